@@ -1,0 +1,50 @@
+# What every target of the house is compiled and linked with.
+
+set(CMAKE_CXX_STANDARD 20)
+set(CMAKE_CXX_STANDARD_REQUIRED ON)
+set(CMAKE_CXX_EXTENSIONS OFF)
+set(CMAKE_POSITION_INDEPENDENT_CODE ON)
+set(CMAKE_CXX_VISIBILITY_PRESET hidden)
+set(CMAKE_VISIBILITY_INLINES_HIDDEN ON)
+
+set(ACCOUNTS_SANITIZE "" CACHE STRING "Sanitizers to build with, as for -fsanitize=")
+option(ACCOUNTS_COVERAGE "Count executed lines and branches" OFF)
+option(ACCOUNTS_LINT "Run clang-tidy on every source that is compiled" OFF)
+
+find_program(CCACHE_PROGRAM ccache)
+if(CCACHE_PROGRAM)
+  set(CMAKE_C_COMPILER_LAUNCHER "${CCACHE_PROGRAM}")
+  set(CMAKE_CXX_COMPILER_LAUNCHER "${CCACHE_PROGRAM}")
+endif()
+
+if(ACCOUNTS_LINT)
+  find_program(CLANG_TIDY_PROGRAM clang-tidy-16 REQUIRED)
+  set(CMAKE_CXX_CLANG_TIDY "${CLANG_TIDY_PROGRAM}" "--quiet" "--extra-arg=-Wno-unknown-warning-option")
+endif()
+
+add_compile_options(
+  -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wold-style-cast -Wnon-virtual-dtor
+  -Woverloaded-virtual -Wnull-dereference -Wcast-qual -Wformat=2 -Werror
+  -fstack-protector-strong)
+add_link_options(-Wl,-z,relro,-z,now,-z,noexecstack)
+
+if(ACCOUNTS_SANITIZE)
+  add_compile_options(-fsanitize=${ACCOUNTS_SANITIZE} -fno-omit-frame-pointer -fno-sanitize-recover=all)
+  add_link_options(-fsanitize=${ACCOUNTS_SANITIZE})
+  # GCC's flow analysis sees null pointers in the sanitizers' own checks.
+  add_compile_options(-Wno-null-dereference)
+  if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
+    # The sanitizer's run time stands in the program, not in the shared libraries.
+    add_link_options(-Wl,-z,undefs)
+  endif()
+else()
+  add_compile_definitions($<$<NOT:$<CONFIG:Debug>>:_FORTIFY_SOURCE=2>)
+endif()
+
+if(ACCOUNTS_COVERAGE)
+  add_compile_options(--coverage -fprofile-update=atomic)
+  add_link_options(--coverage)
+endif()
+
+# An installed tree finds its own libraries from wherever it stands.
+set(CMAKE_INSTALL_RPATH "$ORIGIN/../${CMAKE_INSTALL_LIBDIR}")

@@ -1,0 +1,15 @@
+# The libraries that the house stands on, each found through its own pkg-config or CMake description.
+
+find_package(PkgConfig REQUIRED)
+find_package(Threads REQUIRED)
+pkg_check_modules(libplist REQUIRED IMPORTED_TARGET libplist-2.0)
+pkg_check_modules(libsystemd REQUIRED IMPORTED_TARGET libsystemd)
+pkg_check_modules(uuid REQUIRED IMPORTED_TARGET uuid)
+find_package(ICU REQUIRED COMPONENTS i18n uc)
+find_package(sdbus-c++ REQUIRED)
+find_package(nlohmann_json REQUIRED)
+
+if(ACCOUNTS_TESTS)
+  find_package(GTest REQUIRED)
+  find_package(Python3 REQUIRED COMPONENTS Interpreter)
+endif()

@@ -1,0 +1,48 @@
+#include "platform/class_registry.h"
+
+#include <algorithm>
+#include <mutex>
+#include <vector>
+
+namespace platform {
+namespace {
+
+struct Table {
+  std::mutex guard;
+  std::vector<std::shared_ptr<const ClassInfo>> classes;
+};
+
+// Never destroyed: modules leave it while the process ends.
+Table& table() {
+  static auto* const only = new Table;
+  return *only;
+}
+
+class ProcessClassRegistry final : public ClassRegistry {
+ public:
+  [[nodiscard]] const ClassInfo* classNamed(std::string_view name) const override {
+    const std::scoped_lock lock{table().guard};
+    const auto& classes = table().classes;
+    const auto found = std::find_if(classes.rbegin(), classes.rend(),
+                                    [name](const auto& candidate) { return candidate->name() == name; });
+    return found == classes.rend() ? nullptr : found->get();
+  }
+};
+
+}  // namespace
+
+ClassInfo::~ClassInfo() = default;
+
+ClassRegistration::ClassRegistration(std::shared_ptr<const ClassInfo> info) : _info{std::move(info)} {
+  const std::scoped_lock lock{table().guard};
+  table().classes.push_back(_info);
+}
+
+ClassRegistration::~ClassRegistration() {
+  const std::scoped_lock lock{table().guard};
+  std::erase(table().classes, _info);
+}
+
+std::unique_ptr<ClassRegistry> makeProcessClassRegistry() { return std::make_unique<ProcessClassRegistry>(); }
+
+}  // namespace platform

@@ -1,0 +1,18 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+
+namespace platform {
+
+// The time of day, as text.
+class Clock {
+ public:
+  virtual ~Clock() = default;
+
+  // The current time in the local time zone, formatted by a Unicode date pattern (UTS #35) in the locale en_US_POSIX
+  // and the proleptic Gregorian calendar. Empty where the pattern is invalid or no time zone data can be read.
+  [[nodiscard]] virtual std::string currentLocalTime(std::string_view pattern) const = 0;
+};
+
+}  // namespace platform

@@ -1,0 +1,27 @@
+#pragma once
+
+#include <memory>
+#include <string_view>
+
+namespace platform {
+
+// A lock that at most one holder on the device has at a time, whatever process it is in. The kernel gives it back when
+// the holder dies, so a killed process leaves nothing behind.
+class ExclusiveFileLock {
+ public:
+  virtual ~ExclusiveFileLock() = default;  // gives the lock back where it is held
+
+  // Waits until nobody else holds the lock, then holds it. Answers whether it is held.
+  virtual bool lock() = 0;
+  virtual void unlock() = 0;
+};
+
+// Makes locks by name.
+class ExclusiveFileLocks {
+ public:
+  virtual ~ExclusiveFileLocks() = default;
+  // A lock object, not yet held; null where none can be made.
+  [[nodiscard]] virtual std::unique_ptr<ExclusiveFileLock> lockNamed(std::string_view name) = 0;
+};
+
+}  // namespace platform

@@ -1,0 +1,66 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+#include <filesystem>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "platform/property_value.h"
+#include "platform/status.h"
+
+namespace platform {
+
+using Path = std::filesystem::path;
+
+enum class FileKind : std::uint8_t { file, directory, other };
+
+// The device's files. Paths are absolute. Every call works relative to the opened parent directory of its path and
+// never follows a link at the path itself, except where a call says so. A failed call names its cause and leaves
+// nothing half made that it made itself.
+class FileSystem {
+ public:
+  virtual ~FileSystem() = default;
+
+  // What stands at the path, links followed; nothing where nothing does or where it cannot be told. Nothing is opened.
+  [[nodiscard]] virtual std::optional<FileKind> kindOf(const Path& path) = 0;
+
+  // The whole contents of a regular file, links followed. Anything that is no regular file, or that is larger than
+  // `sizeLimit` bytes, is refused without being read, and nothing blocks.
+  virtual Result<Bytes> read(const Path& path, std::size_t sizeLimit) = 0;
+
+  // Makes a file at a path where nothing stands, mode 0600, writes the bytes and brings them to stable storage. On
+  // failure no file remains.
+  virtual Status create(const Path& path, std::span<const std::uint8_t> bytes) = 0;
+
+  // Replaces whatever file stands at the path, or makes one, mode 0600: a reader sees the old file or the new one,
+  // whole. The bytes and the directory entry are on stable storage when it succeeds.
+  virtual Status replace(const Path& path, std::span<const std::uint8_t> bytes) = 0;
+
+  // Copies a regular file, byte for byte, to a path where nothing stands, mode 0600.
+  virtual Status copy(const Path& from, const Path& to) = 0;
+
+  // Removes what stands at the path, a directory with all below it, never following a link. A path at which nothing
+  // stands is an error (ENOENT).
+  virtual Status remove(const Path& path) = 0;
+
+  // Makes a directory and those above it that are missing. The last one has exactly the given permission bits, whatever
+  // the process's umask, those above it mode 0755.
+  virtual Status createDirectories(const Path& path, unsigned permissions) = 0;
+
+  // Sets the owner and the group of the file at the path, by account name, as the device's own passwd and group files
+  // have them. An unknown name is an error (ENOENT).
+  virtual Status setOwner(const Path& path, std::string_view owner, std::string_view group) = 0;
+
+  // A name for a temporary file in the process's default temporary directory, at which nothing stands; nothing where
+  // none can be had. The name is a proposal: only `create` makes sure that nobody else takes it.
+  [[nodiscard]] virtual std::optional<Path> temporaryName() = 0;
+
+  // Moves a file onto a path in one step, replacing what is there, and brings the directory entry to stable storage. An
+  // error after the move itself is reported as an error.
+  virtual Status rename(const Path& from, const Path& to) = 0;
+};
+
+}  // namespace platform

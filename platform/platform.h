@@ -1,0 +1,60 @@
+#pragma once
+
+#include <memory>
+
+#include "platform/base_directories.h"
+#include "platform/class_registry.h"
+#include "platform/clock.h"
+#include "platform/cloud_tabs_notice.h"
+#include "platform/console_log.h"
+#include "platform/device_info_query.h"
+#include "platform/exclusive_file_lock.h"
+#include "platform/export.h"
+#include "platform/external_sources_query.h"
+#include "platform/file_system.h"
+#include "platform/localized_strings.h"
+#include "platform/module_loader.h"
+#include "platform/preferences_changed_notice.h"
+#include "platform/preferences_store.h"
+#include "platform/profile_restrictions.h"
+#include "platform/property_list_store.h"
+#include "platform/run_observer.h"
+#include "platform/system_account_query.h"
+#include "platform/system_log.h"
+#include "platform/tethered_sync_query.h"
+#include "platform/unique_identifiers.h"
+
+namespace platform {
+
+// The services of the operating system, as one process uses them. Every member but the observer is set.
+struct Platform {
+  std::shared_ptr<BaseDirectories> directories;
+  std::shared_ptr<FileSystem> files;
+  std::shared_ptr<PropertyListStore> propertyLists;
+  std::shared_ptr<PreferencesStore> preferences;
+  std::shared_ptr<PreferencesChangedNotice> preferencesChanged;
+  std::shared_ptr<CloudTabsNotice> cloudTabs;
+  std::shared_ptr<ExclusiveFileLocks> locks;
+  std::shared_ptr<SystemLog> systemLog;
+  std::shared_ptr<ConsoleLog> console;
+  std::shared_ptr<DeviceInfoQuery> deviceInfo;
+  std::shared_ptr<ProfileRestrictions> restrictions;
+  std::shared_ptr<TetheredSyncQuery> tetheredSync;
+  std::shared_ptr<ExternalSourcesQuery> externalSources;
+  std::shared_ptr<SystemAccountQuery> systemAccount;
+  std::shared_ptr<ModuleLoader> modules;
+  std::shared_ptr<ClassRegistry> classes;
+  std::shared_ptr<LocalizedStrings> strings;
+  std::shared_ptr<UniqueIdentifiers> identifiers;
+  std::shared_ptr<Clock> clock;
+  std::shared_ptr<RunObserver> observer;  // null where nobody watches
+};
+
+// The process's platform. Until somebody sets one it is the device's own, made at the first call.
+[[nodiscard]] ACCOUNT_EXPORT const Platform& current();
+
+// Sets the process's platform. To be called before the first use of anything that is built on it, from one thread; what
+// earlier calls of `current` answered is void afterwards.
+ACCOUNT_EXPORT void setCurrent(Platform platform);
+
+}  // namespace platform
