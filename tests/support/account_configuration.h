@@ -1,0 +1,14 @@
+#pragma once
+
+#include "tests/support/fake_platform.h"
+
+namespace tests {
+
+// Puts configuration files into the device's resources: the fifteen account types with the data classes they ship with,
+// the data classes of which several stores can be kept, and no creators.
+void putAccountConfiguration(FakeDevice& device);
+
+// The contents of the account-type file, for tests that change it before they put it.
+[[nodiscard]] Dictionary accountTypesProperties();
+
+}  // namespace tests
