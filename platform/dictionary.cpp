@@ -89,10 +89,12 @@ const Dictionary* Dictionary::dictionary(std::string_view key) const {
 }
 
 Dictionary::Contents& Dictionary::editable() {
-  if (_contents == nullptr) {
+  // Counting one more holder orders this thread after every reader that has let go of the contents by now.
+  const std::shared_ptr<Contents> held = _contents;
+  if (held == nullptr) {
     _contents = std::make_shared<Contents>();
-  } else if (_contents.use_count() > 1) {
-    _contents = std::make_shared<Contents>(*_contents);
+  } else if (held.use_count() > 2) {
+    _contents = std::make_shared<Contents>(*held);
   }
   return *_contents;
 }
