@@ -1,0 +1,170 @@
+#include "migrator/accounts_data_migrator.h"
+
+#include <exception>
+#include <memory>
+#include <tuple>
+#include <utility>
+
+#include "accountsettings/product_values.h"
+#include "migrator/stage.h"
+#include "platform/class_registry.h"
+#include "platform/message.h"
+#include "platform/platform.h"
+
+namespace migrator {
+namespace {
+
+const platform::ClassRegistration registration{std::make_shared<platform::DataClassMigratorClass>(
+    "AccountsDataMigrator", [] { return std::make_unique<AccountsDataMigrator>(); })};
+
+void writeToConsole(std::string_view line) { platform::current().console->write(line); }
+
+// Says what was thrown. Out of memory even for that, it says less, and at last nothing.
+void reportThrown(std::string_view what) noexcept {
+  try {
+    writeToConsole(platform::message("AccountsDataMigrator: The migration was given up. %s", {what}));
+  } catch (...) {
+    try {
+      writeToConsole("AccountsDataMigrator: The migration was given up.");
+    } catch (...) {
+      return;
+    }
+  }
+}
+
+void reportCurrentException() noexcept {
+  try {
+    throw;
+  } catch (const std::exception& exception) {
+    reportThrown(exception.what());
+  } catch (...) {
+    reportThrown("Something was thrown that is no exception");
+  }
+}
+
+using HeldLock = std::unique_ptr<platform::ExclusiveFileLock>;
+
+void release(HeldLock lock) noexcept {
+  try {
+    AccountsManager::releaseMigrationLock(std::move(lock));
+  } catch (...) {
+    reportCurrentException();
+  }
+}
+
+struct Decision {
+  bool mail = false;
+  bool exchange = false;
+  bool newSettings = false;
+
+  [[nodiscard]] bool isLegacyFound() const { return mail || exchange; }
+  [[nodiscard]] bool isAnythingToMigrate() const { return isLegacyFound() || newSettings; }
+};
+
+Decision decide() {
+  const Stage stage{"decision"};
+  Decision decision;
+  AccountsManager::shouldMigrateOldMailAccounts_oldDAAccounts_newAccountSettings(&decision.mail, &decision.exchange,
+                                                                                 &decision.newSettings);
+  return decision;
+}
+
+void finishInterruptedRemoval(AccountsDataMigrator& migrator) {
+  const Stage stage{"legacy removal"};
+  writeToConsole("Detected that a removal old accounts info was in progress. Early return!.");
+  migrator._removeOldAccountsInfo();
+}
+
+std::shared_ptr<AccountsManager> loadStore() {
+  const Stage stage{"load"};
+  return AccountsManager::initInsideOfMigration();
+}
+
+// The version steps alone decide the outcome: a conversion that failed shows only in the log, and its legacy file is
+// deleted like any other. They run after a conversion too, so that converted accounts pass through them.
+bool migrate(AccountsDataMigrator& migrator, AccountsManager& store, const Decision& decision) {
+  migrator._collatedMigrationData.reset();
+  if (AccountsDataMigrator::_saveMigrationInformation()) migrator._collatedMigrationData.emplace();
+  writeToConsole("Migrating accounts");
+  if (decision.exchange) {
+    const Stage stage{"exchange conversion"};
+    std::ignore = migrator._migrateDAAccounts(store);
+  }
+  if (decision.mail) {
+    const Stage stage{"mail conversion"};
+    std::ignore = migrator._migrateMailAccounts(store);
+  }
+  const Stage stage{"version steps"};
+  return migrator._migrateNewAccountsInfo(store);
+}
+
+// Also after failed steps: the file is stamped with the current version whatever became of the run.
+void stampAndSave(AccountsManager& store) {
+  const Stage stage{"save"};
+  store.setDataVersion(AccountsManager::currentVersion());
+  store.saveAllAccounts();
+}
+
+// Nobody asks whether the save went through: the legacy files go after every successful run, and with them, where the
+// file could not be saved, the only copy of the accounts in them. Who cannot bear that keeps a copy of the device.
+void removeLegacyFiles(AccountsDataMigrator& migrator) {
+  const Stage stage{"legacy removal"};
+  migrator._removeOldAccountsInfo();
+}
+
+void writeReport(AccountsDataMigrator& migrator) {
+  const Stage stage{"report"};
+  migrator._saveCollatedMigrationInformation();
+}
+
+void tellMailApplication() {
+  const platform::Platform& services = platform::current();
+  std::ignore = services.files->remove(services.directories->mailData() / "AutoFetchEnabled");
+  services.preferencesChanged->post(accountsettings::kMailPreferencesDomain,
+                                    accountsettings::kMailPreferencesAccountsKey);
+}
+
+void concludeSuccessfulRun(AccountsDataMigrator& migrator, const Decision& decision) {
+  if (decision.isLegacyFound()) removeLegacyFiles(migrator);
+  if (AccountsDataMigrator::_saveMigrationInformation()) writeReport(migrator);
+  tellMailApplication();
+}
+
+}  // namespace
+
+AccountsDataMigrator::~AccountsDataMigrator() { _collatedMigrationData.reset(); }
+
+std::string_view AccountsDataMigrator::dataClassName() const { return "accounts"; }
+
+bool AccountsDataMigrator::performMigration() {
+  HeldLock lock;
+  bool hasSucceeded = false;
+  try {
+    lock = AccountsManager::createAndLockMigrationLock();
+    hasSucceeded = lock != nullptr && executeMigrationSteps();
+  } catch (...) {
+    reportCurrentException();
+    AccountsManager::_setShouldSkipNotifications(false);
+  }
+  release(std::move(lock));
+  return hasSucceeded;
+}
+
+bool AccountsDataMigrator::executeMigrationSteps() {
+  AccountsManager::_setShouldSkipNotifications(true);
+  _copyAsideAccountsPlist();
+  if (_failedToRemoveOldAccountsInfo()) {
+    finishInterruptedRemoval(*this);
+    return true;  // and leaves notifications off for the rest of the process, as this exit always has
+  }
+  const Decision decision = decide();
+  std::shared_ptr<AccountsManager> store = loadStore();
+  const bool hasSucceeded = !decision.isAnythingToMigrate() || migrate(*this, *store, decision);
+  stampAndSave(*store);
+  store.reset();
+  if (hasSucceeded) concludeSuccessfulRun(*this, decision);
+  AccountsManager::_setShouldSkipNotifications(false);
+  return hasSucceeded;
+}
+
+}  // namespace migrator

@@ -1,0 +1,40 @@
+#pragma once
+
+#include <functional>
+#include <memory>
+#include <optional>
+#include <span>
+#include <string>
+#include <string_view>
+
+#include "accountsettings/accounts_manager.h"
+
+// What the conversions of legacy mail and of legacy Exchange accounts have in common.
+namespace migrator {
+
+// A key of a legacy account description and the key under which an account record keeps its value.
+struct Rename {
+  platform::StringConstant legacyKey;
+  platform::StringConstant key;
+};
+
+// The description with its legacy keys renamed, in the given order. A value is moved whatever its kind and takes the
+// place of one that the new key already had.
+[[nodiscard]] platform::Dictionary renamed(const platform::Dictionary& description, std::span<const Rename> renames);
+
+// The legacy file; empty where it cannot be read.
+[[nodiscard]] platform::Dictionary readLegacyFile(const std::string& path);
+
+using Conversion = std::function<std::shared_ptr<accountsettings::BasicAccount>(const platform::Dictionary&)>;
+
+// The accounts that the legacy file describes in the array under the key, in order: all of them, or nothing where the
+// conversion refuses one, after a console line of the given format with that element's description. A missing array is
+// an empty one, an element that is no dictionary an empty dictionary.
+[[nodiscard]] std::optional<accountsettings::AccountsManager::Accounts> convertedAccounts(
+    const platform::Dictionary& legacyFile, std::string_view key, const Conversion& convert, std::string_view method,
+    std::string_view failureFormat);
+
+// Deletes what earlier releases left beside the legacy file: its copy under the same name with ".original" appended.
+void removeOriginalCompanion(const std::string& legacyPath);
+
+}  // namespace migrator

@@ -1,0 +1,70 @@
+#include <array>
+#include <utility>
+
+#include "migrator/accounts_data_migrator.h"
+#include "migrator/legacy_conversion.h"
+
+namespace migrator {
+namespace {
+
+using namespace accountsettings;
+
+constexpr std::array kRenames{Rename{"DAAccountConfigurationClass", kAccountClass},
+                              Rename{"DAAccountDescription", kAccountDisplayName},
+                              Rename{"DAAccountConfigurationAccountID", kAccountIdentifier}};
+
+struct Switch {
+  StringConstant legacyKey;
+  StringConstant dataclass;
+};
+
+constexpr std::array kSwitches{Switch{"DAAccountEnabledForCalendar", kAccountDataclassCalendars},
+                               Switch{"DAAccountEnabledForContacts", kAccountDataclassContacts},
+                               Switch{"DAAccountEnabledForEmail", kAccountDataclassMail},
+                               Switch{"DAAccountEnabledForContactsSearch", kAccountDataclassContactsSearch}};
+
+// Switches that were never set, or that hold what is no switch, are on.
+bool isOn(const std::optional<PropertyValue>& value) { return !value || value->booleanValue().value_or(true); }
+
+Array takeEnabledDataclasses(Dictionary& record) {
+  Array enabled;
+  for (const Switch& each : kSwitches) {
+    if (isOn(record.remove(each.legacyKey))) enabled.emplace_back(each.dataclass);
+  }
+  return enabled;
+}
+
+}  // namespace
+
+std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertExchangeAccountDescription(const Dictionary& description) {
+  Dictionary record = renamed(description, kRenames);
+  Array enabled = takeEnabledDataclasses(record);
+  record.set(kAccountEnabledDataclasses, std::move(enabled));
+  record.set(kAccountType, kExchangeAccountType);
+  record.set(kAccountTypeString, "Exchange");
+  record.set(kAccountShortTypeString, "Exchange");
+  std::shared_ptr<BasicAccount> account = BasicAccount::initWithProperties(record);
+  if (!account) return nullptr;
+  // Unlike a mail account, one without an identifier is given no sync identifier of its own here.
+  if (const Text* const identifier = record.text(kAccountIdentifier)) {
+    account->setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
+  }
+  return account;
+}
+
+bool AccountsDataMigrator::_migrateDAAccounts(AccountsManager& store) {
+  const std::string path = daAccountPath();
+  const Dictionary legacyFile = readLegacyFile(path);
+  if (!legacyFile.empty()) _foundOldDAAccountsToMigrate = true;
+  if (_saveMigrationInformation() && _collatedMigrationData) {
+    _collatedMigrationData->set("OldExchangeAccount", legacyFile);
+  }
+  const auto accounts = convertedAccounts(legacyFile, "DAAccountsKey", _convertExchangeAccountDescription,
+                                          "-[AccountsDataMigrator(Internal) _migrateDAAccounts:]",
+                                          "%s. Could not convert the description for the Exchange account %@");
+  if (accounts) store.replaceAccountsWithTypes_withAccounts({kExchangeAccountType}, *accounts);
+  removeOriginalCompanion(path);
+  return accounts.has_value();
+}
+
+}  // namespace migrator

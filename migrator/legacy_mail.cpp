@@ -1,0 +1,160 @@
+#include <algorithm>
+#include <array>
+#include <mutex>
+#include <utility>
+
+#include "accountsettings/as_runtime_fix_mail_account.h"
+#include "migrator/accounts_data_migrator.h"
+#include "migrator/legacy_conversion.h"
+#include "platform/platform.h"
+
+namespace migrator {
+namespace {
+
+using namespace accountsettings;
+
+constexpr std::string_view kMethod = "-[AccountsDataMigrator(Internal) _migrateMailAccounts:]";
+
+constexpr std::array kRenames{Rename{"AccountType", kAccountClass}, Rename{"AccountName", kAccountDisplayName},
+                              Rename{"uniqueId", kAccountIdentifier}};
+
+constexpr StringConstant kGenericClass{"MailAccount"};
+constexpr StringConstant kGenericDeliveryClass{"SMTPAccount"};
+constexpr StringConstant kGenericTypeString{"Account"};
+
+// What a legacy class stands for: the account's type, and what people call that type.
+struct MailClass {
+  std::string_view name;
+  StringConstant type;
+  StringConstant typeString;
+};
+
+constexpr StringConstant kGmailClass{"GmailAccount"};
+
+constexpr std::array kMailClasses{
+    MailClass{kGmailClass, kGmailAccountType, "Gmail"},  // "Google Mail" in some regions
+    MailClass{"WexmoAccount", kNimbraAccountType, "Nimbra"},
+    MailClass{"KeldorIMAPAccount", kKeldorIMAPAccountType, "Cirrant"},
+    MailClass{"YahooAccount", kYahooAccountType, "Yahoo!\u200E"},  // with a left-to-right mark
+    MailClass{"DAMailAccount", kExchangeAccountType, "Exchange ActiveSync"},
+    MailClass{"NimbraAccount", kNimbraAccountType, "Nimbra"},
+    MailClass{"DeliveryAccount", kSMTPAccountType, kGenericTypeString},
+    MailClass{kGenericDeliveryClass, kSMTPAccountType, kGenericTypeString},
+};
+constexpr MailClass kAnyOtherMailClass{{}, kMailAccountType, kGenericTypeString};
+
+const MailClass& mailClassNamed(std::string_view name) {
+  const auto* const found = std::ranges::find(kMailClasses, name, &MailClass::name);
+  return found == kMailClasses.end() ? kAnyOtherMailClass : *found;
+}
+
+// The record's class; a delivery account that has none is given the generic one.
+std::optional<Text> settledClass(Dictionary& record, std::string_view initialType) {
+  if (const Text* const present = record.text(kAccountClass)) return *present;
+  if (initialType != kSMTPAccountType.view()) return std::nullopt;
+  record.set(kAccountClass, kGenericDeliveryClass);
+  return Text{kGenericDeliveryClass};
+}
+
+void describeType(Dictionary& record, std::string_view className) {
+  record.set(kAccountTypeString, AccountsDataMigrator::_accountTypeStringForMailAccountClass(className));
+  record.set(kAccountShortTypeString, AccountsDataMigrator::_accountShortTypeStringForMailAccountClass(className));
+  record.set(kAccountType, AccountsDataMigrator::_accountTypeForMailAccountClass(className));
+}
+
+// The hosted service knows its users by the part before the "@".
+void cutHostedUsername(Dictionary& record) {
+  const Text* const type = record.text(kAccountType);
+  const Text* const username = record.text(kAccountUsername);
+  if (type == nullptr || username == nullptr || *type != kNimbraAccountType.view()) return;
+  const std::size_t at = username->view().find('@');
+  if (at != std::string_view::npos) record.set(kAccountUsername, Text{username->view().substr(0, at)});
+}
+
+void setSyncIdentifier(BasicAccount& account, const Dictionary& record) {
+  if (const Text* const identifier = record.text(kAccountIdentifier)) {
+    account.setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
+  } else if (const std::optional<std::string> made = platform::current().identifiers->makeUuid()) {
+    account.setAccountProperty_forKey(*made, kAccountSyncIdentifier);
+  }
+}
+
+Conversion conversionOfType(std::string_view initialType) {
+  return [initialType](const Dictionary& description) {
+    return AccountsDataMigrator::_convertMailAccountDescription_type(description, initialType);
+  };
+}
+
+struct ConvertedMail {
+  AccountsManager::Accounts delivery;
+  AccountsManager::Accounts incoming;
+};
+
+// Every account of the file, or nothing where one of them is refused.
+std::optional<ConvertedMail> convertedMail(const Dictionary& legacyFile) {
+  auto delivery = convertedAccounts(legacyFile, "DeliveryAccounts", conversionOfType(kSMTPAccountType), kMethod,
+                                    "%s. Could not convert the description for the delivery account %@");
+  if (!delivery) return std::nullopt;
+  auto incoming = convertedAccounts(legacyFile, "MailAccounts", conversionOfType(kMailAccountType), kMethod,
+                                    "%s. Could not convert the description for the incoming account %@");
+  if (!incoming) return std::nullopt;
+  return ConvertedMail{*std::move(delivery), *std::move(incoming)};
+}
+
+}  // namespace
+
+bool _UseGoogleMail() {
+  static std::once_flag asked;
+  static bool answer = false;
+  std::call_once(asked, [] {
+    const std::optional<PropertyValue> regional = platform::current().deviceInfo->answer("RegionalBehaviorGoogleMail");
+    answer = regional && regional->booleanValue().value_or(false);
+  });
+  return answer;
+}
+
+Text AccountsDataMigrator::_accountTypeForMailAccountClass(std::string_view className) {
+  return mailClassNamed(className).type;
+}
+
+Text AccountsDataMigrator::_accountTypeStringForMailAccountClass(std::string_view className) {
+  return _accountShortTypeStringForMailAccountClass(className);
+}
+
+Text AccountsDataMigrator::_accountShortTypeStringForMailAccountClass(std::string_view className) {
+  if (className == kGmailClass.view() && _UseGoogleMail()) return "Google Mail";
+  return mailClassNamed(className).typeString;
+}
+
+std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertMailAccountDescription_type(const Dictionary& description,
+                                                                                        std::string_view initialType) {
+  Dictionary record = renamed(description, kRenames);
+  record.set(kAccountType, initialType);
+  if (const std::optional<Text> className = settledClass(record, initialType)) describeType(record, *className);
+  cutHostedUsername(record);
+  std::shared_ptr<BasicAccount> account = BasicAccount::initWithProperties(record);
+  if (!account) return nullptr;
+  setSyncIdentifier(*account, record);
+  if (account->accountClass() == Text{kGenericClass}) {
+    reportMailAccountClassFound(account->properties(), "During account migration");
+  }
+  return account;
+}
+
+bool AccountsDataMigrator::_migrateMailAccounts(AccountsManager& store) {
+  const std::string path = mailAccountsPath();
+  const Dictionary legacyFile = readLegacyFile(path);
+  if (!legacyFile.empty()) _foundOldMailAccountsToMigrate = true;
+  if (_saveMigrationInformation() && _collatedMigrationData) _collatedMigrationData->set("OldMailAccounts", legacyFile);
+
+  const std::optional<ConvertedMail> accounts = convertedMail(legacyFile);
+  if (accounts) {
+    // Only "SMTP" and "Mail" accounts make room, although the class table may have given the new ones other types.
+    store.replaceAccountsWithTypes_withAccounts({kSMTPAccountType}, accounts->delivery);
+    store.replaceAccountsWithTypes_withAccounts({kMailAccountType}, accounts->incoming);
+  }
+  removeOriginalCompanion(path);
+  return accounts.has_value();
+}
+
+}  // namespace migrator

@@ -1,0 +1,61 @@
+#include <span>
+#include <tuple>
+
+#include "migrator/accounts_data_migrator.h"
+#include "platform/message.h"
+#include "platform/platform.h"
+
+namespace migrator {
+namespace {
+
+using platform::Path;
+using platform::Status;
+
+constexpr std::string_view kSentinelContents = "Old Account Information Removal Sentinel";
+
+void makeSentinel(const Path& path) {
+  const platform::Bytes contents{kSentinelContents.begin(), kSentinelContents.end()};
+  std::ignore = platform::current().files->create(path, contents);
+}
+
+void reportUndeleted(const Path& path, const Status& status) {
+  platform::current().console->write(platform::message(
+      "%s. Could not delete %@. Error = %@",
+      {"-[AccountsDataMigrator(Internal) _removeOldAccountsInfo]", path.native(), status.description()}));
+}
+
+// A legacy file that cannot be deleted is worth a message only when accounts were found in it.
+enum class Report { failures, nothing };
+
+Status deleteFile(const Path& path, Report report) {
+  Status status = platform::current().files->remove(path);
+  if (!status.isOk() && report == Report::failures) reportUndeleted(path, status);
+  return status;
+}
+
+Report failuresIf(bool found) { return found ? Report::failures : Report::nothing; }
+
+}  // namespace
+
+std::string AccountsDataMigrator::_absolutePathToOldAccountsInfoRemovalSentinel() {
+  return platform::current().directories->home() / "Library/Preferences/.removingOldAccounts";
+}
+
+bool AccountsDataMigrator::_failedToRemoveOldAccountsInfo() {
+  return platform::current().files->kindOf(_absolutePathToOldAccountsInfoRemovalSentinel()).has_value();
+}
+
+bool AccountsDataMigrator::_removeOldAccountsInfo() {
+  const Path sentinel = _absolutePathToOldAccountsInfoRemovalSentinel();
+  if (!_failedToRemoveOldAccountsInfo()) makeSentinel(sentinel);
+
+  const Status exchange = deleteFile(accountsettings::daAccountPath(), failuresIf(_foundOldDAAccountsToMigrate));
+  const bool isMailFileKept = !exchange.isOk() && _foundOldDAAccountsToMigrate;
+  if (!isMailFileKept) {
+    std::ignore = deleteFile(accountsettings::mailAccountsPath(), failuresIf(_foundOldMailAccountsToMigrate));
+  }
+  std::ignore = deleteFile(sentinel, Report::failures);
+  return exchange.isOk();  // false also where there was no Exchange file to delete
+}
+
+}  // namespace migrator

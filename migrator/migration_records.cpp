@@ -1,0 +1,98 @@
+#include <tuple>
+
+#include "migrator/accounts_data_migrator.h"
+#include "migrator/stage.h"
+#include "platform/message.h"
+#include "platform/platform.h"
+
+namespace migrator {
+namespace {
+
+using platform::FileKind;
+using platform::Path;
+
+constexpr std::string_view kSwitchDomain = "com.vorlix.accountsettings-logging";
+constexpr std::string_view kSwitchKey = "ASSaveMigrationInformation";
+constexpr platform::StringConstant kSavedSettingsKey{"NewAccounSettings"};  // readers of reports know this spelling
+constexpr unsigned kOpenToEverybody = 0777;
+// No minutes and no seconds: reports of one tenth of a second of one hour share a name, and the later one stays.
+constexpr std::string_view kReportTimePattern = "Y-M-d-H-M-S";
+
+void writeToConsole(std::string_view format, std::initializer_list<platform::MessageArgument> arguments = {}) {
+  platform::current().console->write(platform::message(format, arguments));
+}
+
+// The copy lies with the shared resources, the report below the home directory.
+Path copyPath(const Path& settingsFile) {
+  return platform::current().directories->sharedResources() / "Library/Logs/CrashReporter" / settingsFile.filename();
+}
+
+Path reportDirectory() {
+  return platform::current().directories->home() / "Library/Logs/CrashReporter/AccountMigration";
+}
+
+// Answers whether reports can be written there.
+bool prepareReportDirectory(const Path& directory) {
+  platform::FileSystem& files = *platform::current().files;
+  const std::optional<FileKind> kind = files.kindOf(directory);
+  if (!kind) {
+    const platform::Status made = files.createDirectories(directory, kOpenToEverybody);
+    if (made.isOk()) return true;
+    writeToConsole(
+        "AccountMigration warning: Could not create the directory to store migration information at %@ [Error = %@]",
+        {directory.native(), made.description()});
+    return false;
+  }
+  if (*kind == FileKind::directory) return true;
+  writeToConsole("AccountMigrator warning: %@ already exists and is not a directory", {directory.native()});
+  return false;
+}
+
+// A binary property list, whatever its ".txt" says. Nobody hears of a report that cannot be written.
+void writeReport(const Path& directory, const Dictionary& report) {
+  const platform::Platform& services = platform::current();
+  const std::string name =
+      platform::message("AccountMigrationInformation-%@.txt", {services.clock->currentLocalTime(kReportTimePattern)});
+  const platform::SerializedPropertyList serialized = services.propertyLists->serialize(report);
+  if (serialized.data) std::ignore = services.files->replace(directory / name, *serialized.data);
+}
+
+}  // namespace
+
+void AccountsDataMigrator::_copyAsideAccountsPlist() {
+  const Stage stage{"copy aside"};
+  platform::FileSystem& files = *platform::current().files;
+  const Path source = AccountsManager::fullPathToAccountSettingsPlist();
+  const Path destination = copyPath(source);
+  if (files.kindOf(destination) && !files.remove(destination).isOk()) {
+    writeToConsole("Couldn't remove existing accountsettings copy at %@", {destination.native()});
+  }
+  const platform::Status copied = files.copy(source, destination);
+  if (!copied.isOk()) writeToConsole("Error trying to save an accountsettings plist copy: %@", {copied.description()});
+}
+
+bool AccountsDataMigrator::_saveMigrationInformation() {
+  static bool hasBeenRead = false;
+  static bool isOn = false;
+  if (!hasBeenRead) {
+    hasBeenRead = true;
+    platform::PreferencesStore& preferences = *platform::current().preferences;
+    preferences.synchronize(kSwitchDomain);
+    isOn = preferences.boolean(kSwitchDomain, kSwitchKey).value_or(false);
+  }
+  return isOn;
+}
+
+void AccountsDataMigrator::_saveCollatedMigrationInformation() {
+  writeToConsole("Saving collated migration information");
+  if (_collatedMigrationData) {
+    const Path settingsFile = AccountsManager::fullPathToAccountSettingsPlist();
+    _collatedMigrationData->set(kSavedSettingsKey,
+                                platform::current().propertyLists->readDictionary(settingsFile).value_or(Dictionary{}));
+  }
+  const Path directory = reportDirectory();
+  // The directory is made also for a run that migrated nothing and so has nothing to report.
+  if (prepareReportDirectory(directory) && _collatedMigrationData) writeReport(directory, *_collatedMigrationData);
+}
+
+}  // namespace migrator
