@@ -30,7 +30,8 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
  public:
   // Making records. `initWithProperties` answers null, after a log line for each reason, where the type is unknown or
   // the class is missing; a record without "Identifier" is given a new one (and, only then, the same "Sync Identifier"
-  // where that is missing). `accountWithType_class` throws AssertionFailure for an unknown type or an empty class.
+  // where that is missing). `accountWithType_class` throws AssertionFailure for an unknown type or an empty class; both
+  // throw it where a new identifier is needed and none can be made, since a record without one could not be stored.
   static std::shared_ptr<BasicAccount> accountWithType_class(std::string_view type, std::string_view className);
   static std::shared_ptr<BasicAccount> accountWithProperties(const Dictionary& properties);
   static std::shared_ptr<BasicAccount> initWithProperties(const Dictionary& properties);
@@ -64,7 +65,7 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
   [[nodiscard]] std::optional<Text> accountClass() const;
   void setAccountClass(std::string_view className);
   [[nodiscard]] virtual std::optional<Text> displayName() const;
-  // Compares with the own properties only; the name must not be empty.
+  // Compares with the own properties only; throws AssertionFailure for an empty name.
   void setDisplayName(std::string_view name);
   [[nodiscard]] std::optional<Text> typeString() const;
   [[nodiscard]] std::optional<Text> shortTypeString() const;
@@ -77,7 +78,7 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
   // Data classes, in the canonical order. `enabledDataclasses` answers nothing where no list is stored; a child shows
   // its parent's list whenever that is not empty. Elements that are no texts are no data classes.
   using Dataclasses = std::vector<Text>;
-  [[nodiscard]] Dataclasses supportedDataclasses() const;
+  [[nodiscard]] const Dataclasses& supportedDataclasses() const;
   [[nodiscard]] Dataclasses provisionedDataclasses() const;
   [[nodiscard]] std::optional<Dataclasses> enabledDataclasses() const;
   [[nodiscard]] bool isEnabledForDataclass(std::string_view dataclass) const;
@@ -88,10 +89,13 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
   [[nodiscard]] static std::unordered_set<std::string_view> _profileRestrictedDataclasses();
 
   // Configuration of account types and data classes (process-wide, loaded once). Anything that needs the account-type
-  // table throws AssertionFailure while the file is missing or unreadable. Nothing is answered for unknown types.
+  // table throws AssertionFailure while the file is missing or unreadable. Nothing is answered for unknown types. What
+  // is of another kind than the configuration needs counts as absent, and elements of its lists that are no texts are
+  // left out.
   static void initialize();
   [[nodiscard]] static const Dataclasses& allSupportedDataclasses();
-  [[nodiscard]] static std::optional<Dataclasses> supportedDataclassesForAccountType(std::string_view type);
+  // Null for an unknown type and for one without a list; lives as long as the process.
+  [[nodiscard]] static const Dataclasses* supportedDataclassesForAccountType(std::string_view type);
   using Actions = std::vector<Text>;
   [[nodiscard]] static std::optional<Actions> userActionsToEnableDataclass_forAccountType(std::string_view dataclass,
                                                                                           std::string_view type);
@@ -131,12 +135,15 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
   void renewAccountCredentialsWithHandler(const std::function<void(int)>& handler);
 
  protected:
-  BasicAccount() = default;
+  BasicAccount();
   // What `initWithProperties` does, for a record of whatever class; answers whether the record may be used.
   [[nodiscard]] bool _acceptProperties(const Dictionary& properties);
   [[nodiscard]] std::optional<Text> _textForKey(std::string_view key) const;
 
  private:
+  // The supported data classes of a type in the canonical order; an empty list for an unknown type.
+  [[nodiscard]] static const Dataclasses& _orderedSupportedDataclassesForAccountType(std::string_view type);
+
   Dictionary _originalProperties;
   Dictionary _properties;
   std::shared_ptr<FullAccountObject> _fullAccount;

@@ -10,7 +10,7 @@ namespace accountsettings {
 
 // The implicit account of all data that belongs to no online account: kept only on the device, or synced with a desktop
 // computer over a cable. Identifier, sync-store identifier and name are fixed, whatever its properties say.
-class ACCOUNT_EXPORT DeviceLocalAccount final : public BasicAccount {
+class ACCOUNT_EXPORT DeviceLocalAccount : public BasicAccount {
  public:
   // The properties of a new device-local account: type, class, both type strings and identifier, nothing else.
   [[nodiscard]] static Dictionary basicAccountProperties();
@@ -33,8 +33,8 @@ class ACCOUNT_EXPORT DeviceLocalAccount final : public BasicAccount {
       std::string_view dataclass, bool beginningOfSentence);
   [[nodiscard]] static std::string localizedReferenceToSyncSourceStringForDataClass(std::string_view dataclass);
 
- private:
-  DeviceLocalAccount() = default;
+ protected:
+  DeviceLocalAccount();
 };
 
 }  // namespace accountsettings

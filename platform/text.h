@@ -49,6 +49,7 @@ class ACCOUNT_EXPORT Text {
            (left._characters.get() == right._characters.get() || left.view() == right.view());
   }
   friend bool operator==(const Text& left, std::string_view right) { return left.view() == right; }
+  friend bool operator==(const Text& left, StringConstant right) { return left.view() == right.view(); }
   friend std::ostream& operator<<(std::ostream& stream, const Text& text) { return stream << text.view(); }
 
  private:

@@ -1,0 +1,198 @@
+#include <algorithm>
+
+#include "accountsettings/assertion_failure.h"
+#include "accountsettings/basic_account.h"
+#include "accountsettings/log_handle.h"
+#include "platform/platform.h"
+
+namespace accountsettings {
+namespace {
+
+constexpr std::string_view kFullAccount = "FullAccount";
+constexpr std::string_view kSyncAccount = "SyncAccount";
+constexpr int kCredentialsNotRenewed = 3;
+
+template <typename... Arguments>
+[[noreturn]] void failLookup(std::string_view format, const Arguments&... arguments) {
+  failAssertion("-[BasicAccount _creatorClassNameForAccountType:creatorType:loader:]", "BasicAccount", format,
+                {platform::MessageArgument{arguments}...});
+}
+
+const Array& creatorEntries(std::string_view type) {
+  const Dictionary* const table = BasicAccount::_accountCreationMap();
+  const Array* const entries = table == nullptr ? nullptr : table->array(type);
+  if (entries == nullptr) {
+    failLookup("Malformed AccountCreators information. Could not find the information for the type %@", type);
+  }
+  return *entries;
+}
+
+bool isCreatorOfType(const PropertyValue& entry, std::string_view creatorType) {
+  const Dictionary* const dictionary = entry.asDictionary();
+  const Text* const type = dictionary == nullptr ? nullptr : dictionary->text("Type");
+  return type != nullptr && *type == creatorType;
+}
+
+// Paths in the configuration are relative to the system root, with or without a slash at their front.
+std::string modulePath(const Text& framework) {
+  const platform::Path relative = platform::Path{framework.string()}.relative_path();
+  return (platform::current().directories->systemRoot() / relative).string();
+}
+
+bool isASCII(std::string_view text) {
+  return std::all_of(text.begin(), text.end(), [](char byte) { return static_cast<unsigned char>(byte) < 0x80; });
+}
+
+void openModule(const std::string& path) {
+  // The loader is handed an ASCII path; one that has no such form cannot be opened.
+  const std::optional<std::string> error =
+      isASCII(path) ? platform::current().modules->open(path) : "the path is not ASCII";
+  if (error) failLookup("Could not load the account creator framework %@. Error %s", path, *error);
+}
+
+bool hasLoadedModuleItself(const AccountClassInfo& loader, const Dictionary& properties) {
+  if (!loader.loadBundleForAccountWithProperties) {
+    failLookup("The loader %@ does not answer loadBundleForAccountWithProperties:", loader.name());
+  }
+  return loader.loadBundleForAccountWithProperties(properties);
+}
+
+std::shared_ptr<FullAccountObject> makeFullAccount(const platform::ClassInfo& info,
+                                                   const std::shared_ptr<BasicAccount>& account) {
+  const auto* const creator = dynamic_cast<const AccountClassInfo*>(&info);
+  if (creator == nullptr) return nullptr;
+  if (creator->classForAccountType) {
+    const AccountClassInfo* const made = creator->classForAccountType(account->type().value_or(Text{}));
+    return made == nullptr || !made->initWithProperties ? nullptr : made->initWithProperties(account->properties());
+  }
+  return creator->accountWithBasicAccount ? creator->accountWithBasicAccount(account) : nullptr;
+}
+
+std::shared_ptr<SyncAccountObject> makeSyncAccount(const platform::ClassInfo& info,
+                                                   const std::shared_ptr<BasicAccount>& account) {
+  const auto* const creator = dynamic_cast<const AccountClassInfo*>(&info);
+  const bool answers = creator != nullptr && creator->accountToRefreshForBasicAccount;
+  return answers ? creator->accountToRefreshForBasicAccount(account) : nullptr;
+}
+
+}  // namespace
+
+std::optional<std::string> BasicAccount::_creatorClassNameForAccountType_creatorType_loader(
+    std::string_view type, std::string_view creatorType, const AccountClassInfo* loader) const {
+  std::optional<std::string> className;
+  // Every matching entry's module is opened; the last one's class counts.
+  for (const PropertyValue& entry : creatorEntries(type)) {
+    if (!isCreatorOfType(entry, creatorType)) continue;
+    const Dictionary* const description = entry.asDictionary()->dictionary("Description");
+    if (description == nullptr) {
+      failLookup("Malformed AccountCreators information. Could not find the description for the %@ with type %@",
+                 creatorType, type);
+    }
+    const bool asksLoader = loader != nullptr && creatorType == kFullAccount;
+    if (!asksLoader || !hasLoadedModuleItself(*loader, _properties)) {
+      const Text* const framework = description->text("Framework");
+      if (framework == nullptr) {
+        failLookup(
+            "Malformed AccountCreators information. Could not find the path to the framework for the %@ with type %@",
+            creatorType, type);
+      }
+      openModule(modulePath(*framework));
+    }
+    const Text* const name = description->text("Class");
+    if (name == nullptr || name->empty()) {
+      failLookup(
+          "Malformed AccountCreators information. Could not find the name of the class that creates %@ with the type "
+          "%@",
+          creatorType, type);
+    }
+    className = name->string();
+  }
+  return className;
+}
+
+std::optional<std::string> BasicAccount::fullAccountCreatorClassNameForAccountType_loader(
+    std::string_view type, const AccountClassInfo* loader) const {
+  return _creatorClassNameForAccountType_creatorType_loader(type, kFullAccount, loader);
+}
+
+std::optional<std::string> BasicAccount::syncAccountCreatorClassNameForAccountType(std::string_view type) const {
+  return _creatorClassNameForAccountType_creatorType_loader(type, kSyncAccount, nullptr);
+}
+
+std::shared_ptr<FullAccountObject> BasicAccount::fullAccountUsingLoader(const AccountClassInfo* loader) {
+  static constexpr std::string_view kMethod = "-[BasicAccount fullAccountUsingLoader:]";
+  if (_fullAccount != nullptr) return _fullAccount;
+  const auto className = fullAccountCreatorClassNameForAccountType_loader(type().value_or(Text{}), loader);
+  const platform::ClassInfo* const info = className ? platform::current().classes->classNamed(*className) : nullptr;
+  if (info == nullptr) {
+    failAssertion(kMethod, "BasicAccount", "The framework/bundle where %@ is defined has not been loaded", {className});
+  }
+  const std::shared_ptr<FullAccountObject> account = makeFullAccount(*info, shared_from_this());
+  if (account == nullptr) {
+    failAssertion(kMethod, "BasicAccount", "Could not create the account with class %@ and id %@",
+                  {className, identifier()});
+  }
+  account->setParentAccount(parentAccount());
+  setFullAccount(account);
+  return _fullAccount;
+}
+
+void BasicAccount::setFullAccount(std::shared_ptr<FullAccountObject> account) { _fullAccount.swap(account); }
+
+std::shared_ptr<SyncAccountObject> BasicAccount::_cachedSyncAccount() {
+  static constexpr const char* kMethod = "-[BasicAccount _cachedSyncAccount]";
+  if (_syncAccount != nullptr) return _syncAccount;
+  const auto className = syncAccountCreatorClassNameForAccountType(type().value_or(Text{}));
+  if (!className) return nullptr;
+  const platform::ClassInfo* const info = platform::current().classes->classNamed(*className);
+  if (info == nullptr) {
+    _ASLogSystem().log(kMethod,
+                       "ERROR: The framework/bundle where %@ is defined has not been loaded, so there is no syncable "
+                       "account for basic account with properties %@",
+                       *className, _properties);
+    return nullptr;
+  }
+  _syncAccount = makeSyncAccount(*info, shared_from_this());
+  if (_syncAccount == nullptr) {
+    _ASLogSystem().log(kMethod, "ERROR: Could not create the account with class %@ and id %@", *className,
+                       identifier());
+  }
+  return _syncAccount;
+}
+
+bool BasicAccount::refreshContainerWithIdentifier_forDataclass_isUserRequested(std::string_view identifier,
+                                                                               std::string_view dataclass,
+                                                                               bool isUserRequested) {
+  const auto account = _cachedSyncAccount();
+  return account != nullptr &&
+         account->refreshContainerWithIdentifier_forDataclass_isUserRequested(identifier, dataclass, isUserRequested);
+}
+
+bool BasicAccount::refreshContainerListForDataclass_isUserRequested(std::string_view dataclass, bool isUserRequested) {
+  const auto account = _cachedSyncAccount();
+  return account != nullptr && account->refreshContainerListForDataclass_isUserRequested(dataclass, isUserRequested);
+}
+
+bool BasicAccount::refreshContainersForDataclass_isUserRequested(std::string_view dataclass, bool isUserRequested) {
+  const auto account = _cachedSyncAccount();
+  return account != nullptr && account->refreshContainersForDataclass_isUserRequested(dataclass, isUserRequested);
+}
+
+bool BasicAccount::refreshContainerWithIdentifier_forDataclass(std::string_view identifier,
+                                                               std::string_view dataclass) {
+  return refreshContainerWithIdentifier_forDataclass_isUserRequested(identifier, dataclass, false);
+}
+
+bool BasicAccount::refreshContainerListForDataclass(std::string_view dataclass) {
+  return refreshContainerListForDataclass_isUserRequested(dataclass, false);
+}
+
+bool BasicAccount::refreshContainersForDataclass(std::string_view dataclass) {
+  return refreshContainersForDataclass_isUserRequested(dataclass, false);
+}
+
+void BasicAccount::renewAccountCredentialsWithHandler(const std::function<void(int)>& handler) {
+  handler(kCredentialsNotRenewed);
+}
+
+}  // namespace accountsettings

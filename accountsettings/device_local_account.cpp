@@ -1,0 +1,137 @@
+#include "accountsettings/device_local_account.h"
+
+#include <algorithm>
+#include <array>
+
+#include "platform/class_registry.h"
+#include "platform/platform.h"
+
+namespace accountsettings {
+namespace {
+
+constexpr StringConstant kClassName{"DeviceLocalAccount"};
+constexpr StringConstant kIdentifier{"DeviceLocalAccount"};
+constexpr StringConstant kTable{"DeviceLocalAccount"};
+constexpr StringConstant kTetheredSyncDomain{"com.vorlix.mobile.tethered_sync"};
+constexpr StringConstant kThisDevice{"Ferrox"};
+
+struct TetheredSyncKey {
+  StringConstant dataclass;
+  StringConstant key;
+};
+
+constexpr std::array<TetheredSyncKey, 6> kTetheredSyncKeys{{
+    {kAccountDataclassMail, "Mail Accounts"},
+    {kAccountDataclassContacts, "Contacts"},
+    {kAccountDataclassCalendars, "Calendars"},
+    {kAccountDataclassReminders, "Calendars"},
+    {kAccountDataclassBookmarks, "Bookmarks"},
+    {kAccountDataclassNotes, "Notes"},
+}};
+
+std::optional<std::string_view> tetheredSyncKey(std::string_view dataclass) {
+  for (const TetheredSyncKey& entry : kTetheredSyncKeys) {
+    if (entry.dataclass == dataclass) return entry.key;
+  }
+  return std::nullopt;
+}
+
+std::string localized(std::string_view key) {
+  return platform::current().strings->text(kTable, key).value_or(std::string{key});
+}
+
+std::string deviceClass() {
+  const std::optional<PropertyValue> answer = platform::current().deviceInfo->answer("DeviceClass");
+  const Text* const text = answer ? answer->asText() : nullptr;
+  return text == nullptr ? std::string{kThisDevice.view()} : text->string();
+}
+
+// Device classes are ASCII; whatever else one holds stays as it is.
+char inKey(char character) {
+  if (character == ' ') return '_';
+  return character >= 'a' && character <= 'z' ? static_cast<char>(character - 'a' + 'A') : character;
+}
+
+std::string localizedForDeviceClass(std::string_view base) {
+  std::string suffix = deviceClass();
+  std::transform(suffix.begin(), suffix.end(), suffix.begin(), inKey);
+  return localized(std::string{base} + "_" + suffix);
+}
+
+std::shared_ptr<const AccountClassInfo> classInfo() {
+  auto info = std::make_shared<AccountClassInfo>(std::string{kClassName.view()});
+  info->initWithProperties = &DeviceLocalAccount::initWithProperties;
+  info->accountWithBasicAccount = [](const std::shared_ptr<BasicAccount>& account) {
+    return DeviceLocalAccount::accountWithBasicAccount(*account);
+  };
+  return info;
+}
+
+const platform::ClassRegistration registration{classInfo()};
+
+}  // namespace
+
+DeviceLocalAccount::DeviceLocalAccount() = default;
+
+Dictionary DeviceLocalAccount::basicAccountProperties() {
+  const Text typeString{class_typeString()};
+  return {{kAccountType, kOnMyDeviceAccountType},
+          {kAccountClass, kClassName},
+          {kAccountTypeString, typeString},
+          {kAccountShortTypeString, typeString},
+          {kAccountIdentifier, kIdentifier}};
+}
+
+std::string DeviceLocalAccount::class_typeString() { return localizedForDeviceClass("ON_MY_DEVICE_TYPE"); }
+
+std::string_view DeviceLocalAccount::_identifier() { return kIdentifier; }
+
+std::shared_ptr<DeviceLocalAccount> DeviceLocalAccount::accountWithProperties(const Dictionary& properties) {
+  return initWithProperties(properties);
+}
+
+std::shared_ptr<DeviceLocalAccount> DeviceLocalAccount::initWithProperties(const Dictionary& properties) {
+  struct Record final : DeviceLocalAccount {};
+  const auto account = std::make_shared<Record>();
+  return account->_acceptProperties(properties) ? account : nullptr;
+}
+
+std::shared_ptr<DeviceLocalAccount> DeviceLocalAccount::accountWithBasicAccount(const BasicAccount& account) {
+  return initWithProperties(account.properties());
+}
+
+std::optional<Text> DeviceLocalAccount::identifier() const { return Text{kIdentifier}; }
+std::optional<Text> DeviceLocalAccount::displayName() const { return Text{class_typeString()}; }
+std::optional<Text> DeviceLocalAccount::syncStoreIdentifier() const { return identifier(); }
+
+std::string DeviceLocalAccount::tetheredSourceForDataClass(std::string_view dataclass) {
+  const auto connection = platform::current().tetheredSync->connect();
+  if (connection == nullptr) return std::string{kThisDevice.view()};
+  const std::optional<PropertyValue> value = connection->value(kTetheredSyncDomain, tetheredSyncKey(dataclass));
+  const Dictionary* const dictionary = value ? value->asDictionary() : nullptr;
+  const Text* const system = dictionary == nullptr ? nullptr : dictionary->text("SyncingOS");
+  return system == nullptr ? std::string{kThisDevice.view()} : system->string();
+}
+
+bool DeviceLocalAccount::isTetheredSyncingDataclass(std::string_view dataclass) {
+  const std::string source = tetheredSourceForDataClass(dataclass);
+  return source == "Drevan" || source == "Windows";
+}
+
+std::string DeviceLocalAccount::localizedSyncSourceStringForDataClass_forBeginningOfSentence(std::string_view dataclass,
+                                                                                             bool beginningOfSentence) {
+  const std::string source = tetheredSourceForDataClass(dataclass);
+  const std::string position = beginningOfSentence ? "" : "_MID_SENTENCE";
+  if (source == "Drevan") return localized("FROM_MY_COMPUTER_TYPE_LUMO" + position);
+  if (source == "Windows") return localized("FROM_MY_COMPUTER_TYPE_PC" + position);
+  return localizedForDeviceClass("ON_MY_DEVICE_TYPE" + position);
+}
+
+std::string DeviceLocalAccount::localizedReferenceToSyncSourceStringForDataClass(std::string_view dataclass) {
+  const std::string source = tetheredSourceForDataClass(dataclass);
+  if (source == "Drevan") return localized("SYNCED_WITH_YOUR_COMPUTER_TYPE_LUMO_MID_SENTENCE");
+  if (source == "Windows") return localized("SYNCED_WITH_YOUR_COMPUTER_TYPE_PC_MID_SENTENCE");
+  return localizedForDeviceClass("ON_YOUR_DEVICE_TYPE_MID_SENTENCE");
+}
+
+}  // namespace accountsettings
