@@ -1,0 +1,181 @@
+#include <algorithm>
+#include <array>
+
+#include "accountsettings/device_local_account.h"
+#include "accountsettings/vocabulary.h"
+#include "migrator/account_reads.h"
+#include "migrator/accounts_data_migrator.h"
+#include "migrator/console.h"
+#include "migrator/stored_names.h"
+#include "platform/platform.h"
+
+namespace migrator {
+namespace {
+
+using namespace accountsettings;  // the vocabulary
+using platform::SyncDataType;
+
+using Accounts = AccountsManager::Accounts;
+
+// --- Identifiers ---
+
+std::optional<Text> unlessEmpty(std::optional<Text> text) {
+  return text && !text->empty() ? std::move(text) : std::nullopt;
+}
+
+void keepIdentifierForSync(BasicAccount& account) {
+  if (const auto identifier = unlessEmpty(textForKey(account, kAccountIdentifier))) {
+    account.setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
+  }
+}
+
+// Read from the account's own properties: a unique id names this very record and is never a parent's.
+std::optional<Text> ownUniqueId(const BasicAccount& account) {
+  const Text* const uniqueId = account.properties().text(kUniqueIdKey);
+  return uniqueId != nullptr ? std::optional{*uniqueId} : std::nullopt;
+}
+
+void settleIdentifier(BasicAccount& account) {
+  if (const auto uniqueId = unlessEmpty(ownUniqueId(account))) {
+    account.setAccountProperty_forKey(*uniqueId, kAccountIdentifier);
+    account.removeAccountPropertyForKey(kUniqueIdKey);
+  } else if (!unlessEmpty(textForKey(account, kAccountIdentifier))) {
+    account.setAccountProperty_forKey(BasicAccount::createNewAccountUID(), kAccountIdentifier);
+  }
+}
+
+// --- The on-device account ---
+
+struct DataclassSources {
+  StringConstant dataclass;
+  SyncDataType sources;
+};
+
+constexpr std::array<DataclassSources, 4> kDataclassesOnDevice{{{kAccountDataclassBookmarks, SyncDataType::bookmarks},
+                                                                {kAccountDataclassCalendars, SyncDataType::calendars},
+                                                                {kAccountDataclassContacts, SyncDataType::contacts},
+                                                                {kAccountDataclassNotes, SyncDataType::notes}}};
+
+void reportSourcesError(std::string_view dataclass, std::string_view error) {
+  writeToConsole("[%s]Error while retreiving external sources for dataclass %@ [%@]",
+                 "-[AccountsDataMigrator(Internal) _migrateAccountsFrom7A153:]", dataclass, error);
+}
+
+// Whether the device keeps data of this class itself: it does unless an external source claims the only store.
+bool isKeptOnDevice(const DataclassSources& kind) {
+  const platform::ExternalSources external = platform::current().externalSources->enabledSources(kind.sources);
+  if (external.error && !external.error->empty()) {
+    reportSourcesError(kind.dataclass, *external.error);
+    return false;
+  }
+  if (!external.sources || external.sources->empty()) return true;
+  return !AccountsDataMigrator::_tetheredDisabledInSources(*external.sources) &&
+         BasicAccount::multipleStoresSupportedByDataclass(kind.dataclass);
+}
+
+BasicAccount::Dataclasses dataclassesKeptOnDevice() {
+  BasicAccount::Dataclasses kept;
+  for (const DataclassSources& kind : kDataclassesOnDevice) {
+    if (isKeptOnDevice(kind)) kept.emplace_back(kind.dataclass);
+  }
+  return kept;
+}
+
+// --- Mail and CalDAV ---
+
+void enableMailAndNotes(BasicAccount& account) {
+  if (!hasClassAmong(account, {kIMAPAccountClass, kGmailAccountClass, kYahooAccountClass, kAOLAccountClass,
+                               kNimbraAccountClass})) {
+    return;
+  }
+  if (!isActiveUnlessSaidOtherwise(account)) return;
+  account.setEnabled_forDataclass(true, kAccountDataclassMail);
+  account.setEnabled_forDataclass(true, kAccountDataclassNotes);
+}
+
+void giveOwnTypeToGmailAndYahoo(BasicAccount& account) {
+  if (hasClassAmong(account, {kGmailAccountClass})) {
+    account._forcedSetAccountProperty_forKey(kGmailAccountType, kAccountType);
+  }
+  if (hasClassAmong(account, {kYahooAccountClass})) {
+    account._forcedSetAccountProperty_forKey(kYahooAccountType, kAccountType);
+  }
+}
+
+Accounts calDAVAccountsOf(const AccountsManager& store) {
+  Accounts accounts;
+  std::ranges::copy_if(store.allBasicAccounts(), std::back_inserter(accounts),
+                       [](const auto& account) { return hasClassAmong(*account, {kCalDAVAccountClass}); });
+  return accounts;
+}
+
+// Every partner is folded in, not just the first; one with two umbrellas is listed for each.
+void foldPartnersInto(BasicAccount& umbrella, const Accounts& candidates, Accounts& folded) {
+  if (!hasClassAmong(umbrella, {kGmailAccountClass, kYahooAccountClass})) return;
+  for (const AccountsManager::Account& candidate : candidates) {
+    if (!AccountsDataMigrator::_calDAVAccount_matchesUmbrellaAccount(*candidate, umbrella)) continue;
+    umbrella.setEnabled_forDataclass(true, kAccountDataclassCalendars);
+    folded.push_back(candidate);
+  }
+}
+
+}  // namespace
+
+bool AccountsDataMigrator::_migrateAccountsFrom7A150(AccountsManager& store) {
+  Accounts incoming = store.basicAccountsWithTypes({kNimbraAccountType, kMailAccountType});
+  std::ranges::copy(store.basicAccountsWithTypes({kExchangeAccountType}), std::back_inserter(incoming));
+  for (const AccountsManager::Account& account : incoming) {
+    keepIdentifierForSync(*account);
+    settleIdentifier(*account);
+  }
+  // Outgoing servers have no data to sync, and so no sync identifier to keep.
+  const Accounts outgoing = store.basicAccountsWithTypes({kSMTPAccountType});
+  for (const AccountsManager::Account& account : outgoing) settleIdentifier(*account);
+
+  store.replaceAccountsWithTypes_withAccounts({kNimbraAccountType, kMailAccountType, kExchangeAccountType}, incoming);
+  store.replaceAccountsWithTypes_withAccounts({kSMTPAccountType}, outgoing);
+  store.setDataVersion(2);
+  return true;
+}
+
+bool AccountsDataMigrator::_migrateAccountsFrom7A153(AccountsManager& store) {
+  const AccountsManager::Account onDevice =
+      BasicAccount::initWithProperties(DeviceLocalAccount::basicAccountProperties());
+  onDevice->setEnabledForDataclasses(dataclassesKeptOnDevice());
+  store.replaceAccountsWithTypes_withAccounts({kOnMyDeviceAccountType}, {onDevice});
+  store.setDataVersion(3);
+  return true;
+}
+
+bool AccountsDataMigrator::_tetheredDisabledInSources(const Array& sources) {
+  return std::ranges::find(sources, PropertyValue{"DenyTethered"}) != sources.end();
+}
+
+bool AccountsDataMigrator::_migrateAccountsFrom7A241(AccountsManager& store) {
+  const Accounts hosted = store.basicAccountsWithTypes({kNimbraAccountType});
+  for (const AccountsManager::Account& account : hosted) {
+    std::optional<BasicAccount::Dataclasses> enabled = account->enabledDataclasses();
+    if (enabled) std::erase(*enabled, Text{kAccountDataclassNotes});
+    // Written back in any case: the list that goes back is the one that counts today, and an absent one stays absent.
+    account->setAccountProperty_forKey(enabled ? std::optional<PropertyValue>{arrayOf(*enabled)} : std::nullopt,
+                                       kAccountEnabledDataclasses);
+  }
+  store.replaceAccountsWithTypes_withAccounts({kNimbraAccountType}, hosted);
+  store.setDataVersion(4);
+  return true;
+}
+
+bool AccountsDataMigrator::_migrateAccountsFrom7A242(AccountsManager& store) {
+  const Accounts candidates = calDAVAccountsOf(store);
+  Accounts folded;
+  for (const AccountsManager::Account& account : store.allBasicAccounts()) {
+    enableMailAndNotes(*account);
+    giveOwnTypeToGmailAndYahoo(*account);
+    foldPartnersInto(*account, candidates, folded);
+  }
+  for (const AccountsManager::Account& account : folded) store.deleteAccount(account);
+  store.setDataVersion(5);
+  return true;
+}
+
+}  // namespace migrator

@@ -1,0 +1,158 @@
+#include <algorithm>
+#include <array>
+
+#include "accountsettings/product_values.h"
+#include "accountsettings/vocabulary.h"
+#include "migrator/account_reads.h"
+#include "migrator/accounts_data_migrator.h"
+#include "migrator/stored_names.h"
+#include "platform/message.h"
+#include "platform/platform.h"
+
+namespace migrator {
+namespace {
+
+using namespace accountsettings;  // the vocabulary
+
+using Account = AccountsManager::Account;
+using Accounts = AccountsManager::Accounts;
+
+// --- Notes on small devices ---
+
+bool deviceKeepsNotesToItself() {
+  const std::optional<PropertyValue> architecture = platform::current().deviceInfo->answer("CPUArchitecture");
+  return architecture == PropertyValue{"armv6"};
+}
+
+// Forced both ways: on such a device notes are no supported data class of any account.
+void keepNotesOnDeviceOnly(BasicAccount& account) {
+  if (account.type() == Text{kOnMyDeviceAccountType}) {
+    account._forcedSetEnabled_forDataclass(true, kAccountDataclassNotes);
+  } else if (account.isEnabledForDataclass(kAccountDataclassNotes)) {
+    account._forcedSetEnabled_forDataclass(false, kAccountDataclassNotes);
+  }
+}
+
+// --- Parents for hosted mail ---
+
+bool isHostedMail(const BasicAccount& account) {
+  return hasClassAmong(account, {kNimbraAccountClass, kWexmoAccountClass});
+}
+
+// What a parent takes away from its mail account; everything else that it takes over, the mail account keeps.
+constexpr std::array kMovedKeys{kAccountEnabledDataclasses, kAccountChildAccounts, kCalendarsAccountSubscribedCalendars,
+                                kSubscribedCalendarInfosKey};
+
+std::optional<PropertyValue> usernameWithDomain(const BasicAccount& mail) {
+  const std::optional<Text> username = textForKey(mail, kAccountUsername);
+  if (!username) return std::nullopt;
+  if (username->view().find('@') != std::string_view::npos) return *username;
+  const StringConstant domain = hasClassAmong(mail, {kWexmoAccountClass}) ? kWexmoMailDomain : kNimbraMailDomain;
+  return platform::message("%@@%@", {*username, domain});
+}
+
+Dictionary parentPropertiesFor(const BasicAccount& mail) {
+  const std::string className = mail.accountClass().value_or(Text{}).string();
+  Dictionary parent;
+  const auto write = [&parent](StringConstant key, std::optional<PropertyValue> value) {
+    if (value) parent.set(key, *std::move(value));
+  };
+  const auto takeOver = [&](StringConstant key) { write(key, mail.accountPropertyForKey(key)); };
+  write(kAccountUsername, usernameWithDomain(mail));
+  takeOver(kAccountDisplayName);
+  takeOver(kAccountEnabledDataclasses);
+  write(kAccountProvisionedDataclasses, arrayOf(mail.supportedDataclasses()));
+  takeOver(kAccountChildAccounts);
+  takeOver(kCalDAVEnabledKey);
+  takeOver(kCalendarsAccountSubscribedCalendars);
+  takeOver(kSubscribedCalendarInfosKey);
+  write(kAccountTypeString, AccountsDataMigrator::_accountTypeStringForMailAccountClass(className));
+  write(kAccountShortTypeString, AccountsDataMigrator::_accountShortTypeStringForMailAccountClass(className));
+  write(kAccountType, kVorlixAccountType);
+  // The parent is of another type but keeps the class name by which older software knows the account.
+  write(kAccountClass, className);
+  return parent;
+}
+
+// Here, unlike in the other steps, an account must say that it is active: a new parent offers mail only if told to.
+bool isActiveBecauseItSaysSo(const BasicAccount& account) { return truthForKey(account, kIsActiveKey).value_or(false); }
+
+void wrapInParent(AccountsManager& store, const Account& mail) {
+  const Account parent = BasicAccount::initWithProperties(parentPropertiesFor(*mail));
+  if (parent == nullptr) return;  // the device knows no cloud accounts, so there is nothing to move to
+  for (const StringConstant key : kMovedKeys) mail->removeAccountPropertyForKey(key);
+  if (isActiveBecauseItSaysSo(*mail)) parent->setEnabled_forDataclass(true, kAccountDataclassMail);
+  store.replaceAccount_withAccount(mail, parent);
+  mail->setParentAccount(parent);
+  store.addChild_toAccount(mail, parent);
+}
+
+// --- Children of cloud accounts, and mail ---
+
+// The child without its display name, which is its parent's to say; nothing for a child that stays as it is.
+std::optional<Dictionary> cleanedChild(const Dictionary& child) {
+  const Account record = BasicAccount::accountWithProperties(child);
+  if (record == nullptr || !isHostedMail(*record) || !record->displayName()) return std::nullopt;
+  record->removeAccountPropertyForKey(kAccountDisplayName);
+  return record->properties();
+}
+
+void cleanChildrenOf(BasicAccount& cloudAccount) {
+  const std::optional<Array> children = arrayForKey(cloudAccount, kAccountChildAccounts);
+  if (!children) return;
+  Array cleaned = *children;
+  for (const PropertyValue& child : *children) {
+    const Dictionary* const properties = child.asDictionary();
+    const std::optional<Dictionary> replacement = cleanedChild(properties != nullptr ? *properties : Dictionary{});
+    if (!replacement) continue;
+    // The place is that of the first equal child, so of two equal ones only the first is ever cleaned.
+    const auto place = std::ranges::find(*children, child) - children->begin();
+    cleaned[static_cast<std::size_t>(place)] = *replacement;
+  }
+  cloudAccount.setAccountProperty_forKey(std::move(cleaned), kAccountChildAccounts);
+}
+
+// Hosted mail is not among these, POP is: the hosted accounts' mail is by now their parents' to switch.
+bool isMailOfOthers(const BasicAccount& account) {
+  return hasClassAmong(account,
+                       {kIMAPAccountClass, kGmailAccountClass, kYahooAccountClass, kAOLAccountClass, kPOPAccountClass});
+}
+
+}  // namespace
+
+bool AccountsDataMigrator::_migrateAccountsFrom8A293(AccountsManager& store) {
+  if (deviceKeepsNotesToItself()) {
+    for (const Account& account : store.allBasicAccounts()) keepNotesOnDeviceOnly(*account);
+  }
+  store.setDataVersion(6);
+  return true;
+}
+
+// No release ever stamped 7 or 8: this step and the next leave the version at 6.
+bool AccountsDataMigrator::_migrateAccountsFrom8B117(AccountsManager& store) {
+  const Accounts snapshot = store.allBasicAccounts();
+  for (const Account& account : snapshot) {
+    if (isHostedMail(*account)) wrapInParent(store, account);
+  }
+  store.saveAllAccounts();
+  return true;
+}
+
+bool AccountsDataMigrator::_migrateAccountsFrom8C136(AccountsManager& store) {
+  for (const Account& account : store.allBasicAccounts()) {
+    if (hasClassAmong(*account, {kCloudAccountClass})) cleanChildrenOf(*account);
+    if (isMailOfOthers(*account) && isActiveUnlessSaidOtherwise(*account)) {
+      account->setEnabled_forDataclass(true, kAccountDataclassMail);
+    }
+  }
+  store.saveAllAccounts();
+  return true;
+}
+
+bool AccountsDataMigrator::_migrateAccountsFrom8F191(AccountsManager& store) {
+  store.setDataVersion(9);
+  store.saveAllAccounts();
+  return true;
+}
+
+}  // namespace migrator
