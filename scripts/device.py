@@ -1,0 +1,146 @@
+"""A device's file tree in a directory: made from readable text, migrated with the real host, read back."""
+
+import json
+import os
+import plistlib
+import shutil
+import stat
+import subprocess
+from pathlib import Path
+from typing import NamedTuple
+
+EXAMPLES = Path(__file__).resolve().parent.parent / "examples" / "devices"
+
+HOME = "var/mobile"
+PREFERENCES = HOME + "/Library/Preferences"
+SETTINGS = PREFERENCES + "/com.vorlix.accountsettings.plist"
+SETTINGS_COPY = HOME + "/Library/Logs/CrashReporter/com.vorlix.accountsettings.plist"
+LEGACY_MAIL = HOME + "/Library/Mail/Accounts.plist"
+LEGACY_EXCHANGE = PREFERENCES + "/com.vorlix.DataAccess.plist"
+TEMPORARY = HOME + "/tmp"
+
+# A device has them from its first start on, and version control cannot hold them while they are empty.
+STANDING_DIRECTORIES = [PREFERENCES, HOME + "/Library/Mail", HOME + "/Library/Logs/CrashReporter"]
+
+
+class Entry(NamedTuple):
+    """What stands at one path."""
+
+    kind: str
+    mode: int
+    owner: tuple
+    content: bytes
+
+
+class Run(NamedTuple):
+    """What one run of the host left behind outside the device."""
+
+    status: int
+    output: list
+    errors: list
+    events: list
+
+    def told(self, event):
+        return [each for each in self.events if each["event"] == event]
+
+    def messages(self):
+        """The quoted part of the log's messages, in order."""
+        return [quoted(each["message"]) for each in self.told("log")]
+
+    def console(self):
+        return [each["message"] for each in self.told("console")]
+
+
+def quoted(line):
+    return line[line.index('"') + 1 : line.rindex('"')]
+
+
+class Device:
+    def __init__(self, root):
+        self.root = Path(root)
+        for directory in STANDING_DIRECTORIES:
+            (self.root / directory).mkdir(parents=True, exist_ok=True)
+
+    @classmethod
+    def like(cls, example, root):
+        """A copy of an example device whose mobile user is the caller; its property lists are binary, as on a device."""
+        shutil.copytree(EXAMPLES / example, root, dirs_exist_ok=True)
+        device = cls(root)
+        for path in device.root.rglob("*.plist"):
+            device.write_plist(path, plistlib.loads(path.read_bytes()))
+        device.set_mobile(os.getuid(), os.getgid())
+        return device
+
+    def path(self, path):
+        return self.root / path
+
+    def write(self, path, content):
+        self.path(path).parent.mkdir(parents=True, exist_ok=True)
+        self.path(path).write_bytes(content.encode() if isinstance(content, str) else content)
+
+    def read(self, path):
+        return self.path(path).read_bytes()
+
+    def write_plist(self, path, value):
+        self.write(path, plistlib.dumps(value, fmt=plistlib.FMT_BINARY, sort_keys=False))
+
+    def read_plist(self, path):
+        return plistlib.loads(self.read(path))
+
+    def set_mobile(self, user, group):
+        """Names the ids of the device's mobile user and group."""
+        self.write("etc/passwd", f"root:*:0:0::/var/root:/bin/sh\nmobile:*:{user}:{group}::/var/mobile:/bin/sh\n")
+        self.write("etc/group", f"wheel:*:0:root\nmobile:*:{group}:\n")
+
+    def entries(self):
+        """Everything below the root, by path."""
+        return {str(path.relative_to(self.root)): _entry(path) for path in sorted(self.root.rglob("*"))}
+
+    def migrate(self, host, *options, environment=None, prepare=None, timeout=60):
+        """Runs the host on this device, with a trace; `prepare` is called in the new process before it starts."""
+        trace = self.root.with_name(self.root.name + ".trace")
+        trace.unlink(missing_ok=True)
+        return run_host(
+            host, "--root", self.root, "--trace", trace, *options,
+            environment=environment, prepare=prepare, timeout=timeout, trace=trace,
+        )
+
+
+def run_host(host, *arguments, environment=None, prepare=None, timeout=60, trace=None):
+    ended = subprocess.run(
+        [str(host), *map(str, arguments)],
+        env={**plain_environment(), **(environment or {})},
+        preexec_fn=prepare,
+        stdin=subprocess.DEVNULL,
+        capture_output=True,
+        timeout=timeout,
+        check=False,
+    )
+    return Run(ended.returncode, lines(ended.stdout), lines(ended.stderr), read_trace(trace))
+
+
+def plain_environment():
+    """The caller's environment without what would lead the host elsewhere than the device."""
+    return {name: value for name, value in os.environ.items() if name not in ("TMPDIR", "HOME")}
+
+
+def lines(output):
+    return output.decode(errors="replace").splitlines()
+
+
+def read_trace(trace):
+    if trace is None or not trace.is_file():
+        return []
+    text = trace.read_text(encoding="utf-8")
+    return [json.loads(line) for line in text.splitlines()]
+
+
+def _entry(path):
+    status = path.lstat()
+    content = path.read_bytes() if stat.S_ISREG(status.st_mode) else b""
+    return Entry(
+        kind={stat.S_IFREG: "file", stat.S_IFDIR: "directory"}.get(stat.S_IFMT(status.st_mode), "other"),
+        mode=stat.S_IMODE(status.st_mode),
+        owner=(status.st_uid, status.st_gid),
+        content=content,
+    )

@@ -1,0 +1,113 @@
+"""Migrates a copy of each example device and shows what became of its accounts."""
+
+import sys
+import tempfile
+from pathlib import Path
+
+from device import EXAMPLES, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, Device
+
+ABSENT = "-"
+TITLES = ("Account", "Before", "After", "What changed")
+
+
+class Account:
+    def __init__(self, properties, place):
+        self.properties = properties
+        self.place = place
+
+    def name(self):
+        return self.properties.get("DisplayName") or self.properties.get("Type String") or self.identifiers()[0]
+
+    def identifiers(self):
+        keys = ("Identifier", "uniqueId", "DAAccountConfigurationAccountID", "Sync Identifier")
+        return [self.properties[key] for key in keys if self.properties.get(key)] or [ABSENT]
+
+    def summary(self):
+        kind = self.properties.get("Type") or self.properties.get("Class") or self.properties.get("AccountType")
+        return f"{kind or ABSENT} ({self.place})"
+
+
+def accounts_of(device):
+    found = []
+    for path, keys, place in (
+        (SETTINGS, ("Accounts",), "settings"),
+        (LEGACY_MAIL, ("DeliveryAccounts", "MailAccounts"), "legacy mail file"),
+        (LEGACY_EXCHANGE, ("DAAccountsKey",), "legacy Exchange file"),
+    ):
+        if device.path(path).is_file():
+            content = device.read_plist(path)
+            for key in keys:
+                found += with_children(content.get(key, []), place)
+    return found
+
+
+def with_children(accounts, place):
+    for account in accounts:
+        found = Account(account, place)
+        yield found
+        yield from with_children(account.get("ChildAccounts", []), f"in {found.name()}")
+
+
+def partner_of(account, others):
+    """The account's other self: the one with which it shares an identifier."""
+    wanted = account.identifiers()
+    return next((other for other in others if set(wanted) & set(other.identifiers())), None)
+
+
+def changes(before, after):
+    old, new = before.properties, after.properties
+    parts = [f"{mark}{key}" for mark, keys in (
+        ("+", [key for key in new if key not in old]),
+        ("-", [key for key in old if key not in new]),
+        ("~", [key for key in new if key in old and new[key] != old[key]]),
+    ) for key in keys]
+    if not parts:
+        return "nothing"
+    return ", ".join(parts[:4]) + (f" and {len(parts) - 4} more" if len(parts) > 4 else "")
+
+
+def rows(before, after):
+    left = list(after)
+    for account in before:
+        partner = partner_of(account, left)
+        if partner is None:
+            yield account.name(), account.summary(), ABSENT, "gone"
+        else:
+            left.remove(partner)
+            yield account.name(), account.summary(), partner.summary(), changes(account, partner)
+    for account in left:
+        yield account.name(), ABSENT, account.summary(), "new"
+
+
+def show_table(table):
+    widths = [max(len(row[column]) for row in [TITLES, *table]) for column in range(len(TITLES))]
+    for row in [TITLES, tuple("-" * width for width in widths), *table]:
+        print("  " + "  ".join(cell.ljust(width) for cell, width in zip(row, widths)).rstrip())
+
+
+def version_of(device):
+    return device.read_plist(SETTINGS).get("Version", ABSENT) if device.path(SETTINGS).is_file() else "none"
+
+
+def migrate_example(example, directory, host):
+    device = Device.like(example, directory / example)
+    version, accounts = version_of(device), accounts_of(device)
+    run = device.migrate(host)
+    print(f"\n{example}: data version {version} -> {version_of(device)}, exit status {run.status}\n")
+    show_table(list(rows(accounts, accounts_of(device))))
+    print(f"\n  settings  {device.path(SETTINGS)}")
+    if device.path(SETTINGS_COPY).is_file():
+        print(f"  before    {device.path(SETTINGS_COPY)}")
+    print(f"  trace     {device.root}.trace ({len(run.events)} events)")
+    return run.status
+
+
+def main(host):
+    directory = Path(tempfile.mkdtemp(prefix="migrated-devices-"))
+    statuses = [migrate_example(example.name, directory, host) for example in sorted(EXAMPLES.iterdir())]
+    print(f"\nThe migrated devices stay in {directory} until you delete them.")
+    return max(statuses)
+
+
+if __name__ == "__main__":
+    sys.exit(main(sys.argv[1]))
