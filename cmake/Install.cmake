@@ -1,0 +1,63 @@
+# What `cmake --install` leaves behind: a tree in which everything finds everything else from wherever the tree stands.
+# Distribution packages, whose libraries lie where the system looks anyway, build with CMAKE_SKIP_INSTALL_RPATH.
+
+include(CMakePackageConfigHelpers)
+
+set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/AccountSettings")
+set(headers_dir "${CMAKE_INSTALL_INCLUDEDIR}/account-settings")
+set(modules_dir "${CMAKE_INSTALL_LIBDIR}/account-settings")
+file(RELATIVE_PATH libraries_from_programs "/${CMAKE_INSTALL_BINDIR}" "/${CMAKE_INSTALL_LIBDIR}")
+
+# Everything that is needed to run, and nothing that only tests need.
+add_custom_target(product)
+
+foreach(library accountplatform accountsettings)
+  if(TARGET ${library})
+    add_dependencies(product ${library})
+    set_target_properties(${library} PROPERTIES INSTALL_RPATH "$ORIGIN")
+    target_compile_features(${library} INTERFACE cxx_std_20)
+    install(TARGETS ${library} EXPORT AccountSettings
+      LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+      INCLUDES DESTINATION "${headers_dir}")
+  endif()
+endforeach()
+
+foreach(program migration-host accountctl)
+  if(TARGET ${program})
+    add_dependencies(product ${program})
+    set_target_properties(${program} PROPERTIES INSTALL_RPATH "$ORIGIN/${libraries_from_programs}")
+    install(TARGETS ${program} RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}")
+  endif()
+endforeach()
+
+# Loadable modules are opened by their path, without a library's prefix in their name.
+get_property(loadable_modules GLOBAL PROPERTY ACCOUNTS_LOADABLE_MODULES)
+if(TARGET accounts-migrator)
+  list(PREPEND loadable_modules accounts-migrator)
+endif()
+foreach(module IN LISTS loadable_modules)
+  add_dependencies(product ${module})
+  set_target_properties(${module} PROPERTIES INSTALL_RPATH "$ORIGIN/..")
+  install(TARGETS ${module} LIBRARY DESTINATION "${modules_dir}")
+endforeach()
+
+install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+
+foreach(folder accountsettings platform)
+  file(GLOB headers CONFIGURE_DEPENDS "${CMAKE_SOURCE_DIR}/${folder}/*.h")
+  install(FILES ${headers} DESTINATION "${headers_dir}/${folder}")
+endforeach()
+
+install(EXPORT AccountSettings NAMESPACE AccountSettings:: DESTINATION "${package_dir}" FILE AccountSettingsTargets.cmake)
+configure_package_config_file(
+  "${CMAKE_SOURCE_DIR}/cmake/AccountSettingsConfig.cmake.in" "${CMAKE_BINARY_DIR}/AccountSettingsConfig.cmake"
+  INSTALL_DESTINATION "${package_dir}")
+write_basic_package_version_file("${CMAKE_BINARY_DIR}/AccountSettingsConfigVersion.cmake" COMPATIBILITY SameMajorVersion)
+install(FILES
+  "${CMAKE_BINARY_DIR}/AccountSettingsConfig.cmake" "${CMAKE_BINARY_DIR}/AccountSettingsConfigVersion.cmake"
+  DESTINATION "${package_dir}")
+
+file(RELATIVE_PATH prefix_from_pkgconfig "/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/")
+string(REGEX REPLACE "/$" "" prefix_from_pkgconfig "${prefix_from_pkgconfig}")
+configure_file("${CMAKE_SOURCE_DIR}/cmake/account-settings.pc.in" "${CMAKE_BINARY_DIR}/account-settings.pc" @ONLY)
+install(FILES "${CMAKE_BINARY_DIR}/account-settings.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
