@@ -1,10 +1,45 @@
 #include "platform/linux/linux_platform.h"
 
 #include "platform/default_platform.h"
+#include "platform/linux/bus_notices.h"
+#include "platform/linux/device_configuration.h"
+#include "platform/linux/linux_base_directories.h"
+#include "platform/linux/linux_clock.h"
+#include "platform/linux/linux_console_log.h"
+#include "platform/linux/linux_file_locks.h"
+#include "platform/linux/linux_file_system.h"
+#include "platform/linux/linux_localized_strings.h"
+#include "platform/linux/linux_module_loader.h"
+#include "platform/linux/linux_preferences_store.h"
+#include "platform/linux/linux_system_log.h"
+#include "platform/linux/linux_unique_identifiers.h"
 
 namespace platform {
 
-Platform makeLinuxPlatform(const LinuxPlatformOptions&) { return {}; }
+Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
+  Platform services;
+  services.directories = makeBaseDirectories(options);
+  services.files = makeFileSystem(services.directories->systemRoot());
+  const DeviceConfiguration configuration{services.directories, services.propertyLists};
+  services.preferences = makePreferencesStore(services.directories, services.propertyLists);
+  const std::shared_ptr<SystemBus> bus = makeSystemBus();
+  services.preferencesChanged = makePreferencesChangedNotice(bus);
+  services.cloudTabs = makeCloudTabsNotice(bus);
+  services.locks = makeFileLocks(options.lockDirectory);
+  services.systemLog = makeSystemLog(systemLogSinks());
+  services.console = makeConsoleLog();
+  services.deviceInfo = makeDeviceInfoQuery(configuration);
+  services.restrictions = makeProfileRestrictions(configuration);
+  services.tetheredSync = makeTetheredSyncQuery(configuration);
+  services.externalSources = makeExternalSourcesQuery(configuration);
+  services.systemAccount = makeSystemAccountQuery();
+  services.modules = makeModuleLoader();
+  services.classes = makeProcessClassRegistry();
+  services.strings = makeLocalizedStrings(services.directories, services.propertyLists);
+  services.identifiers = makeUniqueIdentifiers();
+  services.clock = makeClock();
+  return services;
+}
 
 Platform makeDefaultPlatform() { return makeLinuxPlatform(); }
 

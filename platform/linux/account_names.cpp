@@ -1,0 +1,73 @@
+#include "platform/linux/account_names.h"
+
+#include <grp.h>
+#include <pwd.h>
+
+#include <array>
+#include <cerrno>
+#include <cstdio>
+#include <memory>
+#include <vector>
+
+#include "platform/linux/file_access.h"
+
+namespace platform {
+namespace {
+
+// A name that stands behind a longer entry (a group with very many members) is not found.
+constexpr std::size_t entryLimit = std::size_t{1} << 20;
+
+using File = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
+
+File openTable(const std::filesystem::path& path) {
+  Descriptor table = openRegularFile(openParent(path), AtLink::follow);
+  std::FILE* const file = table.isOpen() ? ::fdopen(table.number(), "re") : nullptr;
+  if (file != nullptr) static_cast<void>(table.release());
+  return {file, &std::fclose};
+}
+
+std::optional<uid_t> userInTable(const std::filesystem::path& path, const std::string& name) {
+  const File table = openTable(path);
+  if (!table) return std::nullopt;
+  std::vector<char> buffer(entryLimit);
+  passwd entry{};
+  passwd* found = nullptr;
+  while (::fgetpwent_r(table.get(), &entry, buffer.data(), buffer.size(), &found) == 0) {
+    if (name == found->pw_name) return found->pw_uid;
+  }
+  return std::nullopt;
+}
+
+std::optional<gid_t> groupInTable(const std::filesystem::path& path, const std::string& name) {
+  const File table = openTable(path);
+  if (!table) return std::nullopt;
+  std::vector<char> buffer(entryLimit);
+  struct group entry {};
+  struct group* found = nullptr;
+  while (::fgetgrent_r(table.get(), &entry, buffer.data(), buffer.size(), &found) == 0) {
+    if (name == found->gr_name) return found->gr_gid;
+  }
+  return std::nullopt;
+}
+
+}  // namespace
+
+std::optional<uid_t> AccountNames::user(const std::string& name) const {
+  if (_root != "/") return userInTable(_root / "etc/passwd", name);
+  std::vector<char> buffer(entryLimit);
+  passwd entry{};
+  passwd* found = nullptr;
+  ::getpwnam_r(name.c_str(), &entry, buffer.data(), buffer.size(), &found);
+  return found == nullptr ? std::nullopt : std::optional{found->pw_uid};
+}
+
+std::optional<gid_t> AccountNames::group(const std::string& name) const {
+  if (_root != "/") return groupInTable(_root / "etc/group", name);
+  std::vector<char> buffer(entryLimit);
+  struct group entry {};
+  struct group* found = nullptr;
+  ::getgrnam_r(name.c_str(), &entry, buffer.data(), buffer.size(), &found);
+  return found == nullptr ? std::nullopt : std::optional{found->gr_gid};
+}
+
+}  // namespace platform

@@ -1,0 +1,24 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <filesystem>
+#include <optional>
+#include <string>
+
+namespace platform {
+
+// The numbers behind account names on a device: on the running system as its name services know them, in a file tree
+// elsewhere by that tree's own etc/passwd and etc/group.
+class AccountNames {
+ public:
+  explicit AccountNames(std::filesystem::path systemRoot) : _root{std::move(systemRoot)} {}
+
+  [[nodiscard]] std::optional<uid_t> user(const std::string& name) const;
+  [[nodiscard]] std::optional<gid_t> group(const std::string& name) const;
+
+ private:
+  std::filesystem::path _root;
+};
+
+}  // namespace platform

@@ -1,0 +1,45 @@
+#pragma once
+
+#include <memory>
+
+#include "platform/base_directories.h"
+#include "platform/device_info_query.h"
+#include "platform/external_sources_query.h"
+#include "platform/profile_restrictions.h"
+#include "platform/property_list_store.h"
+#include "platform/system_account_query.h"
+#include "platform/tethered_sync_query.h"
+
+namespace platform {
+
+// What a device is asked about itself is answered from its own configuration: property lists that are read anew at each
+// question. Every file and every key is optional, and a value of the wrong kind is no answer.
+struct DeviceConfiguration {
+  std::shared_ptr<BaseDirectories> directories;
+  std::shared_ptr<PropertyListStore> propertyLists;
+
+  // The dictionary in ROOT/etc/vorlix/NAME or HOME/Library/Preferences/NAME; nothing where it cannot be read.
+  [[nodiscard]] std::optional<Dictionary> ofSystem(std::string_view name) const;
+  [[nodiscard]] std::optional<Dictionary> ofUser(std::string_view name) const;
+};
+
+// ROOT/etc/vorlix/device-info.plist: the keys of the questions. Without an answer there, "CPUArchitecture" is the
+// machine's, as the kernel names it.
+[[nodiscard]] std::shared_ptr<DeviceInfoQuery> makeDeviceInfoQuery(DeviceConfiguration configuration);
+
+// ROOT/etc/vorlix/profile-restrictions.plist: CloudDocumentSync, MediaStream, SharedStreams, CloudBackup and
+// CardsWhileLocked, true for allowed and false for not allowed.
+[[nodiscard]] std::shared_ptr<ProfileRestrictions> makeProfileRestrictions(DeviceConfiguration configuration);
+
+// HOME/Library/Preferences/com.vorlix.mobile.tethered_sync.plist: one value per key of the domain of that name. Without
+// that file the service cannot be reached.
+[[nodiscard]] std::shared_ptr<TetheredSyncQuery> makeTetheredSyncQuery(DeviceConfiguration configuration);
+
+// HOME/Library/Preferences/com.vorlix.external-sources.plist: Bookmarks, Calendars, Contacts and Notes, each an array
+// of sources or a dictionary with "Sources" (array) and "Error" (text).
+[[nodiscard]] std::shared_ptr<ExternalSourcesQuery> makeExternalSourcesQuery(DeviceConfiguration configuration);
+
+// Fixed for every device.
+[[nodiscard]] std::shared_ptr<SystemAccountQuery> makeSystemAccountQuery();
+
+}  // namespace platform

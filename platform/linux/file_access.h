@@ -1,0 +1,43 @@
+#pragma once
+
+#include <sys/stat.h>
+
+#include <filesystem>
+#include <string>
+
+#include "platform/linux/descriptor.h"
+
+namespace platform {
+
+// The steps that the calls of the file system are made of. All set errno and answer false, or a descriptor that is not
+// open, where they fail.
+
+// A path taken apart: its opened parent directory and the name below it.
+struct Place {
+  Descriptor parent;  // good for the *at calls only
+  std::string leaf;   // "." for a root directory
+};
+
+// Opens the directory above the path. The one place where the directories of a path are resolved.
+[[nodiscard]] Place openParent(const std::filesystem::path& path);
+
+// Whether the name can be made, moved or removed: neither empty nor "." nor "..".
+[[nodiscard]] bool isEntryName(const std::string& leaf);
+
+enum class AtLink : bool { stop, follow };
+
+// Opens a regular file for reading. Whatever else stands there is refused (EISDIR, ELOOP or EINVAL), unopened where
+// that can be told before, and nothing waits for the other side of a pipe or a device.
+[[nodiscard]] Descriptor openRegularFile(const Place& place, AtLink atLink);
+
+// Makes a new file, mode 0600 whatever the umask, open for writing.
+[[nodiscard]] Descriptor makeFile(const Place& place);
+
+[[nodiscard]] bool writeAll(int descriptor, const void* bytes, std::size_t size);
+// Fills the buffer as far as the file goes. Answers the number of bytes, -1 on failure.
+[[nodiscard]] ssize_t readSome(int descriptor, void* buffer, std::size_t size);
+
+// Brings the entries of the directory to stable storage. File systems that have nothing to sync are no failure.
+[[nodiscard]] bool syncDirectory(const Descriptor& directory);
+
+}  // namespace platform

@@ -1,0 +1,72 @@
+#include "platform/linux/linux_base_directories.h"
+
+#include <dlfcn.h>
+#include <pwd.h>
+#include <unistd.h>
+
+#include <cstdlib>
+#include <vector>
+
+namespace platform {
+namespace {
+
+using std::filesystem::path;
+
+path wholePath(const path& given) {
+  std::error_code unused;
+  const path whole = std::filesystem::absolute(given, unused).lexically_normal();
+  return whole.has_filename() || whole == "/" ? whole : whole.parent_path();
+}
+
+path homeOfProcess() {
+  const char* const named = std::getenv("HOME");
+  if (named != nullptr && *named == '/') return wholePath(named);
+  std::vector<char> buffer(std::size_t{1} << 16);
+  passwd entry{};
+  passwd* found = nullptr;
+  ::getpwuid_r(::getuid(), &entry, buffer.data(), buffer.size(), &found);
+  return found != nullptr && *found->pw_dir == '/' ? wholePath(found->pw_dir) : path{"/"};
+}
+
+// A place of the library's own, by which it is found in the file tree.
+void anchor() {}
+
+// The build gives the way from the library's directory to the resources; it is the same built and installed.
+path besideThisLibrary() {
+  Dl_info library{};
+  if (::dladdr(reinterpret_cast<const void*>(&anchor), &library) == 0) return wholePath(ACCOUNT_RESOURCES_FROM_LIBRARY);
+  std::error_code failed;
+  const path file = std::filesystem::canonical(library.dli_fname, failed);
+  return wholePath((failed ? wholePath(library.dli_fname) : file).parent_path() / ACCOUNT_RESOURCES_FROM_LIBRARY);
+}
+
+class LinuxBaseDirectories final : public BaseDirectories {
+ public:
+  explicit LinuxBaseDirectories(const LinuxPlatformOptions& options)
+      : _root{wholePath(options.systemRoot.value_or("/"))},
+        _home{options.home ? wholePath(*options.home) : homeUnder(_root)},
+        _sharedResources{options.sharedResources ? wholePath(*options.sharedResources) : _root / "var/mobile"},
+        _resources{options.resources ? wholePath(*options.resources) : besideThisLibrary()} {}
+
+  [[nodiscard]] path systemRoot() const override { return _root; }
+  [[nodiscard]] path home() const override { return _home; }
+  [[nodiscard]] path sharedResources() const override { return _sharedResources; }
+  [[nodiscard]] path mailData() const override { return _home / "Library/Mail"; }
+  [[nodiscard]] path resources() const override { return _resources; }
+
+ private:
+  static path homeUnder(const path& root) { return root == "/" ? homeOfProcess() : root / "var/mobile"; }
+
+  path _root;
+  path _home;
+  path _sharedResources;
+  path _resources;
+};
+
+}  // namespace
+
+std::shared_ptr<BaseDirectories> makeBaseDirectories(const LinuxPlatformOptions& options) {
+  return std::make_shared<LinuxBaseDirectories>(options);
+}
+
+}  // namespace platform

@@ -1,0 +1,13 @@
+#pragma once
+
+#include <memory>
+
+#include "platform/export.h"
+#include "platform/file_system.h"
+
+namespace platform {
+
+// The files of the device whose file tree begins at the root; account names are those of that device.
+[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<FileSystem> makeFileSystem(Path systemRoot);
+
+}  // namespace platform

@@ -1,0 +1,12 @@
+#pragma once
+
+#include "platform/linux/file_access.h"
+
+namespace platform {
+
+// Removes what stands at the place: a directory with all below it, anything else as itself, links unfollowed. Takes two
+// descriptors and no stack, however deep the tree is. A directory that somebody moves away meanwhile is left (EAGAIN).
+// Answers false, with errno set, where something remains.
+[[nodiscard]] bool removeTree(const Place& place);
+
+}  // namespace platform
