@@ -141,10 +141,41 @@ class ACCOUNT_EXPORT AccountsManager {
   AccountsManager();
   [[nodiscard]] static std::vector<std::unique_ptr<RuntimeFixer>> _createRuntimeFixers();
 
+  // Loading. An element that is no dictionary is read as an empty one.
+  void _loadAccounts(const Array& accounts);
+  [[nodiscard]] static Account _accountFromElement(const PropertyValue& element);
+  void _registerAccount(const Account& account);
+  void _loadChild(const PropertyValue& properties, const Account& parent, const Text& parentIdentifier);
+
+  // Saving. Fixing answers whether a fixer had something to do.
+  [[nodiscard]] bool _fixAccountsForSaving();
+  [[nodiscard]] Array _mergedRecords() const;
+  void _tellFixers(bool saved);
+
+  // By notifier, what changed since the state was last taken.
+  [[nodiscard]] NotificationTable _notificationTable() const;
+
+  // Takes the identifier, whichever record is registered under it, and its children out of the indexes.
+  void _forgetIdentifierOfAccount(const BasicAccount& account);
+
+  // The order and the index that replacing accounts by types builds, and the accounts that have no place in it yet.
+  struct Replacement {
+    Accounts order;
+    AccountsByID byID;
+    Accounts toPlace;
+  };
+  void _replaceInPlace(const Types& types, Replacement& replacement);
+  void _appendAccount(const Account& account, Replacement& replacement);
+  void _moveChild(const Account& child, const Replacement& replacement);
+  void _takeFromRecordedParent(const Text& child, const Account& newParent);
+
   AccountsByID _topLevelAccountsByID;
   Accounts _orderedTopLevelAccounts;
   AccountsByID _childAccountsByID;
   platform::InsertionOrderedMap<std::string> _childAccountIDToParentAccountID;
+  // The children that were indexed when each parent was last registered; one that another parent has taken over since
+  // may still stand here, so `_childAccountIDToParentAccountID` decides.
+  platform::InsertionOrderedMap<std::vector<Text>> _childIdentifiersByParentID;
   platform::InsertionOrderedMap<Dictionary> _originalAccountsByID;
   std::uint64_t _dataVersion = 0;
   std::vector<std::unique_ptr<RuntimeFixer>> _runtimeFixers;

@@ -24,6 +24,11 @@ inline constexpr StringConstant kNimbraMailDomain{"nimbra.com"};
 // The account that owns the settings files, and its group.
 inline constexpr StringConstant kSettingsOwner{"mobile"};
 
+// Keys that the mail application keeps in its accounts: the directory of the account's mail, and whether the account is
+// switched on.
+inline constexpr StringConstant kMailAccountPathKey{"AccountPath"};
+inline constexpr StringConstant kMailAccountIsActiveKey{"IsActive"};
+
 // The mail application's preferences, announced whenever its accounts change.
 inline constexpr StringConstant kMailPreferencesDomain{"com.vorlix.mobilemail"};
 inline constexpr StringConstant kMailPreferencesAccountsKey{"MailAccounts"};

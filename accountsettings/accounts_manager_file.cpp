@@ -1,0 +1,188 @@
+#include <ranges>
+#include <tuple>
+
+#include "accountsettings/accounts_manager.h"
+#include "accountsettings/as_runtime_fix_mail_account.h"
+#include "accountsettings/log_handle.h"
+#include "accountsettings/product_values.h"
+#include "platform/description.h"
+#include "platform/platform.h"
+
+namespace accountsettings {
+namespace {
+
+using platform::Bytes;
+using platform::FileSystem;
+using platform::Path;
+using platform::Status;
+
+constexpr const char* kSave = "-[AccountsManager saveAllAccounts]";
+
+std::uint64_t versionIn(const Dictionary& file) {
+  const PropertyValue* const version = file.find(kPlistVersionKey);
+  return version == nullptr ? 0 : static_cast<std::uint64_t>(version->integerValue().value_or(0));
+}
+
+void logCalculated(const BasicAccount& account, const Dictionary& merged) {
+  const std::function<std::string()> dataclasses = [&account]() -> std::string {
+    const std::optional<BasicAccount::Dataclasses> enabled = account.enabledDataclasses();
+    return enabled ? platform::description(Array(enabled->begin(), enabled->end())) : "(null)";
+  };
+  _ASLogSystem().log(kSave, "Calculated Properties - Type: %@, Properties: %@, Dataclasses: %@", account.type(), merged,
+                     dataclasses);
+}
+
+std::optional<Bytes> serialized(const Dictionary& root) {
+  platform::SerializedPropertyList list = platform::current().propertyLists->serialize(root);
+  if (!list.data || !list.errorDescription.empty()) {
+    _ASLogSystem().log(kSave, "Failed to serialize account settings data: %@", list.errorDescription);
+  }
+  return std::move(list.data);
+}
+
+bool giveToOwner(FileSystem& files, const Path& path) {
+  const Status status = files.setOwner(path, kSettingsOwner, kSettingsOwner);
+  if (!status.isOk()) {
+    _ASLogSystem().log(kSave, "Could not set attributes on the temporary account settings plist. %@",
+                       status.description());
+  }
+  return status.isOk();
+}
+
+// The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails, no
+// temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
+bool replaceSettingsFile(const std::optional<Bytes>& data) {
+  FileSystem& files = *platform::current().files;
+  const Path destination = AccountsManager::fullPathToAccountSettingsPlist();
+  const std::optional<Path> temporary = files.temporaryName();
+  if (!temporary || !data || !files.create(*temporary, *data).isOk()) return false;
+  if (giveToOwner(files, *temporary) && files.rename(*temporary, destination).isOk()) return true;
+  std::ignore = files.remove(*temporary);
+  return false;
+}
+
+}  // namespace
+
+AccountsManager::AccountsManager() : _runtimeFixers{_createRuntimeFixers()} {}
+
+AccountsManager::~AccountsManager() {
+  _topLevelAccountsByID.clear();
+  _orderedTopLevelAccounts.clear();
+  _childAccountIDToParentAccountID.clear();
+  _childAccountsByID.clear();
+  _originalAccountsByID.clear();
+  _runtimeFixers.clear();
+}
+
+std::vector<std::unique_ptr<RuntimeFixer>> AccountsManager::_createRuntimeFixers() {
+  std::vector<std::unique_ptr<RuntimeFixer>> fixers;
+  fixers.push_back(std::make_unique<ASRuntimeFixMailAccount>());
+  return fixers;
+}
+
+std::shared_ptr<AccountsManager> AccountsManager::init() { return initInsideOfMigration(); }
+
+std::shared_ptr<AccountsManager> AccountsManager::initInsideOfMigration() {
+  const Dictionary file =
+      platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist()).value_or(Dictionary{});
+  std::shared_ptr<AccountsManager> store = _initWithAccountsInfo(file.array(kPlistAccountsKey));
+  store->setDataVersion(versionIn(file));
+  return store;
+}
+
+std::shared_ptr<AccountsManager> AccountsManager::initWithAccounsInfoArray(const Array& accounts) {
+  return _initWithAccountsInfo(&accounts);
+}
+
+std::shared_ptr<AccountsManager> AccountsManager::_initWithAccountsInfo(const Array* accounts) {
+  std::shared_ptr<AccountsManager> store{new AccountsManager};
+  if (accounts != nullptr) store->_loadAccounts(*accounts);
+  store->_setOriginalAccountDictionaries();
+  return store;
+}
+
+void AccountsManager::_loadAccounts(const Array& accounts) {
+  bool isFixed = false;
+  for (const PropertyValue& properties : accounts) {
+    const Account account = _accountFromElement(properties);
+    if (account == nullptr) {
+      _ASLogSystem().log("-[AccountsManager _initWithAccountsInfo:]", "ERROR: Failed to create a BasicAccount from %@",
+                         properties);
+      continue;
+    }
+    for (const auto& fixer : _runtimeFixers) {
+      const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
+      if (answer != FixAnswer::drop) _registerAccount(account);
+      isFixed |= answer != FixAnswer::nothingToDo;
+    }
+  }
+  if (isFixed) _tellFixers(false);
+}
+
+AccountsManager::Account AccountsManager::_accountFromElement(const PropertyValue& element) {
+  const Dictionary* const properties = element.asDictionary();
+  return BasicAccount::initWithProperties(properties == nullptr ? Dictionary{} : *properties);
+}
+
+void AccountsManager::_tellFixers(bool saved) {
+  for (const auto& fixer : _runtimeFixers) fixer->accountsHaveBeenSaved(saved);
+}
+
+void AccountsManager::_setOriginalAccountDictionaries() {
+  _originalAccountsByID.clear();
+  for (const Account& account : _orderedTopLevelAccounts) {
+    if (const std::optional<Text> identifier = account->identifier()) {
+      _originalAccountsByID.set(*identifier, account->propertiesToSave());
+    } else {
+      _ASLogSystem().log("-[AccountsManager _setOriginalAccountDictionaries]",
+                         "%@ returned a nil identifier. Account properties may not get saved", account->properties());
+    }
+  }
+}
+
+void AccountsManager::saveAllAccounts() {
+  _ASLogSystem().log(kSave, "Saving all accounts");
+  const bool isFixed = _fixAccountsForSaving();
+  const Dictionary root{{kPlistAccountsKey, _mergedRecords()}, {kPlistVersionKey, currentVersion()}};
+  const bool isSaved = replaceSettingsFile(serialized(root));
+  if (isSaved) {
+    for (const Account& account : _orderedTopLevelAccounts) account->setOriginalProperties(account->propertiesToSave());
+  } else {
+    _ASLogSystem().log(kSave, "Failed to save accounts to filesystem.");
+  }
+  if (isFixed) _tellFixers(true);  // after a failed save, too
+  if (!isSaved || _shouldSkipNotifications()) return;
+  _sendNotificationsForChangedAccounts();
+  _setOriginalAccountDictionaries();
+}
+
+bool AccountsManager::_fixAccountsForSaving() {
+  bool isFixed = false;
+  for (const Account& account : std::views::reverse(_orderedTopLevelAccounts)) {
+    for (const auto& fixer : _runtimeFixers) {
+      const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "saving accounts");
+      // A dropped account is no longer found, but keeps its place in the order and so in the file.
+      if (answer == FixAnswer::drop) _forgetIdentifierOfAccount(*account);
+      isFixed |= answer != FixAnswer::nothingToDo;
+    }
+  }
+  return isFixed;
+}
+
+Array AccountsManager::_mergedRecords() const {
+  const std::shared_ptr<AccountsManager> fileAsItStands = initInsideOfMigration();
+  Array records;
+  records.reserve(_orderedTopLevelAccounts.size());
+  for (const Account& account : _orderedTopLevelAccounts) {
+    const std::optional<Text> identifier = account->identifier();
+    const Account onDisk = identifier ? fileAsItStands->accountWithIdentifier(*identifier) : nullptr;
+    Dictionary merged = mergeInMemoryProperties_originalProperties_onDiskProperties(
+        account->propertiesToSave(), account->originalProperties(),
+        onDisk == nullptr ? nullptr : &onDisk->propertiesToSave());
+    logCalculated(*account, merged);
+    records.emplace_back(std::move(merged));
+  }
+  return records;
+}
+
+}  // namespace accountsettings

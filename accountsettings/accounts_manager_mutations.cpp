@@ -1,0 +1,176 @@
+#include <algorithm>
+#include <ranges>
+#include <unordered_set>
+
+#include "accountsettings/accounts_manager.h"
+#include "accountsettings/assertion_failure.h"
+#include "accountsettings/dataclass_lists.h"
+#include "accountsettings/log_handle.h"
+
+namespace accountsettings {
+namespace {
+
+using Account = AccountsManager::Account;
+using Accounts = AccountsManager::Accounts;
+using AccountsByID = AccountsManager::AccountsByID;
+
+// Accounts without an identifier are like none, each other included.
+bool haveSameIdentifier(const BasicAccount& left, const BasicAccount& right) {
+  const std::optional<Text> identifier = left.identifier();
+  return identifier && identifier == right.identifier();
+}
+
+std::optional<Text> identifierProperty(const BasicAccount& account) {
+  const std::optional<PropertyValue> value = account.accountPropertyForKey(kAccountIdentifier);
+  const Text* const text = value ? value->asText() : nullptr;
+  return text == nullptr ? std::nullopt : std::optional{*text};
+}
+
+void enter(AccountsByID& accounts, const std::optional<Text>& identifier, const Account& account) {
+  if (identifier) accounts.set(*identifier, account);
+}
+
+Account foundIn(const AccountsByID& accounts, const std::optional<Text>& identifier) {
+  const Account* const account = identifier ? accounts.find(*identifier) : nullptr;
+  return account == nullptr ? nullptr : *account;
+}
+
+}  // namespace
+
+void AccountsManager::_registerAccount(const Account& account) {
+  enter(_topLevelAccountsByID, account->identifier(), account);
+  _orderedTopLevelAccounts.push_back(account);
+  _loadChildrenFromAccount(_orderedTopLevelAccounts.back());
+}
+
+void AccountsManager::_forgetIdentifierOfAccount(const BasicAccount& account) {
+  const std::optional<Text> identifier = account.identifier();
+  if (!identifier) return;
+  _removeChildrenForAccountWithIdentifier(*identifier);
+  _topLevelAccountsByID.remove(*identifier);
+}
+
+void AccountsManager::insertAccount(const Account& account) {
+  _ASLogSystem().log("-[AccountsManager insertAccount:]", "Inserting account: %@", account->properties());
+  if (foundIn(_topLevelAccountsByID, account->identifier()) == nullptr) _registerAccount(account);
+}
+
+void AccountsManager::updateAccount(const Account& account) {
+  _ASLogSystem().log("-[AccountsManager updateAccount:]", "Updating account: %@", account->properties());
+  for (Account& present : std::views::reverse(_orderedTopLevelAccounts)) {
+    if (!haveSameIdentifier(*present, *account)) continue;
+    present = account;
+    enter(_topLevelAccountsByID, account->identifier(), account);
+    _loadChildrenFromAccount(account);
+  }
+}
+
+void AccountsManager::deleteAccount(const Account& account) {
+  _ASLogSystem().log("-[AccountsManager deleteAccount:]", "Deleting account: %@", account->properties());
+  _forgetIdentifierOfAccount(*account);
+  const auto last =
+      std::ranges::find_if(_orderedTopLevelAccounts.rbegin(), _orderedTopLevelAccounts.rend(),
+                           [&](const Account& present) { return haveSameIdentifier(*present, *account); });
+  if (last == _orderedTopLevelAccounts.rend()) return;
+  const Account deleted = *last;
+  std::erase(_orderedTopLevelAccounts, deleted);
+}
+
+void AccountsManager::deleteAccountWithIdentifier(std::string_view identifier) {
+  const Account* const account = _topLevelAccountsByID.find(identifier);
+  if (account == nullptr) {
+    failAssertion("-[AccountsManager deleteAccountWithIdentifier:]", "AccountsManager",
+                  "There is no top-level account with identifier %@", {identifier});
+  }
+  deleteAccount(Account{*account});
+}
+
+void AccountsManager::replaceAccount_withAccount(const Account& oldAccount, const Account& newAccount) {
+  const auto position = std::ranges::find(_orderedTopLevelAccounts, oldAccount);
+  if (position == _orderedTopLevelAccounts.end()) {
+    failAssertion("-[AccountsManager replaceAccount:withAccount:]", "AccountsManager",
+                  "The account with identifier %@ is not in the store", {oldAccount->identifier()});
+  }
+  _forgetIdentifierOfAccount(*oldAccount);
+  // Listed, counted and saved, but found by its identifier only in a store that is loaded afresh.
+  *position = newAccount;
+  _loadChildrenFromAccount(*position);
+}
+
+void AccountsManager::replaceAccountsWithTypes_withAccounts(const Types& types, const Accounts& accounts) {
+  _ASLogSystem().log("-[AccountsManager replaceAccountsWithTypes:withAccounts:]", "Replacing accounts");
+  Replacement replacement{_orderedTopLevelAccounts, {}, accounts};
+  _replaceInPlace(types, replacement);
+  for (const Account& account : replacement.toPlace) {
+    account->parentAccountIdentifier() ? _moveChild(account, replacement) : _appendAccount(account, replacement);
+  }
+  _orderedTopLevelAccounts = std::move(replacement.order);
+  _topLevelAccountsByID = std::move(replacement.byID);
+}
+
+void AccountsManager::_replaceInPlace(const Types& types, Replacement& replacement) {
+  AccountsByID given;
+  for (const Account& account : replacement.toPlace) enter(given, identifierProperty(*account), account);
+  std::unordered_set<Account> placed;
+  for (Account& present : std::views::reverse(replacement.order)) {
+    const std::optional<Text> identifier = present->identifier();
+    const std::optional<Text> type = present->type();
+    if (const Account replacing = foundIn(given, identifier)) {
+      present = replacing;
+      enter(replacement.byID, identifier, replacing);
+      placed.insert(replacing);
+      _loadChildrenFromAccount(replacing);
+    } else if (!type || !containsText(types, *type)) {
+      enter(replacement.byID, identifier, present);
+    } else {
+      if (identifier) _removeChildrenForAccountWithIdentifier(*identifier);
+      present = nullptr;
+    }
+  }
+  std::erase(replacement.order, nullptr);
+  std::erase_if(replacement.toPlace, [&placed](const Account& account) { return placed.contains(account); });
+}
+
+void AccountsManager::_appendAccount(const Account& account, Replacement& replacement) {
+  replacement.order.push_back(account);
+  enter(replacement.byID, identifierProperty(*account), account);
+  _loadChildrenFromAccount(account);
+}
+
+void AccountsManager::_moveChild(const Account& child, const Replacement& replacement) {
+  const Account newParent = foundIn(replacement.byID, child->parentAccountIdentifier());
+  if (const std::optional<Text> identifier = child->identifier()) _takeFromRecordedParent(*identifier, newParent);
+  if (newParent != nullptr) addChild_toAccount(child, newParent);
+}
+
+void AccountsManager::_takeFromRecordedParent(const Text& child, const Account& newParent) {
+  const std::string* const recorded = _childAccountIDToParentAccountID.find(child);
+  if (recorded == nullptr) return;
+  const bool isAlreadyThere = newParent != nullptr && newParent->identifier() == Text{*recorded};
+  const Account parent = isAlreadyThere ? newParent : accountWithIdentifier(*recorded);
+  if (parent != nullptr) removeChildWithIdentifier_fromAccount(child, parent);
+}
+
+void AccountsManager::addChild_toAccount(const Account& child, const Account& parent) {
+  const std::optional<PropertyValue> property = parent->accountPropertyForKey(kAccountChildAccounts);
+  const Array* const present = property ? property->asArray() : nullptr;
+  Array children = present == nullptr ? Array{} : *present;
+  children.emplace_back(child->properties());
+  parent->setAccountProperty_forKey(std::move(children), kAccountChildAccounts);
+  _loadChildrenFromAccount(parent);
+}
+
+void AccountsManager::removeChildWithIdentifier_fromAccount(std::string_view identifier, const Account& parent) {
+  const std::optional<PropertyValue> property = parent->accountPropertyForKey(kAccountChildAccounts);
+  if (const Array* const present = property ? property->asArray() : nullptr) {
+    Array children = *present;
+    for (const PropertyValue& properties : *present) {
+      const Account child = _accountFromElement(properties);
+      if (child != nullptr && child->identifier() == Text{identifier}) std::erase(children, properties);
+    }
+    parent->setAccountProperty_forKey(std::move(children), kAccountChildAccounts);
+  }
+  _loadChildrenFromAccount(parent);
+}
+
+}  // namespace accountsettings

@@ -1,0 +1,25 @@
+#pragma once
+
+#include <string>
+
+#include "platform/export.h"
+#include "platform/file_system.h"
+#include "platform/text.h"
+
+// The names and places of the product's files, built here and nowhere else. The places follow the process's platform;
+// nothing needs to exist at any of them.
+namespace accountsettings {
+
+using platform::StringConstant;
+
+// The migration lock, by the name under which every process of the device takes it.
+inline constexpr StringConstant kMigrationLockName{"AccountMigrationInProgress"};
+
+// What an interrupted deletion of the legacy files leaves behind: exists only while they are being deleted.
+[[nodiscard]] ACCOUNT_EXPORT platform::Path removalSentinelPath();
+// The mail application's mark that it may fetch by itself; it goes when the accounts have been migrated.
+[[nodiscard]] ACCOUNT_EXPORT platform::Path mailAutoFetchMarkerPath();
+// A loadable module that the configuration names by its path on the device.
+[[nodiscard]] ACCOUNT_EXPORT std::string modulePath(const platform::Text& framework);
+
+}  // namespace accountsettings

@@ -1,0 +1,7 @@
+#include "accountsettings/runtime_fixer.h"
+
+namespace accountsettings {
+
+RuntimeFixer::~RuntimeFixer() = default;
+
+}  // namespace accountsettings

@@ -1,0 +1,120 @@
+#include <gtest/gtest.h>
+
+#include <algorithm>
+
+#include "tests/support/account_store.h"
+
+namespace tests {
+namespace {
+
+using Identifiers = std::vector<std::string>;
+
+class LoadingTheSettingsFile : public AccountStore {};
+
+TEST_F(LoadingTheSettingsFile, ReadsItUnderTheSystemRoot) {
+  EXPECT_EQ(AccountsManager::fullPathToAccountSettingsPlist(), kSettingsFile);
+  device.directories->root = "/images/device";
+  EXPECT_EQ(AccountsManager::fullPathToAccountSettingsPlist(),
+            "/images/device/var/mobile/Library/Preferences/com.vorlix.accountsettings.plist");
+}
+
+TEST_F(LoadingTheSettingsFile, KeepsTheOrderOfTheAccounts) {
+  EXPECT_EQ(identifiersOf(load({properties("b"), properties("a"), properties("c")})->allBasicAccounts()),
+            (Identifiers{"b", "a", "c"}));
+}
+
+TEST_F(LoadingTheSettingsFile, IsWhatThePlainConstructorDoes) {
+  putFile({properties("a")}, 7);
+  EXPECT_EQ(AccountsManager::init()->dataVersion(), 7U);
+  EXPECT_EQ(AccountsManager::initInsideOfMigration()->dataVersion(), 7U);
+}
+
+TEST_F(LoadingTheSettingsFile, GivesAnEmptyStoreOfVersionZeroWithoutAWordWhereThereIsNoFile) {
+  const Store store = AccountsManager::init();
+  EXPECT_EQ(store->count(), 0U);
+  EXPECT_EQ(store->dataVersion(), 0U);
+  EXPECT_TRUE(device.logMessages().empty());
+}
+
+TEST_F(LoadingTheSettingsFile, GivesAnEmptyStoreOfVersionZeroWithoutAWordWhereTheFileCannotBeRead) {
+  device.files->put(kSettingsFile, "no property list");
+  const Store store = AccountsManager::init();
+  EXPECT_EQ(store->count(), 0U);
+  EXPECT_EQ(store->dataVersion(), 0U);
+  EXPECT_TRUE(device.logMessages().empty());
+}
+
+TEST_F(LoadingTheSettingsFile, GivesAnEmptyStoreWhereTheAccountsAreEmptyOrMissingOrNoArray) {
+  const std::vector<Dictionary> roots{{{"Accounts", Array{}}, {"Version", 3}},
+                                      {{"Version", 3}},
+                                      {{"Accounts", "text"}, {"Version", 3}},
+                                      {{"Accounts", properties("a")}, {"Version", 3}}};
+  for (const Dictionary& root : roots) {
+    device.put(kSettingsFile, root);
+    const Store store = AccountsManager::init();
+    EXPECT_EQ(store->count(), 0U);
+    EXPECT_EQ(store->dataVersion(), 3U);
+  }
+}
+
+TEST_F(LoadingTheSettingsFile, ReadsTheDataVersionOfWhateverKindItIs) {
+  const std::vector<std::pair<PropertyValue, std::uint64_t>> cases{{3, 3},
+                                                                   {12, 12},
+                                                                   {std::uint64_t{1} << 63U, std::uint64_t{1} << 63U},
+                                                                   {-1, UINT64_MAX},
+                                                                   {4.9, 4},
+                                                                   {"11 and more", 11},
+                                                                   {"eleven", 0},
+                                                                   {true, 0},
+                                                                   {Array{5}, 0},
+                                                                   {Dictionary{}, 0},
+                                                                   {Bytes{1}, 0}};
+  for (const auto& [stored, version] : cases) {
+    putFile({}, stored);
+    EXPECT_EQ(AccountsManager::init()->dataVersion(), version);
+  }
+}
+
+TEST_F(LoadingTheSettingsFile, SkipsARecordThatMakesNoAccountAndSaysSo) {
+  const Store store = load({properties("a"), Dictionary{{"Type", "Telepathy"}, {"Class", "X"}}, properties("b")});
+  EXPECT_EQ(identifiersOf(store->allBasicAccounts()), (Identifiers{"a", "b"}));
+  EXPECT_EQ(
+      messagesOf("-[AccountsManager _initWithAccountsInfo:]"),
+      (std::vector<std::string>{"ERROR: Failed to create a BasicAccount from {Type = \"Telepathy\"; Class = \"X\"}"}));
+}
+
+TEST_F(LoadingTheSettingsFile, TakesAnElementThatIsNoDictionaryForAnEmptyOne) {
+  EXPECT_EQ(load({5, properties("a")})->count(), 1U);
+  EXPECT_EQ(device.logMessages(), (std::vector<std::string>{"Invalid account type: (null)", "Missing account class.",
+                                                            "ERROR: Failed to create a BasicAccount from 5"}));
+}
+
+TEST_F(LoadingTheSettingsFile, KeepsTwoRecordsOfOneIdentifierInOrderAndFindsTheLater) {
+  const Store store = load({properties("a", {{"Port", 1}}), properties("b"), properties("a", {{"Port", 2}})});
+  EXPECT_EQ(identifiersOf(store->allBasicAccounts()), (Identifiers{"a", "b", "a"}));
+  EXPECT_EQ(store->accountWithIdentifier("a"), store->allBasicAccounts()[2]);
+}
+
+TEST_F(LoadingTheSettingsFile, LeavesAChildThatMakesNoAccountWhereItStandsAndOutOfTheIndex) {
+  const Dictionary parent = properties("p", {{"ChildAccounts", Array{Dictionary{{"Port", 1}}, properties("c")}}});
+  const Store store = load({parent});
+  EXPECT_EQ(identifiersOf(store->allBasicSyncableAccounts()), (Identifiers{"p", "c"}));
+  store->saveAllAccounts();
+  EXPECT_EQ(fileAccounts(), (Array{parent}));
+}
+
+TEST_F(LoadingTheSettingsFile, CanBeReplacedByAnArrayInMemory) {
+  const Store store = AccountsManager::initWithAccounsInfoArray({properties("a")});
+  EXPECT_EQ(store->count(), 1U);
+  EXPECT_EQ(store->dataVersion(), 0U);
+  EXPECT_EQ(AccountsManager::_initWithAccountsInfo(nullptr)->count(), 0U);
+}
+
+TEST_F(LoadingTheSettingsFile, LeavesOutAnAccountThatTheFixerDrops) {
+  const Store store = load({properties("a", {}, "Mail"), properties("b")});
+  EXPECT_EQ(identifiersOf(store->allBasicAccounts()), (Identifiers{"b"}));
+  EXPECT_EQ(store->accountWithIdentifier("a"), nullptr);
+}
+
+}  // namespace
+}  // namespace tests
