@@ -109,6 +109,8 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
   [[nodiscard]] static bool userConfirmationIsRequiredByDataclass(std::string_view dataclass);
   [[nodiscard]] static bool isMultitaskingEnabled();
   [[nodiscard]] static bool _isValidAccountType(std::string_view type);
+  // The types that the configuration knows, in its order.
+  [[nodiscard]] static std::vector<Text> _accountTypes();
   [[nodiscard]] static std::optional<Dictionary> _dataclassesProperties();
   [[nodiscard]] static std::optional<Dictionary> _creatorsInfo();
   // Null while the creator file cannot be read.

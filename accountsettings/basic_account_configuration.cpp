@@ -191,6 +191,12 @@ bool BasicAccount::isMultitaskingEnabled() {
   return !architecture || *architecture != PropertyValue{"armv6"};
 }
 
+std::vector<Text> BasicAccount::_accountTypes() {
+  std::vector<Text> types;
+  for (const auto& [type, section] : loadedAccountTypes()) types.emplace_back(type);
+  return types;
+}
+
 bool BasicAccount::_isValidAccountType(std::string_view type) {
   const AccountTypes& types = loadedAccountTypes();
   return !type.empty() && types.contains(type);

@@ -41,6 +41,8 @@ foreach(module IN LISTS loadable_modules)
   install(TARGETS ${module} LIBRARY DESTINATION "${modules_dir}")
 endforeach()
 
+add_dependencies(product account_modules)
+
 install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 
 foreach(folder accountsettings platform)

@@ -1,0 +1,8 @@
+#include "accountsettings/service_objects.h"
+
+namespace accountsettings {
+
+ServiceAccountObject::~ServiceAccountObject() = default;
+RefreshQueueObject::~RefreshQueueObject() = default;
+
+}  // namespace accountsettings

@@ -1,0 +1,15 @@
+// Directories that contacts are looked up in. Nothing of them is kept on the device, so there is nothing to refresh.
+
+#include "modules/account_classes.h"
+
+namespace modules {
+namespace {
+
+constexpr ServiceKind kDirectory{.name = "LDAP", .securePort = 636, .plainPort = 389};
+
+const ServiceKind& kindOf(const BasicAccount&) { return kDirectory; }
+
+const platform::ClassRegistration fullAccounts{fullAccountCreator("DirectoryAccountCreator", kindOf)};
+
+}  // namespace
+}  // namespace modules

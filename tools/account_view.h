@@ -1,0 +1,32 @@
+#pragma once
+
+#include <nlohmann/json_fwd.hpp>
+#include <string>
+#include <vector>
+
+#include "tools/session.h"
+
+namespace tools {
+
+// A data class as people write it ("Mail"), and back. The long form stands for itself.
+[[nodiscard]] std::string shortDataclass(std::string_view dataclass);
+[[nodiscard]] std::string fullDataclass(std::string_view name);
+// "Mail, Notes".
+[[nodiscard]] std::string joinedDataclasses(const BasicAccount::Dataclasses& dataclasses);
+
+// What people call the account; empty where it has no name.
+[[nodiscard]] std::string nameOf(const BasicAccount& account);
+// The indexed children of a top-level account, in order.
+[[nodiscard]] std::vector<Account> childrenOf(const AccountsManager& accounts, const Account& parent);
+
+// Values and accounts for machines. No credential is in them, only that it is there, and of data only its size.
+[[nodiscard]] nlohmann::ordered_json jsonOf(const accountsettings::PropertyValue& value);
+[[nodiscard]] nlohmann::ordered_json jsonOf(const accountsettings::Dictionary& properties);
+// The well-known values of one account, without its properties.
+[[nodiscard]] nlohmann::ordered_json jsonOf(const BasicAccount& account);
+[[nodiscard]] nlohmann::ordered_json jsonOf(const BasicAccount::Dataclasses& dataclasses);
+
+// The value under a key for people, on one line, held back in the same way.
+[[nodiscard]] std::string lineOf(const accountsettings::PropertyValue& value, std::string_view key);
+
+}  // namespace tools

@@ -1,0 +1,168 @@
+#include <algorithm>
+#include <functional>
+#include <nlohmann/json.hpp>
+
+#include "accountsettings/assertion_failure.h"
+#include "tools/account_view.h"
+#include "tools/commands.h"
+#include "tools/failure.h"
+#include "tools/key_value.h"
+
+namespace tools {
+namespace {
+
+using accountsettings::AssertionFailure;
+using accountsettings::Text;
+using Json = nlohmann::ordered_json;
+using Dataclasses = BasicAccount::Dataclasses;
+
+[[noreturn]] void refuse(const std::string& message) { throw Failure{ExitStatus::wrongUse, message}; }
+
+std::string printedChange(const BasicAccount& account, bool asJson) {
+  return asJson ? Json{{"account", jsonOf(account)}}.dump(2) + "\n" : std::string{};
+}
+
+void announceBefore(const Session& session, const BasicAccount& account, const Dataclasses& dataclasses) {
+  if (!session.opensModules()) return;
+  try {
+    for (const Text& each : dataclasses) AccountsManager::accountWillChange_forDataclass(account, each);
+  } catch (const AssertionFailure& failure) {
+    throw Failure{ExitStatus::faultyInstallation, "nothing was changed: " + std::string{failure.what()}};
+  }
+}
+
+void announceAfter(const Session& session, const BasicAccount& account, const Dataclasses& dataclasses) {
+  if (!session.opensModules()) return;
+  try {
+    for (const Text& each : dataclasses) AccountsManager::accountDidChange_forDataclass(account, each);
+  } catch (const AssertionFailure& failure) {
+    throw Failure{ExitStatus::faultyInstallation,
+                  "the accounts were saved, but not announced: " + std::string{failure.what()}};
+  }
+}
+
+// Changes an account in memory and saves it, telling those who follow its data classes before and after.
+void changeAndSave(Session& session, const Account& account, const Dataclasses& dataclasses,
+                   const std::function<void()>& change) {
+  announceBefore(session, *account, dataclasses);
+  change();
+  session.save();
+  announceAfter(session, *account, dataclasses);
+}
+
+Dataclasses enabledOf(const BasicAccount& account) { return account.enabledDataclasses().value_or(Dataclasses{}); }
+
+// The data class that the name means for the account.
+Text supportedDataclass(const BasicAccount& account, const std::string& name) {
+  const auto& supported = account.supportedDataclasses();
+  const auto found = std::ranges::find_if(supported, [&](const Text& each) {
+    return each == std::string_view{name} || each == std::string_view{fullDataclass(name)};
+  });
+  if (found != supported.end()) return *found;
+  const auto& known = BasicAccount::allSupportedDataclasses();
+  const bool isKnown = std::ranges::find(known, Text{fullDataclass(name)}) != known.end();
+  if (!isKnown) refuse("unknown data class: " + name);
+  refuse("accounts of the type " + account.type().value_or(Text{}).string() + " do not support " +
+         shortDataclass(name));
+}
+
+std::string switchDataclass(Session& session, const Words& arguments, bool asJson, bool enabled) {
+  session.beginChanges();
+  const auto account = session.accountWithIdentifier(arguments[0]);
+  const auto dataclass = supportedDataclass(*account, arguments[1]);
+  changeAndSave(session, account, {dataclass}, [&] {
+    account->setEnabled_forDataclass(enabled, dataclass);
+    Session::keepChanges(account);
+  });
+  return printedChange(*account, asJson);
+}
+
+Account accountOfTypeAndClass(const std::string& type, const std::string& className) {
+  if (!BasicAccount::_isValidAccountType(type)) refuse("unknown account type: " + type);
+  if (className.empty()) refuse("an account needs a class");
+  return BasicAccount::accountWithType_class(type, className);
+}
+
+void setProperty(BasicAccount& account, const KeyValue& property, std::size_t position) {
+  const auto place = "property " + std::to_string(position);
+  if (property.key == accountsettings::kAccountType || property.key == accountsettings::kAccountClass) {
+    refuse(place + " sets " + property.key + ", which stands before the properties");
+  }
+  const auto* const text = property.value.asText();
+  const bool hasText = text != nullptr && !text->empty();
+  if (property.key == accountsettings::kAccountIdentifier && !hasText) refuse(place + " is no identifier");
+  account.setAccountProperty_forKey(property.value, property.key);
+}
+
+Account newAccount(const Words& arguments) {
+  auto account = accountOfTypeAndClass(arguments[0], arguments[1]);
+  for (std::size_t index = 2; index < arguments.size(); ++index) {
+    setProperty(*account, parseKeyValue(arguments[index], index - 1), index - 1);
+  }
+  return account;
+}
+
+bool isRegistered(Session& session, const BasicAccount& account) {
+  const auto identifier = account.identifier();
+  return std::ranges::any_of(session.accounts().allBasicSyncableAccounts(),
+                             [&](const Account& each) { return each->identifier() == identifier; });
+}
+
+void removeEveryRecord(AccountsManager& accounts, const Account& account) {
+  if (const auto parent = account->parentAccount()) {
+    accounts.removeChildWithIdentifier_fromAccount(account->identifier().value_or(Text{}), parent);
+    return;
+  }
+  // The store takes out one record at a time, and several may have the identifier.
+  for (auto before = accounts.count() + 1; accounts.count() < before;) {
+    before = accounts.count();
+    accounts.deleteAccount(account);
+  }
+}
+
+}  // namespace
+
+std::string enableDataclass(Session& session, const Words& arguments, bool asJson) {
+  return switchDataclass(session, arguments, asJson, true);
+}
+
+std::string disableDataclass(Session& session, const Words& arguments, bool asJson) {
+  return switchDataclass(session, arguments, asJson, false);
+}
+
+std::string renameAccount(Session& session, const Words& arguments, bool asJson) {
+  if (arguments[1].empty()) refuse("an account's name cannot be empty");
+  session.beginChanges();
+  const auto account = session.accountWithIdentifier(arguments[0]);
+  const auto type = account->type();
+  if (type && *type == accountsettings::kOnMyDeviceAccountType) refuse("the device's own account has a fixed name");
+  changeAndSave(session, account, enabledOf(*account), [&] {
+    account->setDisplayName(arguments[1]);
+    Session::keepChanges(account);
+  });
+  return printedChange(*account, asJson);
+}
+
+std::string addAccount(Session& session, const Words& arguments, bool asJson) {
+  session.beginChanges();
+  const auto account = newAccount(arguments);
+  const auto identifier = account->identifier().value_or(Text{}).string();
+  if (isRegistered(session, *account)) refuse("there is an account with the identifier " + identifier);
+  changeAndSave(session, account, enabledOf(*account), [&] { session.accounts().insertAccount(account); });
+  return asJson ? printedChange(*account, true) : identifier + "\n";
+}
+
+std::string removeAccount(Session& session, const Words& arguments, bool asJson) {
+  session.beginChanges();
+  const auto account = session.accountWithIdentifier(arguments[0]);
+  changeAndSave(session, account, enabledOf(*account), [&] { removeEveryRecord(session.accounts(), account); });
+  return asJson ? Json{{"removed", arguments[0]}}.dump(2) + "\n" : std::string{};
+}
+
+std::string saveAccounts(Session& session, const Words&, bool asJson) {
+  session.beginChanges();
+  session.save();
+  return asJson ? Json{{"saved", session.accounts().count()}}.dump(2) + "\n" : std::string{};
+}
+
+}  // namespace tools

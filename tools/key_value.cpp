@@ -1,0 +1,53 @@
+#include "tools/key_value.h"
+
+#include <nlohmann/json.hpp>
+
+#include "tools/failure.h"
+
+namespace tools {
+namespace {
+
+using Json = nlohmann::ordered_json;
+using platform::PropertyValue;
+
+[[noreturn]] void refuse(const std::string& problem, std::size_t position) {
+  throw Failure{ExitStatus::wrongUse, "property " + std::to_string(position) + " " + problem};
+}
+
+// Property lists know every kind of JSON value but null.
+PropertyValue valueOf(const Json& json, std::size_t position) {
+  if (json.is_string()) return json.get<std::string>();
+  if (json.is_boolean()) return json.get<bool>();
+  if (json.is_number_unsigned()) return json.get<std::uint64_t>();
+  if (json.is_number_integer()) return json.get<std::int64_t>();
+  if (json.is_number()) return json.get<double>();
+  if (json.is_array()) {
+    platform::Array elements;
+    for (const auto& element : json) elements.push_back(valueOf(element, position));
+    return elements;
+  }
+  if (!json.is_object()) refuse("holds null, which is no value", position);
+  platform::Dictionary members;
+  for (const auto& [key, member] : json.items()) members.set(key, valueOf(member, position));
+  return members;
+}
+
+PropertyValue parsedValue(std::string_view text, std::size_t position) {
+  const auto json = Json::parse(text, nullptr, false);
+  if (json.is_discarded()) refuse("is no valid JSON after :=", position);
+  return valueOf(json, position);
+}
+
+}  // namespace
+
+KeyValue parseKeyValue(std::string_view argument, std::size_t position) {
+  const auto equals = argument.find('=');
+  if (equals == std::string_view::npos) refuse("is not written KEY=VALUE or KEY:=JSON", position);
+  const bool isJson = equals > 0 && argument[equals - 1] == ':';
+  const auto key = argument.substr(0, isJson ? equals - 1 : equals);
+  const auto value = argument.substr(equals + 1);
+  if (key.empty()) refuse("has no key", position);
+  return {std::string{key}, isJson ? parsedValue(value, position) : PropertyValue{value}};
+}
+
+}  // namespace tools

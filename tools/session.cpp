@@ -1,0 +1,112 @@
+#include "tools/session.h"
+
+#include <algorithm>
+#include <optional>
+#include <utility>
+
+#include "accountsettings/assertion_failure.h"
+#include "platform/linux/linux_platform.h"
+#include "platform/temporary_directory.h"
+#include "tools/failure.h"
+
+namespace tools {
+namespace {
+
+using accountsettings::Array;
+
+// In the place of the device's loader while none of its modules may be opened.
+class ClosedModuleLoader final : public platform::ModuleLoader {
+ public:
+  [[nodiscard]] std::optional<std::string> open(const std::string&) override {
+    return "modules under another root are opened only with --modules";
+  }
+};
+
+bool hasIdentifier(const BasicAccount& account, std::string_view identifier) {
+  const auto own = account.identifier();
+  return own && *own == identifier;
+}
+
+// The children's dictionaries with the changed child's in place of its old one. Of several with one identifier the last
+// is the one that the store knows.
+Array withChild(const Array& children, const BasicAccount& child) {
+  Array changed = children;
+  const auto place = std::find_if(changed.rbegin(), changed.rend(), [&](const auto& element) {
+    const auto* const properties = element.asDictionary();
+    const auto* const identifier =
+        properties == nullptr ? nullptr : properties->text(accountsettings::kAccountIdentifier);
+    return identifier != nullptr && hasIdentifier(child, *identifier);
+  });
+  if (place != changed.rend()) *place = child.properties();
+  return changed;
+}
+
+}  // namespace
+
+Session::Session(const Options& options) : _opensModules{options.opensModules()} {
+  auto platform = platform::makeLinuxPlatform(options.device);
+  _saves = std::make_shared<SaveWatch>(platform.systemLog);
+  platform.systemLog = _saves;
+  if (!_opensModules) platform.modules = std::make_shared<ClosedModuleLoader>();
+  platform::setCurrent(std::move(platform));
+  AccountsManager::_setShouldSkipNotifications(!_opensModules);
+}
+
+AccountsManager& Session::accounts() {
+  if (_accounts == nullptr) loadAccounts();
+  return *_accounts;
+}
+
+void Session::loadAccounts() {
+  AccountsManager::waitForMigrationToFinish();
+  const auto path = AccountsManager::fullPathToAccountSettingsPlist();
+  const auto& platform = platform::current();
+  // The store takes a file that it cannot read for an empty one; saving would then lose what is in it.
+  if (platform.files->kindOf(path) && !platform.propertyLists->readDictionary(path)) {
+    throw Failure{ExitStatus::failed, "the account settings cannot be read: " + path.string()};
+  }
+  _accounts = AccountsManager::init();
+}
+
+Account Session::accountWithIdentifier(std::string_view identifier) {
+  auto found = accounts().accountWithIdentifier(identifier);
+  if (found != nullptr && hasIdentifier(*found, identifier)) return found;
+  // A child's identifier has led to its parent.
+  for (const auto& account : accounts().allBasicSyncableAccounts()) {
+    if (hasIdentifier(*account, identifier)) return account;
+  }
+  throw Failure{ExitStatus::noSuchAccount, "no account has the identifier " + std::string{identifier}};
+}
+
+void Session::beginChanges() {
+  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
+  const auto& store = accounts();
+  if (AccountsManager::accountSettingsNeedsToBeMigrated()) {
+    throw Failure{ExitStatus::failed, "the account settings have data version " + std::to_string(store.dataVersion()) +
+                                          " and must be migrated before they are changed"};
+  }
+}
+
+void Session::keepChanges(const Account& account) {
+  const auto& parent = account->parentAccount();
+  if (parent == nullptr) return;
+  const auto children = parent->accountPropertyForKey(accountsettings::kAccountChildAccounts);
+  const auto* const array = children ? children->asArray() : nullptr;
+  if (array == nullptr) return;
+  parent->setAccountProperty_forKey(withChild(*array, *account), accountsettings::kAccountChildAccounts);
+}
+
+void Session::save() {
+  try {
+    accounts().saveAllAccounts();
+  } catch (const accountsettings::AssertionFailure& failure) {
+    throw Failure{ExitStatus::faultyInstallation,
+                  "the accounts were saved, but not announced: " + std::string{failure.what()}};
+  }
+  if (!_saves->hasFailed()) return;
+  const auto path = AccountsManager::fullPathToAccountSettingsPlist().string();
+  throw Failure{ExitStatus::failed,
+                "the accounts could not be saved to " + path + (_saves->cause().empty() ? "" : ": " + _saves->cause())};
+}
+
+}  // namespace tools

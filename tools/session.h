@@ -1,0 +1,48 @@
+#pragma once
+
+#include <cstddef>
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "accountsettings/accounts_manager.h"
+#include "tools/options.h"
+#include "tools/save_watch.h"
+
+namespace tools {
+
+using accountsettings::AccountsManager;
+using accountsettings::BasicAccount;
+using Account = AccountsManager::Account;
+
+// The accounts of one device, for one command. Making a session sets the process's platform.
+class Session {
+ public:
+  explicit Session(const Options& options);
+
+  [[nodiscard]] bool opensModules() const { return _opensModules; }
+
+  // The store, loaded at its first use and once no migration is running. Throws Failure where the file is there but
+  // cannot be read as account settings.
+  [[nodiscard]] AccountsManager& accounts();
+
+  // The account or child account of that identifier; throws Failure where there is none.
+  [[nodiscard]] Account accountWithIdentifier(std::string_view identifier);
+
+  // To be called before the accounts are changed: throws Failure where they are of an earlier release, since saving
+  // them would mark them as migrated.
+  void beginChanges();
+  // Keeps what was changed of the account: a child's record is a copy of what its parent holds.
+  static void keepChanges(const Account& account);
+  // Writes the file. Throws Failure where it cannot be written, and where it was but nobody could be told.
+  void save();
+
+ private:
+  void loadAccounts();
+
+  bool _opensModules;
+  std::shared_ptr<SaveWatch> _saves;
+  std::shared_ptr<AccountsManager> _accounts;
+};
+
+}  // namespace tools
