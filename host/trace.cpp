@@ -1,0 +1,67 @@
+#include "host/trace.h"
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+#include <cerrno>
+#include <nlohmann/json.hpp>
+
+namespace host {
+namespace {
+
+using Event = nlohmann::ordered_json;
+
+bool writeLine(int descriptor, const std::string& line) {
+  for (;;) {
+    const auto written = ::write(descriptor, line.data(), line.size());
+    if (written >= 0) return static_cast<std::size_t>(written) == line.size();
+    if (errno != EINTR) return false;
+  }
+}
+
+}  // namespace
+
+platform::Result<std::shared_ptr<Trace>> Trace::open(const std::filesystem::path& path) {
+  const int descriptor =
+      ::open(path.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_NOFOLLOW | O_CLOEXEC | O_NOCTTY, S_IRUSR | S_IWUSR);
+  if (descriptor < 0) return platform::Status::failure(errno, "open the trace file " + path.string());
+  return std::shared_ptr<Trace>{new Trace{descriptor}};
+}
+
+Trace::~Trace() { ::close(_descriptor); }
+
+template <typename MakeEvent>
+void Trace::append(const MakeEvent& makeEvent) noexcept {
+  try {
+    const Event event = makeEvent();
+    if (!writeLine(_descriptor, event.dump(-1, ' ', false, Event::error_handler_t::replace) + '\n')) _complete = false;
+  } catch (...) {
+    _complete = false;
+  }
+}
+
+void Trace::console(std::string_view message) noexcept {
+  append([&] { return Event{{"event", "console"}, {"message", message}}; });
+}
+
+void Trace::log(std::string_view subsystem, std::string_view category,
+                const std::function<std::string()>& message) noexcept {
+  append([&] {
+    return Event{{"event", "log"}, {"subsystem", subsystem}, {"category", category}, {"message", message()}};
+  });
+}
+
+void Trace::preferencesChanged(std::string_view domain, std::string_view key) noexcept {
+  append([&] { return Event{{"event", "preferences-changed"}, {"domain", domain}, {"key", key}}; });
+}
+
+void Trace::cloudTabs(bool enabled) noexcept {
+  append([&] { return Event{{"event", "cloud-tabs"}, {"enabled", enabled}}; });
+}
+
+void Trace::result(std::string_view dataClass, bool success) noexcept {
+  append([&] { return Event{{"event", "result"}, {"dataClass", dataClass}, {"success", success}}; });
+}
+
+}  // namespace host

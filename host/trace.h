@@ -1,0 +1,43 @@
+#pragma once
+
+#include <filesystem>
+#include <functional>
+#include <memory>
+#include <string>
+#include <string_view>
+
+#include "platform/status.h"
+
+namespace host {
+
+// The events of one run, one JSON object a line, in the order in which they are told. Each event is appended with one
+// write and nothing is kept back, so a run that dies leaves the events up to its end. Text that is no UTF-8 is shown
+// with replacement characters. An event that cannot be written is lost and the run goes on; `complete` tells of it.
+class Trace {
+ public:
+  // Appends to the file, which is made (mode 0600) where there is none; a symbolic link is refused.
+  [[nodiscard]] static platform::Result<std::shared_ptr<Trace>> open(const std::filesystem::path& path);
+
+  Trace(const Trace&) = delete;
+  Trace& operator=(const Trace&) = delete;
+  ~Trace();
+
+  void console(std::string_view message) noexcept;
+  void log(std::string_view subsystem, std::string_view category, const std::function<std::string()>& message) noexcept;
+  void preferencesChanged(std::string_view domain, std::string_view key) noexcept;
+  void cloudTabs(bool enabled) noexcept;
+  void result(std::string_view dataClass, bool success) noexcept;
+
+  // Whether every event so far was written.
+  [[nodiscard]] bool complete() const { return _complete; }
+
+ private:
+  explicit Trace(int descriptor) : _descriptor{descriptor} {}
+  template <typename MakeEvent>
+  void append(const MakeEvent& makeEvent) noexcept;
+
+  int _descriptor;
+  bool _complete = true;
+};
+
+}  // namespace host

@@ -1,0 +1,53 @@
+// A migrator plug-in that does what TEST_PLUGIN says: what the host does with a plug-in is tried on it.
+
+#include <chrono>
+#include <cstdlib>
+#include <functional>
+#include <memory>
+#include <stdexcept>
+#include <string>
+#include <thread>
+
+#include "platform/data_class_migrator.h"
+#include "platform/platform.h"
+
+namespace {
+
+std::string direction() {
+  const char* const given = std::getenv("TEST_PLUGIN");
+  return given == nullptr ? "" : given;
+}
+
+void tellEverything() {
+  const auto& platform = platform::current();
+  const std::function<std::string()> text = [] { return std::string{"-[Test tell] (7) \"told\""}; };
+  platform.console->write("first");
+  if (platform.systemLog->hasReaders()) platform.systemLog->write({"com.example.test", "log", "-[Test tell]", 7, text});
+  platform.preferencesChanged->post("com.example.domain", "Key");
+  platform.cloudTabs->post(true);
+  platform.cloudTabs->post(false);
+  platform.console->write("no UTF-8: \xff\xfe\n\"quoted\"");
+}
+
+class DirectedMigrator final : public platform::DataClassMigrator {
+ public:
+  [[nodiscard]] std::string_view dataClassName() const override { return "directed"; }
+  bool performMigration() override {
+    if (direction() == "throw") throw std::runtime_error{"thrown on purpose"};
+    if (direction() == "directories")
+      platform::current().console->write(platform::current().directories->home().c_str());
+    if (direction() == "tell late") std::this_thread::sleep_for(std::chrono::milliseconds{300});
+    if (direction().starts_with("tell")) tellEverything();
+    return direction() != "fail";
+  }
+};
+
+std::unique_ptr<platform::DataClassMigrator> make() {
+  if (direction() == "make nothing") return nullptr;
+  return std::make_unique<DirectedMigrator>();
+}
+
+const platform::ClassRegistration registration{
+    std::make_shared<platform::DataClassMigratorClass>("AccountsDataMigrator", make)};
+
+}  // namespace

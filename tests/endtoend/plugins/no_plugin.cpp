@@ -1,0 +1,3 @@
+// A module that registers nothing.
+
+extern "C" [[gnu::visibility("default")]] int answer() { return 42; }

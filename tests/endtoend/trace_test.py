@@ -1,0 +1,91 @@
+"""The trace: one JSON object a line, in the order in which things happened, whatever stands in them."""
+
+import json
+import os
+import stat
+import unittest
+
+from device_test import DeviceTest
+
+TOLD = [
+    {"event": "console", "message": "first"},
+    {
+        "event": "log",
+        "subsystem": "com.example.test",
+        "category": "log",
+        "message": '-[Test tell] (7) "told"',
+    },
+    {"event": "preferences-changed", "domain": "com.example.domain", "key": "Key"},
+    {"event": "cloud-tabs", "enabled": True},
+    {"event": "cloud-tabs", "enabled": False},
+    {"event": "console", "message": 'no UTF-8: \ufffd\ufffd\n"quoted"'},
+    {"event": "result", "dataClass": "directed", "success": True},
+]
+
+
+class TraceTest(DeviceTest):
+    def setUp(self):
+        super().setUp()
+        self.trace = self.scratch / "trace"
+
+    def lines(self):
+        return self.trace.read_text(encoding="utf-8").split("\n")
+
+    def test_holds_each_event_in_order_on_a_line_of_its_own(self):
+        run = self.run_directed("tell", "--trace", self.trace)
+        self.assertEqual(0, run.status)
+        self.assertEqual("", self.lines()[-1])
+        self.assertEqual(TOLD, [json.loads(line) for line in self.lines()[:-1]])
+
+    def test_keeps_the_order_of_an_events_members(self):
+        self.run_directed("tell", "--trace", self.trace)
+        self.assertEqual('{"event":"result","dataClass":"directed","success":true}', self.lines()[-2])
+        self.assertTrue(self.lines()[1].startswith('{"event":"log","subsystem":"com.example.test","category":"log",'))
+
+    def test_passes_the_events_on(self):
+        errors = self.run_directed("tell", "--trace", self.trace).errors
+        self.assertEqual("first", errors[0])
+
+    def test_tells_of_a_failed_run(self):
+        self.assertEqual(1, self.run_directed("fail", "--trace", self.trace).status)
+        self.assertEqual(['{"event":"result","dataClass":"directed","success":false}', ""], self.lines())
+
+    def test_is_readable_by_its_owner_only(self):
+        self.run_directed("succeed", "--trace", self.trace)
+        self.assertEqual(0o600, stat.S_IMODE(self.trace.stat().st_mode))
+
+    def test_is_appended_to(self):
+        self.trace.write_text("earlier\n")
+        self.run_directed("succeed", "--trace", self.trace)
+        self.assertEqual(["earlier", '{"event":"result","dataClass":"directed","success":true}', ""], self.lines())
+
+    def test_refuses_a_symbolic_link(self):
+        self.trace.symlink_to(self.scratch / "target")
+        run = self.run_directed("succeed", "--trace", self.trace)
+        self.assertEqual(2, run.status)
+        self.assertEqual(1, len(run.errors))
+        self.assertRegex(run.errors[0], rf"^migration-host: Could not open the trace file {self.trace}: ")
+        self.assertFalse((self.scratch / "target").exists())
+
+    def test_refuses_a_directory(self):
+        run = self.run_directed("succeed", "--trace", self.scratch)
+        self.assertEqual((2, 1), (run.status, len(run.errors)))
+
+    def test_that_cannot_be_written_is_said_to_be_incomplete(self):
+        run = self.run_directed("succeed", "--trace", "/dev/full")
+        message = "migration-host: the trace is incomplete: not every event could be written"
+        self.assertEqual((0, [message]), (run.status, run.errors))
+
+    def test_whose_reader_went_away_does_not_end_the_run(self):
+        os.mkfifo(self.trace)
+        reader = os.fork()
+        if reader == 0:
+            os.close(os.open(self.trace, os.O_RDONLY))
+            os._exit(0)
+        run = self.run_directed("tell late", "--trace", self.trace)
+        os.waitpid(reader, 0)
+        self.assertEqual(0, run.status)
+
+
+if __name__ == "__main__":
+    unittest.main()
