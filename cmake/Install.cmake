@@ -49,6 +49,8 @@ foreach(folder accountsettings platform)
   file(GLOB headers CONFIGURE_DEPENDS "${CMAKE_SOURCE_DIR}/${folder}/*.h")
   install(FILES ${headers} DESTINATION "${headers_dir}/${folder}")
 endforeach()
+# For programs that work on a device's file tree which stands elsewhere than at "/".
+install(FILES "${CMAKE_SOURCE_DIR}/platform/linux/linux_platform.h" DESTINATION "${headers_dir}/platform/linux")
 
 install(EXPORT AccountSettings NAMESPACE AccountSettings:: DESTINATION "${package_dir}" FILE AccountSettingsTargets.cmake)
 configure_package_config_file(
