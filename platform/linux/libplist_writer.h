@@ -1,0 +1,10 @@
+#pragma once
+
+#include "platform/property_list_store.h"
+
+namespace platform {
+
+// The dictionary as a binary property list, read back and compared before it is answered.
+[[nodiscard]] SerializedPropertyList writePropertyList(const Dictionary& dictionary);
+
+}  // namespace platform
