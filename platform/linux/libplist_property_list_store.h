@@ -25,7 +25,7 @@ namespace platform {
 //
 // A file is refused only where it is no property list for libplist at all, or where reading it would exhaust the
 // process: more than 256 nested containers, cycles, contents that unfold to more than about 120 times the file's size
-// in memory (shared references), XML with a dictionary of more than 16,384 entries or with a text of very many
+// in memory (shared references), XML with a dictionary of more than 5,000 entries or with a text of very many
 // entities, files above 256 MiB (binary) or 16 MiB (XML).
 //
 // `serialize` answers an error for what such a reader would not give back: more than 256 nested containers, UIDs above

@@ -3,6 +3,7 @@
 #include "platform/default_platform.h"
 #include "platform/linux/bus_notices.h"
 #include "platform/linux/device_configuration.h"
+#include "platform/linux/libplist_property_list_store.h"
 #include "platform/linux/linux_base_directories.h"
 #include "platform/linux/linux_clock.h"
 #include "platform/linux/linux_console_log.h"
@@ -20,6 +21,7 @@ Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   Platform services;
   services.directories = makeBaseDirectories(options);
   services.files = makeFileSystem(services.directories->systemRoot());
+  services.propertyLists = makeLibplistPropertyListStore(services.files);
   const DeviceConfiguration configuration{services.directories, services.propertyLists};
   services.preferences = makePreferencesStore(services.directories, services.propertyLists);
   const std::shared_ptr<SystemBus> bus = makeSystemBus();

@@ -17,7 +17,7 @@ constexpr char kNoUtf8 = '\xFF';
 
 // libplist moves the rest of a text for each entity in it, and walks a large dictionary for a key that comes again.
 constexpr std::uint64_t kMostMovedBytes = std::uint64_t{1} << 33U;
-constexpr std::uint64_t kMostWalkedEntries = std::uint64_t{1} << 28U;
+constexpr std::uint64_t kMostWalkedEntries = std::uint64_t{1} << 24U;
 
 class Scan {
  public:
