@@ -22,6 +22,28 @@ using accountsettings::AccountsManager;
 using accountsettings::AssertionFailure;
 using accountsettings::BasicAccount;
 
+// A new directory that goes with this object. Its path cannot be changed, so nothing else is ever removed.
+class ScratchDirectory {
+ public:
+  ScratchDirectory() : _path{make()} {}
+  ScratchDirectory(const ScratchDirectory&) = delete;
+  ScratchDirectory& operator=(const ScratchDirectory&) = delete;
+  ~ScratchDirectory() {
+    std::error_code ignored;
+    std::filesystem::remove_all(_path, ignored);
+  }
+  [[nodiscard]] const Path& path() const { return _path; }
+
+ private:
+  static Path make() {
+    std::string name = std::filesystem::temp_directory_path() / "modules-XXXXXX";
+    if (::mkdtemp(name.data()) == nullptr) std::abort();
+    return name;
+  }
+
+  const Path _path;
+};
+
 // A device whose root is a real directory with the sample modules in it, opened by the real loader. Everything else of
 // it is in memory.
 class ModuleDevice : public ::testing::Test {
@@ -29,9 +51,7 @@ class ModuleDevice : public ::testing::Test {
   FakeDevice device;
 
   ModuleDevice() {
-    std::string name = std::filesystem::temp_directory_path() / "modules-XXXXXX";
-    if (::mkdtemp(name.data()) == nullptr) std::abort();
-    device.directories->root = name;
+    device.directories->root = _scratch.path();
     std::filesystem::create_directories(root() / "usr/lib");
     std::filesystem::copy(SAMPLE_MODULES_DIR, root() / "usr/lib/samples");
     auto services = platform::current();
@@ -42,7 +62,7 @@ class ModuleDevice : public ::testing::Test {
   }
   ModuleDevice(const ModuleDevice&) = delete;
   ModuleDevice& operator=(const ModuleDevice&) = delete;
-  ~ModuleDevice() override { std::filesystem::remove_all(root()); }
+  ~ModuleDevice() override = default;
 
   [[nodiscard]] const Path& root() const { return device.directories->root; }
 
@@ -64,6 +84,9 @@ class ModuleDevice : public ::testing::Test {
     }
     return "(no failure)";
   }
+
+ private:
+  const ScratchDirectory _scratch;
 };
 
 inline Dictionary description(const std::string& module, const std::string& className) {
