@@ -98,7 +98,7 @@ struct FaultyNotifier {
   Dictionary entry;
   std::string message;
 
-  friend void PrintTo(const FaultyNotifier& entry, std::ostream* stream) { *stream << entry.name; }
+  friend void PrintTo(const FaultyNotifier& fault, std::ostream* stream) { *stream << fault.name; }
 };
 
 class FaultyNotifiers : public Notifiers, public ::testing::WithParamInterface<FaultyNotifier> {};
