@@ -12,6 +12,12 @@ constexpr std::string_view kFullAccount = "FullAccount";
 constexpr std::string_view kSyncAccount = "SyncAccount";
 constexpr int kCredentialsNotRenewed = 3;
 
+// What is looked for: the creator of one kind for one account type.
+struct Search {
+  std::string_view type;
+  std::string_view creatorType;
+};
+
 template <typename... Arguments>
 [[noreturn]] void failLookup(std::string_view format, const Arguments&... arguments) {
   failAssertion("-[BasicAccount _creatorClassNameForAccountType:creatorType:loader:]", "BasicAccount", format,
@@ -33,6 +39,35 @@ bool isCreatorOfType(const PropertyValue& entry, std::string_view creatorType) {
   return type != nullptr && *type == creatorType;
 }
 
+const Dictionary& descriptionIn(const PropertyValue& entry, const Search& search) {
+  const Dictionary* const description = entry.asDictionary()->dictionary("Description");
+  if (description == nullptr) {
+    failLookup("Malformed AccountCreators information. Could not find the description for the %@ with type %@",
+               search.creatorType, search.type);
+  }
+  return *description;
+}
+
+const Text& frameworkIn(const Dictionary& description, const Search& search) {
+  const Text* const framework = description.text("Framework");
+  if (framework == nullptr) {
+    failLookup(
+        "Malformed AccountCreators information. Could not find the path to the framework for the %@ with type %@",
+        search.creatorType, search.type);
+  }
+  return *framework;
+}
+
+const Text& classNameIn(const Dictionary& description, const Search& search) {
+  const Text* const name = description.text("Class");
+  if (name == nullptr || name->empty()) {
+    failLookup(
+        "Malformed AccountCreators information. Could not find the name of the class that creates %@ with the type %@",
+        search.creatorType, search.type);
+  }
+  return *name;
+}
+
 // Paths in the configuration are relative to the system root, with or without a slash at their front.
 std::string modulePath(const Text& framework) {
   const platform::Path relative = platform::Path{framework.string()}.relative_path();
@@ -50,11 +85,13 @@ void openModule(const std::string& path) {
   if (error) failLookup("Could not load the account creator framework %@. Error %s", path, *error);
 }
 
-bool hasLoadedModuleItself(const AccountClassInfo& loader, const Dictionary& properties) {
-  if (!loader.loadBundleForAccountWithProperties) {
-    failLookup("The loader %@ does not answer loadBundleForAccountWithProperties:", loader.name());
+// Only full accounts have loaders.
+bool isLoadedBy(const AccountClassInfo* loader, const Search& search, const Dictionary& properties) {
+  if (loader == nullptr || search.creatorType != kFullAccount) return false;
+  if (!loader->loadBundleForAccountWithProperties) {
+    failLookup("The loader %@ does not answer loadBundleForAccountWithProperties:", loader->name());
   }
-  return loader.loadBundleForAccountWithProperties(properties);
+  return loader->loadBundleForAccountWithProperties(properties);
 }
 
 std::shared_ptr<FullAccountObject> makeFullAccount(const platform::ClassInfo& info,
@@ -79,33 +116,14 @@ std::shared_ptr<SyncAccountObject> makeSyncAccount(const platform::ClassInfo& in
 
 std::optional<std::string> BasicAccount::_creatorClassNameForAccountType_creatorType_loader(
     std::string_view type, std::string_view creatorType, const AccountClassInfo* loader) const {
+  const Search search{type, creatorType};
   std::optional<std::string> className;
   // Every matching entry's module is opened; the last one's class counts.
   for (const PropertyValue& entry : creatorEntries(type)) {
     if (!isCreatorOfType(entry, creatorType)) continue;
-    const Dictionary* const description = entry.asDictionary()->dictionary("Description");
-    if (description == nullptr) {
-      failLookup("Malformed AccountCreators information. Could not find the description for the %@ with type %@",
-                 creatorType, type);
-    }
-    const bool asksLoader = loader != nullptr && creatorType == kFullAccount;
-    if (!asksLoader || !hasLoadedModuleItself(*loader, _properties)) {
-      const Text* const framework = description->text("Framework");
-      if (framework == nullptr) {
-        failLookup(
-            "Malformed AccountCreators information. Could not find the path to the framework for the %@ with type %@",
-            creatorType, type);
-      }
-      openModule(modulePath(*framework));
-    }
-    const Text* const name = description->text("Class");
-    if (name == nullptr || name->empty()) {
-      failLookup(
-          "Malformed AccountCreators information. Could not find the name of the class that creates %@ with the type "
-          "%@",
-          creatorType, type);
-    }
-    className = name->string();
+    const Dictionary& description = descriptionIn(entry, search);
+    if (!isLoadedBy(loader, search, _properties)) openModule(modulePath(frameworkIn(description, search)));
+    className = classNameIn(description, search).string();
   }
   return className;
 }

@@ -1,5 +1,4 @@
 #include <algorithm>
-#include <array>
 #include <unordered_set>
 
 #include "accountsettings/basic_account.h"
@@ -11,21 +10,6 @@ namespace {
 
 using Dataclasses = BasicAccount::Dataclasses;
 using platform::ManagedFeature;
-
-struct RestrictableDataclass {
-  ManagedFeature feature;
-  StringConstant dataclass;
-};
-
-// In the order in which the features are asked about.
-constexpr std::array<RestrictableDataclass, 6> kRestrictableDataclasses{{
-    {ManagedFeature::cloudDocumentSync, kAccountDataclassQuorvel},
-    {ManagedFeature::cloudDocumentSync, kAccountDataclassKeyValue},
-    {ManagedFeature::mediaStream, kAccountDataclassMediaStream},
-    {ManagedFeature::sharedStreams, kAccountDataclassSharedStreams},
-    {ManagedFeature::cloudBackup, kAccountDataclassBackup},
-    {ManagedFeature::cardsWhileLocked, kAccountDataclassTickora},
-}};
 
 Dataclasses intersection(Dataclasses list, const Dataclasses& other) {
   std::erase_if(list, [&other](const Text& dataclass) { return !containsText(other, dataclass); });
@@ -121,15 +105,16 @@ Dataclasses BasicAccount::_orderedDataclasses(const Dataclasses& dataclasses) {
 }
 
 std::unordered_set<std::string_view> BasicAccount::_profileRestrictedDataclasses() {
-  const platform::ProfileRestrictions& service = *platform::current().restrictions;
   std::unordered_set<std::string_view> restricted;
-  std::optional<ManagedFeature> asked;
-  bool isForbidden = false;
-  for (const RestrictableDataclass& entry : kRestrictableDataclasses) {
-    if (asked != entry.feature) isForbidden = service.restriction(entry.feature) == platform::Restriction::notAllowed;
-    asked = entry.feature;
-    if (isForbidden) restricted.insert(entry.dataclass);
-  }
+  const auto ask = [&restricted, &service = *platform::current().restrictions](
+                       ManagedFeature feature, std::initializer_list<std::string_view> dataclasses) {
+    if (service.restriction(feature) == platform::Restriction::notAllowed) restricted.insert(dataclasses);
+  };
+  ask(ManagedFeature::cloudDocumentSync, {kAccountDataclassQuorvel, kAccountDataclassKeyValue});
+  ask(ManagedFeature::mediaStream, {kAccountDataclassMediaStream});
+  ask(ManagedFeature::sharedStreams, {kAccountDataclassSharedStreams});
+  ask(ManagedFeature::cloudBackup, {kAccountDataclassBackup});
+  ask(ManagedFeature::cardsWhileLocked, {kAccountDataclassTickora});
   return restricted;
 }
 
