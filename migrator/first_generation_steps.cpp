@@ -155,7 +155,7 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A241(AccountsManager& store) {
   const Accounts hosted = store.basicAccountsWithTypes({kNimbraAccountType});
   for (const AccountsManager::Account& account : hosted) {
     std::optional<BasicAccount::Dataclasses> enabled = account->enabledDataclasses();
-    if (enabled) std::erase(*enabled, Text{kAccountDataclassNotes});
+    if (enabled) std::erase(*enabled, kAccountDataclassNotes);
     // Written back in any case: the list that goes back is the one that counts today, and an absent one stays absent.
     account->setAccountProperty_forKey(enabled ? std::optional<PropertyValue>{arrayOf(*enabled)} : std::nullopt,
                                        kAccountEnabledDataclasses);

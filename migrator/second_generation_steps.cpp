@@ -26,7 +26,7 @@ bool deviceKeepsNotesToItself() {
 
 // Forced both ways: on such a device notes are no supported data class of any account.
 void keepNotesOnDeviceOnly(BasicAccount& account) {
-  if (account.type() == Text{kOnMyDeviceAccountType}) {
+  if (account.type() == kOnMyDeviceAccountType) {
     account._forcedSetEnabled_forDataclass(true, kAccountDataclassNotes);
   } else if (account.isEnabledForDataclass(kAccountDataclassNotes)) {
     account._forcedSetEnabled_forDataclass(false, kAccountDataclassNotes);

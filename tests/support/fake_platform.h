@@ -11,6 +11,7 @@
 
 #include "platform/platform.h"
 #include "tests/support/fake_file_system.h"
+#include "tests/support/printing.h"
 
 namespace tests {
 

@@ -1,0 +1,223 @@
+#include <cstdint>
+#include <limits>
+
+#include "platform/run_observer.h"
+#include "tests/support/step_test.h"
+
+namespace migrator {
+namespace {
+
+using tests::account;
+
+const std::vector<std::string> kReleases{"7A149", "7A150", "7A153", "7A241", "7A242", "8A293",
+                                         "8B117", "8C136", "8F191", "9A182", "9A334", "9B176"};
+
+class Stages final : public platform::RunObserver {
+ public:
+  explicit Stages(std::shared_ptr<AccountsManager>& store) : _store{store} {}
+  std::vector<std::string> steps;
+  std::vector<std::uint64_t> versions;  // of the store, after each step
+
+  void stageBegan(std::string_view stage) override { steps.emplace_back(stage); }
+  void stageEnded(std::string_view) override { versions.push_back(_store->dataVersion()); }
+
+ private:
+  std::shared_ptr<AccountsManager>& _store;
+};
+
+class Dispatch : public tests::StepTest {
+ protected:
+  Dispatch() {
+    platform::Platform observed = platform::current();
+    observed.observer = stages;
+    platform::setCurrent(observed);
+  }
+
+  void expectStepsFrom(std::size_t first) const {
+    std::vector<std::string> expected;
+    for (std::size_t step = first; step < kReleases.size(); ++step) {
+      expected.push_back("_migrateAccountsFrom" + kReleases[step] + ":");
+    }
+    EXPECT_EQ(stages->steps, expected);
+  }
+
+  std::shared_ptr<Stages> stages = std::make_shared<Stages>(store);
+};
+
+struct Entry {
+  PropertyValue version;
+  std::size_t firstStep;
+  std::ptrdiff_t saves;
+};
+
+void PrintTo(const Entry& entry, std::ostream* stream) { PrintTo(entry.version, stream); }
+
+class DispatchOfAStoredVersion : public Dispatch, public testing::WithParamInterface<Entry> {};
+
+TEST_P(DispatchOfAStoredVersion, EntersTheChainAtTheStepOfThatVersion) {
+  load({account("LDAP", "LDAPAccount", "L")}, GetParam().version);
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  expectStepsFrom(GetParam().firstStep);
+  EXPECT_EQ(saves(), GetParam().saves);
+  EXPECT_GE(store->dataVersion(), 12U);
+}
+
+INSTANTIATE_TEST_SUITE_P(EveryVersion, DispatchOfAStoredVersion,
+                         testing::Values(Entry{0, 0, 6}, Entry{1, 1, 6}, Entry{2, 2, 6}, Entry{3, 3, 6}, Entry{4, 4, 6},
+                                         Entry{5, 5, 6}, Entry{6, 6, 6}, Entry{7, 7, 5}, Entry{8, 8, 4}, Entry{9, 9, 3},
+                                         Entry{10, 10, 2}, Entry{11, 11, 1}, Entry{12, 12, 0}, Entry{13, 12, 0}));
+
+INSTANTIATE_TEST_SUITE_P(OddVersions, DispatchOfAStoredVersion,
+                         testing::Values(Entry{-1, 12, 0}, Entry{std::numeric_limits<std::int64_t>::min(), 12, 0},
+                                         Entry{std::numeric_limits<std::int64_t>::max(), 12, 0},
+                                         Entry{std::numeric_limits<std::uint64_t>::max(), 12, 0}, Entry{"7", 7, 5},
+                                         Entry{"11 and more", 11, 1}, Entry{"-3", 12, 0}, Entry{"twelve", 0, 6},
+                                         Entry{"", 0, 6}, Entry{9.99, 9, 3}, Entry{-0.5, 0, 6}, Entry{true, 0, 6},
+                                         Entry{Array{12}, 0, 6}, Entry{Dictionary{{"Version", 12}}, 0, 6},
+                                         Entry{platform::Date{12}, 0, 6}));
+
+TEST_P(DispatchOfAStoredVersion, ReadsTheVersionAsTheStoreDoes) {
+  load({}, GetParam().version);
+  EXPECT_EQ(std::min<std::uint64_t>(store->dataVersion(), kReleases.size()), GetParam().firstStep);
+}
+
+TEST_F(Dispatch, RunsAllStepsForAFileWithoutAVersion) {
+  putSettings({{"Accounts", Array{account("LDAP", "LDAPAccount", "L")}}});
+  store = AccountsManager::initInsideOfMigration();
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  expectStepsFrom(0);
+  EXPECT_EQ(store->dataVersion(), 12U);
+}
+
+TEST_F(Dispatch, RunsAllStepsWhereThereIsNoFile) {
+  store = AccountsManager::initInsideOfMigration();
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  expectStepsFrom(0);
+}
+
+TEST_F(Dispatch, GoesByTheFileAndNotByTheStore) {
+  load({}, 11);
+  store->setDataVersion(3);
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  expectStepsFrom(11);
+}
+
+TEST_F(Dispatch, LeavesTheStampAtSixUntilTheLastStepOfTheSecondGeneration) {
+  load({}, 6);
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_EQ(stages->versions, (std::vector<std::uint64_t>{6, 6, 9, 10, 11, 12}));
+}
+
+TEST_F(Dispatch, LeavesStoreAndFileOfACurrentVersionAlone) {
+  load({account("Mail", "IMAPAccount", "M", {{"uniqueId", "U"}})}, 12);
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_EQ(value(0, "Identifier"), PropertyValue{"M"});
+  EXPECT_TRUE(device.outputs.empty());
+}
+
+TEST_F(Dispatch, ReadsTheFileOnceForTheVersionAndOnceForTheReport) {
+  load({}, 12);
+  device.propertyLists->reads.clear();
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  const tests::Path file = AccountsManager::fullPathToAccountSettingsPlist();
+  EXPECT_EQ(device.propertyLists->reads, (std::vector<tests::Path>{file, file}));
+}
+
+class DispatchWithAReport : public Dispatch {
+ protected:
+  DispatchWithAReport() {
+    device.preferences->switches[{"com.vorlix.accountsettings-logging", "ASSaveMigrationInformation"}] = true;
+    migrator._collatedMigrationData.emplace();
+  }
+  [[nodiscard]] PropertyValue collected() const {
+    const PropertyValue* const entry = migrator._collatedMigrationData->find("OldAccountSettings");
+    return entry != nullptr ? *entry : tests::kAbsent;
+  }
+};
+
+TEST_F(DispatchWithAReport, CollectsTheFileAsItWasBeforeAnyStep) {
+  const Dictionary settings{{"Accounts", Array{account("Mail", "IMAPAccount", "M", {{"uniqueId", "U"}})}},
+                            {"Version", 0},
+                            {"Written By", "somebody"}};
+  putSettings(settings);
+  store = AccountsManager::initInsideOfMigration();
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_EQ(collected(), PropertyValue{settings});
+  EXPECT_NE(device.dictionaryAt(AccountsManager::fullPathToAccountSettingsPlist()), settings);
+}
+
+TEST_F(DispatchWithAReport, CollectsAnEmptyDictionaryForAFileThatCannotBeRead) {
+  device.files->put(AccountsManager::fullPathToAccountSettingsPlist(), "no property list");
+  store = AccountsManager::initInsideOfMigration();
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_EQ(collected(), PropertyValue{Dictionary{}});
+}
+
+TEST_F(DispatchWithAReport, CollectsTheFileAlsoWhereNoStepRuns) {
+  load({}, 12);
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_EQ(collected(), (PropertyValue{Dictionary{{"Version", 12}, {"Accounts", Array{}}}}));
+}
+
+TEST_F(Dispatch, CollectsNothingWhereNoReportIsWanted) {
+  load({}, 11);
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_FALSE(migrator._collatedMigrationData.has_value());
+}
+
+TEST_F(Dispatch, FindsTheSettingsFileByItsPathAlone) {
+  EXPECT_FALSE(AccountsDataMigrator::_newAccountsInformationPresent());
+  device.files->put(AccountsManager::fullPathToAccountSettingsPlist(), "no property list");
+  EXPECT_TRUE(AccountsDataMigrator::_newAccountsInformationPresent());
+}
+
+struct Stamp {
+  std::string_view release;
+  bool (AccountsDataMigrator::*step)(AccountsManager&);
+  std::uint64_t version;
+  std::ptrdiff_t saves;
+};
+
+void PrintTo(const Stamp& stamp, std::ostream* stream) { *stream << stamp.release; }
+
+constexpr std::uint64_t kNoStamp = 99;
+
+class EveryStep : public tests::StepTest, public testing::WithParamInterface<Stamp> {};
+
+TEST_P(EveryStep, StampsItsVersionAndSavesAsItsReleaseDid) {
+  load({account("LDAP", "LDAPAccount", "L")});
+  store->setDataVersion(kNoStamp);
+  EXPECT_TRUE((migrator.*GetParam().step)(*store));
+  EXPECT_EQ(store->dataVersion(), GetParam().version);
+  EXPECT_EQ(saves(), GetParam().saves);
+}
+
+TEST_P(EveryStep, LeavesAnAccountAloneThatNoStepNames) {
+  const Dictionary directory = account("LDAP", "LDAPAccount", "L", {{"uniqueId", "U"}, {"IsActive", true}, {"X", 1.5}});
+  load({directory});
+  EXPECT_TRUE((migrator.*GetParam().step)(*store));
+  EXPECT_EQ(at(0).properties(), directory);
+}
+
+TEST_P(EveryStep, DoesNothingWithAnEmptyStoreButAddTheOnDeviceAccount) {
+  load({});
+  EXPECT_TRUE((migrator.*GetParam().step)(*store));
+  EXPECT_EQ(store->count(), GetParam().version == 3 ? 1U : 0U);
+}
+
+INSTANTIATE_TEST_SUITE_P(ByRelease, EveryStep,
+                         testing::Values(Stamp{"7A149", &AccountsDataMigrator::_migrateAccountsFrom7A149, 1, 0},
+                                         Stamp{"7A150", &AccountsDataMigrator::_migrateAccountsFrom7A150, 2, 0},
+                                         Stamp{"7A153", &AccountsDataMigrator::_migrateAccountsFrom7A153, 3, 0},
+                                         Stamp{"7A241", &AccountsDataMigrator::_migrateAccountsFrom7A241, 4, 0},
+                                         Stamp{"7A242", &AccountsDataMigrator::_migrateAccountsFrom7A242, 5, 0},
+                                         Stamp{"8A293", &AccountsDataMigrator::_migrateAccountsFrom8A293, 6, 0},
+                                         Stamp{"8B117", &AccountsDataMigrator::_migrateAccountsFrom8B117, kNoStamp, 1},
+                                         Stamp{"8C136", &AccountsDataMigrator::_migrateAccountsFrom8C136, kNoStamp, 1},
+                                         Stamp{"8F191", &AccountsDataMigrator::_migrateAccountsFrom8F191, 9, 1},
+                                         Stamp{"9A182", &AccountsDataMigrator::_migrateAccountsFrom9A182, 10, 1},
+                                         Stamp{"9A334", &AccountsDataMigrator::_migrateAccountsFrom9A334, 11, 1},
+                                         Stamp{"9B176", &AccountsDataMigrator::_migrateAccountsFrom9B176, 12, 1}));
+
+}  // namespace
+}  // namespace migrator
