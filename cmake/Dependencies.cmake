@@ -11,5 +11,6 @@ find_package(nlohmann_json REQUIRED)
 
 if(ACCOUNTS_TESTS)
   find_package(GTest REQUIRED)
+  find_package(rapidcheck REQUIRED)
   find_package(Python3 REQUIRED COMPONENTS Interpreter)
 endif()

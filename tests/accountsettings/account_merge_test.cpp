@@ -43,6 +43,11 @@ constexpr Combination kCombinations[]{
     {"O", "M", "D", "M"},                  // changed by both, memory wins
 };
 
+void PrintTo(const Combination& keys, std::ostream* stream) {
+  const auto letter = [](const char* value) { return value == nullptr ? "-" : value; };
+  *stream << letter(keys.original) << letter(keys.inMemory) << letter(keys.onDisk);
+}
+
 class MergingOneKey : public AccountStore, public testing::WithParamInterface<Combination> {};
 
 TEST_P(MergingOneKey, GivesTheValueOfWhoeverChangedItAndOfMemoryWhereBothDid) {
