@@ -5,7 +5,6 @@ include(CMakePackageConfigHelpers)
 
 set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/AccountSettings")
 set(headers_dir "${CMAKE_INSTALL_INCLUDEDIR}/account-settings")
-set(modules_dir "${CMAKE_INSTALL_LIBDIR}/account-settings")
 file(RELATIVE_PATH libraries_from_programs "/${CMAKE_INSTALL_BINDIR}" "/${CMAKE_INSTALL_LIBDIR}")
 
 # Everything that is needed to run, and nothing that only tests need.
@@ -30,19 +29,19 @@ foreach(program migration-host accountctl)
   endif()
 endforeach()
 
-# Loadable modules are opened by their path, without a library's prefix in their name.
-get_property(loadable_modules GLOBAL PROPERTY ACCOUNTS_LOADABLE_MODULES)
 if(TARGET accounts-migrator)
-  list(PREPEND loadable_modules accounts-migrator)
+  add_dependencies(product accounts-migrator)
+  set_target_properties(accounts-migrator PROPERTIES INSTALL_RPATH "$ORIGIN/..")
+  install(TARGETS accounts-migrator LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/account-settings")
 endif()
-foreach(module IN LISTS loadable_modules)
-  add_dependencies(product ${module})
-  set_target_properties(${module} PROPERTIES INSTALL_RPATH "$ORIGIN/..")
-  install(TARGETS ${module} LIBRARY DESTINATION "${modules_dir}")
+foreach(rest account_modules resources)
+  if(TARGET ${rest})
+    add_dependencies(product ${rest})
+  endif()
 endforeach()
 
-add_dependencies(product account_modules)
-
+install(DIRECTORY "${CMAKE_SOURCE_DIR}/resources/" DESTINATION "${CMAKE_INSTALL_DATADIR}/account-settings"
+  PATTERN CMakeLists.txt EXCLUDE)
 install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 
 foreach(folder accountsettings platform)

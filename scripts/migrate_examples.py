@@ -7,30 +7,39 @@ from pathlib import Path
 from device import EXAMPLES, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, Device
 
 ABSENT = "-"
+SHOWN = 3  # changes of one account that are named; the others are counted
 TITLES = ("Account", "Before", "After", "What changed")
 
 
+# The keys under which the three files keep the same thing, in the order in which they count.
+NAME_KEYS = ("DisplayName", "AccountName", "DAAccountDescription", "Type String", "Type")
+KIND_KEYS = ("Type", "AccountType", "DAAccountConfigurationClass")
+IDENTIFIER_KEYS = ("Identifier", "uniqueId", "DAAccountConfigurationAccountID", "Sync Identifier")
+
+
 class Account:
-    def __init__(self, properties, place):
+    def __init__(self, properties, place=None):
         self.properties = properties
-        self.place = place
+        self.place = place  # where it lies, unless among the settings' own accounts
+
+    def _values(self, keys):
+        return [self.properties[key] for key in keys if self.properties.get(key)]
 
     def name(self):
-        return self.properties.get("DisplayName") or self.properties.get("Type String") or self.identifiers()[0]
+        return next(iter(self._values(NAME_KEYS) or self.identifiers()), ABSENT)
 
     def identifiers(self):
-        keys = ("Identifier", "uniqueId", "DAAccountConfigurationAccountID", "Sync Identifier")
-        return [self.properties[key] for key in keys if self.properties.get(key)] or [ABSENT]
+        return self._values(IDENTIFIER_KEYS)
 
     def summary(self):
-        kind = self.properties.get("Type") or self.properties.get("Class") or self.properties.get("AccountType")
-        return f"{kind or ABSENT} ({self.place})"
+        kind = next(iter(self._values(KIND_KEYS)), "outgoing mail")
+        return f"{kind} ({self.place})" if self.place else kind
 
 
 def accounts_of(device):
     found = []
     for path, keys, place in (
-        (SETTINGS, ("Accounts",), "settings"),
+        (SETTINGS, ("Accounts",), None),
         (LEGACY_MAIL, ("DeliveryAccounts", "MailAccounts"), "legacy mail file"),
         (LEGACY_EXCHANGE, ("DAAccountsKey",), "legacy Exchange file"),
     ):
@@ -63,7 +72,7 @@ def changes(before, after):
     ) for key in keys]
     if not parts:
         return "nothing"
-    return ", ".join(parts[:4]) + (f" and {len(parts) - 4} more" if len(parts) > 4 else "")
+    return ", ".join(parts[:SHOWN]) + (f" and {len(parts) - SHOWN} more" if len(parts) > SHOWN else "")
 
 
 def rows(before, after):

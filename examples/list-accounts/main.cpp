@@ -9,6 +9,7 @@
 
 #include <exception>
 #include <iostream>
+#include <string_view>
 
 namespace {
 
@@ -37,7 +38,10 @@ int run(int count, char** arguments) {
     std::cerr << "Usage: list-accounts ROOT [IDENTIFIER DATACLASS]\n";
     return 2;
   }
-  platform::setCurrent(platform::makeLinuxPlatform({.systemRoot = arguments[1]}));
+  const std::string_view root = arguments[1];
+  platform::setCurrent(platform::makeLinuxPlatform({.systemRoot = root}));
+  // Those who listen for changes on this machine have nothing to do with another device's.
+  AccountsManager::_setShouldSkipNotifications(root != "/");
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   AccountsManager::waitForMigrationToFinish();
   const auto store = AccountsManager::init();

@@ -2,7 +2,7 @@
 
 import unittest
 
-from device_test import PLUGINS, DeviceTest
+from device_case import PLUGINS, DeviceTest
 
 OPTIONS = ["--root", "--home", "--shared-resources", "--resources", "--plugin", "--trace"]
 

@@ -22,6 +22,7 @@ void tellEverything() {
   const auto& platform = platform::current();
   const std::function<std::string()> text = [] { return std::string{"-[Test tell] (7) \"told\""}; };
   platform.console->write("first");
+  if (direction() == "tell slowly") std::this_thread::sleep_for(std::chrono::milliseconds{500});
   if (platform.systemLog->hasReaders()) platform.systemLog->write({"com.example.test", "log", "-[Test tell]", 7, text});
   platform.preferencesChanged->post("com.example.domain", "Key");
   platform.cloudTabs->post(true);
@@ -36,7 +37,6 @@ class DirectedMigrator final : public platform::DataClassMigrator {
     if (direction() == "throw") throw std::runtime_error{"thrown on purpose"};
     if (direction() == "directories")
       platform::current().console->write(platform::current().directories->home().c_str());
-    if (direction() == "tell late") std::this_thread::sleep_for(std::chrono::milliseconds{300});
     if (direction().starts_with("tell")) tellEverything();
     return direction() != "fail";
   }

@@ -1,0 +1,109 @@
+"""The installed tree, moved to where nobody installed it: it runs there, and other programs build and run on it."""
+
+import os
+import subprocess
+import unittest
+from pathlib import Path
+
+from device import EXAMPLES, SETTINGS, lines, plain_environment
+from device_case import DeviceTest
+
+BUILD_TREE = Path(os.environ["BUILD_TREE"])
+LIBRARY_DIRECTORY = os.environ["LIBRARY_DIRECTORY"]
+SOURCES = EXAMPLES.parent / "list-accounts"
+IDENTIFIER = "55E4F607-1829-43A4-95B6-C7D8E9FA0B05"
+NOTES = "com.vorlix.Dataclass.Notes"
+
+
+def run(*command, **environment):
+    ended = subprocess.run(
+        [str(part) for part in command],
+        env={**plain_environment(), **environment},
+        stdin=subprocess.DEVNULL,
+        stdout=subprocess.PIPE,
+        stderr=subprocess.STDOUT,
+        check=False,
+    )
+    if ended.returncode != 0:
+        raise AssertionError(f"{command} failed:\n{ended.stdout.decode(errors='replace')}")
+    return lines(ended.stdout)
+
+
+class InstalledTree(DeviceTest):
+    def setUp(self):
+        super().setUp()
+        run("cmake", "--install", BUILD_TREE, "--prefix", self.scratch / "first")
+        self.prefix = self.scratch / "somewhere" / "else"
+        self.prefix.parent.mkdir()
+        (self.scratch / "first").rename(self.prefix)
+        self.library = self.prefix / LIBRARY_DIRECTORY
+
+    def dynamic_section(self, path):
+        return "\n".join(run("readelf", "--dynamic", path))
+
+    def test_holds_no_path_of_the_build(self):
+        for path in [self.prefix / "bin" / "migration-host", *self.library.rglob("*.so")]:
+            with self.subTest(path=path):
+                self.assertNotIn(str(BUILD_TREE), self.dynamic_section(path))
+                self.assertIn("[$ORIGIN", self.dynamic_section(path))
+
+    def test_migrates_a_device(self):
+        device = self.example("current")
+        before = device.read_plist(SETTINGS)
+        migrated = device.migrate(self.prefix / "bin" / "migration-host")
+        self.assertEqual((0, before), (migrated.status, device.read_plist(SETTINGS)))
+
+    def test_uses_its_own_plugin_and_resources(self):
+        device = self.example("current")
+        (self.library / "account-settings" / "accounts-migrator.so").unlink()
+        self.assertEqual(3, device.migrate(self.prefix / "bin" / "migration-host").status)
+
+    def build_with_cmake(self):
+        build = self.scratch / "with-cmake"
+        run(
+            "cmake", "-G", "Ninja", "-S", SOURCES, "-B", build,
+            f"-DCMAKE_PREFIX_PATH={self.prefix}", f"-DCMAKE_CXX_COMPILER={os.environ['CXX']}", *self.sanitizer_options(),
+        )
+        run("cmake", "--build", build)
+        return build / "list-accounts"
+
+    def sanitizer_options(self):
+        flags = self.sanitizer_flags()
+        return [f"-DCMAKE_CXX_FLAGS={' '.join(flags)}"] if flags else []
+
+    def sanitizer_flags(self):
+        sanitizers = os.environ["SANITIZE"]
+        return [f"-fsanitize={sanitizers}"] if sanitizers else []
+
+    def build_with_pkg_config(self):
+        program = self.scratch / "with-pkg-config"
+        options = run(
+            "pkg-config", "--cflags", "--libs", "account-settings", PKG_CONFIG_PATH=str(self.library / "pkgconfig")
+        )[0].split()
+        run(
+            os.environ["CXX"], SOURCES / "main.cpp", *self.sanitizer_flags(), *options,
+            f"-Wl,-rpath,{self.library}", "-o", program,
+        )
+        return program
+
+    def assert_lists_and_switches(self, program):
+        device = self.example("current")
+        settings = device.read_plist(SETTINGS)
+        listed = run(program, device.root)
+        self.assertEqual(
+            [f"{each['Identifier']}  {each['Type']}  {each['DisplayName']}" for each in settings["Accounts"][:3]],
+            [line for line in listed if not line.startswith(" ")][:3],
+        )
+        run(program, device.root, IDENTIFIER, NOTES)
+        settings["Accounts"][1]["Enabled Dataclasses"].remove(NOTES)
+        self.assertEqual(settings, device.read_plist(SETTINGS))
+
+    def test_serves_a_program_built_with_cmake(self):
+        self.assert_lists_and_switches(self.build_with_cmake())
+
+    def test_serves_a_program_built_with_pkg_config(self):
+        self.assert_lists_and_switches(self.build_with_pkg_config())
+
+
+if __name__ == "__main__":
+    unittest.main()
