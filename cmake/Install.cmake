@@ -40,8 +40,6 @@ foreach(rest account_modules resources)
   endif()
 endforeach()
 
-install(DIRECTORY "${CMAKE_SOURCE_DIR}/resources/" DESTINATION "${CMAKE_INSTALL_DATADIR}/account-settings"
-  PATTERN CMakeLists.txt EXCLUDE)
 install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
 
 foreach(folder accountsettings platform)
