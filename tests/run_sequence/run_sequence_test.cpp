@@ -39,7 +39,7 @@ class RunSequence : public testing::Test {
   AccountsDataMigrator migrator;
 
   [[nodiscard]] std::int64_t savedVersion() {
-    return device.dictionaryAt(kSettingsFile).find("Version")->integerValue().value();
+    return device.dictionaryAt(kSettingsFile).find("Version")->integerValue().value_or(-1);
   }
   // Everything that happened, without the library's log.
   [[nodiscard]] std::vector<std::string> happenings() const {
