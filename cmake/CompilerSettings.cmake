@@ -24,15 +24,13 @@ endif()
 
 add_compile_options(
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wold-style-cast -Wnon-virtual-dtor
-  -Woverloaded-virtual -Wnull-dereference -Wcast-qual -Wformat=2 -Werror
+  -Woverloaded-virtual -Wcast-qual -Wformat=2 -Werror
   -fstack-protector-strong)
 add_link_options(-Wl,-z,relro,-z,now,-z,noexecstack)
 
 if(ACCOUNTS_SANITIZE)
   add_compile_options(-fsanitize=${ACCOUNTS_SANITIZE} -fno-omit-frame-pointer -fno-sanitize-recover=all)
   add_link_options(-fsanitize=${ACCOUNTS_SANITIZE})
-  # GCC's flow analysis sees null pointers in the sanitizers' own checks.
-  add_compile_options(-Wno-null-dereference)
   if(CMAKE_CXX_COMPILER_ID STREQUAL "Clang")
     # The sanitizer's run time stands in the program, not in the shared libraries.
     add_link_options(-Wl,-z,undefs)
