@@ -1,0 +1,52 @@
+#pragma once
+
+#include <cerrno>
+#include <functional>
+#include <memory>
+
+#include "platform/file_system.h"
+
+namespace tests {
+
+// What happens at one operation of a run, counted from 1.
+struct Mishap {
+  enum class Kind { none, failsOnce, failsFromThenOn, diesBefore, diesAfter };
+  Kind kind = Kind::none;
+  int operation = 0;
+  int errorNumber = EIO;
+};
+
+// Forwards every call to another file system, counts the calls, and lets the one mishap happen. Dying is what `die`
+// does: it must not return.
+class MishapFileSystem final : public platform::FileSystem {
+ public:
+  MishapFileSystem(std::shared_ptr<platform::FileSystem> inner, Mishap mishap, std::function<void()> die)
+      : _inner{std::move(inner)}, _mishap{mishap}, _die{std::move(die)} {}
+
+  [[nodiscard]] int operations() const { return _operations; }
+
+  [[nodiscard]] std::optional<platform::FileKind> kindOf(const platform::Path& path) override;
+  platform::Result<platform::Bytes> read(const platform::Path& path, std::size_t sizeLimit) override;
+  platform::Status create(const platform::Path& path, std::span<const std::uint8_t> bytes) override;
+  platform::Status replace(const platform::Path& path, std::span<const std::uint8_t> bytes) override;
+  platform::Status copy(const platform::Path& from, const platform::Path& to) override;
+  platform::Status remove(const platform::Path& path) override;
+  platform::Status createDirectories(const platform::Path& path, unsigned permissions) override;
+  platform::Status setOwner(const platform::Path& path, std::string_view owner, std::string_view group) override;
+  [[nodiscard]] std::optional<platform::Path> temporaryName() override;
+  platform::Status rename(const platform::Path& from, const platform::Path& to) override;
+
+ private:
+  // Runs one operation, unless the mishap takes its place; `failed` is what it answers then.
+  template <typename Operation, typename Failed>
+  auto run(const Operation& operation, const Failed& failed) -> decltype(operation());
+  template <typename Operation>
+  auto change(const Operation& operation, const platform::Path& path) -> decltype(operation());
+
+  std::shared_ptr<platform::FileSystem> _inner;
+  Mishap _mishap;
+  std::function<void()> _die;
+  int _operations = 0;
+};
+
+}  // namespace tests
