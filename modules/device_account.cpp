@@ -1,27 +1,13 @@
-// The account of what is kept only on the device: its record is its full account, and it has no service to refresh
-// from.
-
-#include <memory>
+// The account of what is kept only on the device. Its record is its full account, and the class that makes it the
+// library's own, so all that this module has to do is to be there and to bring the library with it.
 
 #include "accountsettings/device_local_account.h"
-#include "platform/class_registry.h"
 
 namespace modules {
 namespace {
 
-using accountsettings::AccountClassInfo;
-using accountsettings::BasicAccount;
-using accountsettings::DeviceLocalAccount;
-
-std::shared_ptr<const AccountClassInfo> creator() {
-  auto info = std::make_shared<AccountClassInfo>("DeviceAccountCreator");
-  info->accountWithBasicAccount = [](const std::shared_ptr<BasicAccount>& account) {
-    return DeviceLocalAccount::accountWithBasicAccount(*account);
-  };
-  return info;
-}
-
-const platform::ClassRegistration fullAccounts{creator()};
+// Keeps the library among what this module needs, however the linker is asked to drop what seems unused.
+[[gnu::used]] const auto fullAccount = &accountsettings::DeviceLocalAccount::accountWithBasicAccount;
 
 }  // namespace
 }  // namespace modules
