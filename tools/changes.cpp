@@ -1,8 +1,8 @@
 #include <algorithm>
+#include <exception>
 #include <functional>
 #include <nlohmann/json.hpp>
 
-#include "accountsettings/assertion_failure.h"
 #include "tools/account_view.h"
 #include "tools/commands.h"
 #include "tools/failure.h"
@@ -11,7 +11,7 @@
 namespace tools {
 namespace {
 
-using accountsettings::AssertionFailure;
+using accountsettings::Dictionary;
 using accountsettings::Text;
 using Json = nlohmann::ordered_json;
 using Dataclasses = BasicAccount::Dataclasses;
@@ -22,11 +22,12 @@ std::string printedChange(const BasicAccount& account, bool asJson) {
   return asJson ? Json{{"account", jsonOf(account)}}.dump(2) + "\n" : std::string{};
 }
 
+// A module may fail in its own way, too; whatever it throws, the message says what became of the change.
 void announceBefore(const Session& session, const BasicAccount& account, const Dataclasses& dataclasses) {
   if (!session.opensModules()) return;
   try {
     for (const Text& each : dataclasses) AccountsManager::accountWillChange_forDataclass(account, each);
-  } catch (const AssertionFailure& failure) {
+  } catch (const std::exception& failure) {
     throw Failure{ExitStatus::faultyInstallation, "nothing was changed: " + std::string{failure.what()}};
   }
 }
@@ -35,7 +36,7 @@ void announceAfter(const Session& session, const BasicAccount& account, const Da
   if (!session.opensModules()) return;
   try {
     for (const Text& each : dataclasses) AccountsManager::accountDidChange_forDataclass(account, each);
-  } catch (const AssertionFailure& failure) {
+  } catch (const std::exception& failure) {
     throw Failure{ExitStatus::faultyInstallation,
                   "the accounts were saved, but not announced: " + std::string{failure.what()}};
   }
@@ -77,13 +78,13 @@ std::string switchDataclass(Session& session, const Words& arguments, bool asJso
   return printedChange(*account, asJson);
 }
 
-Account accountOfTypeAndClass(const std::string& type, const std::string& className) {
+Dictionary typeAndClass(const std::string& type, const std::string& className) {
   if (!BasicAccount::_isValidAccountType(type)) refuse("unknown account type: " + type);
   if (className.empty()) refuse("an account needs a class");
-  return BasicAccount::accountWithType_class(type, className);
+  return {{accountsettings::kAccountType, type}, {accountsettings::kAccountClass, className}};
 }
 
-void setProperty(BasicAccount& account, const KeyValue& property, std::size_t position) {
+void setProperty(Dictionary& properties, const KeyValue& property, std::size_t position) {
   const auto place = "property " + std::to_string(position);
   if (property.key == accountsettings::kAccountType || property.key == accountsettings::kAccountClass) {
     refuse(place + " sets " + property.key + ", which stands before the properties");
@@ -91,15 +92,15 @@ void setProperty(BasicAccount& account, const KeyValue& property, std::size_t po
   const auto* const text = property.value.asText();
   const bool hasText = text != nullptr && !text->empty();
   if (property.key == accountsettings::kAccountIdentifier && !hasText) refuse(place + " is no identifier");
-  account.setAccountProperty_forKey(property.value, property.key);
+  properties.set(property.key, property.value);
 }
 
 Account newAccount(const Words& arguments) {
-  auto account = accountOfTypeAndClass(arguments[0], arguments[1]);
+  auto properties = typeAndClass(arguments[0], arguments[1]);
   for (std::size_t index = 2; index < arguments.size(); ++index) {
-    setProperty(*account, parseKeyValue(arguments[index], index - 1), index - 1);
+    setProperty(properties, parseKeyValue(arguments[index], index - 1), index - 1);
   }
-  return account;
+  return BasicAccount::initWithProperties(properties);
 }
 
 bool isRegistered(Session& session, const BasicAccount& account) {

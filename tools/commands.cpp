@@ -13,13 +13,13 @@ const std::vector<Command>& commands() {
   static const std::vector<Command> all{
       {"list", "", "all accounts, children below their parents", 0, 0, listAccounts},
       {"show", "ID", "one account with its properties", 1, 1, showAccount},
-      {"types", "", "the account types and the data classes that each supports", 0, 0, listTypes},
+      {"types", "", "the account types, with their data classes", 0, 0, listTypes},
       {"enable", "ID DATACLASS", "switch a data class on", 2, 2, enableDataclass},
       {"disable", "ID DATACLASS", "switch a data class off", 2, 2, disableDataclass},
       {"rename", "ID NAME", "change what the account is called", 2, 2, renameAccount},
       {"add", "TYPE CLASS [KEY=VALUE]...", "add an account and print its identifier", 2, kAnyNumber, addAccount},
       {"remove", "ID", "remove an account, with its children", 1, 1, removeAccount},
-      {"save", "", "load the accounts, repair what needs it, and save them", 0, 0, saveAccounts},
+      {"save", "", "repair what needs it and save the accounts", 0, 0, saveAccounts},
   };
   return all;
 }

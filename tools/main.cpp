@@ -34,11 +34,11 @@ constexpr std::string_view kUsageOptions =
     "  --help           print this text\n"
     "  --version        print the version\n"
     "\n"
-    "DATACLASS is written Mail or com.vorlix.Dataclass.Mail, VALUE is a text; KEY:=JSON\n"
-    "gives any other value. Credentials are never printed.\n"
+    "DATACLASS is written Mail or com.vorlix.Dataclass.Mail, VALUE is a text;\n"
+    "KEY:=JSON gives any other value. Credentials are never printed.\n"
     "\n"
-    "Exit status: 0 done, 1 failed, 2 wrong use, 3 no such account, 4 the configuration or\n"
-    "a module is at fault.\n";
+    "Exit status: 0 done, 1 failed, 2 wrong use, 3 no such account, 4 the\n"
+    "configuration or a module is at fault.\n";
 
 // A reader that went away and a file that may not grow are failed writes, not the end of a half-done change.
 void surviveFailedWrites() {

@@ -8,6 +8,7 @@
 #include <system_error>
 #include <utility>
 
+#include "platform/text.h"
 #include "tools/failure.h"
 
 namespace tools {
@@ -76,6 +77,14 @@ void readWord(std::string_view word, Options& options) {
   }
 }
 
+// Property lists hold nothing but text; what is none would be kept as something else than was asked for.
+void checkWords(const Options& options) {
+  const auto& words = options.arguments;
+  const auto found = std::ranges::find_if_not(words, platform::isWellFormedText);
+  if (found == words.end()) return;
+  refuse("argument " + std::to_string(found - words.begin() + 1) + " of " + options.command + " is not UTF-8");
+}
+
 }  // namespace
 
 bool Options::opensModules() const {
@@ -97,6 +106,7 @@ Options parseArguments(Arguments arguments) {
       readOption(argument, arguments, options);
     }
   }
+  checkWords(options);
   std::error_code ignored;
   if (const auto& root = options.device.systemRoot; root && !std::filesystem::is_directory(*root, ignored)) {
     refuse("--root is no directory: " + root->string());

@@ -25,7 +25,8 @@ struct Options {
 
 // Reads the arguments that follow the program's name. Options stand before or after the command, written `--name VALUE`
 // or `--name=VALUE`, in full; `--` ends them. Throws Failure (wrong use) for an option that is unknown or given twice,
-// a value that is missing or empty, and a root that is no directory.
+// a value that is missing or empty, a root
+// that is no directory, and a word that is not UTF-8.
 [[nodiscard]] Options parseArguments(std::span<const char* const> arguments);
 
 }  // namespace tools

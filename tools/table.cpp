@@ -33,10 +33,26 @@ bool hasNoWidth(std::string_view character) {
   return isBetween(character, "\u0300", "\u036F") || isBetween(character, "\u200B", "\u200F") || character == "\uFEFF";
 }
 
+// Characters of East Asian scripts and pictographs, which terminals show in two columns.
+bool isWide(std::string_view character) {
+  return isBetween(character, "\u1100", "\u115F") || isBetween(character, "\u2E80", "\uA4CF") ||
+         isBetween(character, "\uAC00", "\uD7A3") || isBetween(character, "\uF900", "\uFAFF") ||
+         isBetween(character, "\uFE30", "\uFE6F") || isBetween(character, "\uFF00", "\uFF60") ||
+         isBetween(character, "\uFFE0", "\uFFE6") || isBetween(character, "\U0001F300", "\U0001F64F") ||
+         isBetween(character, "\U0001F900", "\U0001F9FF") || isBetween(character, "\U00020000", "\U0003FFFD");
+}
+
+std::size_t columnsOf(std::string_view character) {
+  if (hasNoWidth(character)) return 0;
+  return isWide(character) ? 2 : 1;
+}
+
 std::size_t widthOf(std::string_view text) {
   std::size_t width = 0;
-  for (; !text.empty(); text.remove_prefix(lengthOfFirst(text))) {
-    if (!hasNoWidth(text.substr(0, lengthOfFirst(text)))) ++width;
+  while (!text.empty()) {
+    const auto character = text.substr(0, lengthOfFirst(text));
+    width += columnsOf(character);
+    text.remove_prefix(character.size());
   }
   return width;
 }

@@ -1,0 +1,216 @@
+"""What accountctl refuses or fails to do: one clear line, a status that scripts can tell by, and the device as it was."""
+
+import os
+import subprocess
+import tempfile
+import unittest
+
+from accountctl_case import ACCOUNTCTL, CLOUD, DIRECTORY, HOME_MAIL, AccountctlTest, changed
+from device import SETTINGS, run_host
+from failed_saves_test import CAP_DAC_OVERRIDE, SHARED_MEMORY, without_capabilities
+
+FAILED, WRONG_USE, NO_ACCOUNT, FAULTY_INSTALLATION = 1, 2, 3, 4
+CHANGES = (["enable", "M1", "Notes"], ["rename", "M1", "Work"], ["add", "LDAP", "LDAPAccount"], ["remove", "M1"], ["save"])
+NOT_UTF8 = b"\xff"
+
+
+class WrongUse(AccountctlTest):
+    def setUp(self):
+        super().setUp()
+        self.put(HOME_MAIL, CLOUD)
+
+    def assert_wrong(self, message, *words):
+        with self.subTest(words=words):
+            self.assert_refused(WRONG_USE, message, *words)
+
+    def test_of_options(self):
+        self.assert_wrong("unknown option: --jsn (see --help)", "--jsn", "list")
+        self.assert_wrong("unknown option: -j (see --help)", "list", "-j")
+        self.assert_wrong("unknown option: --json (see --help)", "--json=yes", "list")
+        self.assert_wrong("--root is given twice (see --help)", "--root", self.scratch, "list")
+        for option in ("--home", "--resources"):
+            self.assert_wrong(f"{option} needs a value (see --help)", "list", option)
+            self.assert_wrong(f"{option} needs a value (see --help)", "list", f"{option}=")
+            self.assert_wrong(f"{option} needs a value (see --help)", option, "--json", "list")
+
+    def test_of_commands(self):
+        self.assert_wrong("no command is given (see --help)")
+        self.assert_wrong("unknown command: lst (see --help)", "lst")
+        self.assert_wrong("usage: accountctl list", "list", "M1")
+        self.assert_wrong("usage: accountctl show ID", "show")
+        self.assert_wrong("usage: accountctl enable ID DATACLASS", "enable", "M1")
+        self.assert_wrong("usage: accountctl rename ID NAME", "rename", "M1", "New", "name")
+        self.assert_wrong("usage: accountctl add TYPE CLASS [KEY=VALUE]...", "add", "Mail")
+
+    def test_of_data_classes(self):
+        self.assert_wrong("unknown data class: mail", "enable", "M1", "mail")
+        self.assert_wrong("accounts of the type Mail do not support Contacts", "enable", "M1", "Contacts")
+        self.assert_wrong("accounts of the type Mail do not support Contacts", "disable", "M1", "Contacts")
+
+    def test_of_names(self):
+        self.assert_wrong("an account's name cannot be empty", "rename", "M1", "")
+        self.put(changed(DIRECTORY, Type="OnMyDevice", Class="DeviceLocalAccount"))
+        self.assert_wrong("the device's own account has a fixed name", "rename", "L1", "Mine")
+
+    def test_of_new_accounts(self):
+        self.assert_wrong("unknown account type: Post", "add", "Post", "IMAPAccount")
+        self.assert_wrong("an account needs a class", "add", "Mail", "")
+        for taken in ("M1", "C1"):
+            message = f"there is an account with the identifier {taken}"
+            self.assert_wrong(message, "add", "Mail", "IMAPAccount", f"Identifier={taken}")
+
+    def test_of_properties(self):
+        def assert_wrong(message, word):
+            self.assert_wrong(f"property 2 {message}", "add", "Mail", "IMAPAccount", "Username=ines", word)
+
+        assert_wrong("is not written KEY=VALUE or KEY:=JSON", "Hostname")
+        assert_wrong("has no key", "=value")
+        assert_wrong("has no key", ":=1")
+        assert_wrong("is no valid JSON after :=", "Port:=many")
+        assert_wrong("is no valid JSON after :=", "Port:=")
+        assert_wrong("holds null, which is no value", "Port:=[1, null]")
+        assert_wrong("sets Type, which stands before the properties", "Type=LDAP")
+        assert_wrong("sets Class, which stands before the properties", "Class=LDAPAccount")
+        assert_wrong("is no identifier", "Identifier=")
+        assert_wrong("is no identifier", "Identifier:=7")
+
+    def test_of_words_that_are_no_text(self):
+        before = self.standing()
+        words = [b"rename", b"M1", NOT_UTF8]
+        run = subprocess.run([ACCOUNTCTL, b"--root", self.tree.root, *words], capture_output=True, check=False)
+        self.assertEqual((WRONG_USE, b"accountctl: argument 2 of rename is not UTF-8 (see --help)\n"),
+                         (run.returncode, run.stderr))
+        self.assert_unchanged(before)
+
+    def test_of_a_root_that_is_no_directory(self):
+        run = run_host(ACCOUNTCTL, "--root", self.scratch / "nowhere", "list")
+        message = f"accountctl: --root is no directory: {self.scratch}/nowhere (see --help)"
+        self.assertEqual((WRONG_USE, [], [message]), (run.status, run.output, run.errors))
+
+
+class UnknownAccounts(AccountctlTest):
+    def test_are_told_apart_from_wrong_use(self):
+        self.put(HOME_MAIL, CLOUD)
+        for words in (["show"], ["enable", "Mail"], ["disable", "Mail"], ["rename", "Work"], ["remove"]):
+            with self.subTest(words=words):
+                command, *rest = words
+                self.assert_refused(NO_ACCOUNT, "no account has the identifier M7", command, "M7", *rest)
+
+    def test_with_marks_that_steer_a_terminal_are_named_without_them(self):
+        self.assert_refused(NO_ACCOUNT, "no account has the identifier a\ufffd[2Jb", "show", "a\x1b[2Jb")
+
+
+class AccountsThatCannotBeRead(AccountctlTest):
+    def assert_left_alone(self):
+        for words in (["list"], ["show", "M1"], *CHANGES):
+            with self.subTest(words=words):
+                message = f"the account settings cannot be read: {self.tree.path(SETTINGS)}"
+                self.assert_refused(FAILED, message, *words)
+
+    def test_because_they_are_no_property_list(self):
+        self.tree.write(SETTINGS, "bplist00 but no more")
+        self.assert_left_alone()
+
+    def test_because_they_are_an_array(self):
+        self.tree.write_plist(SETTINGS, [HOME_MAIL])
+        self.assert_left_alone()
+
+    def test_because_they_are_a_directory(self):
+        self.tree.path(SETTINGS).mkdir()
+        self.assert_left_alone()
+
+
+class AccountsOfAnEarlierRelease(AccountctlTest):
+    def test_are_not_changed_before_they_are_migrated(self):
+        self.put(HOME_MAIL, version=11)
+        for words in CHANGES:
+            with self.subTest(words=words):
+                self.assert_refused(
+                    FAILED, "the account settings have data version 11 and must be migrated before they are changed",
+                    *words,
+                )
+
+
+class FailedSaves(AccountctlTest):
+    NO_OWNER = "Could not set attributes on the temporary account settings plist. "
+
+    def setUp(self):
+        super().setUp()
+        self.put(HOME_MAIL, CLOUD)
+
+    def assert_not_saved(self, cause, **more):
+        for words in CHANGES:
+            with self.subTest(words=words):
+                before = self.standing()
+                run = self.accountctl(*words, **more)
+                self.assertEqual((FAILED, [], 1), (run.status, run.output, len(run.errors)), run.errors)
+                self.assertRegex(
+                    run.errors[0], f"^accountctl: the accounts could not be saved to {self.tree.path(SETTINGS)}{cause}$"
+                )
+                self.assert_unchanged(before)
+
+    def test_for_want_of_a_mobile_user_say_so(self):
+        self.tree.write("etc/passwd", "")
+        self.assert_not_saved(f": {self.NO_OWNER}.+")
+
+    def test_where_the_directory_may_not_be_written(self):
+        directory = self.tree.path(SETTINGS).parent
+        directory.chmod(0o555)
+        self.addCleanup(directory.chmod, 0o755)
+        self.assert_not_saved("", prepare=without_capabilities(CAP_DAC_OVERRIDE))
+
+    def test_where_the_temporary_directory_is_on_another_volume(self):
+        if SHARED_MEMORY.stat().st_dev == self.scratch.stat().st_dev:
+            self.skipTest(f"{SHARED_MEMORY} is no volume of its own here")
+        with tempfile.TemporaryDirectory(dir=SHARED_MEMORY) as elsewhere:
+            self.assert_not_saved("", environment={"TMPDIR": elsewhere})
+            self.assertEqual([], os.listdir(elsewhere))
+
+
+class FaultyInstallations(AccountctlTest):
+    def test_without_the_configuration_of_types(self):
+        self.put(HOME_MAIL)
+        empty = self.scratch / "empty"
+        empty.mkdir()
+        for words in (["list"], ["types"], *CHANGES):
+            with self.subTest(words=words):
+                self.assert_refused(
+                    FAULTY_INSTALLATION,
+                    "Assertion failure in +[BasicAccount initialize], BasicAccount:"
+                    " Could not find AccountTypesProperties.plist",
+                    "--resources", empty, *words,
+                )
+
+
+class Output(AccountctlTest):
+    def test_that_cannot_be_written_is_a_failure(self):
+        with open("/dev/full", "wb") as full:
+            run = subprocess.run([ACCOUNTCTL, "types"], stdout=full, stderr=subprocess.PIPE, check=False)
+        self.assertEqual((FAILED, b"accountctl: the output could not be written\n"), (run.returncode, run.stderr))
+
+    def test_that_nobody_reads_does_not_undo_a_change(self):
+        self.put(HOME_MAIL)
+        reader, writer = os.pipe()
+        os.close(reader)
+        words = ["--root", self.tree.root, "--json", "rename", "M1", "Work"]
+        run = subprocess.run([ACCOUNTCTL, *words], stdout=writer, stderr=subprocess.PIPE, check=False)
+        os.close(writer)
+        self.assertEqual((FAILED, "Work"), (run.returncode, self.accounts()[0]["DisplayName"]))
+
+
+class Help(AccountctlTest):
+    def test_names_every_command_and_every_option(self):
+        text = "\n".join(self.done("--help"))
+        for name in ("list", "show ID", "types", "enable ID", "disable ID", "rename ID", "add TYPE", "remove ID", "save",
+                     "--root", "--home", "--resources", "--modules", "--json", "--version", "Exit status"):
+            self.assertIn(name, text)
+
+    def test_fits_a_terminal(self):
+        self.assertLessEqual(max(map(len, self.done("--help"))), 80)
+
+    def test_version(self):
+        self.assertRegex(self.done("--version")[0], r"^accountctl \d+\.\d+\.\d+$")
+
+
+if __name__ == "__main__":
+    unittest.main()
