@@ -77,6 +77,14 @@ class TwoAndAnEditor(AtOnce):
         self.assert_done(first)
         self.assertEqual("First", self.accounts()[0]["DisplayName"])
 
+    def test_are_left_with_the_accounts_that_the_one_who_saves_last_knows(self):
+        first, gate = self.start_and_hold("rename", "M1", "Work")
+        self.done("remove", "L1")
+        self.done("add", "LDAP", "LDAPAccount", "Identifier=L2")
+        os.close(gate)
+        self.assert_done(first)
+        self.assertEqual([changed(HOME_MAIL, DisplayName="Work"), CLOUD, DIRECTORY], self.accounts())
+
 
 class ARunningMigration(AtOnce):
     def test_is_waited_for_before_the_accounts_are_read(self):
