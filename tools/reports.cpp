@@ -1,7 +1,7 @@
+#include <exception>
 #include <nlohmann/json.hpp>
 #include <optional>
 
-#include "accountsettings/assertion_failure.h"
 #include "accountsettings/service_objects.h"
 #include "tools/account_view.h"
 #include "tools/commands.h"
@@ -40,7 +40,7 @@ std::optional<ServiceAddress> serviceOf(const Session& session, BasicAccount& ac
     const auto full = account.fullAccountUsingLoader(nullptr);
     const auto* const service = dynamic_cast<const ServiceAccountObject*>(full.get());
     return service == nullptr ? std::nullopt : service->service();
-  } catch (const accountsettings::AssertionFailure&) {
+  } catch (const std::exception&) {
     return std::nullopt;
   }
 }

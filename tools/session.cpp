@@ -1,10 +1,11 @@
 #include "tools/session.h"
 
 #include <algorithm>
+#include <exception>
+#include <new>
 #include <optional>
 #include <utility>
 
-#include "accountsettings/assertion_failure.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/temporary_directory.h"
 #include "tools/failure.h"
@@ -99,7 +100,9 @@ void Session::keepChanges(const Account& account) {
 void Session::save() {
   try {
     accounts().saveAllAccounts();
-  } catch (const accountsettings::AssertionFailure& failure) {
+  } catch (const std::bad_alloc&) {
+    throw;  // before the file was written or after it
+  } catch (const std::exception& failure) {
     throw Failure{ExitStatus::faultyInstallation,
                   "the accounts were saved, but not announced: " + std::string{failure.what()}};
   }

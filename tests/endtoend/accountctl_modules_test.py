@@ -40,13 +40,16 @@ class Notifiers(AccountctlTest):
         self.assertEqual([], self.told())
         self.assertEqual([MAIL], self.accounts()[0]["Enabled Dataclasses"])
 
-    def assert_answers(self, notifier, message, words=("disable", "M1", "Notes"), saved=True):
-        run = self.edit(*words, notifier=notifier)
+    def assert_answers(self, notifier, message, saved=True):
+        run = self.edit("disable", "M1", "Notes", notifier=notifier)
         self.assertEqual((FAULTY_INSTALLATION, [], [f"accountctl: {message}"]), (run.status, run.output, run.errors))
         self.assertEqual([MAIL] if saved else [MAIL, NOTES], self.accounts()[0]["Enabled Dataclasses"])
 
     def test_that_throw_before_a_change_prevent_it(self):
         self.assert_answers("ThrowsBefore", "nothing was changed: no pen at hand", saved=False)
+
+    def test_that_throw_at_a_save_do_not_undo_it(self):
+        self.assert_answers("ThrowsAtSave", "the accounts were saved, but not announced: no pen at hand")
 
     def test_that_throw_after_a_change_do_not_undo_it(self):
         self.assert_answers("ThrowsAfter", "the accounts were saved, but not announced: no pen at hand")

@@ -50,16 +50,30 @@ std::shared_ptr<const AccountClassInfo> gated() {
   return info;
 }
 
-std::shared_ptr<const AccountClassInfo> throwing(bool before) {
-  auto info = journalist(before ? "ThrowsBefore" : "ThrowsAfter");
-  const auto fail = [](std::string_view, std::string_view) { throw std::runtime_error{"no pen at hand"}; };
-  (before ? info->accountWillChange_forDataclass : info->accountDidChange_forDataclass) = fail;
+[[noreturn]] void fail() { throw std::runtime_error{"no pen at hand"}; }
+
+std::shared_ptr<const AccountClassInfo> throwingBefore() {
+  auto info = journalist("ThrowsBefore");
+  info->accountWillChange_forDataclass = [](std::string_view, std::string_view) { fail(); };
+  return info;
+}
+
+std::shared_ptr<const AccountClassInfo> throwingAtSave() {
+  auto info = journalist("ThrowsAtSave");
+  info->noteAccountChanges = [](const std::vector<platform::Dictionary>&) { fail(); };
+  return info;
+}
+
+std::shared_ptr<const AccountClassInfo> throwingAfter() {
+  auto info = journalist("ThrowsAfter");
+  info->accountDidChange_forDataclass = [](std::string_view, std::string_view) { fail(); };
   return info;
 }
 
 const platform::ClassRegistration gatedNotifier{gated()};
-const platform::ClassRegistration throwsBefore{throwing(true)};
-const platform::ClassRegistration throwsAfter{throwing(false)};
+const platform::ClassRegistration throwsBefore{throwingBefore()};
+const platform::ClassRegistration throwsAtSave{throwingAtSave()};
+const platform::ClassRegistration throwsAfter{throwingAfter()};
 const platform::ClassRegistration deafNotifier{std::make_shared<const AccountClassInfo>("DeafNotifier")};
 
 }  // namespace
