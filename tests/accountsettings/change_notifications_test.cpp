@@ -1,0 +1,401 @@
+#include <gmock/gmock.h>
+
+#include <map>
+
+#include "accountsettings/assertion_failure.h"
+#include "tests/support/account_store.h"
+
+namespace tests {
+namespace {
+
+using accountsettings::AccountClassInfo;
+using accountsettings::AssertionFailure;
+using accountsettings::ChangeType;
+using testing::ElementsAre;
+using testing::IsEmpty;
+using testing::SizeIs;
+using testing::UnorderedElementsAre;
+using Changes = std::vector<Dictionary>;
+using Names = std::vector<std::string>;
+
+constexpr const char* kMail = "com.vorlix.Dataclass.Mail";
+constexpr const char* kCalendars = "com.vorlix.Dataclass.Calendars";
+constexpr const char* kNotes = "com.vorlix.Dataclass.Notes";
+
+// A device with one notifier for each of three data classes and one for two of them, for Exchange accounts.
+class ChangeNotifications : public AccountStore {
+ protected:
+  ChangeNotifications() {
+    putNotifiers("Exchange", {notifier("MailNotifier", {kMail}), notifier("CalendarsNotifier", {kCalendars}),
+                              notifier("NotesNotifier", {kNotes}), notifier("BothNotifier", {kMail, kCalendars})});
+    for (const char* const name : {"MailNotifier", "CalendarsNotifier", "NotesNotifier", "BothNotifier"}) listen(name);
+  }
+
+  static Dictionary notifier(std::string_view className, Array dataclasses) {
+    return {{"Type", "NotifierAccount"},
+            {"Description", Dictionary{{"Framework", "Modules/Test"},
+                                       {"Class", className},
+                                       {"Supported Dataclasses", std::move(dataclasses)}}}};
+  }
+  void putNotifiers(std::string_view type, const Array& entries) {
+    device.put("/resources/AccountCreators.plist", Dictionary{{type, entries}});
+  }
+  void listen(const std::string& name) {
+    auto info = std::make_shared<AccountClassInfo>(name);
+    info->noteAccountChanges = [this, name](const Changes& changes) {
+      EXPECT_EQ(heard.count(name), 0U) << "one call for each notifier and save";
+      heard[name] = changes;
+    };
+    _classes.push_back(std::make_unique<platform::ClassRegistration>(std::move(info)));
+  }
+
+  static Dictionary exchange(std::string_view identifier, Array dataclasses,
+                             std::initializer_list<Dictionary::Entry> more = {}) {
+    Dictionary dictionary = properties(identifier, more, "Exchange");
+    dictionary.set("Enabled Dataclasses", std::move(dataclasses));
+    return dictionary;
+  }
+  static Account made(const Dictionary& dictionary) {
+    return accountsettings::BasicAccount::initWithProperties(dictionary);
+  }
+  static Dictionary entry(int change, std::string_view identifier, Array original) {
+    return {{"ChangeType", change},
+            {"AccountID", identifier},
+            {"AccountType", "Exchange"},
+            {"OriginalDataclasses", std::move(original)}};
+  }
+
+  void save(const Store& store) {
+    heard.clear();
+    store->saveAllAccounts();
+  }
+  [[nodiscard]] Names whoHeard() const {
+    Names names;
+    for (const auto& [name, changes] : heard) names.push_back(name);
+    return names;
+  }
+  // Saves the account with the edit and answers who heard of it.
+  Names whoHearsOf(const Dictionary& loaded, const std::function<void(accountsettings::BasicAccount&)>& edit) {
+    const Store store = load({loaded});
+    edit(*store->allBasicAccounts()[0]);
+    save(store);
+    return whoHeard();
+  }
+
+  std::map<std::string, Changes> heard;  // by notifier, of the last save
+
+ private:
+  std::vector<std::unique_ptr<platform::ClassRegistration>> _classes;
+};
+
+TEST_F(ChangeNotifications, TellOfAnAddedAccountToTheNotifiersOfItsDataClasses) {
+  const Store store = load({});
+  store->insertAccount(made(exchange("a", {kMail, kCalendars})));
+  save(store);
+  EXPECT_THAT(whoHeard(), UnorderedElementsAre("MailNotifier", "CalendarsNotifier", "BothNotifier"));
+  for (const auto& [name, changes] : heard) EXPECT_THAT(changes, ElementsAre(entry(0, "a", {})));
+}
+
+TEST_F(ChangeNotifications, TellOfADataClassSwitchedOffToItsNotifiersOnly) {
+  const Store store = load({exchange("a", {kMail, kNotes})});
+  store->allBasicAccounts()[0]->setEnabled_forDataclass(false, kNotes);
+  save(store);
+  EXPECT_THAT(whoHeard(), ElementsAre("NotesNotifier"));
+  EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(1, "a", {kMail, kNotes})));
+}
+
+TEST_F(ChangeNotifications, TellOfADataClassSwitchedOnToItsNotifiersOnly) {
+  EXPECT_THAT(whoHearsOf(exchange("a", {kMail}), [](auto& account) { account.setEnabled_forDataclass(true, kNotes); }),
+              ElementsAre("NotesNotifier"));
+}
+
+TEST_F(ChangeNotifications, TellOfAnyOtherSettingToTheNotifiersOfAllEnabledDataClasses) {
+  EXPECT_THAT(whoHearsOf(exchange("a", {kCalendars, kNotes}), [](auto& account) { account.setDisplayName("Home"); }),
+              UnorderedElementsAre("CalendarsNotifier", "BothNotifier", "NotesNotifier"));
+}
+
+TEST_F(ChangeNotifications, TellEachNotifierOnceHoweverManyDataClassesConcernIt) {
+  const Store store = load({exchange("a", {kMail, kCalendars})});
+  store->allBasicAccounts()[0]->setDisplayName("Home");
+  save(store);
+  EXPECT_THAT(heard["BothNotifier"], SizeIs(1));
+}
+
+TEST_F(ChangeNotifications, SayNothingOfChildrenAndOfTheSwitchOfTheMailApplication) {
+  EXPECT_THAT(whoHearsOf(exchange("a", {kMail}, {{"IsActive", true}}),
+                         [](auto& account) {
+                           account.setAccountProperty_forKey(false, "IsActive");
+                           account.setAccountProperty_forKey(Array{properties("c")}, "ChildAccounts");
+                         }),
+              IsEmpty());
+}
+
+TEST_F(ChangeNotifications, SayNothingOfAnUnchangedAccount) {
+  EXPECT_THAT(whoHearsOf(exchange("a", {kMail}), [](auto&) {}), IsEmpty());
+}
+
+TEST_F(ChangeNotifications, SayNothingOfOtherSettingsWhereNoDataClassIsEnabled) {
+  EXPECT_THAT(whoHearsOf(exchange("a", {}), [](auto& account) { account.setDisplayName("Home"); }), IsEmpty());
+}
+
+TEST_F(ChangeNotifications, TellOfTheLastDataClassSwitchedOffToItsNotifiersOnly) {
+  EXPECT_THAT(whoHearsOf(exchange("a", {kNotes}),
+                         [](auto& account) {
+                           account.removeAccountPropertyForKey("Enabled Dataclasses");
+                           account.setDisplayName("Home");
+                         }),
+              ElementsAre("NotesNotifier"));
+}
+
+TEST_F(ChangeNotifications, TakeElementsThatAreNoTextForNoDataClasses) {
+  EXPECT_THAT(whoHearsOf(exchange("a", {5, kNotes}), [](auto& account) { account.setDisplayName("Home"); }),
+              ElementsAre("NotesNotifier"));
+  EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(1, "a", {5, kNotes})));
+}
+
+TEST_F(ChangeNotifications, TellOfARemovedAccountByWhatItWas) {
+  const Store store = load({exchange("a", {kMail}), exchange("b", {kNotes})});
+  store->deleteAccountWithIdentifier("b");
+  save(store);
+  EXPECT_THAT(whoHeard(), ElementsAre("NotesNotifier"));
+  EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(2, "b", {kNotes})));
+}
+
+TEST_F(ChangeNotifications, TellOfRemovalsFirstThenOfAdditionsThenOfTheRest) {
+  const Store store = load({exchange("kept", {kNotes}), exchange("removed", {kNotes})});
+  store->allBasicAccounts()[0]->setDisplayName("Home");
+  store->deleteAccountWithIdentifier("removed");
+  store->insertAccount(made(exchange("added", {kNotes})));
+  save(store);
+  EXPECT_THAT(heard["NotesNotifier"],
+              ElementsAre(entry(2, "removed", {kNotes}), entry(0, "added", {}), entry(1, "kept", {kNotes})));
+}
+
+TEST_F(ChangeNotifications, TellOfAReplacedAccountsRemovalOnly) {
+  const Store store = load({exchange("old", {kNotes})});
+  store->replaceAccount_withAccount(store->allBasicAccounts()[0], made(exchange("new", {kNotes})));
+  save(store);
+  EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(2, "old", {kNotes})));
+}
+
+TEST_F(ChangeNotifications, DescribeOnlyWhatChangedSinceTheLastSave) {
+  const Store store = load({exchange("a", {kNotes})});
+  store->allBasicAccounts()[0]->setDisplayName("Home");
+  save(store);
+  EXPECT_THAT(whoHeard(), ElementsAre("NotesNotifier"));
+  save(store);
+  EXPECT_THAT(whoHeard(), IsEmpty());
+}
+
+TEST_F(ChangeNotifications, TellAfterTheyWereSwitchedOffOfEverythingSinceTheyLastWent) {
+  const Store store = load({exchange("a", {kNotes})});
+  AccountsManager::_setShouldSkipNotifications(true);
+  store->deleteAccountWithIdentifier("a");
+  save(store);
+  EXPECT_THAT(whoHeard(), IsEmpty());
+  AccountsManager::_setShouldSkipNotifications(false);
+  save(store);
+  EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(2, "a", {kNotes})));
+}
+
+TEST_F(ChangeNotifications, AreNotSkippedToBeginWith) { EXPECT_FALSE(AccountsManager::_shouldSkipNotifications()); }
+
+TEST_F(ChangeNotifications, TellAfterAFailedSaveOfItsChangesWithTheNext) {
+  const Store store = load({exchange("a", {kNotes})});
+  store->allBasicAccounts()[0]->setDisplayName("Home");
+  device.files->failing = {"rename"};
+  save(store);
+  EXPECT_THAT(whoHeard(), IsEmpty());
+  device.files->failing.clear();
+  save(store);
+  EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(1, "a", {kNotes})));
+}
+
+TEST_F(ChangeNotifications, YieldNothingForATypeWithoutNotifiers) {
+  putNotifiers("CalDAV", {Dictionary{{"Type", "FullAccount"}}, "no dictionary"});
+  const Store store = load({});
+  store->insertAccount(account("a", {{"Enabled Dataclasses", Array{kCalendars}}}));
+  save(store);
+  EXPECT_THAT(whoHeard(), IsEmpty());
+  EXPECT_TRUE(device.modules->opened.empty());
+}
+
+// One account's entries, by the data classes that each combination concerns.
+class ChangeEntries : public ChangeNotifications {
+ protected:
+  static AccountsManager::NotificationTable tableOf(ChangeType change, const Dictionary* original,
+                                                    const Dictionary* current) {
+    AccountsManager::NotificationTable table;
+    AccountsManager::initWithAccounsInfoArray({})
+        ->_addNotificationToDictionary_forChangeType_originalProperties_currentProperties(table, change, original,
+                                                                                          current);
+    return table;
+  }
+  static Names keysOf(const Dictionary& dictionary) {
+    Names keys;
+    for (const auto& each : dictionary) keys.push_back(each.key.string());
+    return keys;
+  }
+};
+
+TEST_F(ChangeEntries, NameTheChangeTheAccountItsTypeAndItsFormerDataClasses) {
+  const Dictionary original = exchange("a", {kNotes});
+  const Dictionary changed = exchange("a", {kNotes}, {{"Port", 1}});
+  const auto table = tableOf(ChangeType::present, &original, &changed);
+  ASSERT_NE(table.find("NotesNotifier"), nullptr);
+  EXPECT_THAT(keysOf(table.find("NotesNotifier")->front()),
+              ElementsAre("ChangeType", "AccountID", "AccountType", "OriginalDataclasses"));
+}
+
+TEST_F(ChangeEntries, TakeIdentifierAndTypeFromTheOriginalWhereTheAccountHasLostThem) {
+  const Dictionary original = exchange("a", {kNotes});
+  const Dictionary current{{"Enabled Dataclasses", Array{kNotes}}};
+  const auto table = tableOf(ChangeType::present, &original, &current);
+  EXPECT_THAT(*table.find("NotesNotifier"), ElementsAre(entry(1, "a", {kNotes})));
+}
+
+TEST_F(ChangeEntries, EndAtTheFirstValueThatIsMissing) {
+  const Dictionary nameless{{"Type", "Exchange"}, {"Enabled Dataclasses", Array{kNotes}}};
+  EXPECT_THAT(*tableOf(ChangeType::added, nullptr, &nameless).find("NotesNotifier"),
+              ElementsAre(Dictionary{{"ChangeType", 0}}));
+}
+
+TEST_F(ChangeEntries, EndBeforeATypeThatIsMissing) {
+  putNotifiers("", {notifier("NotesNotifier", {kNotes})});  // only so that anybody is asked
+  const Dictionary typeless{{"Identifier", "a"}, {"Enabled Dataclasses", Array{kNotes}}};
+  EXPECT_THAT(*tableOf(ChangeType::added, nullptr, &typeless).find("NotesNotifier"),
+              ElementsAre(Dictionary{{"ChangeType", 0}, {"AccountID", "a"}}));
+}
+
+TEST_F(ChangeEntries, AreAppendedToWhatTheTableHolds) {
+  const Dictionary account = exchange("a", {kNotes});
+  auto table = tableOf(ChangeType::added, nullptr, &account);
+  AccountsManager::initWithAccounsInfoArray({})
+      ->_addNotificationToDictionary_forChangeType_originalProperties_currentProperties(table, ChangeType::removed,
+                                                                                        &account, nullptr);
+  EXPECT_THAT(*table.find("NotesNotifier"), ElementsAre(entry(0, "a", {}), entry(2, "a", {kNotes})));
+}
+
+// What is wrong with a notifier is said by the name of the operation that found it.
+class FaultsOfNotifiers : public ChangeNotifications {
+ protected:
+  static std::string failureOf(const std::function<void()>& call) {
+    try {
+      call();
+    } catch (const AssertionFailure& failure) {
+      EXPECT_EQ(failure.file(), "AccountsManager");
+      return failure.method() + ": " + failure.message();
+    }
+    return "no failure";
+  }
+  std::string failureOfSave() {
+    const Store store = load({exchange("a", {kMail})});
+    store->allBasicAccounts()[0]->setDisplayName("Home");
+    return failureOf([&] { store->saveAllAccounts(); });
+  }
+  static std::string failureOfSearch() {
+    return failureOf([] { (void)AccountsManager::_notifierClassNamesForAccountType_dataclass("Exchange", kMail); });
+  }
+  static constexpr const char* kFind = "+[AccountsManager _notifierClassNamesForAccountType:dataclass:]: ";
+};
+
+TEST_F(FaultsOfNotifiers, IncludeATypeThatTheConfigurationDoesNotKnow) {
+  putNotifiers("CalDAV", {});
+  EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the "
+                                                   "information for the type Exchange"});
+}
+
+TEST_F(FaultsOfNotifiers, IncludeAConfigurationThatCannotBeRead) {
+  device.files->nodes.erase("/resources/AccountCreators.plist");
+  EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the "
+                                                   "information for the type Exchange"});
+}
+
+TEST_F(FaultsOfNotifiers, IncludeAMissingFramework) {
+  putNotifiers("Exchange",
+               {Dictionary{{"Type", "NotifierAccount"},
+                           {"Description", Dictionary{{"Class", "X"}, {"Supported Dataclasses", Array{kMail}}}}}});
+  EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the path to "
+                                                   "the framework for the notifier with type Exchange"});
+}
+
+TEST_F(FaultsOfNotifiers, IncludeAModuleThatCannotBeOpened) {
+  device.directories->root = "/images/device";
+  device.modules->errors = {{"/images/device/Modules/Test", "out of symbols"}};
+  EXPECT_EQ(failureOfSearch(), kFind + std::string{"Could not load the account creator framework "
+                                                   "/images/device/Modules/Test. Error out of symbols"});
+}
+
+TEST_F(FaultsOfNotifiers, IncludeAMissingOrEmptyClassName) {
+  Dictionary description{{"Framework", "/Modules/Test"}, {"Supported Dataclasses", Array{kMail}}};
+  for (int round = 0; round < 2; ++round) {
+    const Array entries{Dictionary{{"Type", "NotifierAccount"}, {"Description", description}}};
+    putNotifiers("Exchange", entries);
+    EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the name "
+                                                     "of the class for notificatinos with the type Exchange"});
+    description.set("Class", "");
+  }
+}
+
+TEST_F(FaultsOfNotifiers, IncludeAClassThatNoModuleDefines) {
+  putNotifiers("Exchange", {notifier("Nobody", {kMail})});
+  EXPECT_EQ(failureOfSave(),
+            "-[AccountsManager _sendNotificationsForChangedAccounts]: Could not find a class for "
+            "class name Nobody");
+  const Account account = made(exchange("a", {kMail}));
+  EXPECT_EQ(failureOf([&] { AccountsManager::accountWillChange_forDataclass(*account, kMail); }),
+            "+[AccountsManager accountWillChange:forDataclass:]: Could not find a class for class name Nobody");
+  EXPECT_EQ(failureOf([&] { AccountsManager::accountDidChange_forDataclass(*account, kMail); }),
+            "+[AccountsManager accountDidChange:forDataclass:]: Could not find a class for class name Nobody");
+}
+
+TEST_F(FaultsOfNotifiers, IncludeAClassThatIsNoAccountClass) {
+  const platform::ClassRegistration other{std::make_shared<platform::ClassInfo>("OtherKind")};
+  putNotifiers("Exchange", {notifier("OtherKind", {kMail})});
+  EXPECT_EQ(failureOfSave(),
+            "-[AccountsManager _sendNotificationsForChangedAccounts]: Could not find a class for "
+            "class name OtherKind");
+}
+
+TEST_F(FaultsOfNotifiers, IncludeNotListeningToSaves) {
+  const platform::ClassRegistration deaf{std::make_shared<AccountClassInfo>("DeafNotifier")};
+  putNotifiers("Exchange", {notifier("DeafNotifier", {kMail})});
+  EXPECT_EQ(failureOfSave(),
+            "-[AccountsManager _sendNotificationsForChangedAccounts]: The notifier DeafNotifier does "
+            "not answer noteAccountChanges:");
+}
+
+TEST_F(FaultsOfNotifiers, DoNotIncludeNotListeningToSingleChanges) {
+  const Account account = made(exchange("a", {kMail}));
+  EXPECT_EQ(failureOf([&] { AccountsManager::accountWillChange_forDataclass(*account, kMail); }), "no failure");
+  EXPECT_EQ(failureOf([&] { AccountsManager::accountDidChange_forDataclass(*account, kMail); }), "no failure");
+}
+
+TEST_F(ChangeNotifications, FindNotifiersInTheOrderOfTheConfigurationAndOpenTheirModulesEachTime) {
+  const auto find = [] { return AccountsManager::_notifierClassNamesForAccountType_dataclass("Exchange", kCalendars); };
+  EXPECT_THAT(find(), ElementsAre("CalendarsNotifier", "BothNotifier"));
+  EXPECT_THAT(find(), ElementsAre("CalendarsNotifier", "BothNotifier"));
+  EXPECT_EQ(device.modules->opened, Names(4, "/Modules/Test"));
+}
+
+TEST_F(ChangeNotifications, TellOfASingleChangeBeforeAndAfterIt) {
+  Names told;
+  auto listener = std::make_shared<AccountClassInfo>("Listener");
+  const auto telling = [&told](const char* when) {
+    return [&told, when](std::string_view identifier, std::string_view dataclass) {
+      told.push_back(when + std::string{identifier} + " " + std::string{dataclass});
+    };
+  };
+  listener->accountWillChange_forDataclass = telling("will ");
+  listener->accountDidChange_forDataclass = telling("did ");
+  const platform::ClassRegistration registration{std::move(listener)};
+  putNotifiers("Exchange", {notifier("Listener", {kMail})});
+  const Account account = made(exchange("a", {kMail}));
+  AccountsManager::accountWillChange_forDataclass(*account, kMail);
+  AccountsManager::accountDidChange_forDataclass(*account, kMail);
+  AccountsManager::accountWillChange_forDataclass(*account, kNotes);
+  EXPECT_THAT(told, ElementsAre("will a com.vorlix.Dataclass.Mail", "did a com.vorlix.Dataclass.Mail"));
+}
+
+}  // namespace
+}  // namespace tests
