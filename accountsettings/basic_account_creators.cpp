@@ -2,6 +2,7 @@
 
 #include "accountsettings/assertion_failure.h"
 #include "accountsettings/basic_account.h"
+#include "accountsettings/file_paths.h"
 #include "accountsettings/log_handle.h"
 #include "platform/platform.h"
 
@@ -66,12 +67,6 @@ const Text& classNameIn(const Dictionary& description, const Search& search) {
         search.creatorType, search.type);
   }
   return *name;
-}
-
-// Paths in the configuration are relative to the system root, with or without a slash at their front.
-std::string modulePath(const Text& framework) {
-  const platform::Path relative = platform::Path{framework.string()}.relative_path();
-  return (platform::current().directories->systemRoot() / relative).string();
 }
 
 bool isASCII(std::string_view text) {

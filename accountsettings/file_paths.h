@@ -19,7 +19,8 @@ inline constexpr StringConstant kMigrationLockName{"AccountMigrationInProgress"}
 [[nodiscard]] ACCOUNT_EXPORT platform::Path removalSentinelPath();
 // The mail application's mark that it may fetch by itself; it goes when the accounts have been migrated.
 [[nodiscard]] ACCOUNT_EXPORT platform::Path mailAutoFetchMarkerPath();
-// A loadable module that the configuration names by its path on the device.
+// A loadable module, by the path that the configuration names it by: relative to the system root, with or without a
+// slash at its front.
 [[nodiscard]] ACCOUNT_EXPORT std::string modulePath(const platform::Text& framework);
 
 }  // namespace accountsettings

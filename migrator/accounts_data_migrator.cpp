@@ -5,6 +5,7 @@
 #include <tuple>
 #include <utility>
 
+#include "accountsettings/file_paths.h"
 #include "accountsettings/product_values.h"
 #include "migrator/stage.h"
 #include "platform/class_registry.h"
@@ -119,7 +120,7 @@ void writeReport(AccountsDataMigrator& migrator) {
 
 void tellMailApplication() {
   const platform::Platform& services = platform::current();
-  std::ignore = services.files->remove(services.directories->mailData() / "AutoFetchEnabled");
+  std::ignore = services.files->remove(accountsettings::mailAutoFetchMarkerPath());
   services.preferencesChanged->post(accountsettings::kMailPreferencesDomain,
                                     accountsettings::kMailPreferencesAccountsKey);
 }

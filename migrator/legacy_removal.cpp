@@ -1,6 +1,7 @@
 #include <span>
 #include <tuple>
 
+#include "accountsettings/file_paths.h"
 #include "migrator/accounts_data_migrator.h"
 #include "platform/message.h"
 #include "platform/platform.h"
@@ -38,7 +39,7 @@ Report failuresIf(bool found) { return found ? Report::failures : Report::nothin
 }  // namespace
 
 std::string AccountsDataMigrator::_absolutePathToOldAccountsInfoRemovalSentinel() {
-  return platform::current().directories->home() / "Library/Preferences/.removingOldAccounts";
+  return accountsettings::removalSentinelPath();
 }
 
 bool AccountsDataMigrator::_failedToRemoveOldAccountsInfo() {

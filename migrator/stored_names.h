@@ -1,5 +1,6 @@
 #pragma once
 
+#include "accountsettings/product_values.h"
 #include "platform/text.h"
 
 // Names that earlier releases and other programs put into account records, beside the library's own vocabulary. Like
@@ -20,7 +21,7 @@ inline constexpr StringConstant kCloudAccountClass{"KQAccount"};       // the ve
 inline constexpr StringConstant kCalDAVAccountClass{"MobileCalDAVAccount"};
 
 // Keys of an account.
-inline constexpr StringConstant kIsActiveKey{"IsActive"};              // boolean of mail accounts
+inline constexpr StringConstant kIsActiveKey = accountsettings::kMailAccountIsActiveKey;  // boolean of mail accounts
 inline constexpr StringConstant kUniqueIdKey{"uniqueId"};              // text: the identifier of the earliest releases
 inline constexpr StringConstant kPrimaryAccountKey{"primaryAccount"};  // boolean of cloud accounts
 inline constexpr StringConstant kCalDAVEnabledKey{"CalDAVEnabled"};    // boolean

@@ -13,7 +13,6 @@ using accountsettings::AssertionFailure;
 using accountsettings::ChangeType;
 using testing::ElementsAre;
 using testing::IsEmpty;
-using testing::SizeIs;
 using testing::UnorderedElementsAre;
 using Changes = std::vector<Dictionary>;
 using Names = std::vector<std::string>;
@@ -118,7 +117,7 @@ TEST_F(ChangeNotifications, TellEachNotifierOnceHoweverManyDataClassesConcernIt)
   const Store store = load({exchange("a", {kMail, kCalendars})});
   store->allBasicAccounts()[0]->setDisplayName("Home");
   save(store);
-  EXPECT_THAT(heard["BothNotifier"], SizeIs(1));
+  EXPECT_EQ(heard["BothNotifier"].size(), 1U);
 }
 
 TEST_F(ChangeNotifications, SayNothingOfChildrenAndOfTheSwitchOfTheMailApplication) {
@@ -220,7 +219,6 @@ TEST_F(ChangeNotifications, YieldNothingForATypeWithoutNotifiers) {
   EXPECT_TRUE(device.modules->opened.empty());
 }
 
-// One account's entries, by the data classes that each combination concerns.
 class ChangeEntries : public ChangeNotifications {
  protected:
   static AccountsManager::NotificationTable tableOf(ChangeType change, const Dictionary* original,
