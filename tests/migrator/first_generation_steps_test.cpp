@@ -119,7 +119,7 @@ TEST_F(OnDeviceAccount, IsMadeOfItsBasePropertiesAndTheEnabledDataclasses) {
 }
 
 TEST_F(OnDeviceAccount, CountsAnEmptyListOfSourcesAsNone) {
-  listSources(SyncDataType::notes, {Array{}, std::nullopt});
+  listSources(SyncDataType::bookmarks, {Array{}, std::nullopt});
   listSources(SyncDataType::contacts, {std::nullopt, ""});
   EXPECT_THAT(enabledAfterwards(), UnorderedElementsAre("Bookmarks", "Calendars", "Contacts", "Notes"));
 }

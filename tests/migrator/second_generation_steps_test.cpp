@@ -130,6 +130,13 @@ TEST_F(HostedParents, LeaveTheRestWithTheMailAccountWhichBecomesTheLastChild) {
   EXPECT_EQ(store->syncableAccountWithSyncIdentifier("S")->parentAccount(), store->allBasicAccounts()[0]);
 }
 
+TEST_F(HostedParents, AreParentsOfTheVeryRecordsThatTheyWereMadeFor) {
+  load({kHostedMail});
+  const auto mail = store->allBasicAccounts()[0];
+  migrate();
+  EXPECT_EQ(mail->parentAccount(), store->allBasicAccounts()[0]);
+}
+
 TEST_F(HostedParents, TakeThePlacesOfTheirMailAccounts) {
   load({account("LDAP", "LDAPAccount", "1"), account("Nimbra", "WexmoAccount", "2", {{"Username", "a"}}),
         account("LDAP", "LDAPAccount", "3"), account("Mail", "NimbraAccount", "4", {{"Username", "b"}})});

@@ -65,17 +65,19 @@ TEST_F(PrimaryAccount, HasNoChildren) {
 }
 
 TEST_F(PrimaryAccount, IsTheSeparateCloudAccountThatLocatesTheDevice) {
-  load({cloud("K", {{kStatus, 2}, {"DisplayName", "Nimbra"}, {"Enabled Dataclasses", dataclasses({"DeviceLocator"})}}),
-        account("VorlixAccount", "Other", "O", {{kStatus, 2}})});
+  const Dictionary earlier = account("VorlixAccount", "Other", "O", {{kStatus, 2}});
+  load(
+      {earlier,
+       cloud("K", {{kStatus, 2}, {"DisplayName", "Nimbra"}, {"Enabled Dataclasses", dataclasses({"DeviceLocator"})}})});
   migrate();
-  EXPECT_EQ(at(0).properties(),
+  EXPECT_EQ(at(0).properties(), earlier);
+  EXPECT_EQ(at(1).properties(),
             cloud("K", {{kStatus, 2},
                         {"DisplayName", "Cirrant"},
                         {"Type String", "Cirrant"},
                         {"Short Type String", "Cirrant"},
                         {"primaryAccount", true},
                         {"Enabled Dataclasses", dataclasses({"DeviceLocator", "Quorvel", "KeyValue"})}}));
-  EXPECT_EQ(at(1).properties(), account("VorlixAccount", "Other", "O", {{kStatus, 2}}));
   EXPECT_THAT(device.console->lines, ElementsAre("Found Nimbra account with status 2"));
 }
 
@@ -309,7 +311,7 @@ TEST_F(Passes, ArePreparedForATypeThatDoesNotYetSupportThem) {
   EXPECT_THAT(storedDataclasses(0, "Enabled Dataclasses"), ElementsAre("Quorvel"));
 }
 
-TEST_F(Passes, AreSavedAfterTheStamp) {
+TEST_F(Passes, ReachTheFile) {
   loadPrimary(dataclasses({"Quorvel"}), dataclasses({"Quorvel"}));
   migrate();
   EXPECT_EQ(savedAccounts(), (Array{at(0).properties()}));

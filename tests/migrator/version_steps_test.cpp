@@ -192,6 +192,18 @@ TEST_P(EveryStep, StampsItsVersionAndSavesAsItsReleaseDid) {
   EXPECT_EQ(saves(), GetParam().saves);
 }
 
+TEST_P(EveryStep, ThatSavesDoesSoWithItsStamp) {
+  load({account("LDAP", "LDAPAccount", "L")});
+  store->setDataVersion(kNoStamp);
+  std::vector<std::uint64_t> versionsAtSave;
+  device.propertyLists->beforeRead = [&](const tests::Path& file) {
+    if (file == AccountsManager::fullPathToAccountSettingsPlist()) versionsAtSave.push_back(store->dataVersion());
+  };
+  EXPECT_TRUE((migrator.*GetParam().step)(*store));
+  const auto saves = static_cast<std::size_t>(GetParam().saves);
+  EXPECT_EQ(versionsAtSave, std::vector<std::uint64_t>(saves, GetParam().version));
+}
+
 TEST_P(EveryStep, LeavesAnAccountAloneThatNoStepNames) {
   const Dictionary directory = account("LDAP", "LDAPAccount", "L", {{"uniqueId", "U"}, {"IsActive", true}, {"X", 1.5}});
   load({directory});
