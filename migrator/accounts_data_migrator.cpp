@@ -7,9 +7,9 @@
 
 #include "accountsettings/file_paths.h"
 #include "accountsettings/product_values.h"
+#include "migrator/console.h"
 #include "migrator/stage.h"
 #include "platform/class_registry.h"
-#include "platform/message.h"
 #include "platform/platform.h"
 
 namespace migrator {
@@ -18,12 +18,10 @@ namespace {
 const platform::ClassRegistration registration{std::make_shared<platform::DataClassMigratorClass>(
     "AccountsDataMigrator", [] { return std::make_unique<AccountsDataMigrator>(); })};
 
-void writeToConsole(std::string_view line) { platform::current().console->write(line); }
-
 // Says what was thrown. Out of memory even for that, it says less, and at last nothing.
 void reportThrown(std::string_view what) noexcept {
   try {
-    writeToConsole(platform::message("AccountsDataMigrator: The migration was given up. %s", {what}));
+    writeToConsole("AccountsDataMigrator: The migration was given up. %s", what);
   } catch (...) {
     try {
       writeToConsole("AccountsDataMigrator: The migration was given up.");

@@ -3,7 +3,7 @@
 #include <tuple>
 #include <utility>
 
-#include "platform/message.h"
+#include "migrator/console.h"
 #include "platform/platform.h"
 
 namespace migrator {
@@ -37,7 +37,7 @@ std::optional<AccountsManager::Accounts> convertedAccounts(const Dictionary& leg
     const Dictionary* const description = element.asDictionary();
     std::shared_ptr<BasicAccount> account = convert(description == nullptr ? Dictionary{} : *description);
     if (!account) {
-      platform::current().console->write(platform::message(failureFormat, {method, element}));
+      writeToConsole(failureFormat, method, element);
       return std::nullopt;
     }
     accounts.push_back(std::move(account));

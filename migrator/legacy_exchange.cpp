@@ -3,6 +3,7 @@
 
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/legacy_conversion.h"
+#include "migrator/stored_names.h"
 
 namespace migrator {
 namespace {
@@ -57,7 +58,7 @@ bool AccountsDataMigrator::_migrateDAAccounts(AccountsManager& store) {
   const Dictionary legacyFile = readLegacyFile(path);
   if (!legacyFile.empty()) _foundOldDAAccountsToMigrate = true;
   if (_saveMigrationInformation() && _collatedMigrationData) {
-    _collatedMigrationData->set("OldExchangeAccount", legacyFile);
+    _collatedMigrationData->set(kOldExchangeAccountsKey, legacyFile);
   }
   const auto accounts = convertedAccounts(legacyFile, "DAAccountsKey", _convertExchangeAccountDescription,
                                           "-[AccountsDataMigrator(Internal) _migrateDAAccounts:]",

@@ -6,6 +6,7 @@
 #include "accountsettings/as_runtime_fix_mail_account.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/legacy_conversion.h"
+#include "migrator/stored_names.h"
 #include "platform/platform.h"
 
 namespace migrator {
@@ -16,10 +17,8 @@ using namespace accountsettings;
 constexpr std::string_view kMethod = "-[AccountsDataMigrator(Internal) _migrateMailAccounts:]";
 
 constexpr std::array kRenames{Rename{"AccountType", kAccountClass}, Rename{"AccountName", kAccountDisplayName},
-                              Rename{"uniqueId", kAccountIdentifier}};
+                              Rename{kUniqueIdKey, kAccountIdentifier}};
 
-constexpr StringConstant kGenericClass{"MailAccount"};
-constexpr StringConstant kGenericDeliveryClass{"SMTPAccount"};
 constexpr StringConstant kGenericTypeString{"Account"};
 
 // What a legacy class stands for: the account's type, and what people call that type.
@@ -29,17 +28,15 @@ struct MailClass {
   StringConstant typeString;
 };
 
-constexpr StringConstant kGmailClass{"GmailAccount"};
-
 constexpr std::array kMailClasses{
-    MailClass{kGmailClass, kGmailAccountType, "Gmail"},  // "Google Mail" in some regions
-    MailClass{"WexmoAccount", kNimbraAccountType, "Nimbra"},
-    MailClass{"KeldorIMAPAccount", kKeldorIMAPAccountType, "Cirrant"},
-    MailClass{"YahooAccount", kYahooAccountType, "Yahoo!\u200E"},  // with a left-to-right mark
-    MailClass{"DAMailAccount", kExchangeAccountType, "Exchange ActiveSync"},
-    MailClass{"NimbraAccount", kNimbraAccountType, "Nimbra"},
-    MailClass{"DeliveryAccount", kSMTPAccountType, kGenericTypeString},
-    MailClass{kGenericDeliveryClass, kSMTPAccountType, kGenericTypeString},
+    MailClass{kGmailAccountClass, kGmailAccountType, "Gmail"},  // "Google Mail" in some regions
+    MailClass{kWexmoAccountClass, kNimbraAccountType, "Nimbra"},
+    MailClass{kCloudMailClass, kKeldorIMAPAccountType, "Cirrant"},
+    MailClass{kYahooAccountClass, kYahooAccountType, "Yahoo!\u200E"},  // with a left-to-right mark
+    MailClass{kExchangeMailClass, kExchangeAccountType, "Exchange ActiveSync"},
+    MailClass{kNimbraAccountClass, kNimbraAccountType, "Nimbra"},
+    MailClass{kDeliveryAccountClass, kSMTPAccountType, kGenericTypeString},
+    MailClass{kSMTPAccountClass, kSMTPAccountType, kGenericTypeString},
 };
 constexpr MailClass kAnyOtherMailClass{{}, kMailAccountType, kGenericTypeString};
 
@@ -52,8 +49,8 @@ const MailClass& mailClassNamed(std::string_view name) {
 std::optional<Text> settledClass(Dictionary& record, std::string_view initialType) {
   if (const Text* const present = record.text(kAccountClass)) return *present;
   if (initialType != kSMTPAccountType.view()) return std::nullopt;
-  record.set(kAccountClass, kGenericDeliveryClass);
-  return Text{kGenericDeliveryClass};
+  record.set(kAccountClass, kSMTPAccountClass);
+  return Text{kSMTPAccountClass};
 }
 
 void describeType(Dictionary& record, std::string_view className) {
@@ -122,7 +119,7 @@ Text AccountsDataMigrator::_accountTypeStringForMailAccountClass(std::string_vie
 }
 
 Text AccountsDataMigrator::_accountShortTypeStringForMailAccountClass(std::string_view className) {
-  if (className == kGmailClass.view() && _UseGoogleMail()) return "Google Mail";
+  if (className == kGmailAccountClass.view() && _UseGoogleMail()) return "Google Mail";
   return mailClassNamed(className).typeString;
 }
 
@@ -135,7 +132,7 @@ std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertMailAccountDescripti
   std::shared_ptr<BasicAccount> account = BasicAccount::initWithProperties(record);
   if (!account) return nullptr;
   setSyncIdentifier(*account, record);
-  if (account->accountClass() == Text{kGenericClass}) {
+  if (account->accountClass() == Text{kGenericMailClass}) {
     reportMailAccountClassFound(account->properties(), "During account migration");
   }
   return account;
@@ -145,7 +142,8 @@ bool AccountsDataMigrator::_migrateMailAccounts(AccountsManager& store) {
   const std::string path = mailAccountsPath();
   const Dictionary legacyFile = readLegacyFile(path);
   if (!legacyFile.empty()) _foundOldMailAccountsToMigrate = true;
-  if (_saveMigrationInformation() && _collatedMigrationData) _collatedMigrationData->set("OldMailAccounts", legacyFile);
+  if (_saveMigrationInformation() && _collatedMigrationData)
+    _collatedMigrationData->set(kOldMailAccountsKey, legacyFile);
 
   const std::optional<ConvertedMail> accounts = convertedMail(legacyFile);
   if (accounts) {

@@ -3,7 +3,7 @@
 
 #include "accountsettings/file_paths.h"
 #include "migrator/accounts_data_migrator.h"
-#include "platform/message.h"
+#include "migrator/console.h"
 #include "platform/platform.h"
 
 namespace migrator {
@@ -20,9 +20,8 @@ void makeSentinel(const Path& path) {
 }
 
 void reportUndeleted(const Path& path, const Status& status) {
-  platform::current().console->write(platform::message(
-      "%s. Could not delete %@. Error = %@",
-      {"-[AccountsDataMigrator(Internal) _removeOldAccountsInfo]", path.native(), status.description()}));
+  writeToConsole("%s. Could not delete %@. Error = %@", "-[AccountsDataMigrator(Internal) _removeOldAccountsInfo]",
+                 path.native(), status.description());
 }
 
 // A legacy file that cannot be deleted is worth a message only when accounts were found in it.

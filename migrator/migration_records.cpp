@@ -1,7 +1,9 @@
 #include <tuple>
 
 #include "migrator/accounts_data_migrator.h"
+#include "migrator/console.h"
 #include "migrator/stage.h"
+#include "migrator/stored_names.h"
 #include "platform/message.h"
 #include "platform/platform.h"
 
@@ -13,14 +15,9 @@ using platform::Path;
 
 constexpr std::string_view kSwitchDomain = "com.vorlix.accountsettings-logging";
 constexpr std::string_view kSwitchKey = "ASSaveMigrationInformation";
-constexpr platform::StringConstant kSavedSettingsKey{"NewAccounSettings"};  // readers of reports know this spelling
 constexpr unsigned kOpenToEverybody = 0777;
 // No minutes and no seconds: reports of one tenth of a second of one hour share a name, and the later one stays.
 constexpr std::string_view kReportTimePattern = "Y-M-d-H-M-S";
-
-void writeToConsole(std::string_view format, std::initializer_list<platform::MessageArgument> arguments = {}) {
-  platform::current().console->write(platform::message(format, arguments));
-}
 
 // The copy lies with the shared resources, the report below the home directory.
 Path copyPath(const Path& settingsFile) {
@@ -40,11 +37,11 @@ bool prepareReportDirectory(const Path& directory) {
     if (made.isOk()) return true;
     writeToConsole(
         "AccountMigration warning: Could not create the directory to store migration information at %@ [Error = %@]",
-        {directory.native(), made.description()});
+        directory.native(), made.description());
     return false;
   }
   if (*kind == FileKind::directory) return true;
-  writeToConsole("AccountMigrator warning: %@ already exists and is not a directory", {directory.native()});
+  writeToConsole("AccountMigrator warning: %@ already exists and is not a directory", directory.native());
   return false;
 }
 
@@ -65,10 +62,10 @@ void AccountsDataMigrator::_copyAsideAccountsPlist() {
   const Path source = AccountsManager::fullPathToAccountSettingsPlist();
   const Path destination = copyPath(source);
   if (files.kindOf(destination) && !files.remove(destination).isOk()) {
-    writeToConsole("Couldn't remove existing accountsettings copy at %@", {destination.native()});
+    writeToConsole("Couldn't remove existing accountsettings copy at %@", destination.native());
   }
   const platform::Status copied = files.copy(source, destination);
-  if (!copied.isOk()) writeToConsole("Error trying to save an accountsettings plist copy: %@", {copied.description()});
+  if (!copied.isOk()) writeToConsole("Error trying to save an accountsettings plist copy: %@", copied.description());
 }
 
 bool AccountsDataMigrator::_saveMigrationInformation() {

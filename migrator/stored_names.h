@@ -18,6 +18,11 @@ inline constexpr StringConstant kAOLAccountClass{"AOLAccount"};
 inline constexpr StringConstant kWexmoAccountClass{"WexmoAccount"};    // mail of the vendor's oldest hosted service
 inline constexpr StringConstant kNimbraAccountClass{"NimbraAccount"};  // mail of the vendor's earlier hosted service
 inline constexpr StringConstant kCloudAccountClass{"KQAccount"};       // the vendor's cloud account
+inline constexpr StringConstant kCloudMailClass{"KeldorIMAPAccount"};  // mail of the cloud account
+inline constexpr StringConstant kExchangeMailClass{"DAMailAccount"};   // the mail side of an Exchange account
+inline constexpr StringConstant kDeliveryAccountClass{"DeliveryAccount"};
+inline constexpr StringConstant kSMTPAccountClass{"SMTPAccount"};
+inline constexpr StringConstant kGenericMailClass{"MailAccount"};  // mail of which no more was known
 inline constexpr StringConstant kCalDAVAccountClass{"MobileCalDAVAccount"};
 
 // Keys of an account.
@@ -35,6 +40,9 @@ inline constexpr StringConstant kCalDAVServerKey{"CalDAV_Server_Key"};
 inline constexpr StringConstant kCalDAVPrincipalPathKey{"CalDAV_PrincipalPath_Key"};
 
 // Keys of the report's collected data.
+inline constexpr StringConstant kOldExchangeAccountsKey{"OldExchangeAccount"};
+inline constexpr StringConstant kOldMailAccountsKey{"OldMailAccounts"};
 inline constexpr StringConstant kOldAccountSettingsKey{"OldAccountSettings"};
+inline constexpr StringConstant kSavedSettingsKey{"NewAccounSettings"};  // readers of reports know this spelling
 
 }  // namespace migrator

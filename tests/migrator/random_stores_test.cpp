@@ -118,7 +118,7 @@ class RandomFiles {
 // How many files are tried: a few thousand, or as many as the environment asks for.
 int rounds() {
   const char* const asked = std::getenv("RANDOM_STORES");
-  return asked != nullptr ? std::atoi(asked) : 3000;
+  return asked != nullptr ? std::atoi(asked) : 2000;
 }
 
 class RandomStores : public tests::StepTest {
@@ -261,7 +261,7 @@ constexpr std::array kSteps{
 
 TEST_P(RandomStoresOneStepEarlier, BecomeTheSameWhereThatStepHasNothingToDo) {
   int compared = 0;
-  for (int round = 0; round < rounds() / 8; ++round) {
+  for (int round = 0; round < rounds() / 10; ++round) {
     RandomFiles random{static_cast<std::uint32_t>(round)};
     Array accounts = random.accounts(true);
     if (GetParam() == kStepOfTheOnDeviceAccount) accounts = withCurrentOnDeviceAccount(accounts);
