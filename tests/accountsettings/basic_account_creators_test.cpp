@@ -384,8 +384,8 @@ TEST_F(Creators, AreNotNeededToSayThatCredentialsCannotBeRenewed) {
 template <typename Object>
 class Witness final : public Object {
  public:
-  Witness(std::string name, const BasicAccount* record, std::weak_ptr<BasicAccount> parent, Strings& events)
-      : _name{std::move(name)}, _record{record}, _parent{std::move(parent)}, _events{events} {}
+  Witness(std::string_view name, const BasicAccount* record, const std::weak_ptr<BasicAccount>& parent, Strings& events)
+      : _name{name}, _record{record}, _parent{parent}, _events{events} {}
   Witness(const Witness&) = delete;
   Witness& operator=(const Witness&) = delete;
   ~Witness() override {
