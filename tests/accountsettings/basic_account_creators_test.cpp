@@ -378,58 +378,5 @@ TEST_F(Creators, AreNotNeededToSayThatCredentialsCannotBeRenewed) {
   EXPECT_EQ(results, std::vector<int>{3});
 }
 
-// --- The end of a record ---
-
-// Says what is left of a record at the moment when it is let go of itself.
-template <typename Object>
-class Witness final : public Object {
- public:
-  Witness(std::string_view name, const BasicAccount* record, const std::weak_ptr<BasicAccount>& parent, Strings& events)
-      : _name{name}, _record{record}, _parent{parent}, _events{events} {}
-  Witness(const Witness&) = delete;
-  Witness& operator=(const Witness&) = delete;
-  ~Witness() override {
-    const bool hasProperties = !_record->properties().empty() || !_record->originalProperties().empty();
-    _events.push_back(_name + (_parent.expired() ? "" : " before parent") +
-                      (hasProperties ? " before properties" : ""));
-  }
-
- private:
-  std::string _name;
-  const BasicAccount* _record;
-  std::weak_ptr<BasicAccount> _parent;
-  Strings& _events;
-};
-
-class PlainFullAccount : public FullAccountObject {
- public:
-  void setParentAccount(std::shared_ptr<BasicAccount> /*parent*/) override {}
-};
-
-class PlainSyncAccount : public SyncAccountObject {
- public:
-  bool refreshContainerWithIdentifier_forDataclass_isUserRequested(std::string_view, std::string_view, bool) override {
-    return false;
-  }
-  bool refreshContainerListForDataclass_isUserRequested(std::string_view, bool) override { return false; }
-  bool refreshContainersForDataclass_isUserRequested(std::string_view, bool) override { return false; }
-};
-
-TEST_F(Creators, ObjectsAreLetGoOfAfterParentAndPropertiesTheFullAccountFirst) {
-  Strings events;
-  const auto info = std::make_shared<AccountClassInfo>("WitnessCreator");
-  info->accountToRefreshForBasicAccount = [&events](const std::shared_ptr<BasicAccount>& record) {
-    return std::make_shared<Witness<PlainSyncAccount>>("sync", record.get(), record->parentAccount(), events);
-  };
-  const platform::ClassRegistration registration{info};
-  put({creator("SyncAccount", "sync.so", "WitnessCreator")});
-  account->setParentAccount(BasicAccount::accountWithType_class("VorlixAccount", "X"));
-  account->_cachedSyncAccount();
-  account->setFullAccount(
-      std::make_shared<Witness<PlainFullAccount>>("full", account.get(), account->parentAccount(), events));
-  account.reset();
-  EXPECT_EQ(events, (Strings{"full", "sync"}));
-}
-
 }  // namespace
 }  // namespace accountsettings
