@@ -6,6 +6,7 @@
 #include <vector>
 
 #include "platform/linux/libplist_node.h"
+#include "platform/linux/xml_key_cost.h"
 #include "platform/linux/xml_text_repair.h"
 
 namespace platform {
@@ -15,9 +16,9 @@ constexpr std::string_view kBlanks = " \t\r\n";
 constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
 constexpr char kNoUtf8 = '\xFF';
 
-// libplist moves the rest of a text for each entity in it, and walks a large dictionary for a key that comes again.
+// libplist moves the rest of a text for each entity in it.
 constexpr std::uint64_t kMostMovedBytes = std::uint64_t{1} << 33U;
-constexpr std::uint64_t kMostWalkedEntries = std::uint64_t{1} << 24U;
+constexpr std::uint64_t kMostKeySteps = std::uint64_t{1} << 24U;
 
 class Scan {
  public:
@@ -37,7 +38,7 @@ class Scan {
   enum class Open : std::uint8_t { plist, dictionary, array };
   struct Container {
     bool isDictionary;
-    std::uint64_t elements = 0;
+    XmlKeyCost keys = {};
   };
   struct Tag {
     std::string_view name;
@@ -113,7 +114,7 @@ class Scan {
     if (tag.name == "/plist") return pop(Open::plist);
     if (tag.name == "/dict") return pop(Open::dictionary);
     if (tag.name == "/array") return pop(Open::array);
-    return count() && value(tag);
+    return value(tag);
   }
 
   bool readTag(Tag& tag) {
@@ -142,13 +143,6 @@ class Scan {
     _containers.pop_back();
     _isDone = _containers.empty();
     return true;
-  }
-
-  // One more element, key or value, of what is open.
-  [[nodiscard]] bool count() {
-    if (_containers.empty() || !_containers.back().isDictionary) return true;
-    _walkedEntries += ++_containers.back().elements / 2;
-    return _walkedEntries <= kMostWalkedEntries;
   }
 
   [[nodiscard]] bool value(const Tag& tag) {
@@ -186,7 +180,7 @@ class Scan {
     skipBlanks();
     if (!startsWith(">")) return false;
     ++_position;
-    if (isText) return repairText();
+    if (isText) return repairText() && countKey(tag);
     blankComments();
     const bool isPlain = std::ranges::none_of(_parts, &Part::isVerbatim);
     if (isPlain && tag.name == "integer") repairXmlInteger(_file.subspan(begin, end - begin));
@@ -226,6 +220,14 @@ class Scan {
     return _movedBytes <= kMostMovedBytes;
   }
 
+  [[nodiscard]] bool countKey(const Tag& tag) {
+    if (tag.name != "key" || _containers.empty() || !_containers.back().isDictionary) return true;
+    const std::string_view key = _text.substr(_parts.front().begin, _parts.front().end - _parts.front().begin);
+    const bool isPlain = _parts.size() == 1 && key.find('&') == std::string_view::npos;
+    _keySteps += _containers.back().keys.add(key, isPlain);
+    return _keySteps <= kMostKeySteps;
+  }
+
   // libplist takes of data no more than stands before the first comment.
   void blankComments() {
     for (std::size_t next = 1; next < _parts.size(); ++next) {
@@ -240,7 +242,7 @@ class Scan {
   std::vector<Open> _open;             // the tags from the root to here
   std::vector<Container> _containers;  // the dictionaries and arrays among them
   std::vector<Part> _parts;            // of the element that is being read
-  std::uint64_t _walkedEntries = 0;
+  std::uint64_t _keySteps = 0;
   std::uint64_t _movedBytes = 0;
   bool _isDone = false;
 };
