@@ -39,6 +39,12 @@ else()
   add_compile_definitions($<$<NOT:$<CONFIG:Debug>>:_FORTIFY_SOURCE=2>)
 endif()
 
+if(ACCOUNTS_FUZZ)
+  # What the fuzzers are guided by; only they link the fuzzing engine itself.
+  add_compile_options(-fsanitize=fuzzer-no-link)
+  add_link_options(-fsanitize=fuzzer-no-link)
+endif()
+
 if(ACCOUNTS_COVERAGE)
   add_compile_options(--coverage -fprofile-update=atomic)
   add_link_options(--coverage)

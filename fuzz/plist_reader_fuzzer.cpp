@@ -1,0 +1,41 @@
+#include <cstddef>
+#include <cstdint>
+#include <cstdio>
+#include <cstdlib>
+#include <memory>
+
+#include "platform/linux/libplist_property_list_store.h"
+#include "tests/support/fake_file_system.h"
+
+// Any bytes are refused or read; what is read can be written and read back with the same value.
+
+namespace {
+
+struct Reader {
+  std::shared_ptr<tests::FakeFileSystem> files = std::make_shared<tests::FakeFileSystem>();
+  std::shared_ptr<platform::PropertyListStore> store = platform::makeLibplistPropertyListStore(files);
+
+  std::optional<platform::Dictionary> read(platform::Bytes bytes) {
+    files->calls.clear();
+    files->put("/file.plist", std::move(bytes));
+    return store->readDictionary("/file.plist");
+  }
+};
+
+void require(bool condition, const char* what) {
+  if (condition) return;
+  std::fprintf(stderr, "%s\n", what);
+  std::abort();
+}
+
+}  // namespace
+
+extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
+  static Reader reader;
+  const auto read = reader.read({data, data + size});
+  if (!read) return 0;
+  const auto written = reader.store->serialize(*read);
+  require(written.data.has_value(), written.errorDescription.c_str());
+  require(reader.read(*written.data) == read, "not equal once written and read back");
+  return 0;
+}

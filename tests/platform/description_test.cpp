@@ -1,0 +1,63 @@
+#include "platform/description.h"
+
+#include <gtest/gtest.h>
+
+#include <cmath>
+#include <limits>
+#include <string>
+#include <utility>
+#include <vector>
+
+using platform::Array;
+using platform::Bytes;
+using platform::Date;
+using platform::description;
+using platform::Dictionary;
+using platform::namesCredential;
+using platform::PropertyValue;
+using platform::Uid;
+
+namespace {
+
+TEST(Descriptions, ShowEachKindOnOneLine) {
+  const std::vector<std::pair<PropertyValue, std::string>> rows{
+      {"text", "\"text\""},
+      {"a \"b\" \\ \n\x7F", R"("a \"b\" \\ \x0a\x7f")"},
+      {7, "7"},
+      {-7, "-7"},
+      {std::numeric_limits<std::uint64_t>::max(), "18446744073709551615"},
+      {1.0, "1.0"},
+      {0.1, "0.1"},
+      {-0.0, "-0.0"},
+      {1e300, "1e+300"},
+      {std::numeric_limits<double>::infinity(), "inf"},
+      {true, "true"},
+      {false, "false"},
+      {Date{1.5}, "<date: 1.5 s since 2001>"},
+      {Bytes(20), "<data: 20 bytes>"},
+      {Uid{3}, "<uid: 3>"},
+      {Array{}, "()"},
+      {Array{1, "a"}, R"((1, "a"))"},
+      {Dictionary{}, "{}"},
+      {Dictionary{{"Plain1", 1}, {"two words", Array{}}, {"", 2}}, R"({Plain1 = 1; "two words" = (); "" = 2})"},
+  };
+  for (const auto& [value, expected] : rows) EXPECT_EQ(description(value), expected);
+}
+
+TEST(Descriptions, HideCredentials) {
+  const Dictionary account{{"Username", "anna"}, {"Password", "s3cret"}, {"OAuth Token", Dictionary{{"v", "s3cret"}}}};
+  EXPECT_EQ(description(account), R"({Username = "anna"; Password = <hidden>; "OAuth Token" = <hidden>})");
+  EXPECT_EQ(description(PropertyValue{Array{account}}).find("s3cret"), std::string::npos);
+}
+
+TEST(Descriptions, TakeAKeyForACredentialByTheWordsInIt) {
+  for (const char* const key : {"password", "PASSWORD", "IMAP Password", "pass-code", "Auth_Token", "clientSecret",
+                                "private key", "APIKey", "Cookies", "PinCode"}) {
+    EXPECT_TRUE(namesCredential(key)) << key;
+  }
+  for (const char* const key : {"", "Username", "Login_Key", "CalDAV_Server_Key", "Hostname", "Pass", "Pin"}) {
+    EXPECT_FALSE(namesCredential(key)) << key;
+  }
+}
+
+}  // namespace
