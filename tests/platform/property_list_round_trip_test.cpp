@@ -162,7 +162,7 @@ TEST_F(PlistlibTest, AgreesOnRandomPropertyLists) {
 
 // Whatever a damaged file is accepted as can be written and read again.
 TEST(DamagedPropertyLists, AreRefusedOrSurviveAWriteAndARead) {
-  constexpr int kMutants = 6000;
+  constexpr int kMutants = 3000;
   PropertyListFiles files;
   const std::uint64_t seed = std::random_device{}();
   SCOPED_TRACE("seed " + std::to_string(seed));
