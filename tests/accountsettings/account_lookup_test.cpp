@@ -125,7 +125,7 @@ TEST_F(LookingUpAccounts, NamesTheGroupByTheEmptyTextWhereTheTableLacksIt) {
   EXPECT_EQ(AccountsManager::displayNameForGroupOfAccountType_forBeginningOfSentence("Subscribed Calendar", true), "");
 }
 
-// Full accounts are the records themselves here, which shows whose full account each one is.
+// Full accounts that tell whose they are.
 class LookingUpFullAccounts : public AccountStore {
  protected:
   LookingUpFullAccounts() {
@@ -145,15 +145,15 @@ class LookingUpFullAccounts : public AccountStore {
   [[nodiscard]] static Lines identifiersOfFull(const std::vector<std::shared_ptr<FullAccountObject>>& accounts) {
     Lines identifiers;
     for (const auto& each : accounts) {
-      identifiers.push_back(dynamic_cast<const Full&>(*each).account->identifier()->string());
+      identifiers.push_back(dynamic_cast<const Full&>(*each).account.lock()->identifier()->string());
     }
     return identifiers;
   }
 
   struct Full final : FullAccountObject {
-    explicit Full(std::shared_ptr<BasicAccount> of) : account{std::move(of)} {}
+    explicit Full(const std::shared_ptr<BasicAccount>& of) : account{of} {}
     void setParentAccount(std::shared_ptr<BasicAccount> /*parent*/) override {}
-    std::shared_ptr<BasicAccount> account;
+    std::weak_ptr<BasicAccount> account;  // the record owns its full account
   };
 
   // A loader that says whether it was asked.
