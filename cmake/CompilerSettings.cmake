@@ -37,6 +37,7 @@ if(ACCOUNTS_SANITIZE)
   endif()
 else()
   add_compile_definitions($<$<NOT:$<CONFIG:Debug>>:_FORTIFY_SOURCE=2>)
+  add_link_options(-Wl,--no-undefined)
 endif()
 
 if(ACCOUNTS_FUZZ)

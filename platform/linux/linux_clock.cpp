@@ -17,6 +17,8 @@ std::unique_ptr<icu::Calendar> prolepticCalendar(const icu::Locale& locale, UErr
   return calendar;
 }
 
+Instant systemInstant() { return std::chrono::floor<std::chrono::milliseconds>(std::chrono::system_clock::now()); }
+
 class LinuxClock final : public Clock {
  public:
   explicit LinuxClock(std::function<Instant()> now) : _now{std::move(now)} {}
@@ -28,10 +30,10 @@ class LinuxClock final : public Clock {
     icu::SimpleDateFormat format{unicode(pattern), locale, error};
     if (U_FAILURE(error) != 0) return {};
     format.adoptCalendar(calendar.release());
-    const std::chrono::duration<double, std::milli> sinceEpoch = _now().time_since_epoch();
+    const auto sinceEpoch = static_cast<UDate>(_now().time_since_epoch().count());
     icu::UnicodeString text;
     // A letter that stands for nothing shows only now.
-    format.format(sinceEpoch.count(), text, nullptr, error);
+    format.format(sinceEpoch, text, nullptr, error);
     std::string utf8;
     return U_SUCCESS(error) != 0 ? text.toUTF8String(utf8) : std::string{};
   }
@@ -42,6 +44,8 @@ class LinuxClock final : public Clock {
 
 }  // namespace
 
-std::shared_ptr<Clock> makeClock(std::function<Instant()> now) { return std::make_shared<LinuxClock>(std::move(now)); }
+std::shared_ptr<Clock> makeClock(std::function<Instant()> now) {
+  return std::make_shared<LinuxClock>(now ? std::move(now) : &systemInstant);
+}
 
 }  // namespace platform

@@ -9,10 +9,9 @@
 
 namespace platform {
 
-using Instant = std::chrono::system_clock::time_point;
+using Instant = std::chrono::sys_time<std::chrono::milliseconds>;
 
-// The clock that shows the instant which `now` answers, the system's as a rule.
-[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<Clock> makeClock(
-    std::function<Instant()> now = &std::chrono::system_clock::now);
+// The clock that shows the instant which `now` answers; without one, the system's.
+[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<Clock> makeClock(std::function<Instant()> now = nullptr);
 
 }  // namespace platform

@@ -10,11 +10,12 @@ namespace platform {
 
 // Where the device's files lie; what is not set is as on the device itself.
 struct LinuxPlatformOptions {
-  std::optional<std::filesystem::path> systemRoot;       // default "/"
-  std::optional<std::filesystem::path> home;             // default: the process's; under another root, ROOT/var/mobile
-  std::optional<std::filesystem::path> sharedResources;  // default ROOT/var/mobile
-  std::optional<std::filesystem::path> resources;        // default: those installed beside this library
-  std::filesystem::path lockDirectory = "/tmp";          // only tests set another
+  std::optional<std::filesystem::path> systemRoot = std::nullopt;  // default "/"
+  // Default: the process's home directory; under another root, ROOT/var/mobile.
+  std::optional<std::filesystem::path> home = std::nullopt;
+  std::optional<std::filesystem::path> sharedResources = std::nullopt;  // default ROOT/var/mobile
+  std::optional<std::filesystem::path> resources = std::nullopt;        // default: those installed beside this library
+  std::filesystem::path lockDirectory = "/tmp";                         // only tests set another
 };
 
 // The services of a Linux device. Nothing is opened or connected before its first use.

@@ -40,6 +40,7 @@ TEST_F(MigrationRecords, CopyTakesThePlaceOfAnEarlierOne) {
 TEST_F(MigrationRecords, CopyLiesWithTheSharedResourcesAndTheReportInTheHomeDirectory) {
   device.directories->shared = "/shared";
   device.directories->homeDirectory = "/home";
+  device.files->putDirectory("/shared/Library/Logs/CrashReporter");
   device.files->put(kSettingsFile, "settings");
   migrator._copyAsideAccountsPlist();
   EXPECT_TRUE(device.files->exists("/shared/Library/Logs/CrashReporter/com.vorlix.accountsettings.plist"));

@@ -55,10 +55,25 @@ platform::Result<Bytes> FakeFileSystem::read(const Path& path, std::size_t sizeL
   return node->second.bytes;
 }
 
+int FakeFileSystem::obstacleAbove(const Path& path) const {
+  const auto above = nodes.find(path.parent_path());
+  if (above == nodes.end()) return ENOENT;
+  return above->second.isDirectory ? 0 : ENOTDIR;
+}
+
+int FakeFileSystem::obstacleToMaking(const Path& path) const {
+  return nodes.contains(path) ? EEXIST : obstacleAbove(path);
+}
+
+int FakeFileSystem::obstacleToReplacing(const Path& path) const {
+  const auto node = nodes.find(path);
+  return node != nodes.end() && node->second.isDirectory ? EISDIR : obstacleAbove(path);
+}
+
 Status FakeFileSystem::create(const Path& path, std::span<const std::uint8_t> bytes) {
   const Status begun = begin("create", path);
   if (!begun.isOk()) return begun;
-  if (nodes.contains(path)) return Status::failure(EEXIST, "create " + path.string());
+  if (const int cause = obstacleToMaking(path)) return Status::failure(cause, "create " + path.string());
   put(path, Bytes{bytes.begin(), bytes.end()});
   return {};
 }
@@ -66,6 +81,7 @@ Status FakeFileSystem::create(const Path& path, std::span<const std::uint8_t> by
 Status FakeFileSystem::replace(const Path& path, std::span<const std::uint8_t> bytes) {
   const Status begun = begin("replace", path);
   if (!begun.isOk()) return begun;
+  if (const int cause = obstacleToReplacing(path)) return Status::failure(cause, "replace " + path.string());
   put(path, Bytes{bytes.begin(), bytes.end()});
   return {};
 }
@@ -75,7 +91,8 @@ Status FakeFileSystem::copy(const Path& from, const Path& to) {
   if (!begun.isOk()) return begun;
   const auto node = nodes.find(from);
   if (node == nodes.end()) return Status::failure(ENOENT, "copy " + from.string());
-  if (nodes.contains(to)) return Status::failure(EEXIST, "copy to " + to.string());
+  if (node->second.isDirectory) return Status::failure(EISDIR, "copy " + from.string());
+  if (const int cause = obstacleToMaking(to)) return Status::failure(cause, "copy to " + to.string());
   put(to, node->second.bytes);
   return {};
 }
@@ -92,6 +109,12 @@ Status FakeFileSystem::remove(const Path& path) {
 Status FakeFileSystem::createDirectories(const Path& path, unsigned permissions) {
   const Status begun = begin("createDirectories", path);
   if (!begun.isOk()) return begun;
+  for (Path above = path; above.has_relative_path(); above = above.parent_path()) {
+    if (nodes.contains(above) && !nodes[above].isDirectory) {
+      return Status::failure(ENOTDIR, "create the directory " + path.string());
+    }
+  }
+  if (nodes.contains(path)) return {};
   putDirectory(path);
   nodes[path].permissions = permissions;
   return {};
@@ -119,6 +142,7 @@ Status FakeFileSystem::rename(const Path& from, const Path& to) {
   if (!begun.isOk()) return begun;
   const auto node = nodes.find(from);
   if (node == nodes.end()) return Status::failure(ENOENT, "rename " + from.string());
+  if (const int cause = obstacleToReplacing(to)) return Status::failure(cause, "rename to " + to.string());
   nodes[to] = node->second;
   nodes.erase(from);
   return {};

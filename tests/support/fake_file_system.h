@@ -9,8 +9,8 @@
 
 namespace tests {
 
-// A device's files in memory. Every call is recorded as "verb path" (or "verb from to"), and any call can be made to
-// fail: by verb, or by verb and path.
+// A device's files in memory, without links; directories are moved by no call here. Every call is recorded as "verb
+// path" (or "verb from to"), and any call can be made to fail: by verb, or by verb and path.
 class FakeFileSystem final : public platform::FileSystem {
  public:
   struct Node {
@@ -48,6 +48,10 @@ class FakeFileSystem final : public platform::FileSystem {
  private:
   // The failure of a call that a switch makes fail or for which the precondition does not hold.
   platform::Status begin(const std::string& verb, const platform::Path& path, const std::string& rest = {});
+  // What keeps a file from standing at the path, as an error number; 0 where nothing does.
+  [[nodiscard]] int obstacleAbove(const platform::Path& path) const;
+  [[nodiscard]] int obstacleToMaking(const platform::Path& path) const;
+  [[nodiscard]] int obstacleToReplacing(const platform::Path& path) const;
 
   int _temporaryNames = 0;
 };

@@ -1,5 +1,6 @@
 #include "tests/support/fake_platform.h"
 
+#include <algorithm>
 #include <array>
 #include <cstdio>
 #include <stdexcept>
@@ -81,6 +82,7 @@ platform::SerializedPropertyList FakePropertyListStore::serialize(const Dictiona
 
 std::optional<bool> FakePreferencesStore::boolean(std::string_view domain, std::string_view key) const {
   ++reads;
+  if (std::find(synchronized.begin(), synchronized.end(), domain) == synchronized.end()) return std::nullopt;
   return lookedUp(switches, std::pair{std::string{domain}, std::string{key}});
 }
 
