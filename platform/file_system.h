@@ -51,8 +51,8 @@ class FileSystem {
   virtual Status createDirectories(const Path& path, unsigned permissions) = 0;
 
   // Sets the owner and the group of the file or directory at the path, by account name, as the device's own passwd and
-  // group files have them. An unknown name is an error (ENOENT), and so is a file with a second name elsewhere (EMLINK),
-  // which would be given away with it.
+  // group files have them. An unknown name is an error (ENOENT), and so is a file with a second name elsewhere
+  // (EMLINK), which would be given away with it.
   virtual Status setOwner(const Path& path, std::string_view owner, std::string_view group) = 0;
 
   // A name for a temporary file in the process's default temporary directory, at which nothing stands; nothing where
