@@ -19,19 +19,14 @@ const PropertyValue* valueInChain(const BasicAccount& account, std::string_view 
 
 bool isGuarded(std::string_view key) { return key == kAccountClass || key == kAccountType; }
 
-std::string requiredAccountUID(std::string_view method) {
-  std::optional<std::string> identifier = BasicAccount::createNewAccountUID();
-  if (!identifier) failAssertion(method, kSourceFile, "Could not create an account identifier");
-  return *std::move(identifier);
-}
-
 // A text that is no identifier would leave the account unreachable, so another kind counts as missing.
 void identify(Dictionary& properties) {
   if (properties.text(kAccountIdentifier) != nullptr) return;
-  const Text identifier{requiredAccountUID("-[BasicAccount initWithProperties:]")};
-  properties.set(kAccountIdentifier, identifier);
+  const std::optional<std::string> identifier = BasicAccount::createNewAccountUID();
+  if (!identifier) return;
+  properties.set(kAccountIdentifier, *identifier);
   // Only a record that is given its identifier here is given a sync identifier, too.
-  if (!properties.contains(kAccountSyncIdentifier)) properties.set(kAccountSyncIdentifier, identifier);
+  if (!properties.contains(kAccountSyncIdentifier)) properties.set(kAccountSyncIdentifier, *identifier);
 }
 
 }  // namespace
@@ -66,11 +61,14 @@ std::shared_ptr<BasicAccount> BasicAccount::_initWithType_class(std::string_view
   if (!_isValidAccountType(type)) {
     failAssertion(kMethod, kSourceFile, "The account type (%@) is not supported", {type});
   }
-  const Text identifier{requiredAccountUID(kMethod)};
-  return initWithProperties({{kAccountType, type},
-                             {kAccountIdentifier, identifier},
-                             {kAccountSyncIdentifier, identifier},
-                             {kAccountClass, className}});
+  Dictionary properties{{kAccountType, type}};
+  if (const std::optional<std::string> identifier = createNewAccountUID()) {
+    const Text text{*identifier};
+    properties.set(kAccountIdentifier, text);
+    properties.set(kAccountSyncIdentifier, text);
+  }
+  properties.set(kAccountClass, className);
+  return initWithProperties(properties);
 }
 
 std::shared_ptr<BasicAccount> BasicAccount::init() {

@@ -23,15 +23,15 @@ using platform::Text;
 // One account: a dictionary of properties, the same that stands in the account settings file, with typed access to the
 // well-known keys, a snapshot of what it was loaded with, a link to its parent, and its data classes. Not thread-safe.
 //
-// A record always has a type that the configuration knows, a class and an identifier when it is made. Getters answer
-// the record's own value or, where it has none, its parent's; a value of another kind answers nothing and does not
-// climb.
+// When it is made, a record has a type that the configuration knows, a class and, save where none can be made, an
+// identifier. Getters answer the record's own value or, where it has none, its parent's; a value of another kind
+// answers nothing and does not climb.
 class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable_shared_from_this<BasicAccount> {
  public:
   // Making records. `initWithProperties` answers null, after a log line for each reason, where the type is unknown or
   // the class is missing; a record without "Identifier" is given a new one (and, only then, the same "Sync Identifier"
-  // where that is missing). `accountWithType_class` throws AssertionFailure for an unknown type or an empty class; both
-  // throw it where a new identifier is needed and none can be made, since a record without one could not be stored.
+  // where that is missing). `accountWithType_class` throws AssertionFailure for an unknown type or an empty class.
+  // Where a new identifier is needed and none can be made, the record stays without.
   static std::shared_ptr<BasicAccount> accountWithType_class(std::string_view type, std::string_view className);
   static std::shared_ptr<BasicAccount> accountWithProperties(const Dictionary& properties);
   static std::shared_ptr<BasicAccount> initWithProperties(const Dictionary& properties);

@@ -176,6 +176,18 @@ TEST_F(SavingAccounts, SaysOfAnAccountWithoutIdentifierThatItsChangesAreNotFollo
                    "get saved"}));
 }
 
+TEST_F(SavingAccounts, KeepsAnAccountForWhichNoIdentifierCanBeMadeAndSaysSoAtTheLoad) {
+  device.identifiers->canMake = false;
+  const Array accounts{Dictionary{{"Type", "CalDAV"}, {"Class", "TestAccount"}}, properties("b")};
+  const Store store = load(accounts);
+  EXPECT_EQ(messagesOf("-[AccountsManager _setOriginalAccountDictionaries]"),
+            (Lines{"{Type = \"CalDAV\"; Class = \"TestAccount\"} returned a nil identifier. Account properties may not "
+                   "get saved"}));
+  EXPECT_EQ(store->count(), 2U);
+  store->saveAllAccounts();
+  EXPECT_EQ(fileAccounts(), accounts);
+}
+
 TEST_F(SavingAccounts, WritesAnAccountWithoutIdentifierAsItStandsInMemory) {
   const Store store = load({properties("a", {{"Port", 1}})});
   letAnotherProcessWrite({properties("a", {{"Port", 2}}), properties("", {{"Port", 3}})});
