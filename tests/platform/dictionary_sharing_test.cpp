@@ -37,6 +37,7 @@ TEST(SharedDictionaries, MayBeSearchedByManyThreadsWhileAnotherEditsItsOwnCopy) 
   for (const int size : {8, 100}) {
     Dictionary mine = withKeys(size);
     std::vector<std::thread> readers;
+    readers.reserve(4);
     for (int reader = 0; reader < 4; ++reader) {
       readers.emplace_back([copy = mine, size] {
         for (int key = 0; key < size; ++key) EXPECT_EQ(*copy.find("key " + std::to_string(key)), PropertyValue{key});
