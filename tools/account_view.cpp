@@ -49,10 +49,10 @@ std::string nameOf(const BasicAccount& account) {
   return account.displayName().value_or(Text{}).string();
 }
 
-std::vector<Account> childrenOf(const AccountsManager& accounts, const Account& parent) {
-  std::vector<Account> children;
+ChildrenByParent childrenByParent(const AccountsManager& accounts) {
+  ChildrenByParent children;
   for (const auto& account : accounts.allBasicSyncableAccounts()) {
-    if (account->parentAccount() == parent) children.push_back(account);
+    if (const auto& parent = account->parentAccount()) children[parent.get()].push_back(account);
   }
   return children;
 }

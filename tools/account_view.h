@@ -2,6 +2,7 @@
 
 #include <nlohmann/json_fwd.hpp>
 #include <string>
+#include <unordered_map>
 #include <vector>
 
 #include "tools/session.h"
@@ -16,8 +17,9 @@ namespace tools {
 
 // What people call the account; empty where it has no name.
 [[nodiscard]] std::string nameOf(const BasicAccount& account);
-// The indexed children of a top-level account, in order.
-[[nodiscard]] std::vector<Account> childrenOf(const AccountsManager& accounts, const Account& parent);
+// The indexed children of all top-level accounts by their parent, each parent's in order.
+using ChildrenByParent = std::unordered_map<const BasicAccount*, std::vector<Account>>;
+[[nodiscard]] ChildrenByParent childrenByParent(const AccountsManager& accounts);
 
 // Values and accounts for machines. No credential is in them, only that it is there, and of data only its size.
 [[nodiscard]] nlohmann::ordered_json jsonOf(const accountsettings::PropertyValue& value);

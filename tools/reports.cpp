@@ -24,10 +24,10 @@ std::vector<std::string> rowOf(const BasicAccount& account, std::string_view ind
           joinedDataclasses(account.enabledDataclasses().value_or(BasicAccount::Dataclasses{}))};
 }
 
-Json treeOf(const AccountsManager& accounts, const Account& account) {
-  auto tree = jsonOf(*account);
+Json treeOf(ChildrenByParent& byParent, const BasicAccount& account) {
+  auto tree = jsonOf(account);
   auto children = Json::array();
-  for (const auto& child : childrenOf(accounts, account)) children.push_back(jsonOf(*child));
+  for (const auto& child : byParent[&account]) children.push_back(jsonOf(*child));
   tree["children"] = std::move(children);
   return tree;
 }
@@ -54,7 +54,7 @@ std::string textOf(const ServiceAddress& service) {
   return service.host + ":" + std::to_string(service.port) + (service.isSecure ? " (secure)" : " (not secure)");
 }
 
-Rows summaryOf(const AccountsManager& accounts, const Account& account, const std::optional<ServiceAddress>& service) {
+Rows summaryOf(ChildrenByParent& byParent, const Account& account, const std::optional<ServiceAddress>& service) {
   const auto enabled = account->enabledDataclasses();
   Rows rows{{"Identifier", textOf(account->identifier())},
             {"Type", textOf(account->type())},
@@ -64,7 +64,7 @@ Rows summaryOf(const AccountsManager& accounts, const Account& account, const st
             {"Supported", joinedDataclasses(account->supportedDataclasses())}};
   if (service) rows.push_back({"Service", textOf(*service)});
   if (const auto parent = account->parentAccountIdentifier()) rows.push_back({"Parent", parent->string()});
-  for (const auto& child : childrenOf(accounts, account)) rows.push_back({"Child", textOf(child->identifier())});
+  for (const auto& child : byParent[account.get()]) rows.push_back({"Child", textOf(child->identifier())});
   return rows;
 }
 
@@ -81,15 +81,16 @@ Rows propertiesOf(const BasicAccount& account) {
 
 std::string listAccounts(Session& session, const Words&, bool asJson) {
   const auto& accounts = session.accounts();
+  auto byParent = childrenByParent(accounts);
   if (asJson) {
     Json report{{"version", accounts.dataVersion()}, {"accounts", Json::array()}};
-    for (const auto& account : accounts.allBasicAccounts()) report["accounts"].push_back(treeOf(accounts, account));
+    for (const auto& account : accounts.allBasicAccounts()) report["accounts"].push_back(treeOf(byParent, *account));
     return report.dump(2) + "\n";
   }
   Rows rows{{"IDENTIFIER", "TYPE", "CLASS", "NAME", "ENABLED"}};
   for (const auto& account : accounts.allBasicAccounts()) {
     rows.push_back(rowOf(*account, ""));
-    for (const auto& child : childrenOf(accounts, account)) rows.push_back(rowOf(*child, "  "));
+    for (const auto& child : byParent[account.get()]) rows.push_back(rowOf(*child, "  "));
   }
   return table(rows);
 }
@@ -97,10 +98,11 @@ std::string listAccounts(Session& session, const Words&, bool asJson) {
 std::string showAccount(Session& session, const Words& arguments, bool asJson) {
   const auto account = session.accountWithIdentifier(arguments[0]);
   const auto service = serviceOf(session, *account);
+  auto byParent = childrenByParent(session.accounts());
   if (!asJson) {
-    return table(summaryOf(session.accounts(), account, service)) + "Properties\n" + table(propertiesOf(*account));
+    return table(summaryOf(byParent, account, service)) + "Properties\n" + table(propertiesOf(*account));
   }
-  auto report = treeOf(session.accounts(), account);
+  auto report = treeOf(byParent, *account);
   report["service"] = jsonOf(service);
   report["properties"] = tools::jsonOf(account->properties());
   return report.dump(2) + "\n";
