@@ -23,6 +23,12 @@ class ClosedModuleLoader final : public platform::ModuleLoader {
   }
 };
 
+// In the place of this machine's notices: those who follow its mail accounts have nothing to do with another root's.
+class NoNotice final : public platform::PreferencesChangedNotice {
+ public:
+  void post(std::string_view, std::string_view) override {}
+};
+
 bool hasIdentifier(const BasicAccount& account, std::string_view identifier) {
   const auto own = account.identifier();
   return own && *own == identifier;
@@ -48,7 +54,10 @@ Session::Session(const Options& options) : _opensModules{options.opensModules()}
   auto platform = platform::makeLinuxPlatform(options.device);
   _saves = std::make_shared<SaveWatch>(platform.systemLog);
   platform.systemLog = _saves;
-  if (!_opensModules) platform.modules = std::make_shared<ClosedModuleLoader>();
+  if (!_opensModules) {
+    platform.modules = std::make_shared<ClosedModuleLoader>();
+    platform.preferencesChanged = std::make_shared<NoNotice>();
+  }
   platform::setCurrent(std::move(platform));
   AccountsManager::_setShouldSkipNotifications(!_opensModules);
 }

@@ -99,15 +99,18 @@ std::string textOf(const std::map<std::string, sdbus::Variant>& entry) {
 // Hears every signal of the interface.
 class Subscriber {
  public:
-  Subscriber() : _connection{sdbus::createSystemBusConnection()}, _object{sdbus::createObject(*_connection, kPath)} {
-    const std::string match = std::string{"type='signal',path='"} + kPath + "',interface='" + kInterface + "'";
+  explicit Subscriber(const std::string& path = kPath, std::string interface = kInterface)
+      : _interface{std::move(interface)},
+        _connection{sdbus::createSystemBusConnection()},
+        _object{sdbus::createObject(*_connection, path)} {
+    const std::string match = "type='signal',path='" + path + "',interface='" + _interface + "'";
     _slot = _connection->addMatch(match, [this](sdbus::Message& message) { hear(message); });
   }
 
   // Everything that was sent until now: the bus keeps the order of what it is sent, so a last signal of the
   // subscriber's own comes after all of it.
   const Texts& heard() {
-    _object->emitSignal("Last").onInterface(kInterface);
+    _object->emitSignal("Last").onInterface(_interface);
     const auto end = steady_clock::now() + 30s;
     while (!_heardLast && steady_clock::now() < end) {
       if (!_connection->processPendingRequest()) std::this_thread::sleep_for(2ms);
@@ -133,6 +136,7 @@ class Subscriber {
     }
   }
 
+  std::string _interface;
   std::unique_ptr<sdbus::IConnection> _connection;
   std::unique_ptr<sdbus::IObject> _object;
   sdbus::Slot _slot;
@@ -196,6 +200,15 @@ TEST_F(Announcer, TellsNothingMoreOfAChangeThatCouldNotBeSaved) {
 
 TEST_F(Announcer, IsNotAskedUnderAnotherRoot) {
   EXPECT_EQ(device.editWithoutModules({"enable", "A", "Notes"}), 0);
+  EXPECT_THAT(subscriber.heard(), IsEmpty());
+}
+
+TEST_F(Announcer, LeavesItToTheMailApplicationsNoticeToTellOfARepairAndToNobodyUnderAnotherRoot) {
+  Subscriber mailApplication{"/com/vorlix/Notices", "com.vorlix.Notices1"};
+  const Texts repaired{"add", "Mail", "MailAccount", "AccountPath=Mail/IMAP-x"};
+  EXPECT_EQ(device.editWithoutModules(repaired), 0);
+  EXPECT_EQ(device.edit(repaired), 0);
+  EXPECT_THAT(mailApplication.heard(), ElementsAre("PreferencesChanged com.vorlix.mobilemail MailAccounts"));
   EXPECT_THAT(subscriber.heard(), IsEmpty());
 }
 
