@@ -141,8 +141,10 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A150(AccountsManager& store) {
 bool AccountsDataMigrator::_migrateAccountsFrom7A153(AccountsManager& store) {
   const AccountsManager::Account onDevice =
       BasicAccount::initWithProperties(DeviceLocalAccount::basicAccountProperties());
-  onDevice->setEnabledForDataclasses(dataclassesKeptOnDevice());
-  store.replaceAccountsWithTypes_withAccounts({kOnMyDeviceAccountType}, {onDevice});
+  if (onDevice != nullptr) {  // else the device knows no such accounts, and none was loaded
+    onDevice->setEnabledForDataclasses(dataclassesKeptOnDevice());
+    store.replaceAccountsWithTypes_withAccounts({kOnMyDeviceAccountType}, {onDevice});
+  }
   store.setDataVersion(3);
   return true;
 }

@@ -189,6 +189,15 @@ TEST_F(OnDeviceAccount, TakesBothPlacesOfTwoWithItsIdentifier) {
   EXPECT_EQ(store->allBasicAccounts()[0], store->allBasicAccounts()[2]);
 }
 
+TEST_F(OnDeviceAccount, IsNotMadeWhereTheDeviceKnowsNoSuchType) {
+  tests::removeAccountType(device, "OnMyDevice");
+  load({account("OnMyDevice", "D", "1"), account("LDAP", "LDAPAccount", "2")});
+  EXPECT_TRUE(migrator._migrateAccountsFrom7A153(*store));
+  ASSERT_EQ(store->count(), 1U);
+  EXPECT_EQ(at(0).properties(), account("LDAP", "LDAPAccount", "2"));
+  EXPECT_EQ(store->dataVersion(), 3U);
+}
+
 TEST_F(OnDeviceAccount, KnowsTheWordThatForbidsTheCableExactly) {
   EXPECT_TRUE(AccountsDataMigrator::_tetheredDisabledInSources({"Computer", 1, "DenyTethered"}));
   EXPECT_FALSE(

@@ -226,6 +226,14 @@ TEST_F(HostedParents, AreMadeForEveryPlaceOfARecordThatStandsTwice) {
   EXPECT_NE(at(0).identifier(), at(1).identifier());
 }
 
+TEST_F(HostedParents, AreNotMadeWhereTheDeviceKnowsNoCloudAccounts) {
+  tests::removeAccountType(device, "VorlixAccount");
+  load({kHostedMail});
+  migrate();
+  ASSERT_EQ(store->count(), 1U);
+  EXPECT_EQ(at(0).properties(), kHostedMail);
+}
+
 TEST_F(HostedParents, ReachTheFileInPlaceOfTheirMailAccounts) {
   load({kHostedMail});
   migrate();

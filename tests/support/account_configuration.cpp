@@ -44,6 +44,12 @@ Dictionary accountTypesProperties() {
           {"KeldorIMAP", type({"Mail", "Notes"})}};
 }
 
+void removeAccountType(FakeDevice& device, std::string_view type) {
+  Dictionary types = accountTypesProperties();
+  types.remove(type);
+  device.put("/resources/AccountTypesProperties.plist", types);
+}
+
 void putAccountConfiguration(FakeDevice& device) {
   device.put("/resources/AccountTypesProperties.plist", accountTypesProperties());
   Dictionary properties;

@@ -11,4 +11,7 @@ void putAccountConfiguration(FakeDevice& device);
 // The contents of the account-type file, for tests that change it before they put it.
 [[nodiscard]] Dictionary accountTypesProperties();
 
+// Takes a type out of the device's account-type file. For tests that have not yet asked the library for a type.
+void removeAccountType(FakeDevice& device, std::string_view type);
+
 }  // namespace tests
