@@ -276,6 +276,17 @@ INSTANTIATE_TEST_SUITE_P(
                 {"Failed to save accounts to filesystem."}}),
     [](const auto& failure) { return failure.param.name; });
 
+TEST_F(SavingAccounts, SavesDataThatCameWithAnErrorAndSaysTheError) {
+  const Store store = load({properties("a")});
+  store->allBasicAccounts()[0]->setAccountProperty_forKey(2, "Port");
+  device.propertyLists->serializeError = "low on ink";
+  device.propertyLists->serializesDespiteError = true;
+  AccountsManager::_setShouldSkipNotifications(true);
+  store->saveAllAccounts();
+  EXPECT_EQ(fileAccounts(), (Array{properties("a", {{"Port", 2}})}));
+  EXPECT_EQ(messagesOf(kSave).back(), "Failed to serialize account settings data: low on ink");
+}
+
 TEST_F(SavingAccounts, SucceedsAfterAFailure) {
   const Store store = load({properties("a")});
   store->insertAccount(account("b"));

@@ -76,8 +76,8 @@ std::optional<Dictionary> FakePropertyListStore::readDictionary(const Path& path
 }
 
 platform::SerializedPropertyList FakePropertyListStore::serialize(const Dictionary& dictionary) {
-  if (!serializeError.empty()) return {std::nullopt, serializeError};
-  return {bytesFor(dictionary), {}};
+  if (!serializeError.empty() && !serializesDespiteError) return {std::nullopt, serializeError};
+  return {bytesFor(dictionary), serializeError};
 }
 
 std::optional<bool> FakePreferencesStore::boolean(std::string_view domain, std::string_view key) const {

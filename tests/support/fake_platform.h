@@ -42,7 +42,8 @@ class FakePropertyListStore final : public platform::PropertyListStore {
   explicit FakePropertyListStore(std::shared_ptr<FakeFileSystem> files) : _files{std::move(files)} {}
 
   std::string serializeError;  // where set, serialising fails with it
-  std::vector<Path> reads;     // every path that was asked for, in order
+  bool serializesDespiteError = false;
+  std::vector<Path> reads;  // every path that was asked for, in order
   // Called before each read, so that a test can change a file at that moment.
   std::function<void(const Path&)> beforeRead;
 
