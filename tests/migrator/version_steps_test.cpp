@@ -108,6 +108,32 @@ TEST_F(Dispatch, LeavesTheStampAtSixUntilTheLastStepOfTheSecondGeneration) {
   EXPECT_EQ(stages->versions, (std::vector<std::uint64_t>{6, 6, 9, 10, 11, 12}));
 }
 
+// What each message says before the account that it describes.
+std::vector<std::string> headsOf(std::vector<std::string> messages) {
+  for (std::string& message : messages) message.resize(std::min(message.size(), message.find(" {")));
+  return messages;
+}
+
+TEST_F(Dispatch, SaysInTheLogWhatTheStepsDoInTheirOrder) {
+  const Dictionary principal{{"Login_Key", "jane"}, {"CalDAV_Server_Key", "www.google.com"}};
+  const Dictionary path{{"CalDAV_PrincipalPath_Key", "/calendar/dav/jane/user"}};
+  load({account("Mail", "GmailAccount", "G", {{"Username", "jane"}}),
+        account("CalDAV", "MobileCalDAVAccount", "C",
+                {{"CalDAVPrincipalConfiguration", principal}, {"CalDAVAccountConfiguration", path}})});
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  std::vector<std::string> expected{"Replacing accounts", "Replacing accounts",  // identifiers
+                                    "Replacing accounts",                        // the on-device account
+                                    "Replacing accounts", "Deleting account:"};  // hosted notes; the folded partner
+  for (int save = 0; save < 6; ++save) {
+    expected.emplace_back("Saving all accounts");
+    for (const std::string type : {"Gmail", "OnMyDevice"}) {
+      expected.insert(expected.end(),
+                      {"Merging inmem", "Merged to", "Calculated Properties - Type: " + type + ", Properties:"});
+    }
+  }
+  EXPECT_EQ(headsOf(device.logMessages()), expected);
+}
+
 TEST_F(Dispatch, LeavesStoreAndFileOfACurrentVersionAlone) {
   load({account("Mail", "IMAPAccount", "M", {{"uniqueId", "U"}})}, 12);
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
