@@ -55,6 +55,15 @@ def quoted(line):
     return line[line.index('"') + 1 : line.rindex('"')]
 
 
+def exactly(value):
+    """Told apart by kind as well, which == does not do for 1, 1.0 and True."""
+    if isinstance(value, dict):
+        return {key: exactly(element) for key, element in value.items()}
+    if isinstance(value, list):
+        return [exactly(element) for element in value]
+    return (type(value).__name__, value)
+
+
 class Device:
     def __init__(self, root):
         self.root = Path(root)

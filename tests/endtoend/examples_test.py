@@ -3,7 +3,7 @@
 import os
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY, HOME
+from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY, HOME, exactly
 from device_case import HOST, DeviceTest
 
 MOBILE = 501
@@ -47,7 +47,8 @@ class Examples(DeviceTest):
     def test_a_current_device_keeps_every_value(self):
         device, before, run = self.migrated("current")
         self.assert_left(device, before, new=[SETTINGS_COPY])
-        self.assertEqual(self.example("current").read_plist(SETTINGS), device.read_plist(SETTINGS))
+        kept = self.example("current").read_plist(SETTINGS)
+        self.assertEqual(exactly(kept), exactly(device.read_plist(SETTINGS)))
         self.assertEqual(before[SETTINGS].content, device.read(SETTINGS_COPY))
         self.assertEqual([], run.console())
 
@@ -83,7 +84,7 @@ class Examples(DeviceTest):
         settled = device.read_plist(SETTINGS)
         run = device.migrate(HOST)
         self.assertEqual((0, []), (run.status, run.console()))
-        self.assertEqual(settled, device.read_plist(SETTINGS))
+        self.assertEqual(exactly(settled), exactly(device.read_plist(SETTINGS)))
 
 
 if __name__ == "__main__":

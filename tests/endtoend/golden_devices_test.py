@@ -9,7 +9,7 @@ import re
 import unittest
 from pathlib import Path
 
-from device import PREFERENCES, SETTINGS
+from device import PREFERENCES, SETTINGS, exactly
 from device_case import HOST, DeviceTest
 
 DEVICES = Path(__file__).parent / "devices"
@@ -44,15 +44,6 @@ class Labels:
         if isinstance(value, str) and value not in self.known and UUID.fullmatch(value):
             return self.names.setdefault(value, f"(new {len(self.names) + 1})")
         return value
-
-
-def exactly(value):
-    """Told apart by kind as well, which == does not do for 1, 1.0 and True."""
-    if isinstance(value, dict):
-        return {key: exactly(element) for key, element in value.items()}
-    if isinstance(value, list):
-        return [exactly(element) for element in value]
-    return (type(value).__name__, value)
 
 
 class GoldenDevices(DeviceTest):

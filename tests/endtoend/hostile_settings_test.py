@@ -5,7 +5,7 @@ import resource
 import struct
 import unittest
 
-from device import SETTINGS, SETTINGS_COPY, TEMPORARY
+from device import SETTINGS, SETTINGS_COPY, TEMPORARY, exactly
 from device_case import HOST, DeviceTest
 
 EMPTY = {"Accounts": [], "Version": 12}
@@ -111,7 +111,7 @@ class HostileSettings(DeviceTest):
     def test_values_of_the_wrong_kind_stay_as_they_are(self):
         odd = {**GOOD, "DisplayName": 7, "Enabled Dataclasses": "Mail", "ChildAccounts": [1, {}, "x"], "Username": []}
         device, _ = self.migrate(plistlib.dumps({"Accounts": [odd], "Version": 12}))
-        self.assertEqual({"Accounts": [odd], "Version": 12}, device.read_plist(SETTINGS))
+        self.assertEqual(exactly({"Accounts": [odd], "Version": 12}), exactly(device.read_plist(SETTINGS)))
 
     def test_keys_beside_accounts_and_version_are_not_written(self):
         device, _ = self.migrate(plistlib.dumps({"Accounts": [GOOD], "Version": 12, "Other": 1}))

@@ -5,7 +5,7 @@ import tempfile
 import unittest
 from pathlib import Path
 
-from device import HOME, LEGACY_EXCHANGE, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY, Device
+from device import HOME, LEGACY_EXCHANGE, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY, Device, exactly
 
 HOST = Path(os.environ["MIGRATION_HOST"])
 DEVICE_INFO = "etc/vorlix/device-info.plist"
@@ -146,7 +146,8 @@ class LegacyCase(unittest.TestCase):
         self.assertEqual([MAIL_NOTICE], run.told("preferences-changed"))
         self.assertEqual([], run.told("cloud-tabs"))
         self.assert_files(device, files)
-        self.assertEqual({"Accounts": list(accounts), "Version": 12}, device.read_plist(SETTINGS))
+        expected = {"Accounts": list(accounts), "Version": 12}
+        self.assertEqual(exactly(expected), exactly(device.read_plist(SETTINGS)))
 
     def assert_files(self, device, expected):
         """Exactly these files stand below the mobile user's home."""
