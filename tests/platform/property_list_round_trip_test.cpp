@@ -5,9 +5,6 @@
 #include <bit>
 #include <cmath>
 #include <cstdlib>
-#include <filesystem>
-#include <fstream>
-#include <iterator>
 #include <random>
 #include <string>
 #include <vector>
@@ -15,6 +12,7 @@
 #include "platform/description.h"
 #include "tests/support/property_list_files.h"
 #include "tests/support/property_value_generator.h"
+#include "tests/support/scratch_directory.h"
 
 namespace platform {
 void showValue(const Dictionary& dictionary, std::ostream& stream);
@@ -106,28 +104,18 @@ RC_GTEST_PROP(RandomPropertyLists, SurviveACopyThatIsEditedAndRestored, ()) {
 
 class PlistlibTest : public testing::Test {
  protected:
-  PlistlibTest() { std::filesystem::create_directories(_directory); }
-  ~PlistlibTest() override { std::filesystem::remove_all(_directory); }
-
-  void write(const std::string& name, const Bytes& bytes) {
-    std::ofstream{_directory / name, std::ios::binary}.write(reinterpret_cast<const char*>(bytes.data()),
-                                                             static_cast<std::streamsize>(bytes.size()));
-  }
-  void write(const std::string& name, const std::string& text) { write(name, Bytes{text.begin(), text.end()}); }
-  [[nodiscard]] std::string contents(const std::string& name) const {
-    std::ifstream file{_directory / name, std::ios::binary};
-    return {std::istreambuf_iterator<char>{file}, {}};
-  }
+  void write(const std::string& name, const Bytes& bytes) { write(name, std::string{bytes.begin(), bytes.end()}); }
+  void write(const std::string& name, const std::string& text) { _scratch.put(name, text); }
+  [[nodiscard]] std::string contents(const std::string& name) const { return _scratch.contents(name); }
   // Compares each N.plist with N.txt, and writes what it has read as N.binary and N.xml.
   void runPython() {
     const std::string command =
-        std::string{PYTHON_EXECUTABLE} + " " + PLISTLIB_CHECK + " '" + _directory.string() + "'";
+        std::string{PYTHON_EXECUTABLE} + " " + PLISTLIB_CHECK + " '" + _scratch.path().string() + "'";
     ASSERT_EQ(std::system(command.c_str()), 0);  // NOLINT(cert-env33-c)
   }
 
  private:
-  std::filesystem::path _directory =
-      std::filesystem::temp_directory_path() / ("plistlib-" + std::to_string(std::random_device{}()));
+  tests::ScratchDirectory _scratch;
 };
 
 // Both ways: what is written here is what Python reads, and what Python writes is what is read here.
