@@ -71,6 +71,15 @@ TEST_F(LookingUpAccounts, SaysWhichChildrenItIgnores) {
                    "Ignoring unknown child account with properties no dictionary"}));
 }
 
+TEST_F(LookingUpAccounts, IndexesAChildForWhichNoIdentifierCanBeMadeUnderTheOneItsParentGivesIt) {
+  device.identifiers->canMake = false;
+  const Store store = load({parent("p", {Dictionary{{"Type", "CalDAV"}, {"Class", "TestAccount"}}})});
+  EXPECT_EQ(identifiersOf(store->allBasicSyncableAccounts()), (Lines{"p", "p"}));
+  EXPECT_EQ(store->accountWithIdentifier("p"), store->allBasicAccounts()[0]);
+  store->deleteAccountWithIdentifier("p");
+  EXPECT_TRUE(store->allBasicSyncableAccounts().empty());
+}
+
 TEST_F(LookingUpAccounts, TakesChildrenThatAreNoArrayForNone) {
   EXPECT_EQ(load({properties("p", {{"ChildAccounts", "text"}})})->allBasicSyncableAccounts().size(), 1U);
 }
