@@ -2,7 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <filesystem>
 #include <memory>
 #include <string>
@@ -15,34 +14,13 @@
 #include "tests/modules/sample_journal.h"
 #include "tests/support/account_configuration.h"
 #include "tests/support/fake_platform.h"
+#include "tests/support/scratch_directory.h"
 
 namespace tests {
 
 using accountsettings::AccountsManager;
 using accountsettings::AssertionFailure;
 using accountsettings::BasicAccount;
-
-// A new directory that goes with this object. Its path cannot be changed, so nothing else is ever removed.
-class ScratchDirectory {
- public:
-  ScratchDirectory() : _path{make()} {}
-  ScratchDirectory(const ScratchDirectory&) = delete;
-  ScratchDirectory& operator=(const ScratchDirectory&) = delete;
-  ~ScratchDirectory() {
-    std::error_code ignored;
-    std::filesystem::remove_all(_path, ignored);
-  }
-  [[nodiscard]] const Path& path() const { return _path; }
-
- private:
-  static Path make() {
-    std::string name = std::filesystem::temp_directory_path() / "modules-XXXXXX";
-    if (::mkdtemp(name.data()) == nullptr) std::abort();
-    return name;
-  }
-
-  const Path _path;
-};
 
 // A device whose root is a real directory with the sample modules in it, opened by the real loader. Everything else of
 // it is in memory.

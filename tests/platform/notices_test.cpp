@@ -5,18 +5,17 @@
 #include <sdbus-c++/sdbus-c++.h>
 #include <sys/socket.h>
 #include <sys/un.h>
-#include <sys/wait.h>
 #include <unistd.h>
 
 #include <array>
 #include <chrono>
-#include <csignal>
 #include <cstdlib>
 #include <cstring>
 #include <thread>
 
 #include "platform/linux/linux_platform.h"
 #include "tests/support/fake_platform.h"
+#include "tests/support/private_bus.h"
 #include "tests/support/scratch_directory.h"
 
 namespace tests {
@@ -24,62 +23,6 @@ namespace {
 
 using namespace std::chrono_literals;
 using testing::ElementsAre;
-
-constexpr const char* configuration = R"(<busconfig>
-  <type>system</type>
-  <listen>unix:path=%s</listen>
-  <auth>EXTERNAL</auth>
-  <policy context="default">
-    <allow user="*"/>
-    <allow send_destination="*"/>
-    <allow receive_sender="*"/>
-    <allow own="*"/>
-  </policy>
-</busconfig>
-)";
-
-// A bus daemon of the test's own, which is the process's system bus.
-class PrivateBus {
- public:
-  PrivateBus() {
-    std::array<char, 1024> text{};
-    std::snprintf(text.data(), text.size(), configuration, (_scratch / "bus").c_str());
-    _scratch.put("bus.conf", text.data());
-    start();
-    ::setenv("DBUS_SYSTEM_BUS_ADDRESS", ("unix:path=" + (_scratch / "bus").string()).c_str(), 1);
-  }
-  PrivateBus(const PrivateBus&) = delete;
-  PrivateBus& operator=(const PrivateBus&) = delete;
-  ~PrivateBus() { stop(); }
-
-  // Answers once the daemon takes connections.
-  void start() {
-    std::array<int, 2> ends{};
-    ASSERT_EQ(::pipe(ends.data()), 0);
-    _daemon = ::fork();
-    if (_daemon == 0) {
-      ::dup2(ends[1], STDOUT_FILENO);
-      const std::string file = "--config-file=" + (_scratch / "bus.conf").string();
-      ::execlp("dbus-daemon", "dbus-daemon", file.c_str(), "--nofork", "--nosyslog", "--print-address", nullptr);
-      ::_exit(1);
-    }
-    ::close(ends[1]);
-    char letter = 0;
-    ASSERT_EQ(::read(ends[0], &letter, 1), 1) << "no dbus-daemon";
-    ::close(ends[0]);
-  }
-  void stop() {
-    if (_daemon <= 0) return;
-    ::kill(_daemon, SIGKILL);
-    ::waitpid(_daemon, nullptr, 0);
-    _daemon = -1;
-    std::filesystem::remove(_scratch / "bus");
-  }
-
- private:
-  ScratchDirectory _scratch;
-  pid_t _daemon = -1;
-};
 
 // Hears every signal of the notices' interface.
 class Subscriber {

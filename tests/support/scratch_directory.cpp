@@ -6,12 +6,17 @@
 #include <stdexcept>
 
 namespace tests {
+namespace {
 
-ScratchDirectory::ScratchDirectory() {
+std::filesystem::path newDirectory() {
   std::string name = (std::filesystem::temp_directory_path() / "account-tests-XXXXXX").string();
   if (::mkdtemp(name.data()) == nullptr) throw std::runtime_error{"no scratch directory"};
-  _path = std::filesystem::canonical(name);
+  return std::filesystem::canonical(name);
 }
+
+}  // namespace
+
+ScratchDirectory::ScratchDirectory() : _path{newDirectory()} {}
 
 ScratchDirectory::~ScratchDirectory() {
   std::error_code unused;

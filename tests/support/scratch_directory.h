@@ -6,7 +6,8 @@
 
 namespace tests {
 
-// A directory of a test's own, made new and removed again with all below it.
+// A directory of a test's own, made new and removed again with all below it. Its path cannot be changed, so nothing
+// else is ever removed.
 class ScratchDirectory {
  public:
   ScratchDirectory();
@@ -22,7 +23,7 @@ class ScratchDirectory {
   [[nodiscard]] std::string contents(std::string_view below) const;
 
  private:
-  std::filesystem::path _path;
+  const std::filesystem::path _path;
 };
 
 // The permission bits of what stands at the path, links unfollowed.
