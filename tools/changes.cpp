@@ -123,15 +123,15 @@ void removeEveryRecord(AccountsManager& accounts, const Account& account) {
 
 }  // namespace
 
-std::string enableDataclass(Session& session, const Words& arguments, bool asJson) {
+Outcome enableDataclass(Session& session, const Words& arguments, bool asJson) {
   return switchDataclass(session, arguments, asJson, true);
 }
 
-std::string disableDataclass(Session& session, const Words& arguments, bool asJson) {
+Outcome disableDataclass(Session& session, const Words& arguments, bool asJson) {
   return switchDataclass(session, arguments, asJson, false);
 }
 
-std::string renameAccount(Session& session, const Words& arguments, bool asJson) {
+Outcome renameAccount(Session& session, const Words& arguments, bool asJson) {
   if (arguments[1].empty()) refuse("an account's name cannot be empty");
   session.beginChanges();
   const auto account = session.accountWithIdentifier(arguments[0]);
@@ -144,7 +144,7 @@ std::string renameAccount(Session& session, const Words& arguments, bool asJson)
   return printedChange(*account, asJson);
 }
 
-std::string addAccount(Session& session, const Words& arguments, bool asJson) {
+Outcome addAccount(Session& session, const Words& arguments, bool asJson) {
   session.beginChanges();
   const auto account = newAccount(arguments);
   const auto identifier = account->identifier().value_or(Text{}).string();
@@ -153,14 +153,14 @@ std::string addAccount(Session& session, const Words& arguments, bool asJson) {
   return asJson ? printedChange(*account, true) : identifier + "\n";
 }
 
-std::string removeAccount(Session& session, const Words& arguments, bool asJson) {
+Outcome removeAccount(Session& session, const Words& arguments, bool asJson) {
   session.beginChanges();
   const auto account = session.accountWithIdentifier(arguments[0]);
   changeAndSave(session, account, enabledOf(*account), [&] { removeEveryRecord(session.accounts(), account); });
   return asJson ? Json{{"removed", arguments[0]}}.dump(2) + "\n" : std::string{};
 }
 
-std::string saveAccounts(Session& session, const Words&, bool asJson) {
+Outcome saveAccounts(Session& session, const Words&, bool asJson) {
   session.beginChanges();
   session.save();
   return asJson ? Json{{"saved", session.accounts().count()}}.dump(2) + "\n" : std::string{};

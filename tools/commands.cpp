@@ -13,6 +13,7 @@ const std::vector<Command>& commands() {
   static const std::vector<Command> all{
       {"list", "", "all accounts, children below their parents", 0, 0, listAccounts},
       {"show", "ID", "one account with its properties", 1, 1, showAccount},
+      {"verify", "[FILE]", "what a migration would do about each fault", 0, 1, verifySettings},
       {"types", "", "the account types, with their data classes", 0, 0, listTypes},
       {"enable", "ID DATACLASS", "switch a data class on", 2, 2, enableDataclass},
       {"disable", "ID DATACLASS", "switch a data class off", 2, 2, disableDataclass},

@@ -9,6 +9,7 @@ namespace tools {
 enum class ExitStatus : int {
   done = 0,
   failed = 1,              // the accounts could not be read or saved; the file is as it was
+  findings = 1,            // a file that was to be verified has faults; for scripts as good as one that cannot be read
   wrongUse = 2,            // what was asked makes no sense; nothing was changed
   noSuchAccount = 3,       // nothing was changed
   faultyInstallation = 4,  // the configuration or a module is at fault; the message says whether the change was saved

@@ -37,8 +37,8 @@ constexpr std::string_view kUsageOptions =
     "DATACLASS is written Mail or com.vorlix.Dataclass.Mail, VALUE is a text;\n"
     "KEY:=JSON gives any other value. Credentials are never printed.\n"
     "\n"
-    "Exit status: 0 done, 1 failed, 2 wrong use, 3 no such account, 4 the\n"
-    "configuration or a module is at fault.\n";
+    "Exit status: 0 done, 1 failed or findings, 2 wrong use, 3 no such account,\n"
+    "4 the configuration or a module is at fault.\n";
 
 // A reader that went away and a file that may not grow are failed writes, not the end of a half-done change.
 void surviveFailedWrites() {
@@ -80,18 +80,19 @@ const tools::Command& commandOf(const tools::Options& options) {
   return *found;
 }
 
-std::string run(std::span<const char* const> arguments) {
+tools::Outcome run(std::span<const char* const> arguments) {
   const auto options = tools::parseArguments(arguments);
   if (options.printsHelp) return usage();
-  if (options.printsVersion) return "accountctl " ACCOUNTCTL_VERSION "\n";
+  if (options.printsVersion) return std::string{"accountctl " ACCOUNTCTL_VERSION "\n"};
   const auto& command = commandOf(options);
   tools::Session session{options};
   return command.run(session, options.arguments, options.printsJson);
 }
 
-ExitStatus print(const std::string& output) {
+ExitStatus print(const tools::Outcome& outcome) {
+  const auto& output = outcome.output;
   const bool isWritten = std::fwrite(output.data(), 1, output.size(), stdout) == output.size();
-  if (isWritten && std::fflush(stdout) == 0) return ExitStatus::done;
+  if (isWritten && std::fflush(stdout) == 0) return outcome.status;
   say("the output could not be written");
   return ExitStatus::failed;
 }

@@ -79,7 +79,7 @@ Rows propertiesOf(const BasicAccount& account) {
 
 }  // namespace
 
-std::string listAccounts(Session& session, const Words&, bool asJson) {
+Outcome listAccounts(Session& session, const Words&, bool asJson) {
   const auto& accounts = session.accounts();
   auto byParent = childrenByParent(accounts);
   if (asJson) {
@@ -95,7 +95,7 @@ std::string listAccounts(Session& session, const Words&, bool asJson) {
   return table(rows);
 }
 
-std::string showAccount(Session& session, const Words& arguments, bool asJson) {
+Outcome showAccount(Session& session, const Words& arguments, bool asJson) {
   const auto account = session.accountWithIdentifier(arguments[0]);
   const auto service = serviceOf(session, *account);
   auto byParent = childrenByParent(session.accounts());
@@ -108,7 +108,7 @@ std::string showAccount(Session& session, const Words& arguments, bool asJson) {
   return report.dump(2) + "\n";
 }
 
-std::string listTypes(Session&, const Words&, bool asJson) {
+Outcome listTypes(Session&, const Words&, bool asJson) {
   Json report{{"types", Json::array()}};
   Rows rows{{"TYPE", "DATA CLASSES"}};
   for (const Text& type : BasicAccount::_accountTypes()) {

@@ -14,8 +14,11 @@ class SaveWatch final : public platform::SystemLog {
  public:
   explicit SaveWatch(std::shared_ptr<platform::SystemLog> log) : _log{std::move(log)} {}
 
-  [[nodiscard]] bool hasReaders() const override { return true; }
+  [[nodiscard]] bool hasReaders() const override { return _passesOn; }
   void write(const platform::LogRecord& record) override;
+
+  // Hears and passes on nothing any more.
+  void keepToYourself() { _passesOn = false; }
 
   // Whether a save has failed.
   [[nodiscard]] bool hasFailed() const { return _hasFailed; }
@@ -27,6 +30,7 @@ class SaveWatch final : public platform::SystemLog {
   void hear(const std::string& message);
 
   std::shared_ptr<platform::SystemLog> _log;
+  bool _passesOn = true;
   bool _hasFailed = false;
   std::string _cause;
 };

@@ -29,6 +29,23 @@ class NoNotice final : public platform::PreferencesChangedNotice {
   void post(std::string_view, std::string_view) override {}
 };
 
+// Answers another file in the place of the device's settings.
+class SettingsFromElsewhere final : public platform::PropertyListStore {
+ public:
+  SettingsFromElsewhere(std::shared_ptr<PropertyListStore> store, platform::Path file)
+      : _store{std::move(store)}, _file{std::move(file)} {}
+  [[nodiscard]] std::optional<accountsettings::Dictionary> readDictionary(const platform::Path& path) override {
+    return _store->readDictionary(path == AccountsManager::fullPathToAccountSettingsPlist() ? _file : path);
+  }
+  [[nodiscard]] platform::SerializedPropertyList serialize(const accountsettings::Dictionary& dictionary) override {
+    return _store->serialize(dictionary);
+  }
+
+ private:
+  std::shared_ptr<PropertyListStore> _store;
+  platform::Path _file;
+};
+
 bool hasIdentifier(const BasicAccount& account, std::string_view identifier) {
   const auto own = account.identifier();
   return own && *own == identifier;
@@ -86,6 +103,17 @@ Account Session::accountWithIdentifier(std::string_view identifier) {
     if (hasIdentifier(*account, identifier)) return account;
   }
   throw Failure{ExitStatus::noSuchAccount, "no account has the identifier " + std::string{identifier}};
+}
+
+void Session::beginExamination(const std::optional<platform::Path>& file) {
+  _saves->keepToYourself();
+  if (!file) {
+    AccountsManager::waitForMigrationToFinish();
+    return;
+  }
+  auto platform = platform::current();
+  platform.propertyLists = std::make_shared<SettingsFromElsewhere>(platform.propertyLists, *file);
+  platform::setCurrent(std::move(platform));
 }
 
 void Session::beginChanges() {

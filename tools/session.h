@@ -2,6 +2,7 @@
 
 #include <cstddef>
 #include <memory>
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -28,6 +29,11 @@ class Session {
 
   // The account or child account of that identifier; throws Failure where there is none.
   [[nodiscard]] Account accountWithIdentifier(std::string_view identifier);
+
+  // Makes the session one that only looks and of which nobody is told, not even the log. The settings are read from
+  // the file that is named, wherever it lies, else from the device's own once no migration is running. To be called
+  // before anything else.
+  void beginExamination(const std::optional<platform::Path>& file);
 
   // To be called before the accounts are changed: throws Failure where they are of an earlier release, since saving
   // them would mark them as migrated.

@@ -201,8 +201,8 @@ class Output(AccountctlTest):
 class Help(AccountctlTest):
     def test_names_every_command_and_every_option(self):
         text = "\n".join(self.done("--help"))
-        for name in ("list", "show ID", "types", "enable ID", "disable ID", "rename ID", "add TYPE", "remove ID", "save",
-                     "--root", "--home", "--resources", "--modules", "--json", "--version", "Exit status"):
+        for name in ("list", "show ID", "verify [FILE]", "types", "enable ID", "disable ID", "rename ID", "add TYPE",
+                     "remove ID", "save", "--root", "--home", "--resources", "--modules", "--json", "--version", "Exit status"):
             self.assertIn(name, text)
 
     def test_fits_a_terminal(self):
