@@ -1,0 +1,27 @@
+#pragma once
+
+#include <cstddef>
+#include <cstdint>
+
+#include "platform/property_value.h"
+
+namespace bench {
+
+// What a settings file of a device with many accounts holds. The same arguments give the same values on every machine.
+// Accounts are of the types that devices have, with 15 to 25 keys each; every tenth is a cloud account with two
+// children (or as many as asked for), and one in four carries a blob of data. Some calendar accounts belong to a mail
+// account of the same user, as in files of early releases.
+struct Population {
+  std::size_t accounts = 1000;
+  std::uint64_t version = 12;
+  std::size_t children = 2;
+  std::uint64_t seed = 20071109;
+};
+
+// The file's root: the accounts and the version.
+[[nodiscard]] platform::Dictionary settingsOf(const Population& population);
+
+// The accounts alone.
+[[nodiscard]] platform::Array accountsOf(const Population& population);
+
+}  // namespace bench

@@ -1,0 +1,18 @@
+#pragma once
+
+#include <chrono>
+
+namespace bench {
+
+// Measures from its making on and prints, as one JSON object, the time with and without waiting for stable storage, and
+// the process's largest memory.
+class Measurement {
+ public:
+  Measurement();
+  void print() const;
+
+ private:
+  std::chrono::steady_clock::time_point _start;
+};
+
+}  // namespace bench

@@ -1,0 +1,224 @@
+#include "bench/pieces.h"
+
+#include <memory>
+
+#include "accountsettings/accounts_manager.h"
+#include "accountsettings/log_handle.h"
+#include "bench/memory_device.h"
+#include "migrator/accounts_data_migrator.h"
+#include "platform/description.h"
+#include "platform/linux/libplist_property_list_store.h"
+
+namespace bench {
+namespace {
+
+using accountsettings::AccountsManager;
+using accountsettings::BasicAccount;
+using migrator::AccountsDataMigrator;
+using platform::Array;
+using platform::Bytes;
+using platform::Dictionary;
+using platform::PropertyValue;
+
+using Action = std::function<void()>;
+using Store = std::shared_ptr<AccountsManager>;
+
+// Keeps the compiler from leaving out what nobody looks at.
+template <typename Value>
+void use(const Value& value) {
+  asm volatile("" : : "g"(&value) : "memory");
+}
+
+const PropertyValue kOtherName{"another name"};
+
+// --- Values ---
+
+Action copyAndEdit(const Population& population) {
+  return [accounts = accountsOf(population)] {
+    Array copies = accounts;
+    for (PropertyValue& each : copies) {
+      Dictionary copy = *each.asDictionary();
+      copy.set("DisplayName", kOtherName);
+      each = std::move(copy);
+    }
+    use(copies);
+  };
+}
+
+Action compareEqual(const Population& population) {
+  return [left = accountsOf(population), right = accountsOf(population)] { use(left == right); };
+}
+
+Action compareIdentical(const Population& population) {
+  return [left = settingsOf(population)] {
+    const Dictionary right = left;
+    use(left == right);
+  };
+}
+
+Action describe(const Population& population) {
+  return [accounts = accountsOf(population)] {
+    for (const PropertyValue& each : accounts) use(platform::description(each));
+  };
+}
+
+// --- Property lists ---
+
+class OneFile final : public platform::FileSystem {
+ public:
+  explicit OneFile(Bytes bytes) : _bytes{std::move(bytes)} {}
+  using Path = platform::Path;
+  using Status = platform::Status;
+  [[nodiscard]] std::optional<platform::FileKind> kindOf(const Path& /*path*/) override { return std::nullopt; }
+  platform::Result<Bytes> read(const Path& /*path*/, std::size_t /*limit*/) override { return _bytes; }
+  Status create(const Path& /*path*/, std::span<const std::uint8_t> /*bytes*/) override { return {}; }
+  Status replace(const Path& /*path*/, std::span<const std::uint8_t> /*bytes*/) override { return {}; }
+  Status copy(const Path& /*from*/, const Path& /*to*/) override { return {}; }
+  Status remove(const Path& /*path*/) override { return {}; }
+  Status createDirectories(const Path& /*path*/, unsigned /*permissions*/) override { return {}; }
+  Status setOwner(const Path& /*path*/, std::string_view /*owner*/, std::string_view /*group*/) override { return {}; }
+  [[nodiscard]] std::optional<Path> temporaryName() override { return std::nullopt; }
+  Status rename(const Path& /*from*/, const Path& /*to*/) override { return {}; }
+
+ private:
+  Bytes _bytes;
+};
+
+std::shared_ptr<platform::PropertyListStore> listStore(Bytes file) {
+  return platform::makeLibplistPropertyListStore(std::make_shared<OneFile>(std::move(file)));
+}
+
+Action parse(const Population& population) {
+  Bytes file = *listStore({})->serialize(settingsOf(population)).data;
+  return [store = listStore(std::move(file))] { use(store->readDictionary("/file")); };
+}
+
+Action serialize(const Population& population) {
+  return [store = listStore({}), settings = settingsOf(population)] { use(store->serialize(settings)); };
+}
+
+// --- The store ---
+
+Store loaded(const Population& population) {
+  static const bool isSet = [] {
+    platform::setCurrent(makeMemoryDevice());
+    return true;
+  }();
+  use(isSet);
+  use(platform::current().propertyLists->serialize(settingsOf(population)));
+  return AccountsManager::init();
+}
+
+// The action on a store that was loaded from the device's file.
+Piece ofStore(const char* name, void (*act)(AccountsManager&)) {
+  return {name,
+          [act](const Population& population) -> Action { return [store = loaded(population), act] { act(*store); }; }};
+}
+
+std::shared_ptr<BasicAccount> stranger() {
+  return BasicAccount::accountWithType_class(accountsettings::kCalDAVAccountType, "MobileCalDAVAccount");
+}
+
+void load(AccountsManager& /*store*/) { use(AccountsManager::init()); }
+
+void save(AccountsManager& store) { store.saveAllAccounts(); }
+
+void saveChanged(AccountsManager& store) {
+  for (const auto& account : store.allBasicAccounts()) account->setDisplayName("another name");
+  store.saveAllAccounts();
+}
+
+void merge(AccountsManager& store) {
+  for (const auto& account : store.allBasicAccounts()) {
+    Dictionary changed = account->properties();
+    changed.set("DisplayName", kOtherName);
+    use(AccountsManager::mergeInMemoryProperties_originalProperties_onDiskProperties(
+        changed, account->originalProperties(), &account->properties()));
+  }
+}
+
+void lookUp(AccountsManager& store) {
+  for (const auto& account : store.allBasicSyncableAccounts()) use(store.accountWithIdentifier(*account->identifier()));
+}
+
+void insert(AccountsManager& store) {
+  for (std::size_t count = store.count(); count > 0; --count) store.insertAccount(stranger());
+}
+
+// These walk the order by their definition, so their number stays the same.
+constexpr std::size_t kFew = 10;
+
+void update(AccountsManager& store) {
+  for (std::size_t number = 0; number < kFew; ++number) store.updateAccount(store.allBasicAccounts()[number]);
+}
+
+void remove(AccountsManager& store) {
+  for (std::size_t number = 0; number < kFew; ++number) store.deleteAccount(store.allBasicAccounts()[number]);
+}
+
+void addChildren(AccountsManager& store) {
+  for (const auto& account : store.allBasicAccounts()) store.addChild_toAccount(stranger(), account);
+}
+
+void replaceAll(AccountsManager& store) {
+  const AccountsManager::Accounts accounts = store.allBasicAccounts();
+  store.replaceAccountsWithTypes_withAccounts({accountsettings::kMailAccountType}, accounts);
+}
+
+void logUnread(AccountsManager& store) {
+  for (const auto& account : store.allBasicAccounts()) {
+    accountsettings::_ASLogSystem().log("-[Bench logUnread]", "An account: %@ %@", account->properties(),
+                                        account->originalProperties());
+  }
+}
+
+// --- Version steps ---
+
+Piece ofStep(const char* name, bool (AccountsDataMigrator::*step)(AccountsManager&)) {
+  return {name, [step](Population population) -> Action {
+            population.version = 0;
+            return [store = loaded(population), step] {
+              AccountsDataMigrator migrator;
+              use((migrator.*step)(*store));
+            };
+          }};
+}
+
+}  // namespace
+
+const std::vector<Piece>& pieces() {
+  static const std::vector<Piece> all{
+      {"copy", &copyAndEdit},
+      {"equality", &compareEqual},
+      {"identity", &compareIdentical},
+      {"description", &describe},
+      {"parse", &parse},
+      {"serialize", &serialize},
+      ofStore("load", &load),
+      ofStore("save", &save),
+      ofStore("save changed", &saveChanged),
+      ofStore("merge", &merge),
+      ofStore("look-up", &lookUp),
+      ofStore("insert", &insert),
+      ofStore("update", &update),
+      ofStore("remove", &remove),
+      ofStore("add children", &addChildren),
+      ofStore("replace all", &replaceAll),
+      ofStore("log unread", &logUnread),
+      ofStep("7A149", &AccountsDataMigrator::_migrateAccountsFrom7A149),
+      ofStep("7A150", &AccountsDataMigrator::_migrateAccountsFrom7A150),
+      ofStep("7A153", &AccountsDataMigrator::_migrateAccountsFrom7A153),
+      ofStep("7A241", &AccountsDataMigrator::_migrateAccountsFrom7A241),
+      ofStep("7A242", &AccountsDataMigrator::_migrateAccountsFrom7A242),
+      ofStep("8A293", &AccountsDataMigrator::_migrateAccountsFrom8A293),
+      ofStep("8B117", &AccountsDataMigrator::_migrateAccountsFrom8B117),
+      ofStep("8C136", &AccountsDataMigrator::_migrateAccountsFrom8C136),
+      ofStep("8F191", &AccountsDataMigrator::_migrateAccountsFrom8F191),
+      ofStep("9A182", &AccountsDataMigrator::_migrateAccountsFrom9A182),
+      ofStep("9A334", &AccountsDataMigrator::_migrateAccountsFrom9A334),
+      ofStep("9B176", &AccountsDataMigrator::_migrateAccountsFrom9B176),
+  };
+  return all;
+}
+
+}  // namespace bench
