@@ -1,5 +1,6 @@
 # What `cmake --install` leaves behind: a tree in which everything finds everything else from wherever the tree stands.
-# Distribution packages, whose libraries lie where the system looks anyway, build with CMAKE_SKIP_INSTALL_RPATH.
+# Each file belongs to one component: library (what programs that use accounts need to run), development (what they need
+# to build), host (what a device needs to migrate), tools. The packages are made of them.
 
 include(CMakePackageConfigHelpers)
 
@@ -16,23 +17,26 @@ foreach(library accountplatform accountsettings)
     set_target_properties(${library} PROPERTIES INSTALL_RPATH "$ORIGIN")
     target_compile_features(${library} INTERFACE cxx_std_20)
     install(TARGETS ${library} EXPORT AccountSettings
-      LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}"
+      LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT library NAMELINK_COMPONENT development
       INCLUDES DESTINATION "${headers_dir}")
   endif()
 endforeach()
 
-foreach(program migration-host accountctl)
+function(install_program program component)
   if(TARGET ${program})
     add_dependencies(product ${program})
     set_target_properties(${program} PROPERTIES INSTALL_RPATH "$ORIGIN/${libraries_from_programs}")
-    install(TARGETS ${program} RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}")
+    install(TARGETS ${program} RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}" COMPONENT ${component})
   endif()
-endforeach()
+endfunction()
+
+install_program(migration-host host)
+install_program(accountctl tools)
 
 if(TARGET accounts-migrator)
   add_dependencies(product accounts-migrator)
   set_target_properties(accounts-migrator PROPERTIES INSTALL_RPATH "$ORIGIN/..")
-  install(TARGETS accounts-migrator LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/account-settings")
+  install(TARGETS accounts-migrator LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/account-settings" COMPONENT host)
 endif()
 foreach(rest account_modules resources)
   if(TARGET ${rest})
@@ -40,25 +44,28 @@ foreach(rest account_modules resources)
   endif()
 endforeach()
 
-install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md DESTINATION "${CMAKE_INSTALL_DOCDIR}")
+install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md
+  DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT library)
 
 foreach(folder accountsettings platform)
   file(GLOB headers CONFIGURE_DEPENDS "${CMAKE_SOURCE_DIR}/${folder}/*.h")
-  install(FILES ${headers} DESTINATION "${headers_dir}/${folder}")
+  install(FILES ${headers} DESTINATION "${headers_dir}/${folder}" COMPONENT development)
 endforeach()
 # For programs that work on a device's file tree which stands elsewhere than at "/".
-install(FILES "${CMAKE_SOURCE_DIR}/platform/linux/linux_platform.h" DESTINATION "${headers_dir}/platform/linux")
+install(FILES "${CMAKE_SOURCE_DIR}/platform/linux/linux_platform.h"
+  DESTINATION "${headers_dir}/platform/linux" COMPONENT development)
 
-install(EXPORT AccountSettings NAMESPACE AccountSettings:: DESTINATION "${package_dir}" FILE AccountSettingsTargets.cmake)
+install(EXPORT AccountSettings NAMESPACE AccountSettings::
+  DESTINATION "${package_dir}" FILE AccountSettingsTargets.cmake COMPONENT development)
 configure_package_config_file(
   "${CMAKE_SOURCE_DIR}/cmake/AccountSettingsConfig.cmake.in" "${CMAKE_BINARY_DIR}/AccountSettingsConfig.cmake"
   INSTALL_DESTINATION "${package_dir}")
 write_basic_package_version_file("${CMAKE_BINARY_DIR}/AccountSettingsConfigVersion.cmake" COMPATIBILITY SameMajorVersion)
 install(FILES
   "${CMAKE_BINARY_DIR}/AccountSettingsConfig.cmake" "${CMAKE_BINARY_DIR}/AccountSettingsConfigVersion.cmake"
-  DESTINATION "${package_dir}")
+  DESTINATION "${package_dir}" COMPONENT development)
 
 file(RELATIVE_PATH prefix_from_pkgconfig "/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/")
 string(REGEX REPLACE "/$" "" prefix_from_pkgconfig "${prefix_from_pkgconfig}")
 configure_file("${CMAKE_SOURCE_DIR}/cmake/account-settings.pc.in" "${CMAKE_BINARY_DIR}/account-settings.pc" @ONLY)
-install(FILES "${CMAKE_BINARY_DIR}/account-settings.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig")
+install(FILES "${CMAKE_BINARY_DIR}/account-settings.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig" COMPONENT development)

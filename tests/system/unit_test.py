@@ -1,0 +1,99 @@
+"""The unit that runs the migration at boot: accepted by systemd, confined, and with enough rights for the work."""
+
+import os
+import subprocess
+import unittest
+from pathlib import Path
+
+from device import SETTINGS, lines, plain_environment
+from device_case import HOST, DeviceTest
+from failed_saves_test import without_capabilities
+
+BUILD_TREE = Path(os.environ["BUILD_TREE"])
+UNIT = "lib/systemd/system/migration-host.service"
+# In tenths, as systemd-analyze wants it; 0 is best. What is left is what the work needs: changing owners, and root.
+WORST_EXPOSURE = 13
+ALL_CAPABILITIES = range(41)
+NEEDED_CAPABILITIES = {"CAP_CHOWN": 0, "CAP_DAC_OVERRIDE": 1, "CAP_FOWNER": 3}
+
+
+def run(*command, expected=0):
+    ended = subprocess.run(
+        [str(part) for part in command],
+        env=plain_environment(), stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, check=False,
+    )
+    if ended.returncode != expected:
+        raise AssertionError(f"{command} ended with {ended.returncode}:\n{ended.stdout.decode(errors='replace')}")
+    return lines(ended.stdout)
+
+
+class InstalledUnit(DeviceTest):
+    def setUp(self):
+        super().setUp()
+        self.prefix = self.scratch / "prefix"
+        run("cmake", "--install", BUILD_TREE, "--prefix", self.prefix, "--component", "host")
+        self.unit = self.prefix / UNIT
+
+    def settings(self, name):
+        return [line.partition("=")[2] for line in self.unit.read_text().splitlines() if line.startswith(name + "=")]
+
+    def test_starts_the_installed_host_with_options_that_it_has(self):
+        program, *options = self.settings("ExecStart")[0].split()
+        self.assertEqual(str(self.prefix / "bin" / "migration-host"), program)
+        known = "\n".join(run(HOST, "--help"))
+        for option in options:
+            if option.startswith("--"):
+                self.assertIn(f" {option} ", known)
+
+    def test_is_found_by_a_start_and_by_the_end_of_an_update(self):
+        for link in ("sysinit.target.wants", "systemd-update-done.service.requires"):
+            linked = self.unit.parent / link / self.unit.name
+            self.assertEqual(self.unit, linked.resolve())
+
+    def test_is_accepted_by_systemd(self):
+        self.assertEqual([], run("systemd-analyze", "verify", "--man=no", self.unit))
+
+    def test_is_confined(self):
+        run("systemd-analyze", "security", "--offline=true", f"--threshold={WORST_EXPOSURE}", "--no-pager", self.unit)
+
+    def test_leaves_the_host_the_rights_that_it_needs(self):
+        self.assertEqual(" ".join(NEEDED_CAPABILITIES), self.settings("CapabilityBoundingSet")[0])
+        if os.getuid() != 0:
+            self.skipTest("only root has rights to give away")
+        device = self.example("first-generation")
+        device.set_mobile(4711, 4712)
+        for path in [device.root, *device.root.rglob("*")]:
+            os.lchown(path, 4711, 4712)
+        dropped = set(ALL_CAPABILITIES) - set(NEEDED_CAPABILITIES.values())
+        self.assertEqual(0, device.migrate(HOST, prepare=without_capabilities(*dropped)).status)
+        status = device.path(SETTINGS).stat()
+        self.assertEqual((4711, 4712), (status.st_uid, status.st_gid))
+        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+
+
+class Fragments(DeviceTest):
+    """The user and the directories, made in a root of the test's own."""
+
+    def setUp(self):
+        super().setUp()
+        self.root = self.scratch / "root"
+        (self.root / "etc").mkdir(parents=True)
+        run("cmake", "--install", BUILD_TREE, "--prefix", self.root / "usr", "--component", "host")
+
+    def test_make_the_mobile_user_and_its_directories(self):
+        if os.getuid() != 0:
+            self.skipTest("only root gives directories to another user")
+        run("systemd-sysusers", f"--root={self.root}", "account-settings.conf")
+        run("systemd-tmpfiles", f"--root={self.root}", "--create", "account-settings.conf")
+        entry = next(line for line in (self.root / "etc/passwd").read_text().splitlines() if line.startswith("mobile:"))
+        _, _, user, group, _, home, _ = entry.split(":")
+        self.assertEqual("/var/mobile", home)
+        for directory, mode in {
+            "Library/Preferences": 0o755, "Library/Mail": 0o700, "Library/Logs/CrashReporter": 0o755, "tmp": 0o700,
+        }.items():
+            status = (self.root / "var/mobile" / directory).stat()
+            self.assertEqual((int(user), int(group), mode), (status.st_uid, status.st_gid, status.st_mode & 0o7777))
+
+
+if __name__ == "__main__":
+    unittest.main()
