@@ -51,5 +51,10 @@ if(ACCOUNTS_COVERAGE)
   add_link_options(--coverage)
 endif()
 
-# An installed tree finds its own libraries from wherever it stands.
-set(CMAKE_INSTALL_RPATH "$ORIGIN/../${CMAKE_INSTALL_LIBDIR}")
+# Programs are position-independent too, whatever the compiler's default.
+include(CheckPIESupported)
+check_pie_supported(LANGUAGES CXX)
+
+# What is built finds its libraries relative to itself. A path of this machine, or an empty one (which is the working
+# directory of whoever starts the program), is in none of it.
+set(CMAKE_BUILD_RPATH_USE_ORIGIN ON)

@@ -18,3 +18,18 @@ function(house_headers target folder)
     target_include_directories(${target} PUBLIC "$<BUILD_INTERFACE:${shelf}>")
   endif()
 endfunction()
+
+# house_binary(TARGET RUNPATH [MAP]): a program, library or module that is installed. It looks for its libraries in
+# RUNPATH, relative to where it stands, built and installed alike; of a library, MAP (a file beside the CMakeLists.txt)
+# says what it exports, since the language makes instances of the standard library's templates visible by itself.
+function(house_binary target runpath)
+  set_target_properties(${target} PROPERTIES INSTALL_RPATH "${runpath}")
+  if(NOT CMAKE_SKIP_INSTALL_RPATH)
+    set_target_properties(${target} PROPERTIES BUILD_WITH_INSTALL_RPATH ON)
+  endif()
+  if(ARGC GREATER 2)
+    set(map "${CMAKE_CURRENT_SOURCE_DIR}/${ARGV2}")
+    target_link_options(${target} PRIVATE "-Wl,--version-script=${map}")
+    set_target_properties(${target} PROPERTIES LINK_DEPENDS "${map}")
+  endif()
+endfunction()

@@ -6,7 +6,6 @@ include(CMakePackageConfigHelpers)
 
 set(package_dir "${CMAKE_INSTALL_LIBDIR}/cmake/AccountSettings")
 set(headers_dir "${CMAKE_INSTALL_INCLUDEDIR}/account-settings")
-file(RELATIVE_PATH libraries_from_programs "/${CMAKE_INSTALL_BINDIR}" "/${CMAKE_INSTALL_LIBDIR}")
 
 # Everything that is needed to run, and nothing that only tests need.
 add_custom_target(product)
@@ -14,7 +13,6 @@ add_custom_target(product)
 foreach(library accountplatform accountsettings)
   if(TARGET ${library})
     add_dependencies(product ${library})
-    set_target_properties(${library} PROPERTIES INSTALL_RPATH "$ORIGIN")
     target_compile_features(${library} INTERFACE cxx_std_20)
     install(TARGETS ${library} EXPORT AccountSettings
       LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT library NAMELINK_COMPONENT development
@@ -25,7 +23,6 @@ endforeach()
 function(install_program program component)
   if(TARGET ${program})
     add_dependencies(product ${program})
-    set_target_properties(${program} PROPERTIES INSTALL_RPATH "$ORIGIN/${libraries_from_programs}")
     install(TARGETS ${program} RUNTIME DESTINATION "${CMAKE_INSTALL_BINDIR}" COMPONENT ${component})
   endif()
 endfunction()
@@ -35,7 +32,6 @@ install_program(accountctl tools)
 
 if(TARGET accounts-migrator)
   add_dependencies(product accounts-migrator)
-  set_target_properties(accounts-migrator PROPERTIES INSTALL_RPATH "$ORIGIN/..")
   install(TARGETS accounts-migrator LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/account-settings" COMPONENT host)
 endif()
 foreach(rest account_modules resources)

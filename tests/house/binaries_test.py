@@ -1,0 +1,150 @@
+"""How every program, library and module is linked, built and installed, and what it exports.
+
+What a library exports is reviewed: exported/NAME.txt lists it, and a library without a list exports nothing. After a
+change that was meant, write the lists anew and read the difference:
+
+    python3 tests/house/binaries_test.py --write BUILD_TREE
+"""
+
+import json
+import os
+import re
+import subprocess
+import sys
+import tempfile
+import unittest
+from pathlib import Path
+
+REVIEWED = Path(__file__).resolve().parent / "exported"
+
+
+def output_of(*command):
+    ended = subprocess.run([str(part) for part in command], check=True, capture_output=True, text=True)
+    return ended.stdout
+
+
+def binaries_below(directory):
+    """Every program, library and module, once, by the name that it was built under."""
+    found = [path for path in sorted(directory.rglob("*")) if path.is_file() and not path.is_symlink()]
+    return [path for path in found if path.open("rb").read(4) == b"\x7fELF"]
+
+
+def name_of(path):
+    return path.name.split(".so")[0]
+
+
+def is_program(path):
+    return ".so" not in path.name
+
+
+def exported_by(path):
+    lines = output_of("nm", "-DC", "--defined-only", path).splitlines()
+    return sorted({line.split(" ", 2)[2] for line in lines})
+
+
+def imported_by(path):
+    return {line.split()[-1].split("@")[0] for line in output_of("nm", "-D", "--undefined-only", path).splitlines()}
+
+
+def reviewed_for(name):
+    listed = REVIEWED / f"{name}.txt"
+    return listed.read_text(encoding="utf-8").splitlines() if listed.is_file() else []
+
+
+def write_lists(libraries):
+    for path in libraries:
+        exported = exported_by(path)
+        if exported:
+            (REVIEWED / f"{name_of(path)}.txt").write_text("\n".join(exported) + "\n", encoding="utf-8")
+
+
+class Binaries(unittest.TestCase):
+    maxDiff = None
+    build_tree = Path(os.environ.get("BUILD_TREE", "."))
+    library_directory = os.environ.get("LIBRARY_DIRECTORY", "lib")
+
+    @classmethod
+    def setUpClass(cls):
+        installed = tempfile.TemporaryDirectory()
+        cls.addClassCleanup(installed.cleanup)
+        output_of("cmake", "--install", cls.build_tree, "--prefix", installed.name)
+        trees = [cls.build_tree / "bin", cls.build_tree / cls.library_directory, Path(installed.name)]
+        cls.binaries = [path for tree in trees for path in binaries_below(tree)]
+        cls.libraries = [path for path in cls.binaries if not is_program(path)]
+
+    def each(self, paths=None):
+        for path in self.binaries if paths is None else paths:
+            with self.subTest(path=str(path)):
+                yield path
+
+    def test_are_all_there_built_and_installed(self):
+        names = [name_of(path) for path in self.binaries]
+        for name in ("migration-host", "accountctl", "libaccountplatform", "libaccountsettings", "accounts-migrator"):
+            self.assertEqual(2, names.count(name), names)
+
+    def test_look_for_libraries_only_relative_to_themselves(self):
+        for path in self.each():
+            dynamic = output_of("readelf", "-dW", path)
+            self.assertNotIn("(RPATH)", dynamic)
+            for line in re.findall(r"\(RUNPATH\).*\[(.*)\]", dynamic):
+                for directory in line.split(":"):
+                    self.assertRegex(directory, r"^\$ORIGIN(/|$)")
+
+    def test_bind_everything_before_they_run_and_write_protect_it(self):
+        for path in self.each():
+            self.assertRegex(output_of("readelf", "-dW", path), r"\(FLAGS_1\).*NOW")
+            self.assertIn("GNU_RELRO", output_of("readelf", "-lW", path))
+
+    def test_have_no_executable_stack_and_no_segment_to_write_and_run(self):
+        for path in self.each():
+            segments = re.findall(r"^ *(\w+) +0x.* ([R ][W ][E ]) 0x", output_of("readelf", "-lW", path), re.MULTILINE)
+            self.assertIn(("GNU_STACK", "RW "), segments)
+            self.assertEqual([], [kind for kind, access in segments if "W" in access and "E" in access])
+
+    def test_can_be_loaded_anywhere(self):
+        for path in self.each():
+            self.assertRegex(output_of("readelf", "-hW", path), r"Type: +DYN")
+
+    def test_contain_no_relocation_of_code(self):
+        for path in self.each():
+            self.assertNotIn("TEXTREL", output_of("readelf", "-dW", path))
+
+    def test_export_what_was_reviewed_and_nothing_else(self):
+        for path in self.each(self.libraries):
+            self.assertEqual(reviewed_for(name_of(path)), exported_by(path))
+
+    def test_of_a_list_are_still_built(self):
+        built = {name_of(path) for path in self.libraries}
+        self.assertLessEqual({listed.stem for listed in REVIEWED.glob("*.txt")}, built)
+
+    def test_guard_their_stack(self):
+        for path in self.each():
+            if name_of(path) in {"libaccountplatform", "libaccountsettings", "accounts-migrator", "migration-host"}:
+                self.assertIn("__stack_chk_fail", imported_by(path))
+
+
+class Compilation(unittest.TestCase):
+    """Flags that leave no trace in a binary that happens to have no use for them."""
+
+    @classmethod
+    def setUpClass(cls):
+        commands = json.loads((Binaries.build_tree / "compile_commands.json").read_text(encoding="utf-8"))
+        cls.commands = [each["command"] for each in commands]
+
+    def test_guards_the_stack(self):
+        self.assertEqual([], [each for each in self.commands if "-fstack-protector-strong" not in each])
+
+    def test_checks_the_buffers_of_library_calls_where_it_optimises(self):
+        if not all(" -O2 " in each for each in self.commands) or os.environ.get("SANITIZE"):
+            self.skipTest("only what is optimised, and no sanitizer, takes _FORTIFY_SOURCE")
+        self.assertEqual([], [each for each in self.commands if "-D_FORTIFY_SOURCE=2" not in each])
+        for path in binaries_below(Binaries.build_tree / Binaries.library_directory):
+            if name_of(path) == "libaccountplatform":
+                self.assertTrue([each for each in imported_by(path) if re.fullmatch(r"__\w+_chk", each)])
+
+
+if __name__ == "__main__":
+    if sys.argv[1:2] == ["--write"]:
+        write_lists(path for path in binaries_below(Path(sys.argv[2]) / "lib"))
+    else:
+        unittest.main()
