@@ -20,6 +20,10 @@ enum class FileKind : std::uint8_t { file, directory, other };
 // The device's files. Paths are absolute. Every call works relative to the opened parent directory of its path and
 // never follows a link at the path itself, except where a call says so. A failed call names its cause and leaves
 // nothing half made that it made itself.
+//
+// A call that makes, replaces, moves or removes something brings the bytes and the directory entry to stable storage;
+// where that fails, the call failed. What was moved or removed by then stays so: only then may the new state be there
+// after a failed call.
 class FileSystem {
  public:
   virtual ~FileSystem() = default;
@@ -31,12 +35,11 @@ class FileSystem {
   // `sizeLimit` bytes, is refused without being read, and nothing blocks.
   virtual Result<Bytes> read(const Path& path, std::size_t sizeLimit) = 0;
 
-  // Makes a file at a path where nothing stands, mode 0600, writes the bytes and brings them to stable storage. On
-  // failure no file remains.
+  // Makes a file at a path where nothing stands, mode 0600, and writes the bytes. On failure no file remains.
   virtual Status create(const Path& path, std::span<const std::uint8_t> bytes) = 0;
 
   // Replaces whatever file stands at the path, or makes one, mode 0600: a reader sees the old file or the new one,
-  // whole. The bytes and the directory entry are on stable storage when it succeeds.
+  // whole.
   virtual Status replace(const Path& path, std::span<const std::uint8_t> bytes) = 0;
 
   // Copies a regular file, byte for byte, to a path where nothing stands, mode 0600.
@@ -59,8 +62,7 @@ class FileSystem {
   // none can be had. The name is a proposal: only `create` makes sure that nobody else takes it.
   [[nodiscard]] virtual std::optional<Path> temporaryName() = 0;
 
-  // Moves a file onto a path in one step, replacing what is there, and brings the directory entry to stable storage. An
-  // error after the move itself is reported as an error.
+  // Moves a file onto a path in one step, replacing what is there.
   virtual Status rename(const Path& from, const Path& to) = 0;
 };
 

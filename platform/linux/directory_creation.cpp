@@ -25,7 +25,7 @@ class Made {
     }
     errno = cause;
   }
-  void add(Place place) { _places.push_back(std::move(place)); }
+  const Place& add(Place place) { return _places.emplace_back(std::move(place)); }
   void keep() { _places.clear(); }
 
  private:
@@ -44,9 +44,10 @@ bool setPermissions(const Place& place, unsigned permissions) {
 
 bool makeDirectory(Place place, unsigned permissions, Made& made) {
   if (::mkdirat(place.parent.number(), place.leaf.c_str(), permissions & 0777U) != 0) return errno == EEXIST;
-  const bool isSet = setPermissions(place, permissions);
-  made.add(std::move(place));
-  return isSet;
+  const Place& own = made.add(std::move(place));
+  if (!setPermissions(own, permissions)) return false;
+  const Descriptor entries = openForSync(own.parent);
+  return entries.isOpen() && sync(entries);
 }
 
 bool isDirectory(const Place& place) {

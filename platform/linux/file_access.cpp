@@ -37,7 +37,7 @@ Descriptor openRegularFile(const Place& place, AtLink atLink) {
   if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, follows ? 0 : AT_SYMLINK_NOFOLLOW) != 0) return {};
   if (refuse(errorForKind(status.st_mode))) return {};
   const int flags = O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | (follows ? 0 : O_NOFOLLOW);
-  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags)};
+  Descriptor file{retried([&] { return ::openat(place.parent.number(), place.leaf.c_str(), flags); })};
   if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return {};
   if (refuse(errorForKind(status.st_mode))) return {};
   return file;
@@ -56,8 +56,7 @@ Descriptor makeFile(const Place& place) {
 bool writeAll(int descriptor, const void* bytes, std::size_t size) {
   const auto* next = static_cast<const char*>(bytes);
   while (size > 0) {
-    const ssize_t written = ::write(descriptor, next, size);
-    if (written < 0 && errno == EINTR) continue;
+    const ssize_t written = retried([&] { return ::write(descriptor, next, size); });
     if (written < 0) return false;
     next += written;
     size -= static_cast<std::size_t>(written);
@@ -68,8 +67,8 @@ bool writeAll(int descriptor, const void* bytes, std::size_t size) {
 ssize_t readSome(int descriptor, void* buffer, std::size_t size) {
   std::size_t filled = 0;
   while (filled < size) {
-    const ssize_t count = ::read(descriptor, static_cast<char*>(buffer) + filled, size - filled);
-    if (count < 0 && errno == EINTR) continue;
+    const ssize_t count =
+        retried([&] { return ::read(descriptor, static_cast<char*>(buffer) + filled, size - filled); });
     if (count < 0) return -1;
     if (count == 0) break;
     filled += static_cast<std::size_t>(count);
@@ -77,9 +76,13 @@ ssize_t readSome(int descriptor, void* buffer, std::size_t size) {
   return static_cast<ssize_t>(filled);
 }
 
-bool syncDirectory(const Descriptor& directory) {
-  const Descriptor readable{::openat(directory.number(), ".", O_RDONLY | O_DIRECTORY | O_CLOEXEC)};
-  return readable.isOpen() && (::fsync(readable.number()) == 0 || errno == EINVAL);
+bool sync(const Descriptor& file) {
+  return retried([&] { return ::fsync(file.number()); }) == 0 || errno == EINVAL;
+}
+
+Descriptor openForSync(const Descriptor& directory) {
+  constexpr int flags = O_RDONLY | O_DIRECTORY | O_CLOEXEC;
+  return Descriptor{retried([&] { return ::openat(directory.number(), ".", flags); })};
 }
 
 }  // namespace platform

@@ -2,6 +2,7 @@
 
 #include <sys/stat.h>
 
+#include <cerrno>
 #include <filesystem>
 #include <string>
 
@@ -33,11 +34,32 @@ enum class AtLink : bool { stop, follow };
 // Makes a new file, mode 0600 whatever the umask, open for writing.
 [[nodiscard]] Descriptor makeFile(const Place& place);
 
+// Calls again what a signal interrupted, a good many times; a call that is interrupted for ever fails with EINTR.
+template <typename Call>
+auto retried(const Call& call) {
+  constexpr int attempts = 100;
+  auto answer = call();
+  for (int attempt = 1; answer < 0 && errno == EINTR && attempt < attempts; ++attempt) answer = call();
+  return answer;
+}
+
 [[nodiscard]] bool writeAll(int descriptor, const void* bytes, std::size_t size);
 // Fills the buffer as far as the file goes. Answers the number of bytes, -1 on failure.
 [[nodiscard]] ssize_t readSome(int descriptor, void* buffer, std::size_t size);
 
-// Brings the entries of the directory to stable storage. File systems that have nothing to sync are no failure.
-[[nodiscard]] bool syncDirectory(const Descriptor& directory);
+// Brings a file, or the entries of a directory, to stable storage. File systems that have nothing to sync are no
+// failure.
+[[nodiscard]] bool sync(const Descriptor& file);
+
+// The directory opened so that it can be synced; a place's parent cannot.
+[[nodiscard]] Descriptor openForSync(const Descriptor& directory);
+
+// Runs a change of the directory's entries, which answers false where it fails, and brings them to stable storage. What
+// could not be synced is not changed in the first place; a sync that fails all the same is a failed change.
+template <typename Change>
+bool changeEntries(const Descriptor& directory, const Change& change) {
+  const Descriptor entries = openForSync(directory);
+  return entries.isOpen() && change() && sync(entries);
+}
 
 }  // namespace platform

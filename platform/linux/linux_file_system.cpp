@@ -38,10 +38,14 @@ void unlinkKeepingCause(const Place& place) {
 // Makes a file whose contents the writer writes to its descriptor; nothing remains where that fails.
 template <typename Writer>
 bool makeSyncedFile(const Place& place, const Writer& write) {
-  const Descriptor file = makeFile(place);
-  if (!file.isOpen()) return false;
-  if (write(file.number()) && ::fsync(file.number()) == 0) return true;
-  unlinkKeepingCause(place);
+  bool isMade = false;
+  const auto makeAndWrite = [&] {
+    const Descriptor file = makeFile(place);
+    isMade = file.isOpen();
+    return isMade && write(file.number()) && sync(file);
+  };
+  if (changeEntries(place.parent, makeAndWrite)) return true;
+  if (isMade) unlinkKeepingCause(place);
   return false;
 }
 
@@ -69,15 +73,18 @@ std::string randomName() {
   return name;
 }
 
+bool move(const Place& from, const Place& to) {
+  return changeEntries(to.parent, [&] {
+    return ::renameat(from.parent.number(), from.leaf.c_str(), to.parent.number(), to.leaf.c_str()) == 0;
+  });
+}
+
 bool replaceFile(const Place& place, std::span<const std::uint8_t> bytes) {
   const Place beside{Descriptor{::openat(place.parent.number(), ".", O_PATH | O_DIRECTORY | O_CLOEXEC)}, randomName()};
   if (!beside.parent.isOpen() || !makeFileOf(beside, bytes)) return false;
-  const int parent = place.parent.number();
-  if (::renameat(parent, beside.leaf.c_str(), parent, place.leaf.c_str()) != 0) {
-    unlinkKeepingCause(beside);
-    return false;
-  }
-  return syncDirectory(place.parent);
+  if (move(beside, place)) return true;
+  unlinkKeepingCause(beside);
+  return false;
 }
 
 // Gives away the very file that was looked at, and only one that has no second name elsewhere.
@@ -156,7 +163,10 @@ class LinuxFileSystem final : public FileSystem {
     });
   }
 
-  Status remove(const Path& path) override { return at(path, "remove", &removeTree); }
+  Status remove(const Path& path) override {
+    return at(path, "remove",
+              [](const Place& place) { return changeEntries(place.parent, [&place] { return removeTree(place); }); });
+  }
 
   Status createDirectories(const Path& path, unsigned permissions) override {
     return makeDirectories(path, permissions) ? Status{} : failure("create the directory", path);
@@ -180,11 +190,7 @@ class LinuxFileSystem final : public FileSystem {
   Status rename(const Path& from, const Path& to) override {
     const Place source = openParent(from);
     const Place target = source.parent.isOpen() ? openParent(to) : Place{};
-    if (target.parent.isOpen() &&
-        ::renameat(source.parent.number(), source.leaf.c_str(), target.parent.number(), target.leaf.c_str()) == 0 &&
-        syncDirectory(target.parent)) {
-      return {};
-    }
+    if (target.parent.isOpen() && move(source, target)) return {};
     const int cause = errno;
     return Status::failure(cause, "rename " + from.string() + " to " + to.string());
   }
