@@ -18,7 +18,9 @@ bool isControl(unsigned char byte) { return (byte < 0x20 && byte != '\t') || byt
 
 // The UTF-8 forms of the second block of control characters (a next-line among them).
 bool beginsUpperControl(std::string_view text) {
-  return text.size() >= 2 && text[0] == '\xc2' && static_cast<unsigned char>(text[1]) < 0xa0;
+  if (text.size() < 2 || text[0] != '\xc2') return false;
+  const auto second = static_cast<unsigned char>(text[1]);
+  return second >= 0x80 && second < 0xa0;
 }
 
 }  // namespace

@@ -164,6 +164,7 @@ TEST(SingleLine, ShowsWhatWouldBreakOrControlIt) {
                         {std::string("\0\v\f", 3), "\\x00\\x0b\\x0c"},
                         {"\x1b[31m\x7f", "\\x1b[31m\\x7f"},
                         {"\xc2\x85\xc2\x9b\xc2\xa0", "\\x85\\x9b\xc2\xa0"},
+                        {"\xc2[\xc2\n", "\xc2[\xc2\\n"},
                         {"\u2028\u2029\u2030", "\\u2028\\u2029\u2030"},
                         {"cut \xc2", "cut \xc2"},
                         {"", ""}};

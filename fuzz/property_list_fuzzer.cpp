@@ -1,9 +1,8 @@
 #include <cstddef>
 #include <cstdint>
-#include <cstdio>
-#include <cstdlib>
 #include <memory>
 
+#include "fuzz/require.h"
 #include "platform/linux/libplist_property_list_store.h"
 #include "tests/support/fake_file_system.h"
 
@@ -22,12 +21,6 @@ struct Reader {
   }
 };
 
-void require(bool condition, const char* what) {
-  if (condition) return;
-  std::fprintf(stderr, "%s\n", what);
-  std::abort();
-}
-
 }  // namespace
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
@@ -35,7 +28,7 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
   const auto read = reader.read({data, data + size});
   if (!read) return 0;
   const auto written = reader.store->serialize(*read);
-  require(written.data.has_value(), written.errorDescription.c_str());
-  require(reader.read(*written.data) == read, "not equal once written and read back");
+  fuzz::require(written.data.has_value(), written.errorDescription);
+  fuzz::require(reader.read(*written.data) == read, "not equal once written and read back");
   return 0;
 }

@@ -1,0 +1,49 @@
+#pragma once
+
+#include <optional>
+#include <string>
+
+#include "fuzz/input.h"
+#include "tests/support/migration_device.h"
+
+namespace fuzz {
+
+// A device in memory that reads and writes its files with the device's own property lists, filled from an input: a
+// settings file of any version, legacy mail and Exchange accounts, the removal sentinel, files that are no property
+// lists, operations that fail.
+class FuzzedDevice : public tests::MigrationDevice {
+ public:
+  explicit FuzzedDevice(Input& input);
+
+  static constexpr std::string_view kSecret = "S3CR3T";  // in every credential and every blob, and nowhere else
+  static constexpr std::string_view kMarker = "Marker";  // an integer of its own in each account
+
+  [[nodiscard]] std::optional<tests::Dictionary> settings() const;
+  [[nodiscard]] std::optional<tests::Bytes> settingsBytes() const;
+
+  bool areIdentifiersUnique = false;
+  bool hasSentinel = false;
+  bool hasLegacyMail = false;
+  bool hasLegacyExchange = false;
+  bool hasFaults = false;
+  std::int64_t version = 0;
+
+ private:
+  tests::PropertyValue anything(int depth);
+  tests::PropertyValue usual(std::string_view key, int depth);
+  tests::PropertyValue identifier();
+  tests::Array accounts(int depth);
+  tests::Dictionary account(int depth);
+  tests::Dictionary described(Words keys);
+  void putReal(const tests::Path& path, const tests::Dictionary& contents) const;
+  void putFile(const tests::Path& path, const tests::Dictionary& contents);
+  void putFiles();
+  void addFaults();
+
+  Input& _input;
+  std::shared_ptr<platform::PropertyListStore> _store;
+  int _identifiers = 0;
+  int _markers = 0;
+};
+
+}  // namespace fuzz
