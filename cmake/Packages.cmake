@@ -1,0 +1,65 @@
+# The Debian packages: `cmake --preset package`, build, then `cpack --preset package`. One package a component.
+
+set(CPACK_PACKAGE_NAME account-settings)
+set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "")  # it would stand above every package's own
+set(CPACK_PACKAGE_VENDOR "Vorlix")
+set(CPACK_PACKAGE_CONTACT "Account Settings Maintainers <account-settings@vorlix.com>")
+set(CPACK_PACKAGE_DIRECTORY "${CMAKE_BINARY_DIR}/packages")
+set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
+set(CPACK_STRIP_FILES ON)
+set(CPACK_VERBATIM_VARIABLES ON)
+set(CPACK_COMPONENTS_ALL library development host tools)
+set(CPACK_PRE_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/FinishPackages.cmake")
+set(CPACK_POST_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/TrimPackages.cmake")
+set(CPACK_PACKAGING_SOURCES "${CMAKE_SOURCE_DIR}/packaging")
+
+set(CPACK_DEB_COMPONENT_INSTALL ON)
+set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
+set(CPACK_DEBIAN_COMPRESSION_TYPE xz)
+set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
+set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS "${CMAKE_LIBRARY_OUTPUT_DIRECTORY}")
+set(CPACK_DEBIAN_PACKAGE_PRIORITY optional)
+set(CPACK_DEBIAN_PACKAGE_SOURCE account-settings)
+
+set(library_package "libaccountsettings${PROJECT_VERSION_MAJOR}")
+set(same_library "${library_package} (= ${PROJECT_VERSION})")
+
+# debian_package(COMPONENT NAME SECTION DEPENDS DESCRIPTION): the description is a line and the text below it.
+macro(debian_package component name section depends description)
+  set(CPACK_DEBIAN_${component}_PACKAGE_NAME "${name}")
+  set(CPACK_DEBIAN_${component}_PACKAGE_SECTION "${section}")
+  set(CPACK_DEBIAN_${component}_PACKAGE_DEPENDS "${depends}")
+  set(CPACK_DEBIAN_${component}_DESCRIPTION "${description}")
+endmacro()
+
+debian_package(LIBRARY "${library_package}" libs "" "accounts of a device - library
+The account-settings library loads, edits, merges and saves the accounts of a
+device. This package has the library, the modules that make accounts of each
+type and announce changes, and the configuration of account types.")
+debian_package(DEVELOPMENT libaccountsettings-dev libdevel "${same_library}" "accounts of a device - development files
+The account-settings library loads, edits, merges and saves the accounts of a
+device. This package has what is needed to build programs that use it.")
+debian_package(HOST migration-host admin
+  "${same_library}, systemd | systemd-standalone-sysusers, systemd | systemd-standalone-tmpfiles"
+  "accounts of a device - upgrade after a system update
+The migration host is run once after a system update. It upgrades the account
+settings that an earlier release of the system left behind, and converts the
+mail and Exchange accounts of its first releases.")
+debian_package(TOOLS accountctl utils "${same_library}" "accounts of a device - command-line client
+accountctl lists, verifies and changes the accounts of a device.")
+
+# control_files(COMPONENT FILE...): packaging/COMPONENT.FILE as the package's control file FILE.
+function(control_files component)
+  string(TOUPPER ${component} upper)
+  foreach(file IN LISTS ARGN)
+    configure_file("${CMAKE_SOURCE_DIR}/packaging/${component}.${file}" "${CMAKE_BINARY_DIR}/packaging/${component}/${file}" @ONLY)
+    list(APPEND files "${CMAKE_BINARY_DIR}/packaging/${component}/${file}")
+  endforeach()
+  set(CPACK_DEBIAN_${upper}_PACKAGE_CONTROL_EXTRA "${files}" PARENT_SCOPE)
+endfunction()
+
+control_files(library shlibs triggers)
+control_files(host postinst postrm)
+
+include(CPack)

@@ -1,0 +1,24 @@
+"""What the tests of the packages share: where they are, and how commands are run on them."""
+
+import os
+import subprocess
+from pathlib import Path
+
+SOURCES = Path(os.environ["SOURCE_TREE"])
+PACKAGES = SOURCES / "build" / "package" / "packages"
+NAMES = ["accountctl", "libaccountsettings-dev", "libaccountsettings1", "migration-host"]
+
+
+def package_files():
+    """The newest packages by name."""
+    return {name: max(PACKAGES.glob(f"{name}_*.deb"), key=os.path.getmtime) for name in NAMES}
+
+
+def run(*command, **more):
+    ended = subprocess.run(
+        [str(part) for part in command],
+        stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, check=False, **more,
+    )
+    if ended.returncode != 0:
+        raise AssertionError(f"{command} ended with {ended.returncode}:\n{ended.stdout}")
+    return ended.stdout

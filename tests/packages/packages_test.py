@@ -1,0 +1,62 @@
+"""The Debian packages as files: accepted by lintian, complete, and finding their libraries where the system has them."""
+
+import re
+import subprocess
+import tempfile
+import unittest
+from pathlib import Path
+
+from packages_case import package_files, run
+
+
+def field(name, file):
+    return run("dpkg-deb", "--field", file, name).strip()
+
+
+class Packages(unittest.TestCase):
+    def test_are_accepted_by_lintian(self):
+        options = ["--allow-root", "--no-cfg", "--tag-display-limit", "0", "--fail-on", "error,warning", "--pedantic"]
+        run("lintian", *options, *package_files().values())
+
+    def test_depend_on_what_their_programs_need_and_on_each_other_exactly(self):
+        files = package_files()
+        library = f"libaccountsettings1 (= {field('Version', files['libaccountsettings1'])})"
+        for name in ("accountctl", "libaccountsettings-dev", "migration-host"):
+            self.assertIn(library, field("Depends", files[name]))
+        for needed in ("libc6", "libplist3", "libsystemd0", "libsdbus-c++1", "libuuid1"):
+            self.assertRegex(field("Depends", files["libaccountsettings1"]), rf"(^|, ){re.escape(needed)} \(")
+        self.assertIn("systemd | systemd-standalone-sysusers", field("Depends", files["migration-host"]))
+
+    def test_have_scripts_only_where_there_is_something_to_do(self):
+        scripts = {"preinst", "postinst", "prerm", "postrm"}
+        with tempfile.TemporaryDirectory() as scratch:
+            for name, file in package_files().items():
+                control = Path(scratch) / name
+                run("dpkg-deb", "--control", file, control)
+                expected = {"postinst", "postrm"} if name == "migration-host" else set()
+                self.assertEqual(expected, {path.name for path in control.iterdir()} & scripts)
+
+    def test_name_no_directory_to_look_for_libraries_in(self):
+        with tempfile.TemporaryDirectory() as scratch:
+            for name, file in package_files().items():
+                run("dpkg-deb", "--extract", file, Path(scratch) / name)
+            binaries = [
+                path for path in Path(scratch).rglob("*")
+                if path.is_file() and not path.is_symlink() and path.read_bytes()[:4] == b"\x7fELF"
+            ]
+            self.assertGreater(len(binaries), 9)
+            for path in binaries:
+                self.assertNotRegex(run("readelf", "--dynamic", path), "RUNPATH|RPATH")
+
+    def test_hold_no_path_of_the_build(self):
+        with tempfile.TemporaryDirectory() as scratch:
+            for name, file in package_files().items():
+                run("dpkg-deb", "--extract", file, Path(scratch) / name)
+            found = subprocess.run(
+                ["grep", "-rlF", str(Path(__file__).parents[2]), scratch], capture_output=True, text=True, check=False
+            )
+            self.assertEqual("", found.stdout)
+
+
+if __name__ == "__main__":
+    unittest.main()
