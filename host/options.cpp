@@ -131,9 +131,11 @@ std::optional<Answer> settleSnapshots(const Words& words, SnapshotOptions& snaps
     if (words.restore) return wrongUse("--restore needs --snapshots");
     if (isListing) return wrongUse("--list-snapshots needs --snapshots");
     if (words.keep) return wrongUse("--keep needs --snapshots");
+    return std::nullopt;
   }
   if (words.restore && isListing) return wrongUse("--restore and --list-snapshots exclude each other");
   if (words.keep && (words.restore || isListing)) return wrongUse("--keep is for a run: only a run removes snapshots");
+  if (!snapshots.directory->has_filename()) snapshots.directory = snapshots.directory->parent_path();
   snapshots.restore = words.restore;
   return words.keep ? readCount(*words.keep, snapshots.keep) : std::nullopt;
 }

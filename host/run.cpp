@@ -5,6 +5,8 @@
 
 #include "host/plugin.h"
 #include "host/say.h"
+#include "host/snapshot_steps.h"
+#include "host/snapshots/problem.h"
 #include "host/trace.h"
 #include "host/traced_services.h"
 #include "platform/temporary_directory.h"
@@ -17,8 +19,10 @@ struct Refusal {
   ExitStatus status;
 };
 
-ExitStatus perform(platform::DataClassMigrator& migrator, Trace* trace) {
+ExitStatus perform(platform::DataClassMigrator& migrator, const SnapshotOptions& options, Trace* trace) {
+  const auto undo = beginUndoableRun(options, migrator);
   const bool success = migrator.performMigration();
+  if (undo) undo->end(success, options.keep);
   if (trace != nullptr) trace->result(migrator.dataClassName(), success);
   if (trace != nullptr && !trace->complete()) say("the trace is incomplete: not every event could be written");
   return success ? ExitStatus::migrated : ExitStatus::notMigrated;
@@ -47,9 +51,10 @@ ExitStatus runInSteps(const Options& options) {
   const std::shared_ptr<Trace> trace = openTrace(options);
   if (trace) traceServices(platform, trace);
   platform::setCurrent(std::move(platform));
+  if (isForSnapshots(options.snapshots)) return workOnSnapshots(options.snapshots);
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   const auto migrator = load(options);
-  return perform(*migrator, trace.get());
+  return perform(*migrator, options.snapshots, trace.get());
 }
 
 }  // namespace
@@ -59,6 +64,9 @@ ExitStatus run(const Options& options) {
     return runInSteps(options);
   } catch (const Refusal& refusal) {
     return refusal.status;
+  } catch (const snapshots::Problem& problem) {
+    say(problem.what());
+    return problem.kind() == snapshots::Problem::Kind::wrongUse ? ExitStatus::wrongUse : ExitStatus::noSnapshot;
   }
 }
 

@@ -6,9 +6,10 @@
 
 namespace host {
 
-enum class ExitStatus : std::uint8_t { migrated = 0, notMigrated = 1, wrongUse = 2, noPlugin = 3 };
+enum class ExitStatus : std::uint8_t { migrated = 0, notMigrated = 1, wrongUse = 2, noPlugin = 3, noSnapshot = 5 };
 
-// One run, as the command line asks for it: makes the platform, loads the plug-in, calls it once and reports.
+// What the command line asks for: a run (makes the platform, loads the plug-in, calls it once and reports), or
+// something to be done with the snapshots in its place.
 [[nodiscard]] ExitStatus run(const Options& options);
 
 }  // namespace host

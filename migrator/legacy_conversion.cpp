@@ -45,8 +45,10 @@ std::optional<AccountsManager::Accounts> convertedAccounts(const Dictionary& leg
   return accounts;
 }
 
+std::string originalCompanionOf(const std::string& legacyPath) { return legacyPath + ".original"; }
+
 void removeOriginalCompanion(const std::string& legacyPath) {
-  std::ignore = platform::current().files->remove(legacyPath + ".original");
+  std::ignore = platform::current().files->remove(originalCompanionOf(legacyPath));
 }
 
 }  // namespace migrator

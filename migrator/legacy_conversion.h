@@ -34,7 +34,9 @@ using Conversion = std::function<std::shared_ptr<accountsettings::BasicAccount>(
     const platform::Dictionary& legacyFile, std::string_view key, const Conversion& convert, std::string_view method,
     std::string_view failureFormat);
 
-// Deletes what earlier releases left beside the legacy file: its copy under the same name with ".original" appended.
+// What earlier releases left beside a legacy file: its copy under the same name with ".original" appended.
+[[nodiscard]] std::string originalCompanionOf(const std::string& legacyPath);
+// Deletes it.
 void removeOriginalCompanion(const std::string& legacyPath);
 
 }  // namespace migrator

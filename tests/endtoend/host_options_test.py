@@ -4,7 +4,7 @@ import unittest
 
 from device_case import PLUGINS, DeviceTest
 
-OPTIONS = ["--root", "--home", "--shared-resources", "--resources", "--plugin", "--trace"]
+OPTIONS = ["--root", "--home", "--shared-resources", "--resources", "--plugin", "--trace", "--snapshots", "--keep", "--restore"]
 
 
 class WrongUse(DeviceTest):

@@ -1,0 +1,104 @@
+#include "host/snapshots/listing.h"
+
+#include <algorithm>
+#include <array>
+#include <nlohmann/json.hpp>
+
+#include "host/snapshots/run_mark.h"
+#include "host/snapshots/snapshot_directory.h"
+#include "host/snapshots/snapshot_store.h"
+
+namespace host::snapshots {
+namespace {
+
+using Json = nlohmann::ordered_json;
+using Row = std::array<std::string, 5>;
+
+struct Entry {
+  std::string id;
+  std::optional<Manifest> manifest;  // nothing where it is damaged
+  bool isRunning = false;
+};
+
+std::string markedSnapshot(const Storage& storage, const Path& directory) {
+  const auto mark = RunJournal{storage, directory}.read();
+  return mark ? mark->snapshot : std::string{};
+}
+
+std::vector<Entry> entriesIn(const Storage& storage, const Path& directory) {
+  requireOwnDirectory(storage, directory, Missing::isRefused);
+  const SnapshotStore store{storage, directory};
+  const std::string marked = markedSnapshot(storage, directory);
+  std::vector<Entry> entries;
+  for (const std::string& id : store.identifiers()) {
+    entries.push_back({.id = id, .manifest = store.undamagedManifest(id), .isRunning = id == marked});
+  }
+  return entries;
+}
+
+std::string stateOf(const Entry& entry) {
+  if (!entry.manifest) return "damaged";
+  if (entry.manifest->outcome) return "finished";
+  return entry.isRunning ? "running" : "unfinished";
+}
+
+std::string filesIn(const Manifest& manifest) {
+  std::string text;
+  for (const KeptFile& file : manifest.files) {
+    if (file.isPresent()) text += (text.empty() ? "" : " ") + file.path.filename().string();
+  }
+  return text.empty() ? "none" : text;
+}
+
+Row rowOf(const Entry& entry) {
+  if (!entry.manifest) return {entry.id, "-", "-", stateOf(entry), "-"};
+  const Manifest& manifest = *entry.manifest;
+  const std::string state = manifest.outcome ? *manifest.outcome : stateOf(entry);
+  return {entry.id, manifest.taken, manifest.dataVersion ? std::to_string(*manifest.dataVersion) : "-",
+          state + (manifest.isKept ? ", kept" : ""), filesIn(manifest)};
+}
+
+std::string lineOf(const Row& row, const std::array<std::size_t, 5>& widths) {
+  std::string line;
+  for (std::size_t column = 0; column < row.size(); ++column) {
+    line += row[column];
+    if (column + 1 < row.size()) line.append(widths[column] - row[column].size() + 2, ' ');
+  }
+  return line + '\n';
+}
+
+std::string tableOf(const std::vector<Row>& rows) {
+  std::array<std::size_t, 5> widths{};
+  for (const Row& row : rows) {
+    for (std::size_t column = 0; column < row.size(); ++column) {
+      widths[column] = std::max(widths[column], row[column].size());
+    }
+  }
+  std::string table;
+  for (const Row& row : rows) table += lineOf(row, widths);
+  return table;
+}
+
+Json jsonOf(const Entry& entry) {
+  Json json = entry.manifest ? Json::parse(textOf(*entry.manifest)).at("manifest") : Json{{"id", entry.id}};
+  json["state"] = stateOf(entry);
+  return json;
+}
+
+}  // namespace
+
+std::string listingForPeople(const Storage& storage, const Path& directory) {
+  const std::vector<Entry> entries = entriesIn(storage, directory);
+  if (entries.empty()) return "no snapshots in " + directory.string() + "\n";
+  std::vector<Row> rows{{"Snapshot", "Taken", "Version", "State", "Files"}};
+  for (const Entry& entry : entries) rows.push_back(rowOf(entry));
+  return tableOf(rows);
+}
+
+std::string listingAsJson(const Storage& storage, const Path& directory) {
+  Json list = Json::array();
+  for (const Entry& entry : entriesIn(storage, directory)) list.push_back(jsonOf(entry));
+  return list.dump(2) + '\n';
+}
+
+}  // namespace host::snapshots

@@ -1,0 +1,88 @@
+#include "host/snapshots/run_mark.h"
+
+#include <cerrno>
+#include <nlohmann/json.hpp>
+
+#include "host/snapshots/problem.h"
+
+namespace host::snapshots {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr std::size_t kLargest = std::size_t{1} << 26U;
+
+std::span<const std::uint8_t> bytesOf(const std::string& text) {
+  return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
+}
+
+std::string lineOf(const Json& json) {
+  try {
+    return json.dump() + '\n';
+  } catch (const Json::exception& thrown) {
+    throw Problem{Problem::Kind::failed, std::string{"the mark cannot be written: "} + thrown.what()};
+  }
+}
+
+void readHead(const Json& json, RunMark& mark) {
+  mark.snapshot = json.at("snapshot");
+  if (json.contains("restores")) mark.restores = json.at("restores").get<std::string>();
+}
+
+void readEntry(const Json& json, RunMark& mark) {
+  if (json.contains("edited")) {
+    mark.edited.insert(json.at("edited").get<std::string>());
+  } else {
+    const Path path = json.at("path").get<std::string>();
+    mark.left[path].insert(json.at("state"));
+    if (json.contains("made")) mark.made.insert(path);
+  }
+}
+
+RunMark markFrom(const std::string& text) {
+  RunMark mark;
+  std::size_t start = 0;
+  for (std::size_t end = 0; (end = text.find('\n', start)) != std::string::npos; start = end + 1) {
+    const Json line = Json::parse(text.substr(start, end - start));
+    start == 0 ? readHead(line, mark) : readEntry(line, mark);
+  }
+  if (start == 0) throw Problem{Problem::Kind::failed, "it is empty"};
+  return mark;
+}
+
+}  // namespace
+
+RunJournal::RunJournal(Storage storage, const Path& directory)
+    : _storage{std::move(storage)}, _mark{directory / "running"}, _last{directory / "last"} {}
+
+void RunJournal::begin(const std::string& snapshot, const std::optional<std::string>& restores) const {
+  Json head{{"snapshot", snapshot}};
+  if (restores) head["restores"] = *restores;
+  const std::string line = lineOf(head);
+  require(_storage.files->replace(_mark, bytesOf(line)));
+}
+
+void RunJournal::append(const std::string& line) const { require(_storage.keeper->append(_mark, bytesOf(line))); }
+
+void RunJournal::noteChange(const Path& path, const std::string& contents, bool isMadeNew) const {
+  Json entry{{"path", path.native()}, {"state", contents}};
+  if (isMadeNew) entry["made"] = true;
+  append(lineOf(entry));
+}
+
+void RunJournal::noteEdit(const Path& path) const { append(lineOf({{"edited", path.native()}})); }
+
+std::optional<RunMark> RunJournal::read() const {
+  const platform::Result<platform::Bytes> bytes = _storage.files->read(_mark, kLargest);
+  if (bytes.status().errorNumber() == ENOENT) return std::nullopt;
+  require(bytes.status());
+  try {
+    return markFrom({bytes.value().begin(), bytes.value().end()});
+  } catch (const std::exception& thrown) {
+    throw Problem{Problem::Kind::failed, "the mark " + _mark.string() + " is damaged: " + thrown.what()};
+  }
+}
+
+void RunJournal::clear() const { require(_storage.files->rename(_mark, _last)); }
+
+}  // namespace host::snapshots

@@ -1,0 +1,105 @@
+#include "host/snapshots/watched_files.h"
+
+#include <cerrno>
+
+#include "host/snapshots/checksum.h"
+#include "host/snapshots/problem.h"
+
+namespace host::snapshots {
+
+using platform::Status;
+
+WatchedFiles::WatchedFiles(Storage storage, const Manifest& snapshot, RunJournal journal)
+    : _storage{std::move(storage)}, _journal{std::move(journal)} {
+  for (const KeptFile& file : snapshot.files) {
+    _known[file.path].insert(file.contents);
+    if (file.part == platform::MigrationFile::Part::settings) _settings.insert(file.path);
+  }
+}
+
+// What cannot be looked at is not known to be as it was left.
+void WatchedFiles::noteWhereEdited(const Path& path) {
+  if (_edited.contains(path)) return;
+  try {
+    if (_known[path].contains(lookAt(_storage, path).contents)) return;
+  } catch (const Problem&) {
+  }
+  _journal.noteEdit(path);
+  _edited.insert(path);
+}
+
+void WatchedFiles::note(const Path& path, const std::string& contents, bool isMadeNew) {
+  noteWhereEdited(path);
+  if (!isMadeNew && _known[path].contains(contents)) return;
+  _journal.noteChange(path, contents, isMadeNew);
+  _known[path].insert(contents);
+}
+
+template <typename Contents, typename Change>
+Status WatchedFiles::noted(const Path& path, const Contents& contents, const Change& change, bool isMadeNew) {
+  if (_known.contains(path)) {
+    try {
+      note(path, contents(), isMadeNew);
+    } catch (const Problem& problem) {
+      return Status::failure(EIO, "note the change of " + path.string() + " (" + problem.what() + ")");
+    }
+  }
+  return change();
+}
+
+Status WatchedFiles::settled(const Path& path, Status outcome) {
+  if (outcome.isOk() && _settings.contains(path)) _isSaving = false;
+  return outcome;
+}
+
+std::optional<platform::FileKind> WatchedFiles::kindOf(const Path& path) { return _storage.files->kindOf(path); }
+
+platform::Result<platform::Bytes> WatchedFiles::read(const Path& path, std::size_t sizeLimit) {
+  return _storage.files->read(path, sizeLimit);
+}
+
+// A file that is made at a path of which nothing is known yet stood there in no form before.
+Status WatchedFiles::create(const Path& path, std::span<const std::uint8_t> bytes) {
+  _known.try_emplace(path, std::set<std::string>{kAbsent});
+  return settled(path,
+                 noted(
+                     path, [&] { return checksum(bytes); }, [&] { return _storage.files->create(path, bytes); }, true));
+}
+
+Status WatchedFiles::replace(const Path& path, std::span<const std::uint8_t> bytes) {
+  return settled(path,
+                 noted(
+                     path, [&] { return checksum(bytes); }, [&] { return _storage.files->replace(path, bytes); }));
+}
+
+Status WatchedFiles::copy(const Path& from, const Path& to) {
+  return settled(
+      to, noted(
+              to, [&] { return lookAt(_storage, from).contents; }, [&] { return _storage.files->copy(from, to); }));
+}
+
+Status WatchedFiles::remove(const Path& path) {
+  return noted(
+      path, [] { return std::string{kAbsent}; }, [&] { return _storage.files->remove(path); });
+}
+
+Status WatchedFiles::createDirectories(const Path& path, unsigned permissions) {
+  return _storage.files->createDirectories(path, permissions);
+}
+
+Status WatchedFiles::setOwner(const Path& path, std::string_view owner, std::string_view group) {
+  return _storage.files->setOwner(path, owner, group);
+}
+
+std::optional<Path> WatchedFiles::temporaryName() {
+  _isSaving = true;
+  return _storage.files->temporaryName();
+}
+
+Status WatchedFiles::rename(const Path& from, const Path& to) {
+  return settled(
+      to, noted(
+              to, [&] { return lookAt(_storage, from).contents; }, [&] { return _storage.files->rename(from, to); }));
+}
+
+}  // namespace host::snapshots

@@ -1,0 +1,51 @@
+#pragma once
+
+#include <cstdint>
+#include <span>
+#include <string>
+#include <vector>
+
+#include "platform/file_system.h"
+
+namespace platform {
+
+// What a file is besides its bytes.
+struct FileAttributes {
+  FileKind kind = FileKind::file;  // other: also a link
+  std::uint64_t size = 0;
+  std::uint32_t owner = 0;  // as numbers, which stay true when accounts are renamed
+  std::uint32_t group = 0;
+  std::uint32_t permissions = 0;         // all twelve bits
+  std::int64_t modifiedSeconds = 0;      // since the epoch
+  std::int64_t modifiedNanoseconds = 0;  // within the second
+
+  bool operator==(const FileAttributes&) const = default;
+};
+
+// What keeping copies of files, and bringing them back exactly, needs beyond the calls of the file system. Paths are
+// absolute, no link at a path itself is followed, and a failed call names its cause.
+class FileKeeper {
+ public:
+  virtual ~FileKeeper() = default;
+
+  // The attributes of what stands at the path; ENOENT where nothing does.
+  virtual Result<FileAttributes> attributesOf(const Path& path) = 0;
+
+  // The names in a directory, in order.
+  virtual Result<std::vector<std::string>> entriesOf(const Path& directory) = 0;
+
+  // Adds to the end of a regular file and brings that to stable storage. On failure the file is as long as it was; a
+  // process that dies meanwhile may leave a part of the bytes.
+  virtual Status append(const Path& path, std::span<const std::uint8_t> bytes) = 0;
+
+  // Puts a file in the place of whatever file stands at the path, or makes one, with the owner, group, permissions and
+  // time of the last change that are given: a reader sees the old file or the new one, whole. Bytes and directory entry
+  // are on stable storage when it succeeds. A process that dies meanwhile may leave `.restoring-NAME` beside the path,
+  // which the next such call removes.
+  virtual Status restore(const Path& path, std::span<const std::uint8_t> bytes, const FileAttributes& attributes) = 0;
+
+  // Sees to it, on stable storage, that no file stands at the path. A directory there is an error.
+  virtual Status removeFile(const Path& path) = 0;
+};
+
+}  // namespace platform
