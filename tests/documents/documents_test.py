@@ -1,0 +1,134 @@
+"""Every command that the documents show is run, on a device of the test's own, and prints what they say.
+
+A block of ```sh is run as it stands and must succeed. A block of ```console holds commands after "$ " and what they
+print; a line of "..." stands for any lines, and "..." in a line for any text. Blocks of one document follow each other
+on one device, a copy of the example "first-generation". What cannot be run here stands below a line
+<!-- not run: REASON -->, and commands stand in no other blocks.
+"""
+
+import os
+import re
+import subprocess
+import unittest
+from pathlib import Path
+
+from accountctl_case import ACCOUNTCTL
+from device import plain_environment
+from device_case import HOST, DeviceTest
+
+SOURCES = Path(os.environ["SOURCE_TREE"])
+DOCUMENTS = [
+    "README.md", "CONTRIBUTING.md", "docs/ACCOUNTCTL.md", "docs/ARCHITECTURE.md", "docs/CONFIGURATION.md",
+    "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MODULES.md", "docs/OPERATIONS.md",
+]
+# It tells of a device after its update.
+MIGRATED = "docs/OPERATIONS.md"
+BLOCK = re.compile(r"^(?:<!-- not run: (?P<reason>.+) -->\n)?```(?P<language>[a-z]*)\n(?P<text>.*?)^```$", re.M | re.S)
+MIGRATE = "migration-host --home /var/mobile --snapshots /var/lib/account-settings/snapshots"
+PROGRAMS = re.compile(r"^(?:sudo )?(?:migration-host|accountctl|\./|tools/|cmake|ctest|cpack|apt|dpkg|systemctl|journalctl)(?!.*\[OPTION\])", re.M)
+# Whatever device a command names, it is the test's own that it gets.
+WRAPPER = """#!/bin/sh
+case " $* " in
+  *" --root "* | *" --help "* | *" --version "*) exec "{program}" "$@" ;;
+  *) exec "{program}" --root "{root}" "$@" ;;
+esac
+"""
+
+
+def blocks(document):
+    return [match.groupdict() for match in BLOCK.finditer((SOURCES / document).read_text(encoding="utf-8"))]
+
+
+def steps(console):
+    """The commands of a console block, each with the lines that it is to print."""
+    found = []
+    for line in console.splitlines():
+        if line.startswith("$ "):
+            found.append((line[2:], []))
+        elif found[-1][0].endswith("\\") and not found[-1][1]:
+            found[-1] = (found[-1][0] + "\n" + line, [])
+        else:
+            found[-1][1].append(line)
+    return found
+
+
+def pattern_of(lines):
+    """What the shown lines stand for."""
+    parts = [r"(?:.*\n)*?" if line == "..." else re.escape(line).replace(r"\.\.\.", ".*") + r"\n" for line in lines]
+    return "".join(parts)
+
+
+class Documents(DeviceTest):
+    def setUp(self):
+        super().setUp()
+        self.tree = self.example("first-generation")
+        # The places that documents speak of, each as this test has it.
+        self.places = {
+            "/mnt/image": self.tree.root,
+            "/var/mobile": self.tree.root / "var/mobile",
+            "/var/lib/account-settings": self.tree.root / "var/lib/account-settings",
+            "/etc/vorlix": self.tree.root / "etc/vorlix",
+            "/tmp": self.scratch / "tmp",
+        }
+        programs = self.scratch / "programs"
+        for directory in (programs, self.scratch / "tmp", self.scratch / "work"):
+            directory.mkdir()
+        for program in (HOST, ACCOUNTCTL):
+            wrapper = programs / program.name
+            wrapper.write_text(WRAPPER.format(program=program, root=self.tree.root))
+            wrapper.chmod(0o755)
+        self.environment = {**plain_environment(), "PATH": f"{programs}:{os.environ['PATH']}", "LC_ALL": "C.UTF-8"}
+
+    def here(self, text):
+        names = "|".join(map(re.escape, self.places))
+        return re.sub(rf"(?<![\w/])({names})\b", lambda match: str(self.places[match[1]]), text)
+
+    def there(self, text):
+        for name in ("/mnt/image", "/tmp"):
+            text = text.replace(str(self.places[name]), name)
+        return text
+
+    def run_shell(self, command):
+        return subprocess.run(
+            ["bash", "-e", "-c", self.here(command)], cwd=self.scratch / "work", env=self.environment,
+            stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, check=False, timeout=60,
+        )
+
+    def check(self, block):
+        if block["reason"]:
+            return
+        if block["language"] == "sh":
+            ended = self.run_shell(block["text"])
+            self.assertEqual(0, ended.returncode, f"{block['text']}\n{ended.stdout}")
+        elif block["language"] == "console":
+            for command, shown in steps(block["text"]):
+                printed = self.there(self.run_shell(command).stdout)
+                self.assertRegex(printed, r"\A" + pattern_of(shown) + r"\Z", f"\n$ {command}\n{printed}")
+        else:
+            self.assertNotRegex(block["text"], PROGRAMS, "a command in a block that is not run")
+
+
+def test_of(document):
+    def test(self):
+        if document == MIGRATED:
+            self.assertEqual(0, self.run_shell(MIGRATE).returncode)
+        for block in blocks(document):
+            self.check(block)
+
+    return test
+
+
+for each in DOCUMENTS:
+    setattr(Documents, "test_commands_in_" + Path(each).stem, test_of(each))
+
+
+class Links(unittest.TestCase):
+    def test_lead_somewhere(self):
+        for document in [*DOCUMENTS, *(str(path.relative_to(SOURCES)) for path in (SOURCES / "docs").glob("*.md"))]:
+            text = BLOCK.sub("", (SOURCES / document).read_text(encoding="utf-8"))
+            for target in re.findall(r"\]\((?!https?:)([^)#]+)", text):
+                self.assertTrue(((SOURCES / document).parent / target).exists(), f"{document}: {target}")
+
+
+if __name__ == "__main__":
+    unittest.main()
