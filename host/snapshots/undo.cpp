@@ -125,15 +125,19 @@ void Undo::end(bool migrated, std::size_t count) {
   }
 }
 
-// The outcome is what ends a run or a restore. The mark is taken away also where it cannot be written.
+// The outcome is what ends a run or a restore; the mark is taken away also where that cannot be written. What fails is
+// made good by the next run, which finds the mark.
 void Undo::finish(Manifest manifest, const char* outcome) {
   manifest.outcome = outcome;
-  try {
-    _store.rewrite(manifest);
-  } catch (const Problem& problem) {
-    _place.warn(problem.what());
-  }
-  _journal.clear();
+  const auto tryTo = [this](const auto& step) {
+    try {
+      step();
+    } catch (const Problem& problem) {
+      _place.warn(problem.what());
+    }
+  };
+  tryTo([&] { _store.rewrite(manifest); });
+  tryTo([&] { _journal.clear(); });
 }
 
 }  // namespace host::snapshots

@@ -210,11 +210,13 @@ std::optional<std::string> ScratchDevice::settingsBytes() const {
   return std::string{std::istreambuf_iterator<char>{file}, {}};
 }
 
-std::optional<Dictionary> ScratchDevice::comparableSettings() const {
-  const std::optional<Dictionary> settings = read(kSettings);
-  if (!settings) return std::nullopt;
+std::optional<Dictionary> ScratchDevice::comparableSettings() const { return comparableAt(kSettings); }
+
+std::optional<Dictionary> ScratchDevice::comparableAt(const std::filesystem::path& path) const {
+  const std::optional<Dictionary> contents = read(path);
+  if (!contents) return std::nullopt;
   std::map<std::string, std::string> madeUp;
-  return *comparable(*settings, madeUp).asDictionary();
+  return *comparable(*contents, madeUp).asDictionary();
 }
 
 std::vector<std::string> ScratchDevice::files() const {

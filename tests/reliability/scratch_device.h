@@ -28,6 +28,8 @@ class ScratchDevice {
   ScratchDevice& operator=(const ScratchDevice&) = delete;
   ~ScratchDevice();
 
+  [[nodiscard]] const std::filesystem::path& root() const { return _root; }
+
   void putSettings(std::optional<std::uint64_t> version);
   void putLegacyMail();
   void putLegacyExchange();
@@ -43,6 +45,8 @@ class ScratchDevice {
   // The settings file with identifiers that the run made up replaced by the place where they stand first; nothing where
   // it cannot be read.
   [[nodiscard]] std::optional<platform::Dictionary> comparableSettings() const;
+  // The same of any property list of the device, by its path below the root.
+  [[nodiscard]] std::optional<platform::Dictionary> comparableAt(const std::filesystem::path& path) const;
   // Every file of the device, relative to its root, in order.
   [[nodiscard]] std::vector<std::string> files() const;
   [[nodiscard]] std::vector<std::string> temporaryFiles() const;

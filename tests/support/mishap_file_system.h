@@ -25,6 +25,22 @@ class MishapFileSystem final : public platform::FileSystem {
 
   [[nodiscard]] int operations() const { return _operations; }
 
+  // For who forwards operations that are none of a file system's: runs one, counted with the others, unless the mishap
+  // takes its place; `failed` is what it answers then.
+  template <typename Operation, typename Failed>
+  auto counted(const Operation& operation, const Failed& failed) -> decltype(operation()) {
+    ++_operations;
+    const bool isHit = _operations == _mishap.operation;
+    if (_mishap.kind == Mishap::Kind::failsOnce && isHit) return failed(_mishap.errorNumber);
+    if (_mishap.kind == Mishap::Kind::failsFromThenOn && _operations >= _mishap.operation) {
+      return failed(_mishap.errorNumber);
+    }
+    if (_mishap.kind == Mishap::Kind::diesBefore && isHit) _die();
+    auto answer = operation();
+    if (_mishap.kind != Mishap::Kind::none && isHit) _die();
+    return answer;
+  }
+
   [[nodiscard]] std::optional<platform::FileKind> kindOf(const platform::Path& path) override;
   platform::Result<platform::Bytes> read(const platform::Path& path, std::size_t sizeLimit) override;
   platform::Status create(const platform::Path& path, std::span<const std::uint8_t> bytes) override;

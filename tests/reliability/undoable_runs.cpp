@@ -1,0 +1,171 @@
+#include "tests/reliability/undoable_runs.h"
+
+#include <sys/stat.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <array>
+#include <cstdlib>
+#include <fstream>
+#include <functional>
+#include <iterator>
+#include <stdexcept>
+
+#include "host/snapshots/problem.h"
+#include "host/snapshots/undo.h"
+#include "migrator/accounts_data_migrator.h"
+#include "platform/linux/libplist_property_list_store.h"
+#include "platform/linux/linux_file_keeper.h"
+#include "platform/linux/linux_platform.h"
+#include "tests/support/fake_platform.h"
+#include "tests/support/mishap_file_keeper.h"
+
+namespace tests {
+namespace {
+
+using host::snapshots::Missing;
+using host::snapshots::Problem;
+using host::snapshots::Undo;
+
+constexpr int kRefused = 5;
+constexpr int kDied = 99;
+constexpr std::size_t kCount = 3;
+constexpr const char* kCopyAside = "var/mobile/Library/Logs/CrashReporter/com.vorlix.accountsettings.plist";
+constexpr const char* kSettings = "var/mobile/Library/Preferences/com.vorlix.accountsettings.plist";
+
+// What the child is, and what it tells of itself.
+struct Child {
+  std::shared_ptr<MishapFileSystem> files;
+  host::snapshots::UndoPlace place;
+  std::array<int, 2> operations{};  // ahead of the plug-in, and all
+};
+
+Outputs& unheard() {
+  static Outputs outputs;
+  return outputs;
+}
+
+Child childOn(const std::filesystem::path& root, const Mishap& mishap) {
+  platform::LinuxPlatformOptions options;
+  options.systemRoot = root;
+  options.resources = RESOURCES_DIRECTORY;
+  options.lockDirectory = root / "lock";
+  platform::Platform services = platform::makeLinuxPlatform(options);
+  const auto files = std::make_shared<MishapFileSystem>(services.files, mishap, [] { ::_exit(kDied); });
+  const auto log = std::make_shared<FakeSystemLog>(unheard());
+  log->readers = false;
+  services.files = files;
+  services.propertyLists = platform::makeLibplistPropertyListStore(files);
+  services.systemLog = log;
+  services.console = std::make_shared<FakeConsoleLog>(unheard());
+  ::setenv("TMPDIR", (root / "var/mobile/tmp").c_str(), 1);
+  return {.files = files,
+          .place = {.services = services,
+                    .keeper = std::make_shared<MishapFileKeeper>(platform::makeFileKeeper(), files),
+                    .directory = root / "snapshots",
+                    .release = "1",
+                    .warn = [](const std::string&) {}}};
+}
+
+bool migrate(Child& child) {
+  platform::setCurrent(child.place.services);
+  Undo undo{child.place, Missing::isMade};
+  migrator::AccountsDataMigrator migrator;
+  platform::Platform watched = child.place.services;
+  watched.files = undo.begin(migrator.footprint());
+  platform::setCurrent(watched);
+  child.operations[0] = child.files->operations();
+  const bool migrated = migrator.performMigration();
+  undo.end(migrated, kCount);
+  return migrated;
+}
+
+bool restore(Child& child) {
+  Undo undo{child.place, Missing::isRefused};
+  std::vector<std::string> names;
+  for (const auto& entry : std::filesystem::directory_iterator{child.place.directory}) {
+    if (entry.path().filename().string().starts_with("0")) names.push_back(entry.path().filename());
+  }
+  return !undo.restore(*std::min_element(names.begin(), names.end())).empty();
+}
+
+[[noreturn]] void beChild(const std::filesystem::path& root, const Mishap& mishap, bool (*task)(Child&), int out) {
+  Child child = childOn(root, mishap);
+  int status = kRefused;
+  try {
+    status = task(child) ? 0 : 1;
+  } catch (const Problem&) {
+    status = kRefused;
+  }
+  child.operations[1] = child.files->operations();
+  static_cast<void>(::write(out, child.operations.data(), sizeof child.operations));
+  ::_exit(status);
+}
+
+UndoOutcome inChild(const std::filesystem::path& root, const Mishap& mishap, bool (*task)(Child&)) {
+  std::array<int, 2> pipe{};
+  if (::pipe(pipe.data()) != 0) throw std::runtime_error{"no pipe"};
+  const pid_t child = ::fork();
+  if (child == 0) beChild(root, mishap, task, pipe[1]);
+  int status = 0;
+  ::waitpid(child, &status, 0);
+  ::close(pipe[1]);
+  std::array<int, 2> operations{};
+  static_cast<void>(::read(pipe[0], operations.data(), sizeof operations));
+  ::close(pipe[0]);
+  const int code = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+  return {.died = code == kDied,
+          .crashed = code != 0 && code != 1 && code != kRefused && code != kDied,
+          .refused = code == kRefused,
+          .succeeded = code == 0,
+          .operations = operations[1],
+          .operationsAhead = operations[0]};
+}
+
+bool isOfTheDevice(const std::string& path) { return path.starts_with("var/"); }
+
+std::string contentsOf(const std::filesystem::path& path) {
+  std::ifstream file{path, std::ios::binary};
+  return {std::istreambuf_iterator<char>{file}, {}};
+}
+
+}  // namespace
+
+UndoOutcome runUndoable(const ScratchDevice& device, const Mishap& mishap) {
+  return inChild(device.root(), mishap, &migrate);
+}
+
+UndoOutcome restoreFirst(const ScratchDevice& device, const Mishap& mishap) {
+  return inChild(device.root(), mishap, &restore);
+}
+
+EndState endStateOf(const ScratchDevice& device) {
+  EndState state{
+      .settings = device.comparableSettings(), .copyAside = device.comparableAt(kCopyAside), .otherFiles = {}};
+  for (const std::string& path : device.files()) {
+    if (isOfTheDevice(path) && path != kSettings && path != kCopyAside)
+      state.otherFiles[path] = contentsOf(device.root() / path);
+  }
+  return state;
+}
+
+std::map<std::string, std::string> exactStateOf(const ScratchDevice& device) {
+  std::map<std::string, std::string> state;
+  for (const std::string& path : device.files()) {
+    struct stat status {};
+    if (!isOfTheDevice(path) || ::lstat((device.root() / path).c_str(), &status) != 0) continue;
+    state[path] = std::to_string(status.st_mode) + " " + std::to_string(status.st_mtim.tv_sec) + "." +
+                  std::to_string(status.st_mtim.tv_nsec) + " " + contentsOf(device.root() / path);
+  }
+  return state;
+}
+
+std::vector<std::string> leftoversIn(const ScratchDevice& device) {
+  std::vector<std::string> left;
+  for (const std::string& path : device.files()) {
+    if (path.starts_with("snapshots/.") || path.find("/.restoring-") != std::string::npos) left.push_back(path);
+  }
+  return left;
+}
+
+}  // namespace tests
