@@ -14,8 +14,11 @@
 #include "platform/export.h"
 #include "platform/file_system.h"
 #include "platform/insertion_ordered_map.h"
+#include "platform/status.h"
 
 namespace accountsettings {
+
+class StoreWatch;
 
 // The change that a change entry tells of.
 enum class ChangeType : std::int32_t { added = 0, present = 1, removed = 2 };
@@ -52,6 +55,10 @@ class ACCOUNT_EXPORT AccountsManager {
   void saveAllAccounts();
   // Internal: takes the state against which the next save's change notifications are computed.
   void _setOriginalAccountDictionaries();
+  // Internal: what follows the accounts for a run's observer; null where none wants to know.
+  [[nodiscard]] StoreWatch* _runWatch() const { return _watch.get(); }
+  // Internal: tells the run's observer, if there is one, what became of the accounts since it last was told.
+  void _tellChanges() const;
 
   // --- Migration support (accounts_manager_migration_support.cpp) ---
 
@@ -142,12 +149,17 @@ class ACCOUNT_EXPORT AccountsManager {
   [[nodiscard]] static std::vector<std::unique_ptr<RuntimeFixer>> _createRuntimeFixers();
 
   // Loading. An element that is no dictionary is read as an empty one.
+  [[nodiscard]] static std::shared_ptr<AccountsManager> _loadedFromFile(std::unique_ptr<StoreWatch> watch);
+  [[nodiscard]] static std::shared_ptr<AccountsManager> _loaded(const Array* accounts,
+                                                                std::unique_ptr<StoreWatch> watch);
+  [[nodiscard]] bool _offerLoaded(const Account& account, const PropertyValue& element);
   void _loadAccounts(const Array& accounts);
   [[nodiscard]] static Account _accountFromElement(const PropertyValue& element);
   void _registerAccount(const Account& account);
   void _loadChild(const PropertyValue& properties, const Account& parent, const Text& parentIdentifier);
 
-  // Saving. Fixing answers whether a fixer had something to do.
+  // Saving. Fixing, like offering, answers whether a fixer had something to do.
+  [[nodiscard]] platform::Status _writeFile() const;
   [[nodiscard]] bool _fixAccountsForSaving();
   [[nodiscard]] Array _mergedRecords() const;
   void _tellFixers(bool saved);
@@ -179,6 +191,7 @@ class ACCOUNT_EXPORT AccountsManager {
   platform::InsertionOrderedMap<Dictionary> _originalAccountsByID;
   std::uint64_t _dataVersion = 0;
   std::vector<std::unique_ptr<RuntimeFixer>> _runtimeFixers;
+  std::unique_ptr<StoreWatch> _watch;  // null unless a run is observed
 };
 
 // Paths of the account settings file and of the two legacy files.

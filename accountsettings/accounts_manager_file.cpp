@@ -1,3 +1,4 @@
+#include <cerrno>
 #include <ranges>
 #include <tuple>
 
@@ -5,8 +6,10 @@
 #include "accountsettings/as_runtime_fix_mail_account.h"
 #include "accountsettings/log_handle.h"
 #include "accountsettings/product_values.h"
+#include "accountsettings/store_watch.h"
 #include "platform/description.h"
 #include "platform/platform.h"
+#include "platform/run_stage.h"
 
 namespace accountsettings {
 namespace {
@@ -40,25 +43,28 @@ std::optional<Bytes> serialized(const Dictionary& root) {
   return std::move(list.data);
 }
 
-bool giveToOwner(FileSystem& files, const Path& path) {
-  const Status status = files.setOwner(path, kSettingsOwner, kSettingsOwner);
+Status giveToOwner(FileSystem& files, const Path& path) {
+  Status status = files.setOwner(path, kSettingsOwner, kSettingsOwner);
   if (!status.isOk()) {
     _ASLogSystem().log(kSave, "Could not set attributes on the temporary account settings plist. %@",
                        status.description());
   }
-  return status.isOk();
+  return status;
 }
 
 // The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails, no
 // temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
-bool replaceSettingsFile(const std::optional<Bytes>& data) {
+Status replaceSettingsFile(const std::optional<Bytes>& data) {
   FileSystem& files = *platform::current().files;
   const Path destination = AccountsManager::fullPathToAccountSettingsPlist();
   const std::optional<Path> temporary = files.temporaryName();
-  if (!temporary || !data || !files.create(*temporary, *data).isOk()) return false;
-  if (giveToOwner(files, *temporary) && files.rename(*temporary, destination).isOk()) return true;
-  std::ignore = files.remove(*temporary);
-  return false;
+  if (!temporary) return Status::failure(EEXIST, "find a name for a temporary file");
+  if (!data) return Status::failure(EINVAL, "serialize the accounts");
+  if (Status made = files.create(*temporary, *data); !made.isOk()) return made;
+  Status status = giveToOwner(files, *temporary);
+  if (status.isOk()) status = files.rename(*temporary, destination);
+  if (!status.isOk()) std::ignore = files.remove(*temporary);
+  return status;
 }
 
 }  // namespace
@@ -83,10 +89,15 @@ std::vector<std::unique_ptr<RuntimeFixer>> AccountsManager::_createRuntimeFixers
 std::shared_ptr<AccountsManager> AccountsManager::init() { return initInsideOfMigration(); }
 
 std::shared_ptr<AccountsManager> AccountsManager::initInsideOfMigration() {
+  return _loadedFromFile(StoreWatch::ofRun());
+}
+
+std::shared_ptr<AccountsManager> AccountsManager::_loadedFromFile(std::unique_ptr<StoreWatch> watch) {
   const Dictionary file =
       platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist()).value_or(Dictionary{});
-  std::shared_ptr<AccountsManager> store = _initWithAccountsInfo(file.array(kPlistAccountsKey));
+  std::shared_ptr<AccountsManager> store = _loaded(file.array(kPlistAccountsKey), std::move(watch));
   store->setDataVersion(versionIn(file));
+  if (store->_watch) store->_watch->loadedAll(store->_orderedTopLevelAccounts, store->_dataVersion);
   return store;
 }
 
@@ -95,7 +106,12 @@ std::shared_ptr<AccountsManager> AccountsManager::initWithAccounsInfoArray(const
 }
 
 std::shared_ptr<AccountsManager> AccountsManager::_initWithAccountsInfo(const Array* accounts) {
+  return _loaded(accounts, nullptr);
+}
+
+std::shared_ptr<AccountsManager> AccountsManager::_loaded(const Array* accounts, std::unique_ptr<StoreWatch> watch) {
   std::shared_ptr<AccountsManager> store{new AccountsManager};
+  store->_watch = std::move(watch);
   if (accounts != nullptr) store->_loadAccounts(*accounts);
   store->_setOriginalAccountDictionaries();
   return store;
@@ -103,20 +119,31 @@ std::shared_ptr<AccountsManager> AccountsManager::_initWithAccountsInfo(const Ar
 
 void AccountsManager::_loadAccounts(const Array& accounts) {
   bool isFixed = false;
+  platform::RunProgress progress{accounts.size()};
   for (const PropertyValue& properties : accounts) {
+    progress.next();
     const Account account = _accountFromElement(properties);
     if (account == nullptr) {
       _ASLogSystem().log("-[AccountsManager _initWithAccountsInfo:]", "ERROR: Failed to create a BasicAccount from %@",
                          properties);
+      if (_watch) _watch->leftOut(properties);
       continue;
     }
-    for (const auto& fixer : _runtimeFixers) {
-      const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
-      if (answer != FixAnswer::drop) _registerAccount(account);
-      isFixed |= answer != FixAnswer::nothingToDo;
-    }
+    isFixed |= _offerLoaded(account, properties);
   }
   if (isFixed) _tellFixers(false);
+}
+
+bool AccountsManager::_offerLoaded(const Account& account, const PropertyValue& element) {
+  bool isFixed = false;
+  for (const auto& fixer : _runtimeFixers) {
+    const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
+    if (answer != FixAnswer::drop) _registerAccount(account);
+    isFixed |= answer != FixAnswer::nothingToDo;
+    if (!_watch) continue;
+    answer == FixAnswer::drop ? _watch->givenUp(element, fixer->ruleForDropping()) : _watch->loaded(element, *account);
+  }
+  return isFixed;
 }
 
 AccountsManager::Account AccountsManager::_accountFromElement(const PropertyValue& element) {
@@ -140,11 +167,16 @@ void AccountsManager::_setOriginalAccountDictionaries() {
   }
 }
 
+void AccountsManager::_tellChanges() const {
+  if (_watch) _watch->look(_orderedTopLevelAccounts);
+}
+
 void AccountsManager::saveAllAccounts() {
+  _tellChanges();
+  const platform::RunStage stage{"save"};
   _ASLogSystem().log(kSave, "Saving all accounts");
   const bool isFixed = _fixAccountsForSaving();
-  const Dictionary root{{kPlistAccountsKey, _mergedRecords()}, {kPlistVersionKey, currentVersion()}};
-  const bool isSaved = replaceSettingsFile(serialized(root));
+  const bool isSaved = _writeFile().isOk();
   if (isSaved) {
     for (const Account& account : _orderedTopLevelAccounts) account->setOriginalProperties(account->propertiesToSave());
   } else {
@@ -156,13 +188,26 @@ void AccountsManager::saveAllAccounts() {
   _setOriginalAccountDictionaries();
 }
 
+Status AccountsManager::_writeFile() const {
+  _tellChanges();
+  Array records = _mergedRecords();
+  if (_watch) _watch->written(_orderedTopLevelAccounts, records);
+  const Dictionary root{{kPlistAccountsKey, std::move(records)}, {kPlistVersionKey, currentVersion()}};
+  Status status = replaceSettingsFile(serialized(root));
+  if (_watch) _watch->savedAll(count(), currentVersion(), fullPathToAccountSettingsPlist(), status);
+  return status;
+}
+
 bool AccountsManager::_fixAccountsForSaving() {
   bool isFixed = false;
   for (const Account& account : std::views::reverse(_orderedTopLevelAccounts)) {
     for (const auto& fixer : _runtimeFixers) {
       const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "saving accounts");
       // A dropped account is no longer found, but keeps its place in the order and so in the file.
-      if (answer == FixAnswer::drop) _forgetIdentifierOfAccount(*account);
+      if (answer == FixAnswer::drop) {
+        _forgetIdentifierOfAccount(*account);
+        if (_watch) _watch->unrepaired(*account, fixer->ruleForDropping());
+      }
       isFixed |= answer != FixAnswer::nothingToDo;
     }
   }
@@ -170,10 +215,12 @@ bool AccountsManager::_fixAccountsForSaving() {
 }
 
 Array AccountsManager::_mergedRecords() const {
-  const std::shared_ptr<AccountsManager> fileAsItStands = initInsideOfMigration();
+  const std::shared_ptr<AccountsManager> fileAsItStands = _loadedFromFile(nullptr);
   Array records;
   records.reserve(_orderedTopLevelAccounts.size());
+  platform::RunProgress progress{count()};
   for (const Account& account : _orderedTopLevelAccounts) {
+    progress.next();
     const std::optional<Text> identifier = account->identifier();
     const Account onDisk = identifier ? fileAsItStands->accountWithIdentifier(*identifier) : nullptr;
     Dictionary merged = mergeInMemoryProperties_originalProperties_onDiskProperties(

@@ -6,6 +6,7 @@
 #include "accountsettings/assertion_failure.h"
 #include "accountsettings/dataclass_lists.h"
 #include "accountsettings/log_handle.h"
+#include "accountsettings/store_watch.h"
 
 namespace accountsettings {
 namespace {
@@ -68,6 +69,7 @@ void AccountsManager::updateAccount(const Account& account) {
 void AccountsManager::deleteAccount(const Account& account) {
   _ASLogSystem().log("-[AccountsManager deleteAccount:]", "Deleting account: %@", account->properties());
   _forgetIdentifierOfAccount(*account);
+  if (_watch) _watch->willGo(*account, "it was deleted");
   const auto last =
       std::ranges::find_if(_orderedTopLevelAccounts.rbegin(), _orderedTopLevelAccounts.rend(),
                            [&](const Account& present) { return haveSameIdentifier(*present, *account); });
@@ -92,6 +94,7 @@ void AccountsManager::replaceAccount_withAccount(const Account& oldAccount, cons
                   "The account with identifier %@ is not in the store", {oldAccount->identifier()});
   }
   _forgetIdentifierOfAccount(*oldAccount);
+  if (_watch) _watch->willGo(*oldAccount, "another account was put in its place");
   // Listed, counted and saved, but found by its identifier only in a store that is loaded afresh.
   *position = newAccount;
   _loadChildrenFromAccount(*position);
@@ -124,6 +127,7 @@ void AccountsManager::_replaceInPlace(const Types& types, Replacement& replaceme
       enter(replacement.byID, identifier, present);
     } else {
       if (identifier) _removeChildrenForAccountWithIdentifier(*identifier);
+      if (_watch) _watch->willGo(*present, "the accounts of its type were replaced, and it is none of the new ones");
       present = nullptr;
     }
   }

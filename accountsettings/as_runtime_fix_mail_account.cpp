@@ -66,6 +66,10 @@ bool ASRuntimeFixMailAccount::_cleanupAccountClass(BasicAccount& account) {
   return false;
 }
 
+std::string_view ASRuntimeFixMailAccount::ruleForDropping() const {
+  return "the mail application does not know its class, and its AccountPath names none";
+}
+
 void ASRuntimeFixMailAccount::accountsHaveBeenSaved(bool saved) {
   if (_shouldNotifyMobileMail && saved) {
     platform::current().preferencesChanged->post(kMailPreferencesDomain, kMailPreferencesAccountsKey);

@@ -16,6 +16,7 @@ class ACCOUNT_EXPORT ASRuntimeFixMailAccount final : public RuntimeFixer {
   ~ASRuntimeFixMailAccount() override;
 
   FixAnswer fixBasicAccountIfNeeded_loggingMessage(BasicAccount& account, std::string_view loggingMessage) override;
+  [[nodiscard]] std::string_view ruleForDropping() const override;
   void accountsHaveBeenSaved(bool saved) override;
 
   // The account types that are looked at; one set for all instances.

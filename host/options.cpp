@@ -21,6 +21,8 @@ constexpr std::string_view kUsage =
     "  --resources DIR         the plug-in's resources, in place of the installed ones\n"
     "  --plugin FILE           the plug-in to load, in place of the installed one\n"
     "  --trace FILE            append the run's events to this file, one JSON object a line\n"
+    "  --explain               print what the run did to which account; =json for machines\n"
+    "  --dry-run               rehearse the run: the device stays as it is\n"
     "  --snapshots DIR         before the run, keep copies in DIR of the files that it may change\n"
     "  --keep N                keep the newest N snapshots (default: 5)\n"
     "  --list-snapshots        in place of a run, list the snapshots in DIR; =json for machines\n"
@@ -90,6 +92,22 @@ std::optional<Answer> readListing(const Argument& argument, SnapshotOptions& sna
   return std::nullopt;
 }
 
+std::optional<Answer> readExplain(const Argument& argument, Explain& explain) {
+  if (explain != Explain::notAsked) return wrongUse("--explain is given twice");
+  if (argument.value && *argument.value != "json" && *argument.value != "text") {
+    return wrongUse("--explain is followed by nothing, =text or =json");
+  }
+  explain = argument.value == "json" ? Explain::json : Explain::text;
+  return std::nullopt;
+}
+
+std::optional<Answer> readDryRun(const Argument& argument, bool& isRehearsal) {
+  if (isRehearsal) return wrongUse("--dry-run is given twice");
+  if (argument.value) return wrongUse("--dry-run takes no value");
+  isRehearsal = true;
+  return std::nullopt;
+}
+
 template <typename Value, typename Read>
 std::optional<Answer> readValue(const Argument& argument, std::span<const char* const>& arguments,
                                 std::optional<Value>& place, const Read& read) {
@@ -107,6 +125,8 @@ std::optional<Answer> readArgument(std::span<const char* const>& arguments, Opti
   if (name == "--help" && !argument.value) return Answer{.text = std::string{kUsage}};
   if (name == "--version" && !argument.value) return Answer{.text = std::string{kVersion}};
   if (!name.starts_with("-")) return wrongUse("unexpected argument: " + name);
+  if (name == "--explain") return readExplain(argument, options.explain);
+  if (name == "--dry-run") return readDryRun(argument, options.isRehearsal);
   if (name == "--list-snapshots") return readListing(argument, options.snapshots);
   if (auto* const word = wordOf(name, words)) {
     return readValue(argument, arguments, *word, [](std::string_view value) { return std::string{value}; });
@@ -140,6 +160,15 @@ std::optional<Answer> settleSnapshots(const Words& words, SnapshotOptions& snaps
   return words.keep ? readCount(*words.keep, snapshots.keep) : std::nullopt;
 }
 
+// A rehearsal keeps nothing, and what is done in place of a run is no run to rehearse or to explain.
+std::optional<Answer> settleRun(const Options& options) {
+  const SnapshotOptions& snapshots = options.snapshots;
+  const bool isRun = !snapshots.restore && snapshots.listing == SnapshotOptions::Listing::none;
+  if (options.isRehearsal && snapshots.directory) return wrongUse("--dry-run and --snapshots exclude each other");
+  if (options.explain != Explain::notAsked && !isRun) return wrongUse("--explain is for a run, and this is none");
+  return std::nullopt;
+}
+
 }  // namespace
 
 std::variant<Options, Answer> parseArguments(std::span<const char* const> arguments) {
@@ -149,6 +178,7 @@ std::variant<Options, Answer> parseArguments(std::span<const char* const> argume
     if (auto answer = readArgument(arguments, options, words)) return *std::move(answer);
   }
   if (auto answer = settleSnapshots(words, options.snapshots)) return *std::move(answer);
+  if (auto answer = settleRun(options)) return *std::move(answer);
   std::error_code ignored;
   if (const auto& root = options.device.systemRoot; root && !std::filesystem::is_directory(*root, ignored)) {
     return wrongUse("--root is no directory: " + root->string());

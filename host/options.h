@@ -22,11 +22,16 @@ struct SnapshotOptions {
   Listing listing = Listing::none;                 // in place of a run
 };
 
+// How a run is explained after it, on standard output; see docs/EXPLAIN.md.
+enum class Explain : std::uint8_t { notAsked, text, json };
+
 // What the command line asks for. Every path is absolute.
 struct Options {
   platform::LinuxPlatformOptions device;
   std::optional<std::filesystem::path> plugin;  // default: the installed one
   std::optional<std::filesystem::path> trace;
+  Explain explain = Explain::notAsked;
+  bool isRehearsal = false;
   SnapshotOptions snapshots;
 };
 

@@ -1,9 +1,15 @@
 #include "host/run.h"
 
+#include <unistd.h>
+
+#include <cstdio>
 #include <memory>
 #include <utility>
 
+#include "host/explanation_output.h"
 #include "host/plugin.h"
+#include "host/rehearsal.h"
+#include "host/run_watch.h"
 #include "host/say.h"
 #include "host/snapshot_steps.h"
 #include "host/snapshots/problem.h"
@@ -14,19 +20,17 @@
 namespace host {
 namespace {
 
-// Ends a run before it began, with what is said of it.
+// Ends a run before it began; what is wrong has been said.
 struct Refusal {
   ExitStatus status;
 };
 
-ExitStatus perform(platform::DataClassMigrator& migrator, const SnapshotOptions& options, Trace* trace) {
-  const auto undo = beginUndoableRun(options, migrator);
-  const bool success = migrator.performMigration();
-  if (undo) undo->end(success, options.keep);
-  if (trace != nullptr) trace->result(migrator.dataClassName(), success);
-  if (trace != nullptr && !trace->complete()) say("the trace is incomplete: not every event could be written");
-  return success ? ExitStatus::migrated : ExitStatus::notMigrated;
-}
+// What watches a run from outside. The watch is null where nobody asks for anything that it could tell.
+struct Watchers {
+  std::shared_ptr<Trace> trace;
+  std::shared_ptr<ProgressLine> progress = std::make_shared<ProgressLine>(STDERR_FILENO);
+  std::shared_ptr<RunWatch> watch;
+};
 
 // The trace that is asked for; null where none is.
 std::shared_ptr<Trace> openTrace(const Options& options) {
@@ -35,6 +39,25 @@ std::shared_ptr<Trace> openTrace(const Options& options) {
   if (opened.isOk()) return opened.take();
   say(opened.status().description());
   throw Refusal{ExitStatus::wrongUse};
+}
+
+Watchers watchersFor(const Options& options) {
+  Watchers watchers;
+  watchers.trace = openTrace(options);
+  const bool isExplained = options.explain != Explain::notAsked;
+  if (isExplained || watchers.progress->isOnTerminal()) {
+    watchers.watch = std::make_shared<RunWatch>(watchers.trace, isExplained, watchers.progress);
+  }
+  return watchers;
+}
+
+platform::Platform platformFor(const Options& options, const Watchers& watchers) {
+  auto platform = platform::makeLinuxPlatform(options.device);
+  if (options.isRehearsal) rehearseOn(platform, options.device.lockDirectory);
+  if (watchers.trace) traceServices(platform, watchers.trace);
+  putConsoleInFrontOf(watchers.progress, platform);
+  platform.observer = watchers.watch;
+  return platform;
 }
 
 std::unique_ptr<platform::DataClassMigrator> load(const Options& options) {
@@ -46,15 +69,38 @@ std::unique_ptr<platform::DataClassMigrator> load(const Options& options) {
   return std::get<std::unique_ptr<platform::DataClassMigrator>>(std::move(loaded));
 }
 
+bool perform(platform::DataClassMigrator& migrator, const SnapshotOptions& options, const Watchers& watchers) {
+  const auto undo = beginUndoableRun(options, migrator);
+  const bool success = migrator.performMigration();
+  watchers.progress->clear();
+  if (undo) undo->end(success, options.keep);
+  if (watchers.trace) {
+    watchers.trace->result(migrator.dataClassName(), success);
+    if (!watchers.trace->complete()) say("the trace is incomplete: not every event could be written");
+  }
+  return success;
+}
+
+void explain(const Options& options, const Watchers& watchers, const Outcome& outcome) {
+  if (options.explain == Explain::notAsked) return;
+  const Explanation& explanation = watchers.watch->explanation();
+  const std::string text =
+      options.explain == Explain::json ? jsonDocumentOf(explanation, outcome) : textOf(explanation, outcome);
+  const bool isWritten = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
+  if (std::fflush(stdout) != 0 || !isWritten) say("the explanation could not be written to standard output");
+}
+
 ExitStatus runInSteps(const Options& options) {
-  auto platform = platform::makeLinuxPlatform(options.device);
-  const std::shared_ptr<Trace> trace = openTrace(options);
-  if (trace) traceServices(platform, trace);
-  platform::setCurrent(std::move(platform));
+  const Watchers watchers = watchersFor(options);
+  platform::setCurrent(platformFor(options, watchers));
   if (isForSnapshots(options.snapshots)) return workOnSnapshots(options.snapshots);
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   const auto migrator = load(options);
-  return perform(*migrator, options.snapshots, trace.get());
+  if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");
+  const bool success = perform(*migrator, options.snapshots, watchers);
+  explain(options, watchers,
+          {.dataClass = migrator->dataClassName(), .success = success, .isRehearsal = options.isRehearsal});
+  return success ? ExitStatus::migrated : ExitStatus::notMigrated;
 }
 
 }  // namespace

@@ -7,6 +7,8 @@
 #include <cerrno>
 #include <nlohmann/json.hpp>
 
+#include "host/fact_json.h"
+
 namespace host {
 namespace {
 
@@ -58,6 +60,15 @@ void Trace::preferencesChanged(std::string_view domain, std::string_view key) no
 
 void Trace::cloudTabs(bool enabled) noexcept {
   append([&] { return Event{{"event", "cloud-tabs"}, {"enabled", enabled}}; });
+}
+
+void Trace::step(std::string_view stage, std::string_view outerStage, const platform::RunFact& fact) noexcept {
+  append([&] {
+    Event event{{"event", "step"}, {"stage", stage}};
+    if (!outerStage.empty()) event["within"] = outerStage;
+    event.update(jsonOf(fact));
+    return event;
+  });
 }
 
 void Trace::result(std::string_view dataClass, bool success) noexcept {

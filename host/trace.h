@@ -6,6 +6,7 @@
 #include <string>
 #include <string_view>
 
+#include "platform/run_fact.h"
 #include "platform/status.h"
 
 namespace host {
@@ -26,6 +27,8 @@ class Trace {
   void log(std::string_view subsystem, std::string_view category, const std::function<std::string()>& message) noexcept;
   void preferencesChanged(std::string_view domain, std::string_view key) noexcept;
   void cloudTabs(bool enabled) noexcept;
+  // What the run did in a stage; `outerStage`, of which that is a part, may be empty.
+  void step(std::string_view stage, std::string_view outerStage, const platform::RunFact& fact) noexcept;
   void result(std::string_view dataClass, bool success) noexcept;
 
   // Whether every event so far was written.

@@ -7,10 +7,12 @@
 
 #include "accountsettings/file_paths.h"
 #include "accountsettings/product_values.h"
+#include "migrator/account_stage.h"
 #include "migrator/console.h"
-#include "migrator/stage.h"
+#include "migrator/told_removal.h"
 #include "platform/class_registry.h"
 #include "platform/platform.h"
+#include "platform/run_stage.h"
 
 namespace migrator {
 namespace {
@@ -61,7 +63,7 @@ struct Decision {
 };
 
 Decision decide() {
-  const Stage stage{"decision"};
+  const platform::RunStage stage{"decision"};
   Decision decision;
   AccountsManager::shouldMigrateOldMailAccounts_oldDAAccounts_newAccountSettings(&decision.mail, &decision.exchange,
                                                                                  &decision.newSettings);
@@ -69,13 +71,13 @@ Decision decide() {
 }
 
 void finishInterruptedRemoval(AccountsDataMigrator& migrator) {
-  const Stage stage{"legacy removal"};
+  const platform::RunStage stage{"legacy removal"};
   writeToConsole("Detected that a removal old accounts info was in progress. Early return!.");
   migrator._removeOldAccountsInfo();
 }
 
 std::shared_ptr<AccountsManager> loadStore() {
-  const Stage stage{"load"};
+  const platform::RunStage stage{"load"};
   return AccountsManager::initInsideOfMigration();
 }
 
@@ -86,20 +88,19 @@ bool migrate(AccountsDataMigrator& migrator, AccountsManager& store, const Decis
   if (AccountsDataMigrator::_saveMigrationInformation()) migrator._collatedMigrationData.emplace();
   writeToConsole("Migrating accounts");
   if (decision.exchange) {
-    const Stage stage{"exchange conversion"};
+    const AccountStage stage{"exchange conversion", store};
     std::ignore = migrator._migrateDAAccounts(store);
   }
   if (decision.mail) {
-    const Stage stage{"mail conversion"};
+    const AccountStage stage{"mail conversion", store};
     std::ignore = migrator._migrateMailAccounts(store);
   }
-  const Stage stage{"version steps"};
+  const platform::RunStage stage{"version steps"};
   return migrator._migrateNewAccountsInfo(store);
 }
 
 // Also after failed steps: the file is stamped with the current version whatever became of the run.
 void stampAndSave(AccountsManager& store) {
-  const Stage stage{"save"};
   store.setDataVersion(AccountsManager::currentVersion());
   store.saveAllAccounts();
 }
@@ -107,18 +108,18 @@ void stampAndSave(AccountsManager& store) {
 // Nobody asks whether the save went through: the legacy files go after every successful run, and with them, where the
 // file could not be saved, the only copy of the accounts in them. Who cannot bear that keeps a copy of the device.
 void removeLegacyFiles(AccountsDataMigrator& migrator) {
-  const Stage stage{"legacy removal"};
+  const platform::RunStage stage{"legacy removal"};
   migrator._removeOldAccountsInfo();
 }
 
 void writeReport(AccountsDataMigrator& migrator) {
-  const Stage stage{"report"};
+  const platform::RunStage stage{"report"};
   migrator._saveCollatedMigrationInformation();
 }
 
 void tellMailApplication() {
   const platform::Platform& services = platform::current();
-  std::ignore = services.files->remove(accountsettings::mailAutoFetchMarkerPath());
+  std::ignore = removeAndTell(accountsettings::mailAutoFetchMarkerPath());
   services.preferencesChanged->post(accountsettings::kMailPreferencesDomain,
                                     accountsettings::kMailPreferencesAccountsKey);
 }

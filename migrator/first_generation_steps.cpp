@@ -2,6 +2,7 @@
 #include <array>
 
 #include "accountsettings/device_local_account.h"
+#include "accountsettings/store_watch.h"
 #include "accountsettings/vocabulary.h"
 #include "migrator/account_reads.h"
 #include "migrator/accounts_data_migrator.h"
@@ -110,12 +111,13 @@ Accounts calDAVAccountsOf(const AccountsManager& store) {
 }
 
 // Every partner is folded in, not just the first; one with two umbrellas is listed for each.
-void foldPartnersInto(BasicAccount& umbrella, const Accounts& candidates, Accounts& folded) {
+void foldPartnersInto(BasicAccount& umbrella, const Accounts& candidates, Accounts& folded, StoreWatch* watch) {
   if (!hasClassAmong(umbrella, {kGmailAccountClass, kYahooAccountClass})) return;
   for (const AccountsManager::Account& candidate : candidates) {
     if (!AccountsDataMigrator::_calDAVAccount_matchesUmbrellaAccount(*candidate, umbrella)) continue;
     umbrella.setEnabled_forDataclass(true, kAccountDataclassCalendars);
     folded.push_back(candidate);
+    if (watch != nullptr) watch->willBeFolded(*candidate, umbrella, "the same user's calendars at the same service");
   }
 }
 
@@ -173,7 +175,7 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A242(AccountsManager& store) {
   for (const AccountsManager::Account& account : store.allBasicAccounts()) {
     enableMailAndNotes(*account);
     giveOwnTypeToGmailAndYahoo(*account);
-    foldPartnersInto(*account, candidates, folded);
+    foldPartnersInto(*account, candidates, folded, store._runWatch());
   }
   for (const AccountsManager::Account& account : folded) store.deleteAccount(account);
   store.setDataVersion(5);

@@ -3,8 +3,11 @@
 #include <tuple>
 #include <utility>
 
+#include "accountsettings/store_watch.h"
 #include "migrator/console.h"
+#include "migrator/told_removal.h"
 #include "platform/platform.h"
+#include "platform/run_stage.h"
 
 namespace migrator {
 
@@ -26,11 +29,37 @@ Dictionary readLegacyFile(const std::string& path) {
   return platform::current().propertyLists->readDictionary(path).value_or(Dictionary{});
 }
 
-std::optional<AccountsManager::Accounts> convertedAccounts(const Dictionary& legacyFile, std::string_view key,
-                                                           const Conversion& convert, std::string_view method,
-                                                           std::string_view failureFormat) {
+namespace {
+
+// Where a description stands: MailAccounts[2] of /a/file.
+std::string placeOf(const LegacySource& source, std::size_t index) {
+  return std::string{source.key} + "[" + std::to_string(index) + "] of " + source.path;
+}
+
+void tellRefused(const LegacySource& source, const std::string& place) {
+  platform::tellFact([&] {
+    return platform::RunFact{.kind = platform::RunFact::Kind::failed,
+                             .reason = place + " has no class, so no account of this file is converted",
+                             .path = source.path};
+  });
+}
+
+}  // namespace
+
+void noteOrigins(AccountsManager& store, const LegacySource& source, const AccountsManager::Accounts& accounts) {
+  accountsettings::StoreWatch* const watch = store._runWatch();
+  const Array* const descriptions = source.contents.array(source.key);
+  if (watch == nullptr || descriptions == nullptr) return;
+  for (std::size_t index = 0; index < accounts.size(); ++index) {
+    const Dictionary* const description = (*descriptions)[index].asDictionary();
+    watch->comesFrom(*accounts[index], description == nullptr ? Dictionary{} : *description, placeOf(source, index));
+  }
+}
+
+std::optional<AccountsManager::Accounts> convertedAccounts(const LegacySource& source, const Conversion& convert,
+                                                           std::string_view method, std::string_view failureFormat) {
   AccountsManager::Accounts accounts;
-  const Array* const descriptions = legacyFile.array(key);
+  const Array* const descriptions = source.contents.array(source.key);
   if (descriptions == nullptr) return accounts;
   accounts.reserve(descriptions->size());
   for (const PropertyValue& element : *descriptions) {
@@ -38,6 +67,7 @@ std::optional<AccountsManager::Accounts> convertedAccounts(const Dictionary& leg
     std::shared_ptr<BasicAccount> account = convert(description == nullptr ? Dictionary{} : *description);
     if (!account) {
       writeToConsole(failureFormat, method, element);
+      tellRefused(source, placeOf(source, accounts.size()));
       return std::nullopt;
     }
     accounts.push_back(std::move(account));
@@ -48,7 +78,7 @@ std::optional<AccountsManager::Accounts> convertedAccounts(const Dictionary& leg
 std::string originalCompanionOf(const std::string& legacyPath) { return legacyPath + ".original"; }
 
 void removeOriginalCompanion(const std::string& legacyPath) {
-  std::ignore = platform::current().files->remove(originalCompanionOf(legacyPath));
+  std::ignore = removeAndTell(originalCompanionOf(legacyPath));
 }
 
 }  // namespace migrator

@@ -27,12 +27,22 @@ struct Rename {
 
 using Conversion = std::function<std::shared_ptr<accountsettings::BasicAccount>(const platform::Dictionary&)>;
 
-// The accounts that the legacy file describes in the array under the key, in order: all of them, or nothing where the
+// An array of account descriptions in a legacy file.
+struct LegacySource {
+  const std::string& path;
+  const platform::Dictionary& contents;
+  std::string_view key;
+};
+
+// The accounts that the legacy file describes in the array, in order: all of them, or nothing where the
 // conversion refuses one, after a console line of the given format with that element's description. A missing array is
 // an empty one, an element that is no dictionary an empty dictionary.
 [[nodiscard]] std::optional<accountsettings::AccountsManager::Accounts> convertedAccounts(
-    const platform::Dictionary& legacyFile, std::string_view key, const Conversion& convert, std::string_view method,
-    std::string_view failureFormat);
+    const LegacySource& source, const Conversion& convert, std::string_view method, std::string_view failureFormat);
+
+// Lets the run's observer know which description each of the converted accounts was made of.
+void noteOrigins(accountsettings::AccountsManager& store, const LegacySource& source,
+                 const accountsettings::AccountsManager::Accounts& accounts);
 
 // What earlier releases left beside a legacy file: its copy under the same name with ".original" appended.
 [[nodiscard]] std::string originalCompanionOf(const std::string& legacyPath);

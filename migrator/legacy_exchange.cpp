@@ -60,10 +60,14 @@ bool AccountsDataMigrator::_migrateDAAccounts(AccountsManager& store) {
   if (_saveMigrationInformation() && _collatedMigrationData) {
     _collatedMigrationData->set(kOldExchangeAccountsKey, legacyFile);
   }
-  const auto accounts = convertedAccounts(legacyFile, "DAAccountsKey", _convertExchangeAccountDescription,
+  const LegacySource source{path, legacyFile, "DAAccountsKey"};
+  const auto accounts = convertedAccounts(source, _convertExchangeAccountDescription,
                                           "-[AccountsDataMigrator(Internal) _migrateDAAccounts:]",
                                           "%s. Could not convert the description for the Exchange account %@");
-  if (accounts) store.replaceAccountsWithTypes_withAccounts({kExchangeAccountType}, *accounts);
+  if (accounts) {
+    noteOrigins(store, source, *accounts);
+    store.replaceAccountsWithTypes_withAccounts({kExchangeAccountType}, *accounts);
+  }
   removeOriginalCompanion(path);
   return accounts.has_value();
 }

@@ -88,11 +88,11 @@ struct ConvertedMail {
 };
 
 // Every account of the file, or nothing where one of them is refused.
-std::optional<ConvertedMail> convertedMail(const Dictionary& legacyFile) {
-  auto delivery = convertedAccounts(legacyFile, "DeliveryAccounts", conversionOfType(kSMTPAccountType), kMethod,
+std::optional<ConvertedMail> convertedMail(const LegacySource& outgoingServers, const LegacySource& mailAccounts) {
+  auto delivery = convertedAccounts(outgoingServers, conversionOfType(kSMTPAccountType), kMethod,
                                     "%s. Could not convert the description for the delivery account %@");
   if (!delivery) return std::nullopt;
-  auto incoming = convertedAccounts(legacyFile, "MailAccounts", conversionOfType(kMailAccountType), kMethod,
+  auto incoming = convertedAccounts(mailAccounts, conversionOfType(kMailAccountType), kMethod,
                                     "%s. Could not convert the description for the incoming account %@");
   if (!incoming) return std::nullopt;
   return ConvertedMail{*std::move(delivery), *std::move(incoming)};
@@ -145,8 +145,12 @@ bool AccountsDataMigrator::_migrateMailAccounts(AccountsManager& store) {
   if (_saveMigrationInformation() && _collatedMigrationData)
     _collatedMigrationData->set(kOldMailAccountsKey, legacyFile);
 
-  const std::optional<ConvertedMail> accounts = convertedMail(legacyFile);
+  const LegacySource delivery{path, legacyFile, "DeliveryAccounts"};
+  const LegacySource incoming{path, legacyFile, "MailAccounts"};
+  const std::optional<ConvertedMail> accounts = convertedMail(delivery, incoming);
   if (accounts) {
+    noteOrigins(store, delivery, accounts->delivery);
+    noteOrigins(store, incoming, accounts->incoming);
     // Only "SMTP" and "Mail" accounts make room, although the class table may have given the new ones other types.
     store.replaceAccountsWithTypes_withAccounts({kSMTPAccountType}, accounts->delivery);
     store.replaceAccountsWithTypes_withAccounts({kMailAccountType}, accounts->incoming);

@@ -4,6 +4,7 @@
 #include "accountsettings/file_paths.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/console.h"
+#include "migrator/told_removal.h"
 #include "platform/platform.h"
 
 namespace migrator {
@@ -27,10 +28,20 @@ void reportUndeleted(const Path& path, const Status& status) {
 // A legacy file that cannot be deleted is worth a message only when accounts were found in it.
 enum class Report { failures, nothing };
 
-Status deleteFile(const Path& path, Report report) {
-  Status status = platform::current().files->remove(path);
-  if (!status.isOk() && report == Report::failures) reportUndeleted(path, status);
+void reportIfUndeleted(const Path& path, const Status& status, Report report) {
+  if (status.isOk() || report == Report::nothing) return;
+  tellUnremoved(path, status);
+  reportUndeleted(path, status);
+}
+
+Status deleteLegacyFile(const Path& path, Report report) {
+  Status status = removeAndTell(path, platform::RunFact::Kind::sourceRemoved);
+  reportIfUndeleted(path, status, report);
   return status;
+}
+
+void deleteSentinel(const Path& path) {
+  reportIfUndeleted(path, platform::current().files->remove(path), Report::failures);
 }
 
 Report failuresIf(bool found) { return found ? Report::failures : Report::nothing; }
@@ -49,12 +60,12 @@ bool AccountsDataMigrator::_removeOldAccountsInfo() {
   const Path sentinel = _absolutePathToOldAccountsInfoRemovalSentinel();
   if (!_failedToRemoveOldAccountsInfo()) makeSentinel(sentinel);
 
-  const Status exchange = deleteFile(accountsettings::daAccountPath(), failuresIf(_foundOldDAAccountsToMigrate));
+  const Status exchange = deleteLegacyFile(accountsettings::daAccountPath(), failuresIf(_foundOldDAAccountsToMigrate));
   const bool isMailFileKept = !exchange.isOk() && _foundOldDAAccountsToMigrate;
   if (!isMailFileKept) {
-    std::ignore = deleteFile(accountsettings::mailAccountsPath(), failuresIf(_foundOldMailAccountsToMigrate));
+    std::ignore = deleteLegacyFile(accountsettings::mailAccountsPath(), failuresIf(_foundOldMailAccountsToMigrate));
   }
-  std::ignore = deleteFile(sentinel, Report::failures);
+  deleteSentinel(sentinel);
   return exchange.isOk();  // false also where there was no Exchange file to delete
 }
 

@@ -2,10 +2,10 @@
 
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/console.h"
-#include "migrator/stage.h"
 #include "migrator/stored_names.h"
 #include "platform/message.h"
 #include "platform/platform.h"
+#include "platform/run_stage.h"
 
 namespace migrator {
 namespace {
@@ -57,7 +57,7 @@ void writeReport(const Path& directory, const Dictionary& report) {
 }  // namespace
 
 void AccountsDataMigrator::_copyAsideAccountsPlist() {
-  const Stage stage{"copy aside"};
+  const platform::RunStage stage{"copy aside"};
   platform::FileSystem& files = *platform::current().files;
   const Path source = AccountsManager::fullPathToAccountSettingsPlist();
   const Path destination = copyPath(source);

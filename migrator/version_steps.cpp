@@ -1,6 +1,7 @@
 #include <array>
 
 #include "accountsettings/vocabulary.h"
+#include "migrator/account_stage.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/stored_names.h"
 #include "migrator/version_chain.h"
@@ -49,7 +50,10 @@ bool AccountsDataMigrator::_migrateNewAccountsInfo(AccountsManager& store) {
   }
   // Compared without sign: a negative stored version counts as newer than every release and is left alone.
   if (storedVersion >= AccountsManager::currentVersion()) return true;
-  return runVersionSteps(std::span{kSteps}, storedVersion, *this, store);
+  return runVersionSteps(std::span{kSteps}, storedVersion, [&](const Step& step) {
+    const AccountStage stage{step.name, store};
+    return (this->*step.run)(store);
+  });
 }
 
 bool AccountsDataMigrator::_newAccountsInformationPresent() {

@@ -16,6 +16,8 @@ constexpr std::array<std::string_view, 17> kCredentialWords{
     "cookie",        "credential", "privatekey", "signingkey",    "sessionkey", "apikey",
     "encryptionkey", "accesskey",  "sharedkey",  "authorization", "pincode"};
 
+constexpr std::string_view kHidden = "<hidden>";
+
 std::string foldedKey(std::string_view key) {
   std::string folded;
   folded.reserve(key.size());
@@ -54,7 +56,7 @@ class Writer {
       append(separator);
       isPlainWord(key) ? append(key) : writeText(key);
       append(" = ");
-      namesCredential(key) ? append("<hidden>") : write(value);
+      namesCredential(key) ? append(kHidden) : write(value);
       separator = "; ";
     }
     append("}");
@@ -114,6 +116,20 @@ class Writer {
   std::string _text;
 };
 
+PropertyValue presentableArray(const Array& array) {
+  Array shown;
+  shown.reserve(array.size());
+  for (const PropertyValue& element : array) shown.push_back(presentable({}, element));
+  return shown;
+}
+
+PropertyValue presentableDictionary(const Dictionary& dictionary) {
+  Dictionary shown;
+  shown.reserve(dictionary.size());
+  for (const auto& [key, value] : dictionary) shown.set(key, presentable(key, value));
+  return shown;
+}
+
 }  // namespace
 
 bool namesCredential(std::string_view key) {
@@ -126,6 +142,22 @@ std::string description(const PropertyValue& value) {
   Writer writer;
   writer.write(value);
   return writer.take();
+}
+
+std::string descriptionUnder(std::string_view key, const PropertyValue& value) {
+  return namesCredential(key) ? std::string{kHidden} : description(value);
+}
+
+PropertyValue presentable(std::string_view key, const PropertyValue& value) {
+  if (namesCredential(key)) return kHidden;
+  switch (value.kind()) {
+    case PropertyValue::Kind::array: return presentableArray(*value.asArray());
+    case PropertyValue::Kind::dictionary: return presentableDictionary(*value.asDictionary());
+    case PropertyValue::Kind::data:
+    case PropertyValue::Kind::date:
+    case PropertyValue::Kind::uid: return description(value);
+    default: return value;
+  }
 }
 
 std::string description(const Dictionary& dictionary) {

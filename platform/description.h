@@ -13,9 +13,15 @@ namespace platform {
 //
 // Credentials are never shown, only that they are there: whatever stands under a key that names one (see
 // `namesCredential`) appears as <hidden>, and data as its size, <data: 20 bytes>. This is the one place where values
-// become text; nothing else may print them.
+// become text; whatever else prints them prints what `presentable` leaves of them.
 [[nodiscard]] ACCOUNT_EXPORT std::string description(const PropertyValue& value);
 [[nodiscard]] ACCOUNT_EXPORT std::string description(const Dictionary& dictionary);
+
+// The same of a value that stands under the key, which may itself name a credential.
+[[nodiscard]] ACCOUNT_EXPORT std::string descriptionUnder(std::string_view key, const PropertyValue& value);
+// The value that stands under the key, as far as it may be shown: with credentials, data, dates and UIDs replaced by
+// the text that `description` shows of them, so that texts, numbers, booleans, arrays and dictionaries are left.
+[[nodiscard]] ACCOUNT_EXPORT PropertyValue presentable(std::string_view key, const PropertyValue& value);
 
 // Whether a key's value is a credential: the key contains, in any letter case, one of the words that name passwords,
 // tokens, secrets, cookies, keys for signing or encrypting, and the like (the list stands in description.cpp).

@@ -36,7 +36,10 @@ constexpr std::array<Step, 3> kChain{
 
 class VersionChain : public testing::Test {
  protected:
-  bool run(std::uint64_t version) { return runVersionSteps(std::span{kChain}, version, releases, record); }
+  bool run(std::uint64_t version) {
+    return runVersionSteps(std::span{kChain}, version,
+                           [this](const Step& step) { return (releases.*step.run)(record); });
+  }
 
   tests::FakeDevice device;
   ThreeReleases releases;

@@ -18,10 +18,16 @@ class Stages final : public platform::RunObserver {
   std::vector<std::string> steps;
   std::vector<std::uint64_t> versions;  // of the store, after each step
 
-  void stageBegan(std::string_view stage) override { steps.emplace_back(stage); }
-  void stageEnded(std::string_view) override { versions.push_back(_store->dataVersion()); }
+  void stageBegan(std::string_view stage) override {
+    if (!isSave(stage)) steps.emplace_back(stage);
+  }
+  void stageEnded(std::string_view stage) override {
+    if (!isSave(stage)) versions.push_back(_store->dataVersion());
+  }
 
  private:
+  static bool isSave(std::string_view stage) { return stage == "save"; }
+
   std::shared_ptr<AccountsManager>& _store;
 };
 

@@ -1,0 +1,259 @@
+#include "accountsettings/record_changes.h"
+
+#include <algorithm>
+#include <deque>
+#include <map>
+#include <unordered_set>
+
+#include "accountsettings/vocabulary.h"
+
+namespace accountsettings {
+namespace {
+
+using platform::RecordChange;
+using platform::RecordName;
+using platform::RunFact;
+
+std::string textUnder(const Dictionary& properties, std::string_view key) {
+  const Text* const text = properties.text(key);
+  return text == nullptr ? std::string{} : text->string();
+}
+
+// --- Keys ---
+
+bool holdsRecordsOnly(const PropertyValue* children) {
+  if (children == nullptr) return true;
+  const Array* const array = children->asArray();
+  return array != nullptr &&
+         std::ranges::all_of(*array, [](const PropertyValue& child) { return child.asDictionary() != nullptr; });
+}
+
+bool isToldByKey(std::string_view key, const Dictionary& before, const Dictionary& after) {
+  return key != kAccountChildAccounts || !holdsRecordsOnly(before.find(key)) || !holdsRecordsOnly(after.find(key));
+}
+
+bool isTellingText(const PropertyValue& value) {
+  const Text* const text = value.asText();
+  return text != nullptr && !text->empty();
+}
+
+// The key that went and whose text now stands under the changed one; taken out of those that went.
+std::string takeOldKey(const PropertyValue& value, std::vector<RecordChange>& gone) {
+  if (!isTellingText(value)) return {};
+  const auto found = std::ranges::find_if(gone, [&value](const RecordChange& each) { return each.from == value; });
+  if (found == gone.end()) return {};
+  std::string key = std::move(found->key);
+  gone.erase(found);
+  return key;
+}
+
+std::vector<RecordChange> goneKeys(const Dictionary& before, const Dictionary& after) {
+  std::vector<RecordChange> gone;
+  for (const auto& [key, value] : before) {
+    if (!after.contains(key) && isToldByKey(key, before, after)) gone.push_back({key.string(), {}, value, {}});
+  }
+  return gone;
+}
+
+// --- Records ---
+
+constexpr std::size_t kNone = static_cast<std::size_t>(-1);
+
+// A record of a state, with children flattened out behind their parents.
+struct Entry {
+  const BasicAccount* account;  // null for a child
+  const Dictionary* properties;
+  std::size_t parent;
+};
+using Entries = std::vector<Entry>;
+
+void addWithChildren(Entry entry, Entries& entries) {
+  entries.push_back(entry);
+  const std::size_t place = entries.size() - 1;
+  const Array* const children = entry.properties->array(kAccountChildAccounts);
+  if (children == nullptr) return;
+  for (const PropertyValue& child : *children) {
+    if (const Dictionary* const properties = child.asDictionary()) {
+      addWithChildren({nullptr, properties, place}, entries);
+    }
+  }
+}
+
+Entries entriesOf(const StoreState& state) {
+  Entries entries;
+  for (const RecordState& record : state) addWithChildren({record.account.get(), &record.properties, kNone}, entries);
+  return entries;
+}
+
+RecordName nameIn(const Entries& entries, std::size_t place) {
+  const Entry& entry = entries[place];
+  const std::string parent =
+      entry.parent == kNone ? std::string{} : textUnder(*entries[entry.parent].properties, kAccountIdentifier);
+  return nameOf(*entry.properties, parent);
+}
+
+std::string_view identifierOf(const Entry& entry) {
+  const Text* const identifier = entry.properties->text(kAccountIdentifier);
+  return identifier == nullptr ? std::string_view{} : identifier->view();
+}
+
+// Finds for each record of a state the one that it was before, each of which is found once.
+class Matching {
+ public:
+  Matching(const Entries& before, const Entries& after)
+      : _before{before}, _after{after}, _isFound(before.size()), _former(after.size(), kNone) {
+    matchObjects();
+    matchChildrenOfTheSame();
+    matchIdentifiers();
+  }
+  [[nodiscard]] std::size_t formerOf(std::size_t place) const { return _former[place]; }
+  [[nodiscard]] bool wentAway(std::size_t place) const { return !_isFound[place]; }
+
+ private:
+  using Places = std::deque<std::size_t>;
+
+  void match(std::size_t place, Places& candidates) {
+    while (!candidates.empty() && _isFound[candidates.front()]) candidates.pop_front();
+    if (candidates.empty()) return;
+    _former[place] = candidates.front();
+    _isFound[candidates.front()] = true;
+    candidates.pop_front();
+  }
+  // Matches what the key, empty for a record that has none, says is the same.
+  template <typename Key, typename MakeBeforeKey, typename MakeAfterKey>
+  void matchBy(const MakeBeforeKey& beforeKey, const MakeAfterKey& afterKey) {
+    std::map<Key, Places> candidates;
+    for (std::size_t place = 0; place < _before.size(); ++place) {
+      if (const auto key = beforeKey(place); key && !_isFound[place]) candidates[*key].push_back(place);
+    }
+    for (std::size_t place = 0; place < _after.size(); ++place) {
+      if (_former[place] != kNone) continue;
+      const auto key = afterKey(place);
+      const auto found = key ? candidates.find(*key) : candidates.end();
+      if (found != candidates.end()) match(place, found->second);
+    }
+  }
+  void matchObjects() {
+    const auto objectIn = [](const Entries& entries) {
+      return [&entries](std::size_t place) {
+        const BasicAccount* const account = entries[place].account;
+        return account == nullptr ? std::nullopt : std::optional{account};
+      };
+    };
+    matchBy<const BasicAccount*>(objectIn(_before), objectIn(_after));
+  }
+  // Parents stand before their children, so a child's parent is matched when the child's turn comes.
+  void matchChildrenOfTheSame() {
+    using Key = std::pair<std::size_t, std::string_view>;
+    const auto key = [](const Entry& child, std::size_t parent) {
+      return parent == kNone ? std::nullopt : std::optional{Key{parent, identifierOf(child)}};
+    };
+    matchBy<Key>([&](std::size_t place) { return key(_before[place], _before[place].parent); },
+                 [&](std::size_t place) {
+                   const std::size_t parent = _after[place].parent;
+                   return key(_after[place], parent == kNone ? kNone : _former[parent]);
+                 });
+  }
+  void matchIdentifiers() {
+    const auto identifierIn = [](const Entries& entries) {
+      return [&entries](std::size_t place) {
+        const std::string_view identifier = identifierOf(entries[place]);
+        return identifier.empty() ? std::nullopt : std::optional{identifier};
+      };
+    };
+    matchBy<std::string_view>(identifierIn(_before), identifierIn(_after));
+  }
+
+  const Entries& _before;
+  const Entries& _after;
+  std::vector<bool> _isFound;
+  std::vector<std::size_t> _former;
+};
+
+class Comparison {
+ public:
+  Comparison(const StoreState& before, const StoreState& after)
+      : _before{entriesOf(before)}, _after{entriesOf(after)}, _matching{_before, _after} {
+    for (const RecordState& record : before) _known.insert(record.account.get());
+  }
+
+  std::vector<Difference> differences() {
+    for (std::size_t place = 0; place < _after.size(); ++place) {
+      const std::size_t former = _matching.formerOf(place);
+      former == kNone ? tellNew(place) : tellKept(former, place);
+    }
+    for (std::size_t place = 0; place < _before.size(); ++place) {
+      if (_matching.wentAway(place)) tell(RunFact::Kind::dropped, nameIn(_before, place), _before[place]);
+    }
+    return std::move(_differences);
+  }
+
+ private:
+  Difference& tell(RunFact::Kind kind, RecordName subject, const Entry& entry) {
+    return _differences.emplace_back(
+        Difference{.fact = {.kind = kind, .subject = std::move(subject)}, .account = entry.account});
+  }
+  void tellNew(std::size_t place) {
+    const Entry& entry = _after[place];
+    const bool isSecond = entry.account != nullptr && !_known.insert(entry.account).second;
+    tell(isSecond ? RunFact::Kind::repeated : RunFact::Kind::added, nameIn(_after, place), entry);
+  }
+  void tellKept(std::size_t former, std::size_t place) {
+    if (isMoved(former, place)) tellMoved(place);
+    auto changes = changesOf(*_before[former].properties, *_after[place].properties);
+    const bool isReplacement = _after[place].account != nullptr && _after[place].account != _before[former].account;
+    if (changes.empty() && !isReplacement) return;
+    Difference& told = tell(RunFact::Kind::changed, nameIn(_after, place), _after[place]);
+    told.fact.changes = std::move(changes);
+    told.isReplacement = isReplacement;
+  }
+  [[nodiscard]] bool isMoved(std::size_t former, std::size_t place) const {
+    const std::size_t before = _before[former].parent;
+    const std::size_t after = _after[place].parent;
+    if (before == kNone || after == kNone) return before != after;
+    return _matching.formerOf(after) != before;
+  }
+  void tellMoved(std::size_t place) {
+    Difference& told = tell(RunFact::Kind::moved, nameIn(_after, place), _after[place]);
+    if (_after[place].parent != kNone) told.fact.others.push_back(nameIn(_after, _after[place].parent));
+  }
+
+  Entries _before;
+  Entries _after;
+  Matching _matching;
+  std::unordered_set<const BasicAccount*> _known;
+  std::vector<Difference> _differences;
+};
+
+bool isUnchanged(const RecordState& before, const RecordState& after) {
+  return before.account == after.account && before.properties.isIdenticalTo(after.properties);
+}
+
+}  // namespace
+
+RecordName nameOf(const Dictionary& properties, std::string_view parent) {
+  std::string name = textUnder(properties, kAccountDisplayName);
+  if (name.empty()) name = textUnder(properties, kAccountUsername);
+  return {textUnder(properties, kAccountType), std::move(name), textUnder(properties, kAccountIdentifier),
+          std::string{parent}};
+}
+
+std::vector<RecordChange> changesOf(const Dictionary& before, const Dictionary& after) {
+  if (before.isIdenticalTo(after)) return {};
+  std::vector<RecordChange> changes;
+  std::vector<RecordChange> gone = goneKeys(before, after);
+  for (const auto& [key, value] : after) {
+    const PropertyValue* const former = before.find(key);
+    if ((former != nullptr && *former == value) || !isToldByKey(key, before, after)) continue;
+    changes.push_back({key.string(), takeOldKey(value, gone), former ? std::optional{*former} : std::nullopt, value});
+  }
+  std::ranges::move(gone, std::back_inserter(changes));
+  return changes;
+}
+
+std::vector<Difference> differencesBetween(const StoreState& before, const StoreState& after) {
+  if (std::ranges::equal(before, after, &isUnchanged)) return {};
+  return Comparison{before, after}.differences();
+}
+
+}  // namespace accountsettings

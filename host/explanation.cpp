@@ -1,0 +1,71 @@
+#include "host/explanation.h"
+
+#include <set>
+
+namespace host {
+
+using platform::RunFact;
+
+namespace {
+
+constexpr std::string_view kOutside = "end of the run";  // where nothing but the last word is left
+
+}  // namespace
+
+void Explanation::began(std::string_view stage) {
+  _open.emplace_back(stage);
+  _isNewStage = true;
+}
+
+void Explanation::ended() {
+  if (!_open.empty()) _open.pop_back();
+  _isNewStage = true;
+}
+
+void Explanation::add(const RunFact& fact) {
+  if (_isNewStage) _stages.push_back({std::string{stage()}, std::string{outerStage()}, {}});
+  _isNewStage = false;
+  _stages.back().facts.push_back(fact);
+}
+
+std::string_view Explanation::stage() const { return _open.empty() ? kOutside : std::string_view{_open.back()}; }
+
+std::string_view Explanation::outerStage() const {
+  return _open.size() < 2 ? std::string_view{} : _open[_open.size() - 2];
+}
+
+template <typename Action>
+void Explanation::forEachFact(const Action& action) const {
+  for (const Stage& stage : _stages) {
+    for (const RunFact& fact : stage.facts) action(fact);
+  }
+}
+
+const RunFact* Explanation::lastSave() const {
+  const RunFact* last = nullptr;
+  forEachFact([&last](const RunFact& fact) {
+    if (fact.kind == RunFact::Kind::saved || fact.kind == RunFact::Kind::saveFailed) last = &fact;
+  });
+  return last;
+}
+
+std::vector<std::string> Explanation::lostFiles() const {
+  const RunFact* const save = lastSave();
+  const bool isUnsaved = save != nullptr && save->kind == RunFact::Kind::saveFailed;
+  std::set<std::string> unconverted;
+  std::vector<std::string> lost;
+  forEachFact([&](const RunFact& fact) {
+    if (fact.kind == RunFact::Kind::failed) unconverted.insert(fact.path);
+    if (fact.kind != RunFact::Kind::sourceRemoved) return;
+    if (isUnsaved || unconverted.contains(fact.path)) lost.push_back(fact.path);
+  });
+  return lost;
+}
+
+std::size_t Explanation::count(RunFact::Kind kind) const {
+  std::size_t count = 0;
+  forEachFact([&](const RunFact& fact) { count += fact.kind == kind ? 1U : 0U; });
+  return count;
+}
+
+}  // namespace host

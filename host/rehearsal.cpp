@@ -1,0 +1,63 @@
+#include "host/rehearsal.h"
+
+#include <memory>
+#include <utility>
+
+#include "platform/linux/libplist_property_list_store.h"
+#include "platform/linux/rehearsal_file_system.h"
+
+namespace host {
+namespace {
+
+class SilentSystemLog final : public platform::SystemLog {
+ public:
+  [[nodiscard]] bool hasReaders() const override { return false; }
+  void write(const platform::LogRecord& /*record*/) override {}
+};
+
+class SilentPreferencesChangedNotice final : public platform::PreferencesChangedNotice {
+ public:
+  void post(std::string_view /*domain*/, std::string_view /*key*/) override {}
+};
+
+class SilentCloudTabsNotice final : public platform::CloudTabsNotice {
+ public:
+  void post(bool /*enabled*/) override {}
+};
+
+// Where there is no lock file, nobody holds the lock, and taking it leaves nothing behind.
+class NobodysLock final : public platform::ExclusiveFileLock {
+ public:
+  bool lock() override { return true; }
+  void unlock() override {}
+};
+
+class RehearsalLocks final : public platform::ExclusiveFileLocks {
+ public:
+  RehearsalLocks(std::shared_ptr<platform::ExclusiveFileLocks> inner, std::filesystem::path directory)
+      : _inner{std::move(inner)}, _directory{std::move(directory)} {}
+
+  [[nodiscard]] std::unique_ptr<platform::ExclusiveFileLock> lockNamed(std::string_view name) override {
+    std::error_code ignored;
+    const auto status = std::filesystem::symlink_status(_directory / name, ignored);
+    if (!std::filesystem::exists(status)) return std::make_unique<NobodysLock>();
+    return _inner->lockNamed(name);
+  }
+
+ private:
+  std::shared_ptr<platform::ExclusiveFileLocks> _inner;
+  std::filesystem::path _directory;
+};
+
+}  // namespace
+
+void rehearseOn(platform::Platform& platform, const std::filesystem::path& lockDirectory) {
+  platform.files = platform::makeRehearsalFileSystem(platform.files, platform.directories->systemRoot());
+  platform.propertyLists = platform::makeLibplistPropertyListStore(platform.files);
+  platform.locks = std::make_shared<RehearsalLocks>(std::move(platform.locks), lockDirectory);
+  platform.systemLog = std::make_shared<SilentSystemLog>();
+  platform.preferencesChanged = std::make_shared<SilentPreferencesChangedNotice>();
+  platform.cloudTabs = std::make_shared<SilentCloudTabsNotice>();
+}
+
+}  // namespace host
