@@ -1,0 +1,29 @@
+"""Rehearsals of random devices; RANDOM_DEVICES says how many (default: a few dozen)."""
+
+import os
+import sys
+import unittest
+
+from device import Device
+from random_devices import RandomDevice
+from rehearsal_case import RehearsalTest
+
+COUNT = int(os.environ.get("RANDOM_DEVICES", "36"))
+
+
+class RandomRehearsals(RehearsalTest):
+    def test_tell_what_a_run_does(self):
+        outcomes = set()
+        for seed in range(COUNT):
+            with self.subTest(seed=seed):
+                device = Device(self.scratch / f"device-{seed}")
+                device.set_mobile(os.getuid(), os.getgid())
+                RandomDevice(seed).fill(device)
+                run = self.assert_foretold(device)
+                self.assertNotIn("never shown", repr((run.output, run.events)))
+                outcomes.add('"saved": true' in "\n".join(run.output))
+        self.assertEqual({True, False}, outcomes)
+
+
+if __name__ == "__main__":
+    sys.exit(unittest.main())
