@@ -12,12 +12,8 @@ namespace platform {
 namespace {
 
 using Path = std::filesystem::path;
-using Kind = Overlay::Node::Kind;
 
-mode_t modeOf(Kind kind) {
-  if (kind == Kind::nothing) return 0;
-  return kind == Kind::file ? S_IFREG : S_IFDIR;
-}
+constexpr mode_t kOwnersFile = S_IFREG | S_IRUSR | S_IWUSR;
 
 bool isBelow(const Path& path, const Path& directory) {
   const auto [end, rest] = std::mismatch(directory.begin(), directory.end(), path.begin(), path.end());
@@ -40,8 +36,8 @@ std::optional<Path> Overlay::placeOf(const Path& path) const {
 
 bool Overlay::isEnterable(const Path& directory) const {
   if (const Node* const node = nodeAt(directory)) {
-    errno = node->kind == Kind::nothing ? ENOENT : ENOTDIR;
-    return node->kind == Kind::directory;
+    errno = node->mode == 0 ? ENOENT : ENOTDIR;
+    return S_ISDIR(node->mode);
   }
   return Descriptor{::open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC)}.isOpen();
 }
@@ -54,7 +50,7 @@ Path Overlay::followed(const Path& place) const {
 }
 
 const Overlay::Node* Overlay::nodeAt(const Path& place) const {
-  static const Node nothing{Kind::nothing};
+  static const Node nothing{0};
   const auto found = _nodes.find(place);
   if (found != _nodes.end()) return &found->second;
   for (Path above = place; above.has_relative_path();) {
@@ -66,7 +62,7 @@ const Overlay::Node* Overlay::nodeAt(const Path& place) const {
 }
 
 mode_t Overlay::modeAt(const Path& place) const {
-  if (const Node* const node = nodeAt(place)) return modeOf(node->kind);
+  if (const Node* const node = nodeAt(place)) return node->mode;
   struct stat status {};
   return ::lstat(place.c_str(), &status) == 0 ? status.st_mode : 0;
 }
@@ -78,14 +74,16 @@ Path Overlay::deviceDirectoryAbove(const Path& place) const {
 }
 
 void Overlay::putFile(const Path& place, Bytes bytes) {
-  _nodes.insert_or_assign(place, Node{Kind::file, std::move(bytes)});
+  _nodes.insert_or_assign(place, Node{kOwnersFile, std::move(bytes)});
 }
 
-void Overlay::putDirectory(const Path& place) { _nodes.insert_or_assign(place, Node{Kind::directory}); }
+void Overlay::putDirectory(const Path& place, mode_t permissions) {
+  _nodes.insert_or_assign(place, Node{S_IFDIR | permissions});
+}
 
 void Overlay::remove(const Path& place) {
   std::erase_if(_nodes, [&place](const auto& entry) { return isBelow(entry.first, place); });
-  _nodes.insert_or_assign(place, Node{Kind::nothing});
+  _nodes.insert_or_assign(place, Node{0});
 }
 
 }  // namespace platform

@@ -15,8 +15,7 @@ namespace platform {
 class Overlay {
  public:
   struct Node {
-    enum class Kind : std::uint8_t { nothing, file, directory };
-    Kind kind;
+    mode_t mode;  // kind and permission bits; 0 where nothing stands
     Bytes bytes{};
   };
 
@@ -28,14 +27,14 @@ class Overlay {
 
   // What the rehearsal made of this very place; null where that is the device's to say.
   [[nodiscard]] const Node* nodeAt(const std::filesystem::path& place) const;
-  // The mode that a file or directory at the place would have, with its kind; 0 where nothing stands. No link at the
-  // place is followed.
+  // The kind and the permission bits of what would stand at the place; 0 where nothing would. No link there is
+  // followed.
   [[nodiscard]] mode_t modeAt(const std::filesystem::path& place) const;
   // The innermost directory of the device above the place.
   [[nodiscard]] std::filesystem::path deviceDirectoryAbove(const std::filesystem::path& place) const;
 
-  void putFile(const std::filesystem::path& place, Bytes bytes);
-  void putDirectory(const std::filesystem::path& place);
+  void putFile(const std::filesystem::path& place, Bytes bytes);  // mode 0600
+  void putDirectory(const std::filesystem::path& place, mode_t permissions);
   void remove(const std::filesystem::path& place);  // with all below it
 
  private:

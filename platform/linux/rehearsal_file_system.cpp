@@ -31,7 +31,7 @@ Status failure(const char* verb, const Path& path) {
 }
 
 bool mayChangeEntriesOf(const Path& directory) {
-  return ::faccessat(AT_FDCWD, directory.c_str(), W_OK | X_OK, AT_EACCESS) == 0;
+  return ::faccessat(AT_FDCWD, directory.c_str(), R_OK | W_OK | X_OK, AT_EACCESS) == 0;
 }
 
 // In a sticky directory, only the owner of an entry or of the directory takes the entry away.
@@ -65,7 +65,7 @@ bool isOnOneVolume(const Path& left, const Path& right) {
   return first.st_dev == second.st_dev || refuse(EXDEV);
 }
 
-class RehearsalFileSystem final : public FileSystem {
+class RehearsalFileSystem final : public RehearsedFiles {
  public:
   RehearsalFileSystem(std::shared_ptr<FileSystem> inner, Path systemRoot)
       : _inner{std::move(inner)}, _accounts{std::move(systemRoot)} {}
@@ -76,8 +76,8 @@ class RehearsalFileSystem final : public FileSystem {
     const Path target = _overlay.followed(*place);
     const Overlay::Node* const node = _overlay.nodeAt(target);
     if (node == nullptr) return _inner->kindOf(target);
-    if (node->kind == Overlay::Node::Kind::nothing) return std::nullopt;
-    return node->kind == Overlay::Node::Kind::file ? FileKind::file : FileKind::directory;
+    if (node->mode == 0) return std::nullopt;
+    return S_ISDIR(node->mode) ? FileKind::directory : FileKind::file;
   }
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
@@ -124,9 +124,10 @@ class RehearsalFileSystem final : public FileSystem {
     return {};
   }
 
-  Status createDirectories(const Path& path, unsigned /*permissions*/) override {
-    return makeDirectories(path.has_filename() ? path : path.parent_path()) ? Status{}
-                                                                            : failure("create the directory", path);
+  Status createDirectories(const Path& path, unsigned permissions) override {
+    return makeDirectories(path.has_filename() ? path : path.parent_path(), permissions)
+               ? Status{}
+               : failure("create the directory", path);
   }
 
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
@@ -150,6 +151,12 @@ class RehearsalFileSystem final : public FileSystem {
       if (!kindOf(name)) return name;
     }
     return std::nullopt;
+  }
+
+  [[nodiscard]] std::optional<unsigned> permissionsAt(const Path& path) override {
+    const auto place = _overlay.placeOf(path);
+    const mode_t mode = place ? _overlay.modeAt(*place) : 0;
+    return mode == 0 ? std::nullopt : std::optional{mode & 07777U};
   }
 
   Status rename(const Path& from, const Path& to) override {
@@ -203,16 +210,16 @@ class RehearsalFileSystem final : public FileSystem {
     if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return refuse(EMLINK);
     return ::geteuid() == 0 || status.st_uid == ::geteuid() || refuse(EPERM);
   }
-  [[nodiscard]] bool makeDirectories(const Path& path) {
+  [[nodiscard]] bool makeDirectories(const Path& path, mode_t permissions) {
     if (!_overlay.placeOf(path)) {
-      if (errno != ENOENT || !path.has_relative_path() || !makeDirectories(path.parent_path())) return false;
+      if (errno != ENOENT || !path.has_relative_path() || !makeDirectories(path.parent_path(), 0755)) return false;
     }
     const auto place = _overlay.placeOf(path);
     if (!place) return false;
     const mode_t mode = _overlay.modeAt(*place);
     if (mode != 0) return S_ISDIR(mode) || refuse(ENOTDIR);
     if (!mayChangeAt(*place)) return false;
-    _overlay.putDirectory(*place);
+    _overlay.putDirectory(*place, permissions);
     return true;
   }
 
@@ -224,7 +231,7 @@ class RehearsalFileSystem final : public FileSystem {
 
 }  // namespace
 
-std::shared_ptr<FileSystem> makeRehearsalFileSystem(std::shared_ptr<FileSystem> inner, Path systemRoot) {
+std::shared_ptr<RehearsedFiles> makeRehearsalFileSystem(std::shared_ptr<FileSystem> inner, Path systemRoot) {
   return std::make_shared<RehearsalFileSystem>(std::move(inner), std::move(systemRoot));
 }
 

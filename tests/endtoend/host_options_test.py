@@ -5,6 +5,7 @@ import unittest
 from device_case import PLUGINS, DeviceTest
 
 OPTIONS = ["--root", "--home", "--shared-resources", "--resources", "--plugin", "--trace", "--snapshots", "--keep", "--restore"]
+SWITCHES = ["--explain", "--dry-run"]
 
 
 class WrongUse(DeviceTest):
@@ -41,6 +42,26 @@ class WrongUse(DeviceTest):
     def test_a_second_value_for_one_option(self):
         self.assert_wrong("--root is given twice (see --help)", "--root", "/", "--root", "/")
 
+    def test_an_explanation_in_an_unknown_form(self):
+        for form in ("--explain=yaml", "--explain="):
+            self.assert_wrong("--explain is followed by nothing, =text or =json (see --help)", form)
+
+    def test_an_explanation_that_is_asked_for_twice(self):
+        self.assert_wrong("--explain is given twice (see --help)", "--explain", "--explain=json")
+
+    def test_a_rehearsal_that_is_asked_for_oddly(self):
+        self.assert_wrong("--dry-run takes no value (see --help)", "--dry-run=yes")
+        self.assert_wrong("--dry-run is given twice (see --help)", "--dry-run", "--dry-run")
+
+    def test_a_rehearsal_that_is_to_keep_snapshots(self):
+        self.assert_wrong("--dry-run and --snapshots exclude each other (see --help)",
+                          "--dry-run", "--snapshots", self.scratch)
+
+    def test_an_explanation_of_no_run(self):
+        for instead in ("--list-snapshots", "--restore=x"):
+            self.assert_wrong("--explain is for a run, and this is none (see --help)",
+                              "--explain", "--snapshots", self.scratch, instead)
+
     def test_a_root_that_is_missing(self):
         root = self.scratch / "nowhere"
         self.assert_wrong(f"--root is no directory: {root} (see --help)", "--root", root)
@@ -55,7 +76,7 @@ class Answers(DeviceTest):
     def test_help_names_every_option(self):
         run = self.run_host("--help")
         self.assertEqual((0, []), (run.status, run.errors))
-        for option in OPTIONS:
+        for option in OPTIONS + SWITCHES:
             self.assertIn(f"  {option} ", "\n".join(run.output))
 
     def test_version_is_one_line(self):

@@ -3,8 +3,11 @@
 #include <gtest/gtest.h>
 
 #include <cerrno>
+#include <filesystem>
+#include <iterator>
 
 #include "platform/linux/linux_platform.h"
+#include "platform/linux/rehearsal_file_system.h"
 #include "tests/support/fake_file_system.h"
 #include "tests/support/scratch_directory.h"
 
@@ -43,6 +46,21 @@ struct OfTheDevice {
   static std::string_view someAccount() { return "mobile"; }
 };
 
+// A rehearsal on a device, which must stay as it is.
+struct OfARehearsal : OfTheDevice {
+  std::shared_ptr<platform::RehearsedFiles> rehearsed = platform::makeRehearsalFileSystem(files, scratch.path());
+
+  OfARehearsal() = default;
+  OfARehearsal(const OfARehearsal&) = delete;
+  OfARehearsal& operator=(const OfARehearsal&) = delete;
+  ~OfARehearsal() {
+    const std::filesystem::recursive_directory_iterator entries{scratch.path()};
+    EXPECT_EQ(std::distance(begin(entries), end(entries)), 3) << "etc, passwd and group";
+  }
+  platform::FileSystem& service() { return *rehearsed; }
+  [[nodiscard]] unsigned permissions(const Path& path) const { return rehearsed->permissionsAt(path).value_or(0); }
+};
+
 template <typename Subject>
 class FileSystemContract : public testing::Test {
  protected:
@@ -57,7 +75,7 @@ class FileSystemContract : public testing::Test {
   void put(std::string_view below, std::string_view text) { ASSERT_TRUE(files.create(at(below), bytes(text)).isOk()); }
 };
 
-using Subjects = testing::Types<OfTheTests, OfTheDevice>;
+using Subjects = testing::Types<OfTheTests, OfTheDevice, OfARehearsal>;
 TYPED_TEST_SUITE(FileSystemContract, Subjects);
 
 TYPED_TEST(FileSystemContract, TellsWhatStandsAtAPath) {

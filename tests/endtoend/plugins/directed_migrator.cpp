@@ -30,6 +30,19 @@ void tellEverything() {
   platform.console->write("no UTF-8: \xff\xfe\n\"quoted\"");
 }
 
+// Two stages, of which only the second goes on for so long that somebody wants to see it move.
+void workSlowly() {
+  const auto observer = platform::current().observer;
+  if (!observer) return;
+  for (const std::string_view stage : {"quick", "slow"}) {
+    observer->stageBegan(stage);
+    if (stage == "slow") std::this_thread::sleep_for(std::chrono::milliseconds{1100});
+    observer->progressed(256, 1000);
+    observer->stageEnded(stage);
+  }
+  platform::current().console->write("done");
+}
+
 class DirectedMigrator final : public platform::DataClassMigrator {
  public:
   [[nodiscard]] std::string_view dataClassName() const override { return "directed"; }
@@ -38,6 +51,7 @@ class DirectedMigrator final : public platform::DataClassMigrator {
     if (direction() == "directories")
       platform::current().console->write(platform::current().directories->home().c_str());
     if (direction().starts_with("tell")) tellEverything();
+    if (direction() == "work slowly") workSlowly();
     return direction() != "fail";
   }
 };

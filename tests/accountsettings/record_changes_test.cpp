@@ -1,0 +1,197 @@
+#include "accountsettings/record_changes.h"
+
+#include <map>
+#include <random>
+
+#include "tests/support/account_store.h"
+#include "tests/support/fact_recorder.h"
+
+namespace tests {
+namespace {
+
+using accountsettings::Difference;
+using accountsettings::RecordState;
+using accountsettings::StoreState;
+using platform::RunFact;
+using Lines = std::vector<std::string>;
+
+class RecordChanges : public AccountStore {
+ protected:
+  static StoreState stateOf(const Accounts& accounts) {
+    StoreState state;
+    for (const Account& each : accounts) state.push_back({each, each->properties()});
+    return state;
+  }
+  static Lines between(const StoreState& before, const StoreState& after) {
+    Lines lines;
+    for (const Difference& each : accountsettings::differencesBetween(before, after)) {
+      lines.push_back(lineOf(each.fact));
+    }
+    return lines;
+  }
+  static Account parent(std::string_view identifier, Array children) {
+    return account(identifier, {{"ChildAccounts", std::move(children)}});
+  }
+};
+
+TEST_F(RecordChanges, AreNoneWhereNothingChanged) {
+  const StoreState state = stateOf({account("a"), parent("p", {properties("c")})});
+  EXPECT_EQ(between(state, state), Lines{});
+}
+
+TEST_F(RecordChanges, AreNoneWhereAValueWasSetToWhatItWas) {
+  const Account one = account("a", {{"Port", 1}});
+  const StoreState before = stateOf({one});
+  one->setAccountProperty_forKey(1, "Port");
+  EXPECT_EQ(between(before, stateOf({one})), Lines{});
+}
+
+TEST_F(RecordChanges, TellKeysThatCameWentAndChanged) {
+  const Account one = account("a", {{"Port", 1}, {"Host", "h"}});
+  const StoreState before = stateOf({one});
+  one->setAccountProperty_forKey(2, "Port");
+  one->setAccountProperty_forKey(true, "Secure");
+  one->removeAccountPropertyForKey("Host");
+  EXPECT_EQ(between(before, stateOf({one})), Lines{"changed a: Port 1 -> 2, +Secure true, -Host"});
+}
+
+TEST_F(RecordChanges, TellOfAKeyThatIsCalledOtherwiseNowInOne) {
+  const Account one = account("a", {{"uniqueId", "u"}});
+  const StoreState before = stateOf({one});
+  one->setAccountProperty_forKey("u", "Identifier");
+  one->removeAccountPropertyForKey("uniqueId");
+  EXPECT_EQ(between(before, stateOf({one})), Lines{"changed u: uniqueId now Identifier \"u\""});
+}
+
+TEST_F(RecordChanges, TakeNoTwoEqualNumbersForARenamedKey) {
+  const Account one = account("a", {{"Port", 1}});
+  const StoreState before = stateOf({one});
+  one->removeAccountPropertyForKey("Port");
+  one->setAccountProperty_forKey(1, "IsActive");
+  EXPECT_EQ(between(before, stateOf({one})), Lines{"changed a: +IsActive 1, -Port"});
+}
+
+TEST_F(RecordChanges, TellOfAccountsThatCameAndWent) {
+  const Account stays = account("s");
+  EXPECT_EQ(between(stateOf({account("a"), stays}), stateOf({stays, account("b")})), (Lines{"added b", "dropped a"}));
+}
+
+TEST_F(RecordChanges, KnowAnAccountWhoseIdentifierChanged) {
+  const Account one = parent("a", {properties("c")});
+  const StoreState before = stateOf({one});
+  one->setAccountProperty_forKey("b", "Identifier");
+  EXPECT_EQ(between(before, stateOf({one})), Lines{"changed b: Identifier \"a\" -> \"b\""});
+}
+
+TEST_F(RecordChanges, TellOfChildrenLikeOfAccounts) {
+  const Account one = parent("p", {properties("c", {{"Port", 1}}), properties("d")});
+  const StoreState before = stateOf({one});
+  one->setAccountProperty_forKey(Array{properties("c", {{"Port", 2}}), properties("e")}, "ChildAccounts");
+  EXPECT_EQ(between(before, stateOf({one})), (Lines{"changed c in p: Port 1 -> 2", "added e in p", "dropped d in p"}));
+}
+
+TEST_F(RecordChanges, TellOfAnAccountThatWentUnderAnotherAndTookItsChildrenAlong) {
+  const Account mail = parent("m", {properties("c")});
+  const StoreState before = stateOf({mail});
+  const Account umbrella = parent("p", {properties("c"), properties("m")});
+  EXPECT_EQ(between(before, stateOf({umbrella})), (Lines{"added p", "moved c in p into p", "moved m in p into p"}));
+}
+
+TEST_F(RecordChanges, TellOfAChildThatBecameAnAccount) {
+  EXPECT_EQ(between(stateOf({parent("p", {properties("c")})}), stateOf({account("c")})),
+            (Lines{"moved c", "changed c", "dropped p"}));
+}
+
+TEST_F(RecordChanges, TellOfAnAccountThatIsListedAgain) {
+  const Account one = account("a");
+  EXPECT_EQ(between(stateOf({one}), stateOf({one, one})), Lines{"repeated a"});
+}
+
+TEST_F(RecordChanges, KeepAccountsOfOneIdentifierApart) {
+  const Account first = account("a", {{"Port", 1}});
+  const Account second = account("a", {{"Port", 2}});
+  const StoreState before = stateOf({first, second});
+  second->setAccountProperty_forKey(3, "Port");
+  EXPECT_EQ(between(before, stateOf({first, second})), Lines{"changed a: Port 2 -> 3"});
+}
+
+TEST_F(RecordChanges, TellByItsKeyOfAChildListThatHoldsSomethingElse) {
+  const Account one = parent("p", {"no record"});
+  const StoreState before = stateOf({one});
+  one->setAccountProperty_forKey(Array{properties("c")}, "ChildAccounts");
+  const Lines told = between(before, stateOf({one}));
+  ASSERT_EQ(told.size(), 2U);
+  EXPECT_TRUE(told[0].starts_with("changed p: ChildAccounts (\"no record\") -> ("));
+  EXPECT_EQ(told[1], "added c in p");
+}
+
+// --- Whatever happens, what is told is enough to make the new accounts of the old ones ---
+
+class RandomEdits {
+ public:
+  explicit RandomEdits(std::uint32_t seed) : _numbers{seed} {}
+
+  Accounts accounts() {
+    Accounts made;
+    for (int count = below(5); count > 0; --count) made.push_back(account(name(), {{"Port", below(3)}}));
+    return made;
+  }
+  void edit(Accounts& accounts) {
+    for (int count = below(6); count > 0; --count) editOnce(accounts);
+  }
+
+ private:
+  int below(int limit) { return std::uniform_int_distribution{0, limit - 1}(_numbers); }
+  std::string name() { return "n" + std::to_string(++_names); }
+  void editOnce(Accounts& accounts) {
+    if (accounts.empty() || below(4) == 0) return accounts.push_back(account(name(), {{"Port", below(3)}}));
+    const auto place = accounts.begin() + below(static_cast<int>(accounts.size()));
+    switch (below(4)) {
+      case 0: accounts.erase(place); return;
+      case 1: (*place)->setAccountProperty_forKey(below(3), "Port"); return;
+      case 2: (*place)->removeAccountPropertyForKey("Port"); return;
+      default: (*place)->setAccountProperty_forKey(name(), "Host"); return;
+    }
+  }
+
+  std::mt19937 _numbers;
+  int _names = 0;
+};
+
+void apply(const RunFact& fact, const StoreState& after, std::map<std::string, Dictionary>& records) {
+  if (fact.kind == RunFact::Kind::dropped) records.erase(fact.subject.identifier);
+  if (fact.kind == RunFact::Kind::added) {
+    for (const RecordState& each : after) {
+      if (each.properties.text("Identifier")->string() == fact.subject.identifier) {
+        records[fact.subject.identifier] = each.properties;
+      }
+    }
+  }
+  for (const platform::RecordChange& change : fact.changes) {
+    Dictionary& record = records[fact.subject.identifier];
+    record.remove(change.oldKey);
+    change.to ? record.set(change.key, *change.to) : static_cast<void>(record.remove(change.key));
+  }
+}
+
+std::map<std::string, Dictionary> byIdentifier(const StoreState& state) {
+  std::map<std::string, Dictionary> records;
+  for (const RecordState& each : state) records[each.properties.text("Identifier")->string()] = each.properties;
+  return records;
+}
+
+TEST_F(RecordChanges, AreAllThatHappened) {
+  for (std::uint32_t seed = 0; seed < 500; ++seed) {
+    RandomEdits random{seed};
+    Accounts accounts = random.accounts();
+    const StoreState before = stateOf(accounts);
+    random.edit(accounts);
+    const StoreState after = stateOf(accounts);
+    auto records = byIdentifier(before);
+    for (const Difference& each : accountsettings::differencesBetween(before, after)) apply(each.fact, after, records);
+    EXPECT_EQ(records, byIdentifier(after)) << "seed " << seed;
+  }
+}
+
+}  // namespace
+}  // namespace tests

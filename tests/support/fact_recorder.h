@@ -1,0 +1,33 @@
+#pragma once
+
+#include <string>
+#include <string_view>
+#include <vector>
+
+#include "platform/run_fact.h"
+#include "platform/run_observer.h"
+
+namespace tests {
+
+// An observer that keeps every fact, and the stage in which it was told.
+class FactRecorder final : public platform::RunObserver {
+ public:
+  bool isWanted = true;
+  std::vector<platform::RunFact> facts;
+  std::vector<std::string> stages;  // of each fact; empty outside of any
+
+  void stageBegan(std::string_view stage) override { _open.emplace_back(stage); }
+  void stageEnded(std::string_view) override { _open.pop_back(); }
+  [[nodiscard]] bool wantsFacts() const override { return isWanted; }
+  void told(const platform::RunFact& fact) override;
+
+  // Each fact in one line, "changed a: Port 1 -> 2, -Host", without those of loading and saving.
+  [[nodiscard]] std::vector<std::string> lines() const;
+
+ private:
+  std::vector<std::string> _open;
+};
+
+[[nodiscard]] std::string lineOf(const platform::RunFact& fact);
+
+}  // namespace tests
