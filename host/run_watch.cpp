@@ -45,7 +45,7 @@ void RunWatch::stageEnded(std::string_view /*stage*/) {
 void RunWatch::told(const platform::RunFact& fact) {
   attempt([&] {
     if (_trace) _trace->step(_explanation.stage(), _explanation.outerStage(), fact);
-    if (_isExplained) _explanation.add(fact);
+    _explanation.add(fact);
   });
 }
 

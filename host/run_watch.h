@@ -14,13 +14,13 @@ namespace host {
 // goes wrong here reaches the run.
 class RunWatch final : public platform::RunObserver {
  public:
-  // `trace` may be null; facts are wanted for it and where `isExplained`.
+  // Facts are kept, and traced where `trace` is not null, only where the run is to be explained.
   RunWatch(std::shared_ptr<Trace> trace, bool isExplained, std::shared_ptr<ProgressLine> progress)
       : _trace{std::move(trace)}, _isExplained{isExplained}, _progress{std::move(progress)} {}
 
   void stageBegan(std::string_view stage) override;
   void stageEnded(std::string_view stage) override;
-  [[nodiscard]] bool wantsFacts() const override { return _isExplained || _trace != nullptr; }
+  [[nodiscard]] bool wantsFacts() const override { return _isExplained; }
   void told(const platform::RunFact& fact) override;
   void progressed(std::size_t done, std::size_t total) override;
 
