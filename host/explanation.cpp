@@ -50,8 +50,8 @@ const RunFact* Explanation::lastSave() const {
 }
 
 std::vector<std::string> Explanation::lostFiles() const {
-  const RunFact* const save = lastSave();
-  const bool isUnsaved = save != nullptr && save->kind == RunFact::Kind::saveFailed;
+  // One save that went through, and what was converted before it is in the settings file.
+  const bool isUnsaved = count(RunFact::Kind::saved) == 0 && count(RunFact::Kind::saveFailed) > 0;
   std::set<std::string> unconverted;
   std::vector<std::string> lost;
   forEachFact([&](const RunFact& fact) {

@@ -31,7 +31,8 @@ class Explanation {
   [[nodiscard]] std::string_view outerStage() const;
   // How the last attempt to save ended; null where there was none.
   [[nodiscard]] const platform::RunFact* lastSave() const;
-  // The removed files whose accounts are on the device no longer, since they could not be converted or not be saved.
+  // The removed files whose accounts are on the device no longer, since they could not be converted or no save of them
+  // went through.
   [[nodiscard]] std::vector<std::string> lostFiles() const;
   [[nodiscard]] std::size_t count(platform::RunFact::Kind kind) const;
 
