@@ -16,7 +16,8 @@ using Kind = RunFact::Kind;
 using Lines = std::vector<std::string>;
 
 RunFact dropped(std::string_view identifier) {
-  return {.kind = Kind::dropped, .subject = {.type = "Mail", .identifier = std::string{identifier}}, .reason = "a rule"};
+  return {
+      .kind = Kind::dropped, .subject = {.type = "Mail", .identifier = std::string{identifier}}, .reason = "a rule"};
 }
 
 RunFact changed(RecordChange change) {

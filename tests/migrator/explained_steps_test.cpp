@@ -8,12 +8,12 @@
 namespace migrator {
 namespace {
 
-using tests::account;
-using tests::FactRecorder;
 using testing::Contains;
 using testing::ElementsAre;
 using testing::Not;
 using testing::StartsWith;
+using tests::account;
+using tests::FactRecorder;
 
 class ExplainedSteps : public tests::StepTest {
  protected:
@@ -40,9 +40,10 @@ TEST_F(ExplainedSteps, TellWhatTheyChangedUnderTheirOwnNames) {
   store->allBasicAccounts()[0]->setAccountProperty_forKey(tests::dataclasses({"Mail", "Notes"}), "Enabled Dataclasses");
   store->_tellChanges();
   ASSERT_TRUE(migrator._migrateNewAccountsInfo(*store));
-  EXPECT_THAT(told("_migrateAccountsFrom7A241:"),
-              ElementsAre("changed N: Enabled Dataclasses (\"com.vorlix.Dataclass.Mail\", \"com.vorlix.Dataclass.Notes\") "
-                          "-> (\"com.vorlix.Dataclass.Mail\")"));
+  EXPECT_THAT(
+      told("_migrateAccountsFrom7A241:"),
+      ElementsAre("changed N: Enabled Dataclasses (\"com.vorlix.Dataclass.Mail\", \"com.vorlix.Dataclass.Notes\") "
+                  "-> (\"com.vorlix.Dataclass.Mail\")"));
   EXPECT_THAT(told("_migrateAccountsFrom7A242:"), Not(Contains(StartsWith("added"))));
 }
 
@@ -50,7 +51,8 @@ TEST_F(ExplainedSteps, TellThatMailWentUnderANewParent) {
   load({account("Nimbra", "NimbraAccount", "N")}, 6);
   ASSERT_TRUE(migrator._migrateNewAccountsInfo(*store));
   const std::string parent = store->allBasicAccounts()[0]->identifier()->string();
-  EXPECT_THAT(told("_migrateAccountsFrom8B117:"), ElementsAre("added " + parent, "moved N in " + parent + " into " + parent));
+  EXPECT_THAT(told("_migrateAccountsFrom8B117:"),
+              ElementsAre("added " + parent, "moved N in " + parent + " into " + parent));
 }
 
 }  // namespace
