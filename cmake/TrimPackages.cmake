@@ -1,5 +1,5 @@
-# Run by cpack when the packages are made. It gives a package with a shared library scripts that run ldconfig, and no way
-# to go without; the package's trigger already sees to that.
+# Run by cpack when the packages are made. It gives a package with a shared library scripts that run ldconfig, and no
+# way to go without; the package's trigger already sees to that.
 
 foreach(package IN LISTS CPACK_PACKAGE_FILES)
   if(package MATCHES "/${CPACK_DEBIAN_LIBRARY_PACKAGE_NAME}_")

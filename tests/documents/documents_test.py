@@ -25,7 +25,10 @@ DOCUMENTS = [
 MIGRATED = "docs/OPERATIONS.md"
 BLOCK = re.compile(r"^(?:<!-- not run: (?P<reason>.+) -->\n)?```(?P<language>[a-z]*)\n(?P<text>.*?)^```$", re.M | re.S)
 MIGRATE = "migration-host --home /var/mobile --snapshots /var/lib/account-settings/snapshots"
-PROGRAMS = re.compile(r"^(?:sudo )?(?:migration-host|accountctl|\./|tools/|cmake|ctest|cpack|apt|dpkg|systemctl|journalctl)(?!.*\[OPTION\])", re.M)
+PROGRAMS = re.compile(
+    r"^(?:sudo )?(?:migration-host|accountctl|\./|tools/|cmake|ctest|cpack|apt|dpkg|systemctl|journalctl)"
+    r"(?!.*\[OPTION\])", re.M,  # a synopsis is no command
+)
 # Whatever device a command names, it is the test's own that it gets.
 WRAPPER = """#!/bin/sh
 case " $* " in
@@ -91,7 +94,8 @@ class Documents(DeviceTest):
     def run_shell(self, command):
         return subprocess.run(
             ["bash", "-e", "-c", self.here(command)], cwd=self.scratch / "work", env=self.environment,
-            stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, check=False, timeout=60,
+            stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True, check=False,
+            timeout=60,
         )
 
     def check(self, block):

@@ -197,7 +197,11 @@ class Children(VerifyTest):
     def test_that_are_no_records_are_left_as_they_are(self):
         place = "Accounts[0].ChildAccounts"
         self.assertEqual(
-            [("unknown-type", f"{place}[0]", "C1"), ("no-class", f"{place}[1]", "C1"), ("no-record", f"{place}[2]", None)],
+            [
+                ("unknown-type", f"{place}[0]", "C1"),
+                ("no-class", f"{place}[1]", "C1"),
+                ("no-record", f"{place}[2]", None),
+            ],
             self.children(changed(CHILD, Type="Post"), without(CHILD, "Class"), 7),
         )
         self.assert_kept()

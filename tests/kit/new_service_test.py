@@ -82,17 +82,18 @@ class NewService(KitTest):
 
     def assert_compiles(self, name):
         ended = subprocess.run(
-            [os.environ["CXX"], "-std=c++20", "-fsyntax-only", "-Wall", "-Wextra", "-Werror", f"-I{self.tree}", self.tree / name],
-            capture_output=True, text=True, check=False,
+            [os.environ["CXX"], "-std=c++20", "-fsyntax-only", "-Wall", "-Wextra", "-Werror", f"-I{self.tree}", name],
+            cwd=self.tree, capture_output=True, text=True, check=False,
         )
         self.assertEqual((0, ""), (ended.returncode, ended.stderr))
 
     def test_is_made_in_five_steps(self):
         self.write("platform/device_colour_query.h", SERVICE)
-        self.insert("platform/platform.h", '#include "platform/device_info_query.h"', '#include "platform/device_colour_query.h"\n')
-        self.insert("platform/platform.h", "  std::shared_ptr<DeviceInfoQuery>", "  std::shared_ptr<DeviceColourQuery> deviceColour;\n")
-        header = "platform/linux/device_configuration.h"
-        self.insert(header, '#include "platform/device_info_query.h"', '#include "platform/device_colour_query.h"\n')
+        aggregate, header = "platform/platform.h", "platform/linux/device_configuration.h"
+        for name in (aggregate, header):
+            self.insert(name, '#include "platform/device_info_query.h"', '#include "platform/device_colour_query.h"\n')
+        member = "  std::shared_ptr<DeviceColourQuery> deviceColour;\n"
+        self.insert(aggregate, "  std::shared_ptr<DeviceInfoQuery>", member)
         self.insert(
             header, "// Fixed for every device.",
             "// ROOT/etc/vorlix/device-info.plist: Colour, a text.\n"
@@ -109,7 +110,8 @@ class NewService(KitTest):
             fakes, "  std::shared_ptr<FakeDeviceInfoQuery> deviceInfo",
             "  std::shared_ptr<FakeDeviceColourQuery> deviceColour = std::make_shared<FakeDeviceColourQuery>();\n",
         )
-        self.insert("tests/support/fake_platform.cpp", "  services.deviceInfo =", "  services.deviceColour = deviceColour;\n")
+        given = "  services.deviceColour = deviceColour;\n"
+        self.insert("tests/support/fake_platform.cpp", "  services.deviceInfo =", given)
         self.write("user.cpp", USER)
         for name in (
             "platform/linux/linux_device_colour_query.cpp", "platform/linux/linux_platform.cpp",

@@ -14,8 +14,8 @@ DEVICES = "tests/endtoend/devices"
 
 class NewStep(KitTest):
     PARTS = (
-        ".clang-format", "README.md", "accountsettings/", "docs/", "migrator/", "tests/endtoend/devices/", "tests/migrator/",
-        "tools/new-step",
+        ".clang-format", "README.md", "accountsettings/", "docs/", "migrator/", "tests/endtoend/devices/",
+        "tests/migrator/", "tools/new-step",
     )
 
     def setUp(self):
@@ -64,7 +64,8 @@ class NewStep(KitTest):
     def test_brings_a_device_of_its_version(self):
         self.add("9C201")
         device = self.tree / DEVICES / f"version-{self.old + 1:02}"
-        settings, expected = (plistlib.loads((device / name).read_bytes()) for name in ("settings.plist", "expected.plist"))
+        settings = plistlib.loads((device / "settings.plist").read_bytes())
+        expected = plistlib.loads((device / "expected.plist").read_bytes())
         self.assertEqual((self.old + 1, settings["Accounts"]), (settings["Version"], expected["Accounts"]))
 
     def test_gives_the_device_of_the_last_version_something_to_migrate(self):

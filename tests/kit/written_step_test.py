@@ -44,7 +44,8 @@ class WrittenStep(KitTest):
         return self.run_in_tree("build/tests/migrator_tests", "--gtest_filter=StepFrom9C201.*", expected=expected)
 
     def golden_devices(self, expected=0):
-        return self.run_in_tree("ctest", "--test-dir", "build", "-R", "golden_devices", "--output-on-failure", expected=expected)
+        ctest = ["ctest", "--test-dir", "build", "--output-on-failure"]
+        return self.run_in_tree(*ctest, "-R", "golden_devices", expected=expected)
 
     def rewrite(self, name, old_start, old_end, new):
         text = self.read(name)

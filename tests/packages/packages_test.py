@@ -1,4 +1,4 @@
-"""The Debian packages as files: accepted by lintian, complete, and finding their libraries where the system has them."""
+"""The Debian packages as files: accepted by lintian, complete, and looking for libraries where the system has them."""
 
 import re
 import subprocess

@@ -1,6 +1,8 @@
 """The unit that runs the migration at boot: accepted by systemd, confined, and with enough rights for the work."""
 
 import os
+import re
+import shutil
 import subprocess
 import unittest
 from pathlib import Path
@@ -20,7 +22,8 @@ NEEDED_CAPABILITIES = {"CAP_CHOWN": 0, "CAP_DAC_OVERRIDE": 1, "CAP_FOWNER": 3}
 def run(*command, expected=0):
     ended = subprocess.run(
         [str(part) for part in command],
-        env=plain_environment(), stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, check=False,
+        env=plain_environment(), stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT,
+        check=False,
     )
     if ended.returncode != expected:
         raise AssertionError(f"{command} ended with {ended.returncode}:\n{ended.stdout.decode(errors='replace')}")
@@ -72,6 +75,34 @@ class InstalledUnit(DeviceTest):
         status = device.path(SETTINGS).stat()
         self.assertEqual((4711, 4712), (status.st_uid, status.st_gid))
         self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+
+
+    def allowed_calls(self):
+        """The system calls that the unit's filters leave, in their order: a list that is added, or taken away."""
+        allowed = set()
+        for line in self.settings("SystemCallFilter"):
+            named = set().union(*(calls_of(name) for name in line.lstrip("~").split()))
+            allowed = allowed - named if line.startswith("~") else allowed | named
+        return allowed
+
+    @unittest.skipUnless(shutil.which("strace"), "needs strace")
+    @unittest.skipIf(os.environ["SANITIZE"], "a sanitizer makes calls of its own")
+    def test_allows_the_host_the_system_calls_that_it_makes(self):
+        device = self.example("legacy-files")
+        log = self.scratch / "calls"
+        run("strace", "-f", "-qq", "-o", log, HOST, "--root", device.root, "--snapshots", self.scratch / "snapshots")
+        called = set(re.findall(r"^\d+ +(\w+)\(", log.read_text(), re.MULTILINE))
+        self.assertTrue(called & {"fchown", "fchownat"}, called)
+        self.assertEqual(set(), called - self.allowed_calls())
+
+
+def calls_of(name):
+    """The system calls of a group, and of the groups in it."""
+    if not name.startswith("@"):
+        return {name}
+    listed = run("systemd-analyze", "syscall-filter", "--no-pager", name)[1:]
+    names = [line.strip() for line in listed if line.strip() and not line.strip().startswith("#")]
+    return set().union(*map(calls_of, names))
 
 
 class Fragments(DeviceTest):
