@@ -11,10 +11,10 @@ namespace platform {
 
 // A record as people and files know it. Whatever a record does not have is empty.
 struct RecordName {
-  std::string type;
-  std::string name;  // what its user calls it
-  std::string identifier;
-  std::string parent;  // the identifier of the record that it lies in
+  std::string type{};
+  std::string name{};  // what its user calls it
+  std::string identifier{};
+  std::string parent{};  // the identifier of the record that it lies in
 
   friend bool operator==(const RecordName&, const RecordName&) = default;
 };
@@ -24,9 +24,9 @@ struct RecordName {
 // values are whole and may be credentials: whoever shows them goes by platform/description.h.
 struct RecordChange {
   std::string key;
-  std::string oldKey;
-  std::optional<PropertyValue> from;
-  std::optional<PropertyValue> to;
+  std::string oldKey{};
+  std::optional<PropertyValue> from{};
+  std::optional<PropertyValue> to{};
 
   friend bool operator==(const RecordChange&, const RecordChange&) = default;
 };
