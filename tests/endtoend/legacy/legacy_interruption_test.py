@@ -4,26 +4,10 @@ import os
 import signal
 import subprocess
 import unittest
-from pathlib import Path
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY, plain_environment
-from legacy_case import (
-    HOST,
-    SENTINEL,
-    STANDING,
-    LegacyCase,
-    delivery,
-    delivery_record,
-    exchange,
-    exchange_file,
-    exchange_record,
-    incoming,
-    mail_file,
-    mail_record,
-)
-
-MORTAL = Path(os.environ["TEST_PLUGINS"]) / "mortal_migrator.so"
-PLUGIN = Path(os.environ["BUILD_TREE"]) / os.environ["LIBRARY_DIRECTORY"] / "account-settings" / "accounts-migrator.so"
+from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY
+from legacy_case import HOST, SENTINEL, STANDING, delivery_record, exchange_record, mail_record
+from mortal_case import MORTAL, MortalCase
 
 ACCOUNTS = [
     STANDING,
@@ -34,43 +18,7 @@ ACCOUNTS = [
 ]
 
 
-class InterruptionTest(LegacyCase):
-    def legacy_device(self, **more):
-        device = self.device(
-            mail=mail_file([incoming("M1"), incoming("G1", "GmailAccount")], [delivery("D1")]),
-            exchange_=exchange_file(exchange("E1")),
-            **more,
-        )
-        for path in (LEGACY_MAIL, LEGACY_EXCHANGE):
-            device.write(path + ".original", "old")
-        return device
-
-    def run_until(self, device, change):
-        """Runs the migrator until right before the change of that number; answers the changes that were made."""
-        run = device.migrate(HOST, "--plugin", MORTAL, environment=self.mortality(change))
-        made = [line.split(" ", 1) for line in self.changes.read_text().splitlines()]
-        return run, [(verb, str(Path(path).relative_to(device.root))) for verb, path in made]
-
-    def mortality(self, change, death=signal.SIGKILL):
-        self.changes = self.scratch / "changes"
-        return {
-            "REAL_PLUGIN": str(PLUGIN),
-            "DIE_BEFORE": str(change),
-            "DIE_OF": str(int(death)),
-            "CHANGES": str(self.changes),
-        }
-
-    def start(self, device, *options, environment=()):
-        process = subprocess.Popen(
-            [HOST, "--root", device.root, *options],
-            env={**plain_environment(), **dict(environment)},
-            stdin=subprocess.DEVNULL,
-            stderr=subprocess.DEVNULL,
-        )
-        self.addCleanup(process.wait)
-        self.addCleanup(process.kill)
-        return process
-
+class InterruptionTest(MortalCase):
     def undisturbed(self):
         device = self.legacy_device()
         run, changes = self.run_until(device, 0)

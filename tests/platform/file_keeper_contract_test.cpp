@@ -1,0 +1,147 @@
+// What every keeper of files does, the device's and the tests' own.
+
+#include <gtest/gtest.h>
+#include <unistd.h>
+
+#include <cerrno>
+
+#include "platform/linux/linux_file_keeper.h"
+#include "platform/linux/linux_platform.h"
+#include "tests/support/fake_file_keeper.h"
+#include "tests/support/scratch_directory.h"
+
+namespace tests {
+namespace {
+
+using platform::Bytes;
+using platform::FileAttributes;
+using platform::FileKind;
+using platform::Path;
+
+Bytes bytes(std::string_view text) { return {text.begin(), text.end()}; }
+
+struct KeeperOfTheTests {
+  FakeFileSystem fileSystem;
+  FakeFileKeeper keeper{fileSystem};
+  Path base = "/device";
+
+  KeeperOfTheTests() { fileSystem.putDirectory(base); }
+  platform::FileSystem& files() { return fileSystem; }
+  platform::FileKeeper& service() { return keeper; }
+};
+
+struct KeeperOfTheDevice {
+  ScratchDirectory scratch;
+  Path base = scratch.path();
+  std::shared_ptr<platform::FileSystem> fileSystem = platform::makeLinuxPlatform({.systemRoot = base}).files;
+  std::shared_ptr<platform::FileKeeper> keeper = platform::makeFileKeeper();
+
+  platform::FileSystem& files() { return *fileSystem; }
+  platform::FileKeeper& service() { return *keeper; }
+};
+
+template <typename Subject>
+class FileKeeperContract : public testing::Test {
+ protected:
+  Subject subject;
+  platform::FileSystem& files = subject.files();
+  platform::FileKeeper& keeper = subject.service();
+  const FileAttributes attributes{.kind = FileKind::file,
+                                  .size = 4,
+                                  .owner = ::geteuid(),
+                                  .group = ::getegid(),
+                                  .permissions = 0641,
+                                  .modifiedSeconds = 1'234'567,
+                                  .modifiedNanoseconds = 89};
+
+  [[nodiscard]] Path at(std::string_view below) const { return subject.base / below; }
+  void put(std::string_view below, std::string_view text) { ASSERT_TRUE(files.create(at(below), bytes(text)).isOk()); }
+  std::string textAt(std::string_view below) {
+    const auto contents = files.read(at(below), SIZE_MAX);
+    return contents.isOk() ? std::string{contents.value().begin(), contents.value().end()} : "(unreadable)";
+  }
+};
+
+using Subjects = testing::Types<KeeperOfTheTests, KeeperOfTheDevice>;
+TYPED_TEST_SUITE(FileKeeperContract, Subjects);
+
+TYPED_TEST(FileKeeperContract, TellsWhatStandsAtAPath) {
+  this->put("file", "text");
+  const auto file = this->keeper.attributesOf(this->at("file"));
+  ASSERT_TRUE(file.isOk());
+  EXPECT_EQ(file.value().kind, FileKind::file);
+  EXPECT_EQ(file.value().size, 4U);
+  EXPECT_EQ(file.value().permissions, 0600U);
+  EXPECT_EQ(this->keeper.attributesOf(this->subject.base).value().kind, FileKind::directory);
+  EXPECT_EQ(this->keeper.attributesOf(this->at("nothing")).status().errorNumber(), ENOENT);
+}
+
+TYPED_TEST(FileKeeperContract, RestoresAFileWithAllThatItWas) {
+  this->put("file", "something else");
+  ASSERT_TRUE(this->keeper.restore(this->at("file"), bytes("text"), this->attributes).isOk());
+  EXPECT_EQ(this->textAt("file"), "text");
+  EXPECT_EQ(this->keeper.attributesOf(this->at("file")).value(), this->attributes);
+}
+
+TYPED_TEST(FileKeeperContract, RestoresAFileThatIsGone) {
+  ASSERT_TRUE(this->keeper.restore(this->at("file"), bytes("text"), this->attributes).isOk());
+  EXPECT_EQ(this->textAt("file"), "text");
+  EXPECT_EQ(this->keeper.entriesOf(this->subject.base).value(), std::vector<std::string>{"file"});
+}
+
+TYPED_TEST(FileKeeperContract, RestoresNothingOntoADirectoryOrIntoAMissingOne) {
+  ASSERT_TRUE(this->files.createDirectories(this->at("directory"), 0755).isOk());
+  EXPECT_EQ(this->keeper.restore(this->at("directory"), bytes("text"), this->attributes).errorNumber(), EISDIR);
+  EXPECT_EQ(this->keeper.restore(this->at("nothing/file"), bytes("text"), this->attributes).errorNumber(), ENOENT);
+  EXPECT_EQ(this->keeper.entriesOf(this->at("directory")).value(), std::vector<std::string>{});
+}
+
+TYPED_TEST(FileKeeperContract, AddsToTheEndOfAFile) {
+  this->put("file", "one");
+  ASSERT_TRUE(this->keeper.append(this->at("file"), bytes(" two")).isOk());
+  EXPECT_EQ(this->textAt("file"), "one two");
+}
+
+TYPED_TEST(FileKeeperContract, AddsToNothingThatIsMissingOrADirectory) {
+  EXPECT_EQ(this->keeper.append(this->at("nothing"), bytes("text")).errorNumber(), ENOENT);
+  EXPECT_EQ(this->keeper.append(this->subject.base, bytes("text")).errorNumber(), EISDIR);
+}
+
+TYPED_TEST(FileKeeperContract, ListsADirectoryInOrder) {
+  for (const char* const name : {"b", "a", "c"}) this->put(name, "");
+  EXPECT_EQ(this->keeper.entriesOf(this->subject.base).value(), (std::vector<std::string>{"a", "b", "c"}));
+  EXPECT_EQ(this->keeper.entriesOf(this->at("nothing")).status().errorNumber(), ENOENT);
+  EXPECT_EQ(this->keeper.entriesOf(this->at("a")).status().errorNumber(), ENOTDIR);
+}
+
+TYPED_TEST(FileKeeperContract, SeesToItThatNoFileStandsAtAPath) {
+  this->put("file", "text");
+  EXPECT_TRUE(this->keeper.removeFile(this->at("file")).isOk());
+  EXPECT_EQ(this->files.kindOf(this->at("file")), std::nullopt);
+  EXPECT_TRUE(this->keeper.removeFile(this->at("file")).isOk());
+  EXPECT_TRUE(this->keeper.removeFile(this->at("nothing/file")).isOk());
+  EXPECT_EQ(this->keeper.removeFile(this->subject.base).errorNumber(), EISDIR);
+}
+
+TEST(LinuxFileKeeper, FollowsNoLinkAtAPathItself) {
+  const ScratchDirectory scratch;
+  scratch.put("target", "precious");
+  std::filesystem::create_symlink(scratch / "target", scratch / "link");
+  const auto keeper = platform::makeFileKeeper();
+  EXPECT_EQ(keeper->attributesOf(scratch / "link").value().kind, FileKind::other);
+  EXPECT_EQ(keeper->append(scratch / "link", bytes("x")).errorNumber(), ELOOP);
+  EXPECT_TRUE(keeper->restore(scratch / "link", bytes("new"), {.owner = ::geteuid(), .group = ::getegid()}).isOk());
+  EXPECT_EQ(scratch.contents("target"), "precious");
+  EXPECT_EQ(scratch.contents("link"), "new");
+}
+
+TEST(LinuxFileKeeper, PutsAwayWhatADeadRestoreLeft) {
+  const ScratchDirectory scratch;
+  scratch.put(".restoring-file", "half a fi");
+  const auto keeper = platform::makeFileKeeper();
+  ASSERT_TRUE(keeper->restore(scratch / "file", bytes("file"), {.owner = ::geteuid(), .group = ::getegid()}).isOk());
+  EXPECT_EQ(keeper->entriesOf(scratch.path()).value(), std::vector<std::string>{"file"});
+}
+
+}  // namespace
+}  // namespace tests
