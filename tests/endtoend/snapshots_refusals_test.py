@@ -28,6 +28,13 @@ class WrongUse(SnapshotsTest):
         for other in ("--list-snapshots", "--restore=x"):
             self.assert_wrong("--keep is for a run: only a run removes snapshots", *snapshots, "--keep", "3", other)
 
+    def test_what_is_no_run_can_be_neither_rehearsed_nor_explained(self):
+        snapshots = ("--snapshots", self.snapshots)
+        for instead in (("--restore", "x"), ("--list-snapshots",)):
+            for option in ("--dry-run", "--explain"):
+                run = self.run_host(*snapshots, *instead, option)
+                self.assertEqual((2, [], 1), (run.status, run.output, len(run.errors)))
+
     def test_a_number_of_snapshots_that_is_none(self):
         for text in BAD_NUMBERS:
             message = f"--keep needs a number of snapshots, at least 1: {text}"
