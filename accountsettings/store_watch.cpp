@@ -11,7 +11,6 @@
 namespace accountsettings {
 namespace {
 
-using platform::RecordName;
 using platform::RunFact;
 using Kind = platform::RunFact::Kind;
 

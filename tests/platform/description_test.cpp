@@ -12,6 +12,7 @@ using platform::Array;
 using platform::Bytes;
 using platform::Date;
 using platform::description;
+using platform::descriptionUnder;
 using platform::Dictionary;
 using platform::namesCredential;
 using platform::PropertyValue;
@@ -58,6 +59,19 @@ TEST(Descriptions, TakeAKeyForACredentialByTheWordsInIt) {
   for (const char* const key : {"", "Username", "Login_Key", "CalDAV_Server_Key", "Hostname", "Pass", "Pin"}) {
     EXPECT_FALSE(namesCredential(key)) << key;
   }
+}
+
+TEST(Descriptions, UnderAKeyThatNamesACredentialIsHidden) {
+  EXPECT_EQ(descriptionUnder("Password", "secret"), "<hidden>");
+  EXPECT_EQ(descriptionUnder("Port", 993), "993");
+}
+
+TEST(Descriptions, LeavesOfAValueWhatMayBeShown) {
+  const Dictionary value{{"Token", "secret"}, {"Blob", Bytes{1, 2}}, {"Ports", Array{1, Dictionary{{"Cookie", 2}}}}};
+  const Dictionary shown{
+      {"Token", "<hidden>"}, {"Blob", "<data: 2 bytes>"}, {"Ports", Array{1, Dictionary{{"Cookie", "<hidden>"}}}}};
+  EXPECT_EQ(platform::presentable("Settings", value), PropertyValue{shown});
+  EXPECT_EQ(platform::presentable("Secrets", value), PropertyValue{"<hidden>"});
 }
 
 }  // namespace
