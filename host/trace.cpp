@@ -1,11 +1,12 @@
 #include "host/trace.h"
 
-#include <fcntl.h>
-#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
 #include <nlohmann/json.hpp>
+#include <utility>
+
+#include "platform/linux/file_to_append.h"
 
 #include "host/fact_json.h"
 
@@ -15,29 +16,29 @@ namespace {
 using Event = nlohmann::ordered_json;
 
 bool writeLine(int descriptor, const std::string& line) {
-  for (;;) {
+  constexpr int attempts = 100;
+  for (int attempt = 0; attempt < attempts; ++attempt) {
     const auto written = ::write(descriptor, line.data(), line.size());
     if (written >= 0) return static_cast<std::size_t>(written) == line.size();
     if (errno != EINTR) return false;
   }
+  return false;
 }
 
 }  // namespace
 
 platform::Result<std::shared_ptr<Trace>> Trace::open(const std::filesystem::path& path) {
-  const int descriptor =
-      ::open(path.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_NOFOLLOW | O_CLOEXEC | O_NOCTTY, S_IRUSR | S_IWUSR);
-  if (descriptor < 0) return platform::Status::failure(errno, "open the trace file " + path.string());
-  return std::shared_ptr<Trace>{new Trace{descriptor}};
+  platform::Descriptor file = platform::openToAppend(path);
+  if (!file.isOpen()) return platform::Status::failure(errno, "open the trace file " + path.string());
+  return std::shared_ptr<Trace>{new Trace{std::move(file)}};
 }
-
-Trace::~Trace() { ::close(_descriptor); }
 
 template <typename MakeEvent>
 void Trace::append(const MakeEvent& makeEvent) noexcept {
   try {
     const Event event = makeEvent();
-    if (!writeLine(_descriptor, event.dump(-1, ' ', false, Event::error_handler_t::replace) + '\n')) _complete = false;
+    if (!writeLine(_file.number(), event.dump(-1, ' ', false, Event::error_handler_t::replace) + '\n'))
+      _complete = false;
   } catch (...) {
     _complete = false;
   }

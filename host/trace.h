@@ -5,7 +5,9 @@
 #include <memory>
 #include <string>
 #include <string_view>
+#include <utility>
 
+#include "platform/linux/descriptor.h"
 #include "platform/run_fact.h"
 #include "platform/status.h"
 
@@ -16,12 +18,13 @@ namespace host {
 // with replacement characters. An event that cannot be written is lost and the run goes on; `complete` tells of it.
 class Trace {
  public:
-  // Appends to the file, which is made (mode 0600) where there is none; a symbolic link is refused.
+  // Appends to the file, which is made where there is none; mode 0600. What somebody else may have put there is
+  // refused.
   [[nodiscard]] static platform::Result<std::shared_ptr<Trace>> open(const std::filesystem::path& path);
 
   Trace(const Trace&) = delete;
   Trace& operator=(const Trace&) = delete;
-  ~Trace();
+  ~Trace() = default;
 
   void console(std::string_view message) noexcept;
   void log(std::string_view subsystem, std::string_view category, const std::function<std::string()>& message) noexcept;
@@ -35,11 +38,11 @@ class Trace {
   [[nodiscard]] bool complete() const { return _complete; }
 
  private:
-  explicit Trace(int descriptor) : _descriptor{descriptor} {}
+  explicit Trace(platform::Descriptor file) : _file{std::move(file)} {}
   template <typename MakeEvent>
   void append(const MakeEvent& makeEvent) noexcept;
 
-  int _descriptor;
+  platform::Descriptor _file;
   bool _complete = true;
 };
 

@@ -18,7 +18,8 @@ using Path = std::filesystem::path;
 enum class FileKind : std::uint8_t { file, directory, other };
 
 // The device's files. Paths are absolute. Every call works relative to the opened parent directory of its path and
-// never follows a link at the path itself, except where a call says so. A failed call names its cause and leaves
+// never follows a link at the path itself, except where a call says so; links above it, and those, are followed only
+// where nobody can have planted them. A failed call names its cause and leaves
 // nothing half made that it made itself.
 //
 // A call that makes, replaces, moves or removes something brings the bytes and the directory entry to stable storage;
@@ -28,11 +29,13 @@ class FileSystem {
  public:
   virtual ~FileSystem() = default;
 
-  // What stands at the path, links followed; nothing where nothing does or where it cannot be told. Nothing is opened.
+  // What stands at the path, links followed; nothing where nothing does or where it cannot be told. A link that is not
+  // to be followed is itself what stands there. Nothing is opened.
   [[nodiscard]] virtual std::optional<FileKind> kindOf(const Path& path) = 0;
 
   // The whole contents of a regular file, links followed. Anything that is no regular file, or that is larger than
-  // `sizeLimit` bytes, is refused without being read, and nothing blocks.
+  // `sizeLimit` bytes, or that has a second name and may be somebody else's (EMLINK), is refused without being read,
+  // and nothing blocks.
   virtual Result<Bytes> read(const Path& path, std::size_t sizeLimit) = 0;
 
   // Makes a file at a path where nothing stands, mode 0600, and writes the bytes. On failure no file remains.
@@ -42,7 +45,7 @@ class FileSystem {
   // whole.
   virtual Status replace(const Path& path, std::span<const std::uint8_t> bytes) = 0;
 
-  // Copies a regular file, byte for byte, to a path where nothing stands, mode 0600.
+  // Copies a regular file that `read` would read, byte for byte, to a path where nothing stands, mode 0600.
   virtual Status copy(const Path& from, const Path& to) = 0;
 
   // Removes what stands at the path, a directory with all below it, never following a link. A path at which nothing
@@ -55,7 +58,7 @@ class FileSystem {
 
   // Sets the owner and the group of the file or directory at the path, by account name, as the device's own passwd and
   // group files have them. An unknown name is an error (ENOENT), and so is a file with a second name elsewhere
-  // (EMLINK), which would be given away with it.
+  // (EMLINK), which would be given away with it, and what stands in the place of what was made there (ESTALE).
   virtual Status setOwner(const Path& path, std::string_view owner, std::string_view group) = 0;
 
   // A name for a temporary file in the process's default temporary directory, at which nothing stands; nothing where

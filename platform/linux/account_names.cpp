@@ -9,8 +9,6 @@
 #include <memory>
 #include <vector>
 
-#include "platform/linux/file_access.h"
-
 namespace platform {
 namespace {
 
@@ -19,15 +17,15 @@ constexpr std::size_t entryLimit = std::size_t{1} << 20;
 
 using File = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
 
-File openTable(const std::filesystem::path& path) {
-  Descriptor table = openRegularFile(openParent(path), AtLink::follow);
+File openTable(const Place& place) {
+  Descriptor table = place.parent.isOpen() ? openOwnFile(place) : Descriptor{};
   std::FILE* const file = table.isOpen() ? ::fdopen(table.number(), "re") : nullptr;
   if (file != nullptr) static_cast<void>(table.release());
   return {file, &std::fclose};
 }
 
-std::optional<uid_t> userInTable(const std::filesystem::path& path, const std::string& name) {
-  const File table = openTable(path);
+std::optional<uid_t> userInTable(const Place& place, const std::string& name) {
+  const File table = openTable(place);
   if (!table) return std::nullopt;
   std::vector<char> buffer(entryLimit);
   passwd entry{};
@@ -38,8 +36,8 @@ std::optional<uid_t> userInTable(const std::filesystem::path& path, const std::s
   return std::nullopt;
 }
 
-std::optional<gid_t> groupInTable(const std::filesystem::path& path, const std::string& name) {
-  const File table = openTable(path);
+std::optional<gid_t> groupInTable(const Place& place, const std::string& name) {
+  const File table = openTable(place);
   if (!table) return std::nullopt;
   std::vector<char> buffer(entryLimit);
   struct group entry {};
@@ -53,7 +51,7 @@ std::optional<gid_t> groupInTable(const std::filesystem::path& path, const std::
 }  // namespace
 
 std::optional<uid_t> AccountNames::user(const std::string& name) const {
-  if (_root != "/") return userInTable(_root / "etc/passwd", name);
+  if (_root != "/") return userInTable(_paths.openParentOfTarget(_root / "etc/passwd"), name);
   std::vector<char> buffer(entryLimit);
   passwd entry{};
   passwd* found = nullptr;
@@ -62,7 +60,7 @@ std::optional<uid_t> AccountNames::user(const std::string& name) const {
 }
 
 std::optional<gid_t> AccountNames::group(const std::string& name) const {
-  if (_root != "/") return groupInTable(_root / "etc/group", name);
+  if (_root != "/") return groupInTable(_paths.openParentOfTarget(_root / "etc/group"), name);
   std::vector<char> buffer(entryLimit);
   struct group entry {};
   struct group* found = nullptr;

@@ -5,7 +5,7 @@
 #include <cerrno>
 #include <vector>
 
-#include "platform/linux/file_access.h"
+#include "platform/linux/tree_removal.h"
 
 namespace platform {
 namespace {
@@ -32,20 +32,32 @@ class Made {
   std::vector<Place> _places;
 };
 
-// The permission bits whatever the umask. A directory that its own bits keep us from opening is changed by name, which
-// follows no link either.
-bool setPermissions(const Place& place, unsigned permissions) {
-  const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-  const Descriptor directory{::openat(place.parent.number(), place.leaf.c_str(), flags)};
-  if (directory.isOpen()) return ::fchmod(directory.number(), permissions) == 0;
-  return errno == EACCES &&
-         ::fchmodat(place.parent.number(), place.leaf.c_str(), permissions, AT_SYMLINK_NOFOLLOW) == 0;
+// Somebody who writes in the parent may have put another directory at the name meanwhile; its bits are not ours to set.
+bool isNew(const Descriptor& directory) {
+  struct stat status {};
+  return ::fstat(directory.number(), &status) == 0 && status.st_uid == ::geteuid() && isEmpty(directory);
 }
 
-bool makeDirectory(Place place, unsigned permissions, Made& made) {
+// The permission bits whatever the umask. A directory that its own bits keep us from opening is changed by name, which
+// follows no link either; only who has no rights over others' directories is kept from opening an own one.
+bool setPermissions(const Place& place, unsigned permissions, Descriptor& directory) {
+  const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
+  directory = Descriptor{::openat(place.parent.number(), place.leaf.c_str(), flags)};
+  if (!directory.isOpen()) {
+    return errno == EACCES &&
+           ::fchmodat(place.parent.number(), place.leaf.c_str(), permissions, AT_SYMLINK_NOFOLLOW) == 0;
+  }
+  if (isNew(directory)) return ::fchmod(directory.number(), permissions) == 0;
+  errno = EEXIST;
+  return false;
+}
+
+// Leaves `directory` unopened where it was there already.
+bool makeDirectory(Place place, unsigned permissions, Made& made, Descriptor& directory) {
+  directory = {};
   if (::mkdirat(place.parent.number(), place.leaf.c_str(), permissions & 0777U) != 0) return errno == EEXIST;
   const Place& own = made.add(std::move(place));
-  if (!setPermissions(own, permissions)) return false;
+  if (!setPermissions(own, permissions, directory)) return false;
   const Descriptor entries = openForSync(own.parent);
   return entries.isOpen() && sync(entries);
 }
@@ -56,34 +68,36 @@ bool isDirectory(const Place& place) {
 }
 
 // The directory and those above it that are missing, from the innermost on; none where that cannot be told.
-std::vector<std::filesystem::path> missingDirectories(const std::filesystem::path& path) {
+std::vector<std::filesystem::path> missingDirectories(const PathResolver& paths, const std::filesystem::path& path) {
   std::vector<std::filesystem::path> missing{path.has_filename() ? path : path.parent_path()};
-  while (!openParent(missing.back()).parent.isOpen()) {
+  while (!paths.openParent(missing.back()).parent.isOpen()) {
     if (errno != ENOENT || !missing.back().has_relative_path()) return {};
     missing.push_back(missing.back().parent_path());
   }
   return missing;
 }
 
-bool makeMissing(const std::filesystem::path& path, unsigned permissions, Made& made) {
-  std::vector<std::filesystem::path> missing = missingDirectories(path);
+bool makeMissing(const PathResolver& paths, std::vector<std::filesystem::path> missing, unsigned permissions,
+                 Made& made, Descriptor& innermost) {
   if (missing.empty()) return false;
   for (; !missing.empty(); missing.pop_back()) {
-    Place place = openParent(missing.back());
+    Place place = paths.openParent(missing.back());
     const unsigned bits = missing.size() == 1 ? permissions : permissionsAbove;
-    if (!place.parent.isOpen() || !makeDirectory(std::move(place), bits, made)) return false;
-    if (!isDirectory(openParent(missing.back()))) return false;
+    if (!place.parent.isOpen() || !makeDirectory(std::move(place), bits, made, innermost)) return false;
+    if (!isDirectory(paths.openParent(missing.back()))) return false;
   }
   return true;
 }
 
 }  // namespace
 
-bool makeDirectories(const std::filesystem::path& path, unsigned permissions) {
+std::optional<Descriptor> makeDirectories(const PathResolver& paths, const std::filesystem::path& path,
+                                          unsigned permissions) {
   Made made;
-  if (!makeMissing(path, permissions, made)) return false;
+  Descriptor innermost;
+  if (!makeMissing(paths, missingDirectories(paths, path), permissions, made, innermost)) return std::nullopt;
   made.keep();
-  return true;
+  return innermost;
 }
 
 }  // namespace platform

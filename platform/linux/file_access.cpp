@@ -21,25 +21,26 @@ bool refuse(int errorNumber) {
 
 }  // namespace
 
-Place openParent(const std::filesystem::path& path) {
-  if (path.empty() && refuse(ENOENT)) return {};
-  const std::filesystem::path trimmed = path.has_filename() ? path : path.parent_path();
-  const std::filesystem::path above = trimmed.parent_path();
-  const int parent = ::open(above.empty() ? "." : above.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC);
-  return {Descriptor{parent}, trimmed.has_filename() ? trimmed.filename().string() : "."};
-}
-
 bool isEntryName(const std::string& leaf) { return !leaf.empty() && leaf != "." && leaf != ".."; }
 
-Descriptor openRegularFile(const Place& place, AtLink atLink) {
-  const bool follows = atLink == AtLink::follow;
+Descriptor openRegularFile(const Place& place) {
   struct stat status {};
-  if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, follows ? 0 : AT_SYMLINK_NOFOLLOW) != 0) return {};
+  if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return {};
   if (refuse(errorForKind(status.st_mode))) return {};
-  const int flags = O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | (follows ? 0 : O_NOFOLLOW);
+  constexpr int flags = O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW;
   Descriptor file{retried([&] { return ::openat(place.parent.number(), place.leaf.c_str(), flags); })};
   if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return {};
   if (refuse(errorForKind(status.st_mode))) return {};
+  return file;
+}
+
+Descriptor openOwnFile(const Place& place) {
+  Descriptor file = openRegularFile(place);
+  struct stat status {};
+  struct stat holder {};
+  if (!file.isOpen() || ::fstat(file.number(), &status) != 0 || ::fstat(place.parent.number(), &holder) != 0) return {};
+  const bool mayBePlanted = status.st_uid != holder.st_uid || (holder.st_mode & S_IWOTH) != 0;
+  if (refuse(status.st_nlink > 1 && mayBePlanted ? EMLINK : 0)) return {};
   return file;
 }
 

@@ -19,17 +19,16 @@ struct Place {
   std::string leaf;   // "." for a root directory
 };
 
-// Opens the directory above the path. The one place where the directories of a path are resolved.
-[[nodiscard]] Place openParent(const std::filesystem::path& path);
-
 // Whether the name can be made, moved or removed: neither empty nor "." nor "..".
 [[nodiscard]] bool isEntryName(const std::string& leaf);
 
-enum class AtLink : bool { stop, follow };
+// Opens a regular file for reading, whoever's it is. Whatever else stands there, a link included, is refused (EISDIR,
+// ELOOP or EINVAL), unopened where that can be told before, and nothing waits for the other side of a pipe or a device.
+[[nodiscard]] Descriptor openRegularFile(const Place& place);
 
-// Opens a regular file for reading. Whatever else stands there is refused (EISDIR, ELOOP or EINVAL), unopened where
-// that can be told before, and nothing waits for the other side of a pipe or a device.
-[[nodiscard]] Descriptor openRegularFile(const Place& place, AtLink atLink);
+// The same for a file whose contents are to be used. One with a second name elsewhere is refused (EMLINK) where
+// somebody may have given it this one: a file that others cannot read would be read for them.
+[[nodiscard]] Descriptor openOwnFile(const Place& place);
 
 // Makes a new file, mode 0600 whatever the umask, open for writing.
 [[nodiscard]] Descriptor makeFile(const Place& place);

@@ -5,7 +5,7 @@
 
 #include <cerrno>
 
-#include "platform/linux/file_access.h"
+#include "platform/linux/path_resolution.h"
 
 namespace platform {
 namespace {
@@ -25,7 +25,7 @@ Descriptor makeLockFile(const Place& place) {
 // another owner.
 Descriptor openLockFile(const Place& place) {
   for (int attempt = 0; place.parent.isOpen() && attempt < attempts; ++attempt) {
-    Descriptor file = openRegularFile(place, AtLink::stop);
+    Descriptor file = openRegularFile(place);
     if (file.isOpen() || errno != ENOENT) return file;
     file = makeLockFile(place);
     if (file.isOpen() || errno != EEXIST) return file;
@@ -75,7 +75,7 @@ class LinuxFileLocks final : public ExclusiveFileLocks {
 
   [[nodiscard]] std::unique_ptr<ExclusiveFileLock> lockNamed(std::string_view name) override {
     if (!isEntryName(std::string{name}) || name.find('/') != std::string_view::npos) return nullptr;
-    Place place = openParent(_directory / name);
+    Place place = PathResolver{}.openParent(_directory / name);
     Descriptor file = openLockFile(place);
     if (!file.isOpen()) return nullptr;
     return std::make_unique<LinuxFileLock>(std::move(place), std::move(file));

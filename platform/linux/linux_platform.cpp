@@ -16,11 +16,20 @@
 #include "platform/linux/linux_unique_identifiers.h"
 
 namespace platform {
+namespace {
+
+FileTrees treesOf(const BaseDirectories& directories) {
+  return {.systemRoot = directories.systemRoot(),
+          .ofDevice = {directories.home(), directories.sharedResources()},
+          .ofMachine = {directories.resources()}};
+}
+
+}  // namespace
 
 Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   Platform services;
   services.directories = makeBaseDirectories(options);
-  services.files = makeFileSystem(services.directories->systemRoot());
+  services.files = makeFileSystem(treesOf(*services.directories));
   services.propertyLists = makeLibplistPropertyListStore(services.files);
   const DeviceConfiguration configuration{services.directories, services.propertyLists};
   services.preferences = makePreferencesStore(services.directories, services.propertyLists);

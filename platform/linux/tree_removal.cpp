@@ -49,11 +49,17 @@ std::optional<std::string> clearUpToDirectory(const Descriptor& directory) {
 
 class Walk {
  public:
+  explicit Walk(dev_t volume) : _volume{volume} {}
+
   // Goes down into the directory of that name.
   bool enter(const Descriptor& from, const std::string& name) {
     Descriptor below{::openat(from.number(), name.c_str(), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC)};
     struct stat status {};
     if (!below.isOpen() || ::fstat(below.number(), &status) != 0) return false;
+    if (status.st_dev != _volume) {
+      errno = EXDEV;
+      return false;
+    }
     _levels.push_back({name, status.st_dev, status.st_ino});
     _current = std::move(below);
     return true;
@@ -89,11 +95,20 @@ class Walk {
     return ::unlinkat(_current.number(), name.c_str(), AT_REMOVEDIR) == 0;
   }
 
+  dev_t _volume;
   Descriptor _current;
   std::vector<Level> _levels;
 };
 
 }  // namespace
+
+bool isEmpty(const Descriptor& directory) {
+  const Stream stream = streamOf(directory);
+  while (const dirent* const entry = stream ? ::readdir(stream.get()) : nullptr) {
+    if (isEntryName(static_cast<const char*>(entry->d_name))) return false;
+  }
+  return stream != nullptr;
+}
 
 bool removeTree(const Place& place) {
   if (!isEntryName(place.leaf)) {
@@ -103,7 +118,9 @@ bool removeTree(const Place& place) {
   if (!isDirectoryAt(place.parent.number(), place.leaf.c_str())) {
     return ::unlinkat(place.parent.number(), place.leaf.c_str(), 0) == 0;
   }
-  Walk walk;
+  struct stat holder {};
+  if (::fstat(place.parent.number(), &holder) != 0) return false;
+  Walk walk{holder.st_dev};
   return walk.enter(place.parent, place.leaf) && walk.run() &&
          ::unlinkat(place.parent.number(), place.leaf.c_str(), AT_REMOVEDIR) == 0;
 }

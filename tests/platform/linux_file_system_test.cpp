@@ -51,7 +51,7 @@ class LinuxFiles : public testing::Test {
 
 TEST_F(LinuxFiles, AreReadThroughALink) {
   scratch.put("file", "text");
-  const Path link = plantLink("link", scratch / "file");
+  const Path link = plantLink("link", "file");
   EXPECT_EQ(files->kindOf(link), FileKind::file);
   EXPECT_EQ(files->read(link, anySize).value(), (Bytes{'t', 'e', 'x', 't'}));
 }
@@ -258,6 +258,7 @@ TEST_F(LinuxFiles, LeaveNoDescriptorOpen) {
   static_cast<void>(files->replace(scratch / "copy", someBytes));
   static_cast<void>(files->rename(scratch / "copy", scratch / "moved"));
   static_cast<void>(files->createDirectories(scratch / "x/y/z", 0700));
+  static_cast<void>(files->remove(scratch / "x/y/z"));
   static_cast<void>(files->remove(scratch / "tree"));
   static_cast<void>(files->read(scratch.path(), anySize));
   EXPECT_EQ(openDescriptors(), before);

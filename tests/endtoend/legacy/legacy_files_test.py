@@ -77,16 +77,17 @@ class LegacyFilesTest(LegacyCase):
 
     def test_link_in_a_files_place_is_followed_to_read_and_not_to_delete(self):
         device = self.device()
-        target = self.scratch / "elsewhere.plist"
-        target.write_bytes(plistlib.dumps(mail_file([incoming("M1")])))
-        device.path(LEGACY_MAIL).symlink_to(target)
+        target = HOME + "/elsewhere.plist"
+        device.write(target, plistlib.dumps(mail_file([incoming("M1")])))
+        device.path(LEGACY_MAIL).symlink_to("/" + target)
         self.assert_migrated(
             device,
             device.migrate(HOST),
             accounts=[STANDING, mail_record("M1")],
             log=[decision(1, 0, 0), REPLACING, REPLACING, *save_of("LDAP", "Mail")],
+            files=(SETTINGS, SETTINGS_COPY, target),
         )
-        self.assertTrue(target.exists())
+        self.assertTrue(device.path(target).exists())
 
     def test_file_in_readable_form_is_as_good_as_a_binary_one(self):
         device = self.device(mail=plistlib.dumps(mail_file([incoming("M1")]), fmt=plistlib.FMT_XML))
