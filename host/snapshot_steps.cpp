@@ -15,14 +15,15 @@ using snapshots::Missing;
 
 snapshots::UndoPlace placeFor(const SnapshotOptions& options) {
   return {.services = platform::current(),
-          .keeper = platform::makeFileKeeper(),
+          .keeper = platform::makeFileKeeper(*platform::current().directories),
           .directory = *options.directory,
           .release = HOST_VERSION,
           .warn = [](const std::string& line) { say(line); }};
 }
 
 void list(const SnapshotOptions& options) {
-  const snapshots::Storage storage{platform::current().files, platform::makeFileKeeper()};
+  const snapshots::Storage storage{platform::current().files,
+                                   platform::makeFileKeeper(*platform::current().directories)};
   const std::string text = options.listing == Listing::json ? listingAsJson(storage, *options.directory)
                                                             : listingForPeople(storage, *options.directory);
   std::fputs(text.c_str(), stdout);

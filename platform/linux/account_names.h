@@ -14,7 +14,8 @@ namespace platform {
 // elsewhere by that tree's own etc/passwd and etc/group.
 class AccountNames {
  public:
-  explicit AccountNames(std::filesystem::path systemRoot) : _root{std::move(systemRoot)}, _paths{_root} {}
+  explicit AccountNames(std::filesystem::path systemRoot)
+      : _root{std::move(systemRoot)}, _paths{FileTrees{.systemRoot = _root}} {}
 
   [[nodiscard]] std::optional<uid_t> user(const std::string& name) const;
   [[nodiscard]] std::optional<gid_t> group(const std::string& name) const;

@@ -8,7 +8,7 @@
 #include <cerrno>
 #include <memory>
 
-#include "platform/linux/file_access.h"
+#include "platform/linux/path_resolution.h"
 
 namespace platform {
 namespace {
@@ -28,14 +28,6 @@ FileAttributes attributesFrom(const struct stat& status) {
           .permissions = status.st_mode & kAllPermissions,
           .modifiedSeconds = status.st_mtim.tv_sec,
           .modifiedNanoseconds = status.st_mtim.tv_nsec};
-}
-
-template <typename Action>
-Status at(const Path& path, const char* verb, const Action& action) {
-  const Place place = openParent(path);
-  if (place.parent.isOpen() && action(place)) return {};
-  const int cause = errno;
-  return Status::failure(cause, std::string{verb} + " " + path.string());
 }
 
 bool appendToFile(const Place& place, std::span<const std::uint8_t> bytes) {
@@ -115,6 +107,8 @@ bool readEntries(const Place& place, std::vector<std::string>& names) {
 
 class LinuxFileKeeper final : public FileKeeper {
  public:
+  explicit LinuxFileKeeper(const FileTrees& trees) : _paths{trees} {}
+
   Result<FileAttributes> attributesOf(const Path& path) override {
     struct stat status {};
     Status outcome = at(path, "look at", [&](const Place& place) {
@@ -144,10 +138,23 @@ class LinuxFileKeeper final : public FileKeeper {
     Status removed = at(path, "remove", &removeAndSync);
     return removed.errorNumber() == ENOENT ? Status{} : removed;
   }
+
+ private:
+  template <typename Action>
+  Status at(const Path& path, const char* verb, const Action& action) {
+    const Place place = _paths.openParent(path);
+    if (place.parent.isOpen() && action(place)) return {};
+    const int cause = errno;
+    return Status::failure(cause, std::string{verb} + " " + path.string());
+  }
+
+  PathResolver _paths;
 };
 
 }  // namespace
 
-std::shared_ptr<FileKeeper> makeFileKeeper() { return std::make_shared<LinuxFileKeeper>(); }
+std::shared_ptr<FileKeeper> makeFileKeeper(const BaseDirectories& directories) {
+  return std::make_shared<LinuxFileKeeper>(treesOf(directories));
+}
 
 }  // namespace platform

@@ -2,11 +2,13 @@
 
 #include <memory>
 
+#include "platform/base_directories.h"
 #include "platform/export.h"
 #include "platform/file_keeper.h"
 
 namespace platform {
 
-[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<FileKeeper> makeFileKeeper();
+// For the files of the device that has these directories, and others.
+[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<FileKeeper> makeFileKeeper(const BaseDirectories& directories);
 
 }  // namespace platform

@@ -63,8 +63,7 @@ bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
 
 class LinuxFileSystem final : public FileSystem {
  public:
-  explicit LinuxFileSystem(const FileTrees& trees)
-      : _accounts{trees.systemRoot}, _paths{trees.systemRoot, trees.ofDevice, trees.ofMachine} {}
+  explicit LinuxFileSystem(const FileTrees& trees) : _accounts{trees.systemRoot}, _paths{trees} {}
 
   [[nodiscard]] std::optional<FileKind> kindOf(const Path& path) override {
     Place place = _paths.openParentOfTarget(path);

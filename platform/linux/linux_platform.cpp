@@ -16,16 +16,6 @@
 #include "platform/linux/linux_unique_identifiers.h"
 
 namespace platform {
-namespace {
-
-FileTrees treesOf(const BaseDirectories& directories) {
-  return {.systemRoot = directories.systemRoot(),
-          .ofDevice = {directories.home(), directories.sharedResources()},
-          .ofMachine = {directories.resources()}};
-}
-
-}  // namespace
-
 Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   Platform services;
   services.directories = makeBaseDirectories(options);

@@ -63,12 +63,13 @@ bool isLink(const Place& place) {
 
 }  // namespace
 
-PathResolver::PathResolver(const path& root, const std::vector<path>& ofDevice, const std::vector<path>& ofMachine) {
+PathResolver::PathResolver(const FileTrees& trees) {
+  const path& root = trees.systemRoot;
   _bases.push_back({root, root});
-  for (const path& directory : ofDevice) {
+  for (const path& directory : trees.ofDevice) {
     if (!isBelow(directory, root)) _bases.push_back({directory, root});
   }
-  for (const path& directory : ofMachine) _bases.push_back({directory, "/"});
+  for (const path& directory : trees.ofMachine) _bases.push_back({directory, "/"});
   _bases.push_back({"/", "/"});
   const auto isLonger = [](const WalkBase& one, const WalkBase& other) {
     return one.path.native().size() > other.path.native().size();

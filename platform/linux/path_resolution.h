@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "platform/linux/file_access.h"
+#include "platform/linux/file_trees.h"
 #include "platform/linux/path_walk.h"
 
 namespace platform {
@@ -24,11 +25,7 @@ namespace platform {
 // root.
 class PathResolver {
  public:
-  PathResolver() : PathResolver{"/"} {}
-  // The device's root, directories of the device that may lie elsewhere, and directories of the machine that it runs
-  // on.
-  explicit PathResolver(const std::filesystem::path& root, const std::vector<std::filesystem::path>& ofDevice = {},
-                        const std::vector<std::filesystem::path>& ofMachine = {});
+  explicit PathResolver(const FileTrees& trees = {});
 
   // The path's place, its parent directory opened; what stands at the path itself is not looked at.
   [[nodiscard]] Place openParent(const std::filesystem::path& path) const;

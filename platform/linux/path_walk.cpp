@@ -17,7 +17,6 @@ bool fail(int cause) {
   return false;
 }
 
-
 bool isOurs(uid_t owner) { return owner == 0 || owner == ::geteuid(); }
 
 bool isClosedToOthers(const struct stat& directory) {
