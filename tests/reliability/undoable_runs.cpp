@@ -59,12 +59,13 @@ Child childOn(const std::filesystem::path& root, const Mishap& mishap) {
   services.systemLog = log;
   services.console = std::make_shared<FakeConsoleLog>(unheard());
   ::setenv("TMPDIR", (root / "var/mobile/tmp").c_str(), 1);
-  return {.files = files,
-          .place = {.services = services,
-                    .keeper = std::make_shared<MishapFileKeeper>(platform::makeFileKeeper(), files),
-                    .directory = root / "snapshots",
-                    .release = "1",
-                    .warn = [](const std::string&) {}}};
+  return {
+      .files = files,
+      .place = {.services = services,
+                .keeper = std::make_shared<MishapFileKeeper>(platform::makeFileKeeper(*services.directories), files),
+                .directory = root / "snapshots",
+                .release = "1",
+                .warn = [](const std::string&) {}}};
 }
 
 bool migrate(Child& child) {
