@@ -33,8 +33,9 @@ struct KeeperOfTheTests {
 struct KeeperOfTheDevice {
   ScratchDirectory scratch;
   Path base = scratch.path();
-  std::shared_ptr<platform::FileSystem> fileSystem = platform::makeLinuxPlatform({.systemRoot = base}).files;
-  std::shared_ptr<platform::FileKeeper> keeper = platform::makeFileKeeper();
+  platform::Platform device = platform::makeLinuxPlatform({.systemRoot = base});
+  std::shared_ptr<platform::FileSystem> fileSystem = device.files;
+  std::shared_ptr<platform::FileKeeper> keeper = platform::makeFileKeeper(*device.directories);
 
   platform::FileSystem& files() { return *fileSystem; }
   platform::FileKeeper& service() { return *keeper; }
@@ -127,7 +128,7 @@ TEST(LinuxFileKeeper, FollowsNoLinkAtAPathItself) {
   const ScratchDirectory scratch;
   scratch.put("target", "precious");
   std::filesystem::create_symlink(scratch / "target", scratch / "link");
-  const auto keeper = platform::makeFileKeeper();
+  const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
   EXPECT_EQ(keeper->attributesOf(scratch / "link").value().kind, FileKind::other);
   EXPECT_EQ(keeper->append(scratch / "link", bytes("x")).errorNumber(), ELOOP);
   EXPECT_TRUE(keeper->restore(scratch / "link", bytes("new"), {.owner = ::geteuid(), .group = ::getegid()}).isOk());
@@ -138,7 +139,7 @@ TEST(LinuxFileKeeper, FollowsNoLinkAtAPathItself) {
 TEST(LinuxFileKeeper, PutsAwayWhatADeadRestoreLeft) {
   const ScratchDirectory scratch;
   scratch.put(".restoring-file", "half a fi");
-  const auto keeper = platform::makeFileKeeper();
+  const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
   ASSERT_TRUE(keeper->restore(scratch / "file", bytes("file"), {.owner = ::geteuid(), .group = ::getegid()}).isOk());
   EXPECT_EQ(keeper->entriesOf(scratch.path()).value(), std::vector<std::string>{"file"});
 }
