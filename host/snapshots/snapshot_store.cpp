@@ -47,8 +47,9 @@ void SnapshotStore::removeIfThere(const Path& path) const {
 }
 
 void SnapshotStore::sweep() const {
-  removeIfThere(_directory / kBeingMade);
-  removeIfThere(_directory / kBeingRemoved);
+  for (const std::string& name : required(_storage.keeper->entriesOf(_directory))) {
+    if (name.starts_with('.')) removeIfThere(_directory / name);
+  }
 }
 
 std::vector<std::string> SnapshotStore::identifiers() const {

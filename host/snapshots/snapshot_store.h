@@ -12,7 +12,7 @@ class SnapshotStore {
  public:
   SnapshotStore(Storage storage, Path directory) : _storage{std::move(storage)}, _directory{std::move(directory)} {}
 
-  // Removes what a dead host left half made or half removed.
+  // Removes what a dead host left half made or half removed: everything that is named with a dot in front.
   void sweep() const;
 
   // The identifiers of the snapshots, oldest first.

@@ -109,13 +109,19 @@ TEST_P(RunsDyingAgain, AreFinishedByTheNextLikeUndisturbedOnes) {
   print("dying again while recovering", whole.operations, 3 * points);
 }
 
-class DyingRestores : public Undo {};
+class DyingRestores : public Undo {
+ protected:
+  // The operations of a restore after one run.
+  [[nodiscard]] int operationsOfARestore() const {
+    ScratchDevice counted;
+    prepare(counted, version, legacy);
+    EXPECT_TRUE(runUndoable(counted).succeeded);
+    return restoreFirst(counted).operations;
+  }
+};
 
 TEST_P(DyingRestores, AreFinishedByTheNextExactly) {
-  ScratchDevice counted;
-  prepare(counted, version, legacy);
-  ASSERT_TRUE(runUndoable(counted).succeeded);
-  const int operations = restoreFirst(counted).operations;
+  const int operations = operationsOfARestore();
   for (const Mishap::Kind death : kDeaths) {
     for (int operation = 1; operation <= operations; operation += stride) {
       ScratchDevice device;
@@ -137,7 +143,7 @@ TEST_P(DyingRestores, AreFinishedByTheNextExactly) {
 
 // What a restore that died left, a run takes up: the device is migrated from where the restore, or nothing, brought it.
 TEST_P(DyingRestores, AreFinishedByTheNextRun) {
-  const int operations = restoreFirst(undisturbed).operations;
+  const int operations = operationsOfARestore();
   for (int operation = 1; operation <= operations; operation += stride) {
     ScratchDevice device;
     prepare(device, version, legacy);
