@@ -52,17 +52,27 @@ Status giveToOwner(FileSystem& files, const Path& path) {
   return status;
 }
 
-// The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails, no
-// temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
+Status moveOntoSettingsFile(FileSystem& files, const Path& temporary) {
+  Status status = giveToOwner(files, temporary);
+  if (status.isOk()) status = files.rename(temporary, AccountsManager::fullPathToAccountSettingsPlist());
+  return status;
+}
+
+// The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails or is
+// thrown, no temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
 Status replaceSettingsFile(const std::optional<Bytes>& data) {
   FileSystem& files = *platform::current().files;
-  const Path destination = AccountsManager::fullPathToAccountSettingsPlist();
   const std::optional<Path> temporary = files.temporaryName();
   if (!temporary) return Status::failure(EEXIST, "find a name for a temporary file");
   if (!data) return Status::failure(EINVAL, "serialize the accounts");
   if (Status made = files.create(*temporary, *data); !made.isOk()) return made;
-  Status status = giveToOwner(files, *temporary);
-  if (status.isOk()) status = files.rename(*temporary, destination);
+  Status status;
+  try {
+    status = moveOntoSettingsFile(files, *temporary);
+  } catch (...) {
+    std::ignore = files.remove(*temporary);
+    throw;
+  }
   if (!status.isOk()) std::ignore = files.remove(*temporary);
   return status;
 }

@@ -195,7 +195,7 @@ void FuzzedDevice::putFiles() {
   hasSentinel = (has & 0x38U) == 0x38U;
   hasFaults = (has & 0xC0U) == 0xC0U;
   systemLog->readers = (has & 0x40U) != 0;
-  version = static_cast<std::int64_t>(_input.below(15)) - 1;
+  const std::int64_t version = static_cast<std::int64_t>(_input.below(15)) - 1;
   const std::size_t isOdd = _input.below(8);
   Dictionary contents;
   if (version >= 0) contents.set("Version", isOdd == 7 ? anything(1) : PropertyValue{version});

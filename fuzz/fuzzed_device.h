@@ -26,7 +26,6 @@ class FuzzedDevice : public tests::MigrationDevice {
   bool hasLegacyMail = false;
   bool hasLegacyExchange = false;
   bool hasFaults = false;
-  std::int64_t version = 0;
 
  private:
   tests::PropertyValue anything(int depth);

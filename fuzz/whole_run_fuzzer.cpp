@@ -48,10 +48,10 @@ bool hasText(const Dictionary& account, std::string_view key, std::initializer_l
 // What a run may take out of a settings file whose identifiers all differ, by the rule that takes it.
 class Losses {
  public:
-  explicit Losses(const FuzzedDevice& device)
-      : _version{device.version}, _hasMail{device.hasLegacyMail}, _hasExchange{device.hasLegacyExchange} {
+  explicit Losses(const FuzzedDevice& device) : _hasMail{device.hasLegacyMail}, _hasExchange{device.hasLegacyExchange} {
     AccountsManager::_setShouldSkipNotifications(true);
     const auto store = AccountsManager::initInsideOfMigration();
+    _version = store->dataVersion();
     for (const auto& account : store->allBasicAccounts()) loadUp(*account, *store);
   }
 
@@ -78,7 +78,7 @@ class Losses {
     if (std::ranges::any_of(store.allBasicAccounts(), isUmbrella)) _partners.insert(marker);
   }
 
-  std::int64_t _version;
+  std::uint64_t _version = 0;
   bool _hasMail;
   bool _hasExchange;
   std::set<std::int64_t> _loaded;

@@ -1,5 +1,5 @@
-// A run that dies before or after any of its file operations. Whatever it left, the settings file is the old one or a
-// complete new one, no account is gone, and the next run finishes.
+// A run that dies before, within or after any of its file operations. Whatever it left, the settings file is the old
+// one or a complete new one, no account is gone, and the next run finishes.
 #include <gtest/gtest.h>
 
 #include <iostream>
@@ -22,6 +22,9 @@ struct Legacy {
 
 constexpr Legacy kLegacyForms[] = {
     {"none", false, false}, {"mail", true, false}, {"exchange", false, true}, {"both", true, true}};
+
+const std::pair<Mishap::Kind, std::string> kDeaths[] = {
+    {Mishap::Kind::diesBefore, "before "}, {Mishap::Kind::diesWithin, "within "}, {Mishap::Kind::diesAfter, "after "}};
 
 struct Numbers {
   int runs = 0;
@@ -70,10 +73,10 @@ TEST_P(DyingRuns, LoseNoAccountAndAreFinishedByTheNextRun) {
   ASSERT_TRUE(whole.succeeded);
   const Survivors survivors = survivorsOf(untouched);
   Numbers numbers;
-  for (const Mishap::Kind kind : {Mishap::Kind::diesBefore, Mishap::Kind::diesAfter}) {
+  for (const auto& [kind, place] : kDeaths) {
     for (int operation = 1; operation <= whole.operations; ++operation) {
-      const std::string when = (kind == Mishap::Kind::diesBefore ? "before operation " : "after operation ") +
-                               std::to_string(operation) + " of " + std::to_string(whole.operations);
+      const std::string when =
+          place + std::to_string(operation) + " of " + std::to_string(whole.operations) + " operations";
       ScratchDevice device;
       prepare(device, version, legacy);
       ASSERT_TRUE(device.run({kind, operation}).died) << when;

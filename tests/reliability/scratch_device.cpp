@@ -1,5 +1,7 @@
 #include "tests/reliability/scratch_device.h"
 
+#include <fcntl.h>
+#include <sys/file.h>
 #include <sys/mman.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -13,6 +15,7 @@
 #include "migrator/accounts_data_migrator.h"
 #include "platform/linux/libplist_property_list_store.h"
 #include "platform/linux/linux_platform.h"
+#include "tests/reliability/scarce_memory.h"
 
 namespace tests {
 namespace {
@@ -23,19 +26,44 @@ using platform::PropertyValue;
 using platform::Text;
 
 constexpr int kDied = 99;
+constexpr int kHeldLock = 98;
+constexpr const char* kReport = "outputs";
+constexpr const char* kFailed = "failed-operation";
 constexpr const char* kSettings = "var/mobile/Library/Preferences/com.vorlix.accountsettings.plist";
 constexpr const char* kLegacyExchange = "var/mobile/Library/Preferences/com.vorlix.DataAccess.plist";
 constexpr const char* kLegacyMail = "var/mobile/Library/Mail/Accounts.plist";
 constexpr const char* kMarker = "Marker";
 
-class SilentSystemLog final : public platform::SystemLog {
+// What a run says goes into a file beside the device's own, since the run may die of it.
+class Report {
  public:
-  [[nodiscard]] bool hasReaders() const override { return false; }
-  void write(const platform::LogRecord&) override {}
+  explicit Report(const std::filesystem::path& path)
+      : _file{::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0600)} {}
+  void line(std::string_view text) const {
+    static_cast<void>(::write(_file, text.data(), text.size()));
+    static_cast<void>(::write(_file, "\n", 1));
+  }
+
+ private:
+  int _file;
 };
-class SilentConsole final : public platform::ConsoleLog {
+
+class ReportedSystemLog final : public platform::SystemLog {
  public:
-  void write(std::string_view) override {}
+  explicit ReportedSystemLog(Report report) : _report{report} {}
+  [[nodiscard]] bool hasReaders() const override { return true; }
+  void write(const platform::LogRecord& record) override { _report.line(record.text()); }
+
+ private:
+  Report _report;
+};
+class ReportedConsole final : public platform::ConsoleLog {
+ public:
+  explicit ReportedConsole(Report report) : _report{report} {}
+  void write(std::string_view message) override { _report.line(message); }
+
+ private:
+  Report _report;
 };
 
 platform::LinuxPlatformOptions optionsFor(const std::filesystem::path& root) {
@@ -47,27 +75,49 @@ platform::LinuxPlatformOptions optionsFor(const std::filesystem::path& root) {
 }
 
 // Shared between the run and who waits for it.
-int* sharedCounter() {
-  void* const memory = ::mmap(nullptr, sizeof(int), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
+struct Counts {
+  int operations;
+  std::size_t allocations;
+};
+Counts* sharedCounts() {
+  void* const memory = ::mmap(nullptr, sizeof(Counts), PROT_READ | PROT_WRITE, MAP_SHARED | MAP_ANONYMOUS, -1, 0);
   if (memory == MAP_FAILED) throw std::runtime_error{"no shared memory"};
-  return static_cast<int*>(memory);
+  return static_cast<Counts*>(memory);
 }
 
-[[noreturn]] void runMigrator(const std::filesystem::path& root, const Mishap& mishap, int& operations) {
+bool isLockHeld(const std::filesystem::path& root) {
+  const int file = ::open((root / "lock/AccountMigrationInProgress").c_str(), O_RDONLY | O_CLOEXEC);
+  return file >= 0 && ::flock(file, LOCK_EX | LOCK_NB) != 0;
+}
+
+[[noreturn]] void runMigrator(const std::filesystem::path& root, const Mishap& mishap, std::size_t failingAllocation,
+                              Counts& counts) {
   platform::Platform services = platform::makeLinuxPlatform(optionsFor(root));
-  const auto files = std::make_shared<MishapFileSystem>(services.files, mishap, [&operations, &mishap] {
-    operations = mishap.operation;
+  const auto files = std::make_shared<MishapFileSystem>(services.files, mishap, [&counts, &mishap] {
+    counts.operations = mishap.operation;
     ::_exit(kDied);
   });
+  const Report report{root / kReport};
   services.files = files;
   services.propertyLists = platform::makeLibplistPropertyListStore(files);
-  services.systemLog = std::make_shared<SilentSystemLog>();
-  services.console = std::make_shared<SilentConsole>();
+  services.systemLog = std::make_shared<ReportedSystemLog>(report);
+  services.console = std::make_shared<ReportedConsole>(report);
   platform::setCurrent(std::move(services));
   ::setenv("TMPDIR", (root / "var/mobile/tmp").c_str(), 1);
+  beginScarcity(failingAllocation);
   const bool succeeded = migrator::AccountsDataMigrator{}.performMigration();
-  operations = files->operations();
-  ::_exit(succeeded ? 0 : 1);
+  counts.allocations = endScarcity();
+  counts.operations = files->operations();
+  if (!files->mishapAt().empty()) Report{root / kFailed}.line(files->mishapAt());
+  ::_exit(isLockHeld(root) ? kHeldLock : succeeded ? 0 : 1);
+}
+
+std::vector<std::string> takeLines(const std::filesystem::path& path) {
+  std::vector<std::string> lines;
+  std::ifstream file{path};
+  for (std::string line; std::getline(file, line);) lines.push_back(line);
+  ::unlink(path.c_str());
+  return lines;
 }
 
 void countMarkers(const PropertyValue& value, std::map<std::string, int>& counts) {
@@ -163,19 +213,24 @@ void ScratchDevice::putLegacyExchange() {
   write(kLegacyExchange, {{"DAAccountsKey", accounts}});
 }
 
-RunOutcome ScratchDevice::run(const Mishap& mishap) const {
-  int* const operations = sharedCounter();
+RunOutcome ScratchDevice::run(const Mishap& mishap, std::size_t failingAllocation) const {
+  Counts* const counts = sharedCounts();
   const pid_t child = ::fork();
-  if (child == 0) runMigrator(_root, mishap, *operations);
+  if (child == 0) runMigrator(_root, mishap, failingAllocation, *counts);
   int status = 0;
   ::waitpid(child, &status, 0);
   RunOutcome outcome;
-  outcome.operations = *operations;
-  ::munmap(operations, sizeof(int));
+  outcome.operations = counts->operations;
+  outcome.allocations = counts->allocations;
+  ::munmap(counts, sizeof(Counts));
   const int code = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
   outcome.died = code == kDied;
   outcome.succeeded = code == 0;
-  outcome.crashed = code != kDied && code != 0 && code != 1;
+  outcome.heldLock = code == kHeldLock;
+  outcome.crashed = code != kDied && code != kHeldLock && code != 0 && code != 1;
+  outcome.outputs = takeLines(_root / kReport);
+  const std::vector<std::string> failed = takeLines(_root / kFailed);
+  if (!failed.empty()) outcome.failedOperation = failed.front();
   return outcome;
 }
 

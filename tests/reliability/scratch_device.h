@@ -16,7 +16,11 @@ struct RunOutcome {
   bool died = false;       // of the mishap
   bool crashed = false;    // of anything else
   bool succeeded = false;  // performMigration answered true
+  bool heldLock = false;   // the migration lock was not given back
   int operations = 0;      // file operations that were begun
+  std::size_t allocations = 0;
+  std::string failedOperation;       // the one that a mishap made fail: "rename /a/path"; the first of them
+  std::vector<std::string> outputs;  // console lines and log messages
 };
 
 // A device in a scratch directory of its own, which goes with it. Every account that is put on it carries a "Marker",
@@ -34,8 +38,9 @@ class ScratchDevice {
   void putLegacyMail();
   void putLegacyExchange();
 
-  // Runs the real migrator over the real services in a child process, with one mishap.
-  RunOutcome run(const Mishap& mishap = {}) const;
+  // Runs the real migrator over the real services in a child process, with one mishap, and with one allocation that
+  // fails, counted from 1.
+  [[nodiscard]] RunOutcome run(const Mishap& mishap = {}, std::size_t failingAllocation = 0) const;
 
   // How often each marker stands in the settings file, and which stand in the legacy files that are there.
   [[nodiscard]] std::map<std::string, int> markersInSettings() const;

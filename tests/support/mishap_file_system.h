@@ -3,6 +3,8 @@
 #include <cerrno>
 #include <functional>
 #include <memory>
+#include <string>
+#include <string_view>
 
 #include "platform/file_system.h"
 
@@ -10,7 +12,8 @@ namespace tests {
 
 // What happens at one operation of a run, counted from 1.
 struct Mishap {
-  enum class Kind { none, failsOnce, failsFromThenOn, diesBefore, diesAfter };
+  // Dying within an operation leaves what it may leave half made: a file with half of its bytes.
+  enum class Kind { none, failsOnce, failsFromThenOn, diesBefore, diesWithin, diesAfter };
   Kind kind = Kind::none;
   int operation = 0;
   int errorNumber = EIO;
@@ -24,6 +27,8 @@ class MishapFileSystem final : public platform::FileSystem {
       : _inner{std::move(inner)}, _mishap{mishap}, _die{std::move(die)} {}
 
   [[nodiscard]] int operations() const { return _operations; }
+  // What the mishap made fail, or died in, first: "rename /a/path".
+  [[nodiscard]] const std::string& mishapAt() const { return _mishapAt; }
 
   // For who forwards operations that are none of a file system's: runs one, counted with the others, unless the mishap
   // takes its place; `failed` is what it answers then.
@@ -53,16 +58,23 @@ class MishapFileSystem final : public platform::FileSystem {
   platform::Status rename(const platform::Path& from, const platform::Path& to) override;
 
  private:
-  // Runs one operation, unless the mishap takes its place; `failed` is what it answers then.
-  template <typename Operation, typename Failed>
-  auto run(const Operation& operation, const Failed& failed) -> decltype(operation());
-  template <typename Operation>
-  auto change(const Operation& operation, const platform::Path& path) -> decltype(operation());
+  static constexpr auto kNothing = [] {};
+
+  // Runs one operation, unless the mishap takes its place; `failed` is what it answers then, `halfDone` what a death
+  // within it leaves.
+  template <typename Operation, typename Failed, typename HalfDone = decltype(kNothing)>
+  auto run(std::string_view verb, const platform::Path& path, const Operation& operation, const Failed& failed,
+           const HalfDone& halfDone = kNothing) -> decltype(operation());
+  template <typename Operation, typename HalfDone = decltype(kNothing)>
+  auto change(std::string_view verb, const platform::Path& path, const Operation& operation,
+              const HalfDone& halfDone = kNothing) -> decltype(operation());
+  [[nodiscard]] bool isHit() const;
 
   std::shared_ptr<platform::FileSystem> _inner;
   Mishap _mishap;
   std::function<void()> _die;
   int _operations = 0;
+  std::string _mishapAt;
 };
 
 }  // namespace tests
