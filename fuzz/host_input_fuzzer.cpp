@@ -20,12 +20,29 @@ using fuzz::Input;
 using fuzz::require;
 using Json = nlohmann::json;
 
-constexpr std::string_view kWords[] = {"--root",      "--home",    "--shared-resources",
-                                       "--resources", "--plugin",  "--trace",
-                                       "--help",      "--version", "--",
-                                       "-",           "=",         "--root=",
-                                       "/",           "here",      "--trace=x",
-                                       "--home=/",    "",          "/nowhere"};
+constexpr std::string_view kWords[] = {"--root",
+                                       "--home",
+                                       "--shared-resources",
+                                       "--resources",
+                                       "--plugin",
+                                       "--trace",
+                                       "--help",
+                                       "--version",
+                                       "--",
+                                       "-",
+                                       "=",
+                                       "--root=",
+                                       "/",
+                                       "here",
+                                       "--trace=x",
+                                       "--snapshots",
+                                       "--keep",
+                                       "3",
+                                       "--list-snapshots",
+                                       "--restore",
+                                       "--home=/",
+                                       "",
+                                       "/nowhere"};
 
 std::variant<host::Options, host::Answer> parsed(const std::vector<std::string>& arguments) {
   std::vector<const char*> pointers;
@@ -41,7 +58,8 @@ std::vector<std::pair<std::string, Place>> placesOf(const host::Options& options
           {"--shared-resources", options.device.sharedResources},
           {"--resources", options.device.resources},
           {"--plugin", options.plugin},
-          {"--trace", options.trace}};
+          {"--trace", options.trace},
+          {"--snapshots", options.snapshots.directory}};
 }
 
 void checkOptions(const std::vector<std::string>& arguments) {

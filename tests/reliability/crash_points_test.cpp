@@ -18,6 +18,7 @@ struct Legacy {
   const char* name;
   bool mail;
   bool exchange;
+  friend void PrintTo(const Legacy& given, std::ostream* stream) { *stream << given.name; }
 };
 
 constexpr Legacy kLegacyForms[] = {

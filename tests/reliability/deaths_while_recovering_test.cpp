@@ -20,6 +20,7 @@ struct Case {
   int version;
   bool hasMail;
   bool hasExchange;
+  friend void PrintTo(const Case& given, std::ostream* stream) { *stream << given.name; }
 };
 
 void prepare(ScratchDevice& device, const Case& given) {
@@ -28,10 +29,10 @@ void prepare(ScratchDevice& device, const Case& given) {
   if (given.hasExchange) device.putLegacyExchange();
 }
 
-// Every pair of deaths, or as many of them, evenly spread, as the environment asks for.
+// Some thousand pairs of deaths, or as many of them, evenly spread, as the environment asks for.
 std::size_t strideOver(std::size_t pairs) {
-  const char* const asked = std::getenv("RECOVERY_SAMPLES");
-  const std::size_t samples = asked == nullptr ? pairs : std::strtoul(asked, nullptr, 10);
+  const char* const asked = std::getenv("FAILURE_SAMPLES");
+  const std::size_t samples = asked == nullptr ? 3000 : std::strtoul(asked, nullptr, 10);
   return std::max<std::size_t>(1, pairs / std::max<std::size_t>(1, samples));
 }
 

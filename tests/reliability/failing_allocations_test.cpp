@@ -17,6 +17,7 @@ struct Case {
   const char* name;
   int version;
   bool hasLegacy;
+  friend void PrintTo(const Case& given, std::ostream* stream) { *stream << given.name; }
 };
 
 void prepare(ScratchDevice& device, const Case& given) {
@@ -27,7 +28,7 @@ void prepare(ScratchDevice& device, const Case& given) {
 
 // Every allocation, or as many of them, evenly spread, as the environment asks for.
 std::size_t strideOver(std::size_t allocations) {
-  const char* const asked = std::getenv("ALLOCATION_SAMPLES");
+  const char* const asked = std::getenv("FAILURE_SAMPLES");
   const std::size_t samples = asked == nullptr ? allocations : std::strtoul(asked, nullptr, 10);
   return std::max<std::size_t>(1, allocations / std::max<std::size_t>(1, samples));
 }

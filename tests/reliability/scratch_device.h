@@ -40,7 +40,7 @@ class ScratchDevice {
 
   // Runs the real migrator over the real services in a child process, with one mishap, and with one allocation that
   // fails, counted from 1.
-  [[nodiscard]] RunOutcome run(const Mishap& mishap = {}, std::size_t failingAllocation = 0) const;
+  RunOutcome run(const Mishap& mishap = {}, std::size_t failingAllocation = 0) const;
 
   // How often each marker stands in the settings file, and which stand in the legacy files that are there.
   [[nodiscard]] std::map<std::string, int> markersInSettings() const;
