@@ -9,12 +9,13 @@
 namespace platform {
 namespace {
 
-// Names of keys that carry credentials, in lower case and without blanks, hyphens and underscores. "key" alone is not
-// among them: many harmless settings are called so ("Login_Key", "CalDAV_Server_Key").
-constexpr std::array<std::string_view, 17> kCredentialWords{
-    "password",      "passwd",     "passphrase", "passcode",      "token",      "secret",
-    "cookie",        "credential", "privatekey", "signingkey",    "sessionkey", "apikey",
-    "encryptionkey", "accesskey",  "sharedkey",  "authorization", "pincode"};
+// Words in names of keys that carry credentials, in lower case and without blanks, hyphens and underscores.
+constexpr std::array<std::string_view, 11> kCredentialWords{"password", "passwd",  "passphrase",   "passcode",
+                                                            "token",    "secret",  "cookie",       "credential",
+                                                            "key",      "pincode", "authorization"};
+
+// Harmless settings that are called keys by an old custom of calendars. What else is called a key is taken for one.
+constexpr std::array<std::string_view, 3> kPlainKeys{"loginkey", "caldavserverkey", "caldavprincipalpathkey"};
 
 constexpr std::string_view kHidden = "<hidden>";
 
@@ -134,6 +135,7 @@ PropertyValue presentableDictionary(const Dictionary& dictionary) {
 
 bool namesCredential(std::string_view key) {
   const std::string folded = foldedKey(key);
+  if (std::ranges::find(kPlainKeys, folded) != kPlainKeys.end()) return false;
   return std::ranges::any_of(kCredentialWords,
                              [&folded](std::string_view word) { return folded.find(word) != std::string::npos; });
 }

@@ -24,7 +24,8 @@ namespace platform {
 [[nodiscard]] ACCOUNT_EXPORT PropertyValue presentable(std::string_view key, const PropertyValue& value);
 
 // Whether a key's value is a credential: the key contains, in any letter case, one of the words that name passwords,
-// tokens, secrets, cookies, keys for signing or encrypting, and the like (the list stands in description.cpp).
+// tokens, secrets, cookies, keys, and the like (the list, and what is called a key and is none, stands in
+// description.cpp).
 [[nodiscard]] ACCOUNT_EXPORT bool namesCredential(std::string_view key);
 
 }  // namespace platform

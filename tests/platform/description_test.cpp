@@ -53,10 +53,11 @@ TEST(Descriptions, HideCredentials) {
 
 TEST(Descriptions, TakeAKeyForACredentialByTheWordsInIt) {
   for (const char* const key : {"password", "PASSWORD", "IMAP Password", "pass-code", "Auth_Token", "clientSecret",
-                                "private key", "APIKey", "Cookies", "PinCode"}) {
+                                "private key", "APIKey", "Cookies", "PinCode", "Master Key", "KeyMaterial"}) {
     EXPECT_TRUE(namesCredential(key)) << key;
   }
-  for (const char* const key : {"", "Username", "Login_Key", "CalDAV_Server_Key", "Hostname", "Pass", "Pin"}) {
+  for (const char* const key :
+       {"", "Username", "Login_Key", "CalDAV_Server_Key", "CalDAV_PrincipalPath_Key", "Hostname", "Pass", "Pin"}) {
     EXPECT_FALSE(namesCredential(key)) << key;
   }
 }
