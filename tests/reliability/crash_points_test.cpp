@@ -99,6 +99,30 @@ TEST_P(DyingRuns, LoseNoAccountAndAreFinishedByTheNextRun) {
   }
 }
 
+std::int64_t storedVersion(const ScratchDevice& device) {
+  const platform::Dictionary settings = device.comparableSettings().value_or(platform::Dictionary{});
+  const platform::PropertyValue* const version = settings.find("Version");
+  return version == nullptr ? 0 : version->integerValue().value_or(0);
+}
+
+// Each save of a chain says that the file is current, so nobody misses what the steps after it would have done.
+TEST(DyingChain, IsNotTakenUpAgainAfterItsFirstSave) {
+  ScratchDevice untouched;
+  untouched.putSettings(6);
+  const int operations = untouched.run().operations;
+  for (int operation = 1; operation <= operations; ++operation) {
+    ScratchDevice device;
+    device.putSettings(6);
+    ASSERT_TRUE(device.run({Mishap::Kind::diesAfter, operation}).died);
+    if (storedVersion(device) != 12) continue;
+    EXPECT_TRUE(device.run().succeeded);
+    EXPECT_NE(device.comparableSettings(), untouched.comparableSettings());
+    EXPECT_EQ(device.markersInSettings(), untouched.markersInSettings());
+    return;
+  }
+  FAIL() << "no save at all";
+}
+
 std::string nameOf(const testing::TestParamInfo<std::tuple<int, Legacy>>& info) {
   return "FromVersion" + std::to_string(std::get<0>(info.param)) + "WithLegacy_" + std::get<1>(info.param).name;
 }
