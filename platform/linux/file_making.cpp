@@ -6,7 +6,6 @@
 #include <array>
 #include <cerrno>
 #include <cstdio>
-#include <vector>
 
 namespace platform {
 namespace {
@@ -31,7 +30,7 @@ Descriptor makeSyncedFile(const Place& place, const Writer& write) {
 }
 
 bool copyBytes(int from, int to) {
-  std::vector<char> buffer(std::size_t{1} << 16);
+  std::array<char, std::size_t{1} << 16> buffer;  // no allocation: one that failed would leave half of a copy
   while (true) {
     const ssize_t count = readSome(from, buffer.data(), buffer.size());
     if (count <= 0) return count == 0;

@@ -83,10 +83,11 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status create(const Path& path, std::span<const std::uint8_t> bytes) override {
+    _made.makeRoomFor(path);
     return at(path, "create", [&](const Place& place) {
       Descriptor file = makeFileOf(place, bytes);
       const bool isMade = file.isOpen();
-      if (isMade) _made.remember(path, std::move(file));
+      isMade ? _made.remember(path, std::move(file)) : _made.forget(path);
       return isMade;
     });
   }

@@ -9,9 +9,11 @@ constexpr std::size_t mostKept = 16;
 
 void MadeThings::remember(const std::filesystem::path& path, Descriptor thing) {
   const std::scoped_lock lock{_guard};
-  if (_things.size() >= mostKept) _things.erase(_things.begin());
+  if (_things.size() >= mostKept && !_things.contains(path)) _things.erase(_things.begin());
   _things.insert_or_assign(path, std::move(thing));
 }
+
+void MadeThings::makeRoomFor(const std::filesystem::path& path) { remember(path, {}); }
 
 void MadeThings::forget(const std::filesystem::path& path) { static_cast<void>(take(path)); }
 

@@ -13,6 +13,8 @@ namespace platform {
 // asks for, some are kept open. For any number of threads.
 class MadeThings {
  public:
+  // Takes the memory to remember a thing, so that remembering it once it is made cannot fail.
+  void makeRoomFor(const std::filesystem::path& path);
   void remember(const std::filesystem::path& path, Descriptor thing);
   void forget(const std::filesystem::path& path);
   // What was made at the path and not asked for yet; not open where nothing was.
