@@ -27,6 +27,7 @@ std::uint64_t versionIn(const Dictionary& file) {
 }
 
 void logCalculated(const BasicAccount& account, const Dictionary& merged) {
+  if (!_ASLogSystem().hasReaders()) return;
   const std::function<std::string()> dataclasses = [&account]() -> std::string {
     const std::optional<BasicAccount::Dataclasses> enabled = account.enabledDataclasses();
     return enabled ? platform::description(Array(enabled->begin(), enabled->end())) : "(null)";

@@ -16,9 +16,8 @@ using Accounts = AccountsManager::Accounts;
 using AccountsByID = AccountsManager::AccountsByID;
 
 // Accounts without an identifier are like none, each other included.
-bool haveSameIdentifier(const BasicAccount& left, const BasicAccount& right) {
-  const std::optional<Text> identifier = left.identifier();
-  return identifier && identifier == right.identifier();
+bool hasIdentifier(const BasicAccount& account, const std::optional<Text>& identifier) {
+  return identifier && account.identifier() == identifier;
 }
 
 std::optional<Text> identifierProperty(const BasicAccount& account) {
@@ -58,10 +57,11 @@ void AccountsManager::insertAccount(const Account& account) {
 
 void AccountsManager::updateAccount(const Account& account) {
   _ASLogSystem().log("-[AccountsManager updateAccount:]", "Updating account: %@", account->properties());
+  const std::optional<Text> identifier = account->identifier();
   for (Account& present : std::views::reverse(_orderedTopLevelAccounts)) {
-    if (!haveSameIdentifier(*present, *account)) continue;
+    if (!hasIdentifier(*present, identifier)) continue;
     present = account;
-    enter(_topLevelAccountsByID, account->identifier(), account);
+    enter(_topLevelAccountsByID, identifier, account);
     _loadChildrenFromAccount(account);
   }
 }
@@ -70,9 +70,9 @@ void AccountsManager::deleteAccount(const Account& account) {
   _ASLogSystem().log("-[AccountsManager deleteAccount:]", "Deleting account: %@", account->properties());
   _forgetIdentifierOfAccount(*account);
   if (_watch) _watch->willGo(*account, "it was deleted");
-  const auto last =
-      std::ranges::find_if(_orderedTopLevelAccounts.rbegin(), _orderedTopLevelAccounts.rend(),
-                           [&](const Account& present) { return haveSameIdentifier(*present, *account); });
+  const std::optional<Text> identifier = account->identifier();
+  const auto last = std::ranges::find_if(_orderedTopLevelAccounts.rbegin(), _orderedTopLevelAccounts.rend(),
+                                         [&](const Account& present) { return hasIdentifier(*present, identifier); });
   if (last == _orderedTopLevelAccounts.rend()) return;
   const Account deleted = *last;
   std::erase(_orderedTopLevelAccounts, deleted);

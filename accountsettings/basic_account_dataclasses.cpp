@@ -1,4 +1,5 @@
 #include <algorithm>
+#include <array>
 #include <unordered_set>
 
 #include "accountsettings/basic_account.h"
@@ -41,6 +42,45 @@ void remove(Array& set, std::string_view dataclass) {
   std::erase_if(set, [dataclass](const PropertyValue& element) { return isDataclass(element, dataclass); });
 }
 
+struct ManagedDataclass {
+  ManagedFeature feature;
+  StringConstant dataclass;
+};
+
+constexpr std::array<ManagedDataclass, 6> kManagedDataclasses{{
+    {ManagedFeature::cloudDocumentSync, kAccountDataclassQuorvel},
+    {ManagedFeature::cloudDocumentSync, kAccountDataclassKeyValue},
+    {ManagedFeature::mediaStream, kAccountDataclassMediaStream},
+    {ManagedFeature::sharedStreams, kAccountDataclassSharedStreams},
+    {ManagedFeature::cloudBackup, kAccountDataclassBackup},
+    {ManagedFeature::cardsWhileLocked, kAccountDataclassTickora},
+}};
+
+constexpr std::array kManagedFeatures{ManagedFeature::cloudDocumentSync, ManagedFeature::mediaStream,
+                                      ManagedFeature::sharedStreams, ManagedFeature::cloudBackup,
+                                      ManagedFeature::cardsWhileLocked};
+
+bool isManaged(const Text& dataclass) {
+  return std::ranges::find(kManagedDataclasses, dataclass.view(), &ManagedDataclass::dataclass) !=
+         kManagedDataclasses.end();
+}
+
+// The device is asked only where its answer can matter.
+Dataclasses withoutRestricted(Dataclasses list) {
+  if (std::ranges::none_of(list, isManaged)) return list;
+  const auto restricted = BasicAccount::_profileRestrictedDataclasses();
+  std::erase_if(list, [&restricted](const Text& dataclass) { return restricted.contains(dataclass); });
+  return list;
+}
+
+// What the service grants, before any restriction of the device.
+Dataclasses grantedDataclasses(const BasicAccount& account) {
+  const Dataclasses& supported = account.supportedDataclasses();
+  const std::optional<PropertyValue> stored = account.accountPropertyForKey(kAccountProvisionedDataclasses);
+  const Array* const list = stored ? stored->asArray() : nullptr;
+  return list == nullptr ? supported : intersection(textsIn(*list), supported);
+}
+
 }  // namespace
 
 const Dataclasses& BasicAccount::supportedDataclasses() const {
@@ -48,13 +88,7 @@ const Dataclasses& BasicAccount::supportedDataclasses() const {
 }
 
 Dataclasses BasicAccount::provisionedDataclasses() const {
-  const Dataclasses& supported = supportedDataclasses();
-  const std::optional<PropertyValue> stored = accountPropertyForKey(kAccountProvisionedDataclasses);
-  const Array* const list = stored ? stored->asArray() : nullptr;
-  Dataclasses provisioned = list == nullptr ? supported : intersection(textsIn(*list), supported);
-  const auto restricted = _profileRestrictedDataclasses();
-  std::erase_if(provisioned, [&restricted](const Text& dataclass) { return restricted.contains(dataclass); });
-  return _orderedDataclasses(provisioned);
+  return _orderedDataclasses(withoutRestricted(grantedDataclasses(*this)));
 }
 
 std::optional<Dataclasses> BasicAccount::enabledDataclasses() const {
@@ -65,7 +99,7 @@ std::optional<Dataclasses> BasicAccount::enabledDataclasses() const {
   const std::optional<PropertyValue> stored = accountPropertyForKey(kAccountEnabledDataclasses);
   const Array* const list = stored ? stored->asArray() : nullptr;
   if (list == nullptr) return std::nullopt;
-  return _orderedDataclasses(intersection(textsIn(*list), provisionedDataclasses()));
+  return _orderedDataclasses(withoutRestricted(intersection(textsIn(*list), grantedDataclasses(*this))));
 }
 
 bool BasicAccount::isEnabledForDataclass(std::string_view dataclass) const {
@@ -105,16 +139,14 @@ Dataclasses BasicAccount::_orderedDataclasses(const Dataclasses& dataclasses) {
 }
 
 std::unordered_set<std::string_view> BasicAccount::_profileRestrictedDataclasses() {
+  const platform::ProfileRestrictions& service = *platform::current().restrictions;
   std::unordered_set<std::string_view> restricted;
-  const auto ask = [&restricted, &service = *platform::current().restrictions](
-                       ManagedFeature feature, std::initializer_list<std::string_view> dataclasses) {
-    if (service.restriction(feature) == platform::Restriction::notAllowed) restricted.insert(dataclasses);
-  };
-  ask(ManagedFeature::cloudDocumentSync, {kAccountDataclassQuorvel, kAccountDataclassKeyValue});
-  ask(ManagedFeature::mediaStream, {kAccountDataclassMediaStream});
-  ask(ManagedFeature::sharedStreams, {kAccountDataclassSharedStreams});
-  ask(ManagedFeature::cloudBackup, {kAccountDataclassBackup});
-  ask(ManagedFeature::cardsWhileLocked, {kAccountDataclassTickora});
+  for (const ManagedFeature feature : kManagedFeatures) {
+    if (service.restriction(feature) != platform::Restriction::notAllowed) continue;
+    for (const ManagedDataclass& each : kManagedDataclasses) {
+      if (each.feature == feature) restricted.insert(each.dataclass);
+    }
+  }
   return restricted;
 }
 

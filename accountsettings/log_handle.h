@@ -28,10 +28,13 @@ class ACCOUNT_EXPORT LogHandle {
  public:
   explicit LogHandle(std::shared_ptr<platform::SystemLog> log) : _log{std::move(log)} {}
 
+  // For whoever has work to do for a message before it can be logged.
+  [[nodiscard]] bool hasReaders() const { return _log->hasReaders(); }
+
   // `format` with %@, %s, %d and %ld replaced by the arguments, which must outlive the call only.
   template <typename... Arguments>
   void log(const LogSite& site, std::string_view format, const Arguments&... arguments) const {
-    if (_log->hasReaders()) write(site, format, {platform::MessageArgument{arguments}...});
+    if (hasReaders()) write(site, format, {platform::MessageArgument{arguments}...});
   }
 
  private:

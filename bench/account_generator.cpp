@@ -66,9 +66,13 @@ constexpr std::array<std::string_view, 20> kOtherKeys{
 
 class Generator {
  public:
-  explicit Generator(const Population& population) : _random{population.seed}, _children{population.children} {}
+  explicit Generator(const Population& population)
+      : _seed{population.seed}, _identity{population.seed}, _children{population.children} {}
 
   Dictionary account(std::size_t number) {
+    const std::size_t place = number % kPopulationPeriod;
+    if (place == 0) _lastGmailUser.clear();
+    _random = Random{_seed + place};
     const bool isCloud = number % 10 == 9;
     const Kind& kind = isCloud ? kCloud : anyKind();
     Dictionary account = common(kind, number);
@@ -160,25 +164,27 @@ class Generator {
 
   Bytes blob(std::size_t size) {
     Bytes bytes(size);
-    for (std::uint8_t& byte : bytes) byte = static_cast<std::uint8_t>(_random.next());
+    for (std::uint8_t& byte : bytes) byte = static_cast<std::uint8_t>(_identity.next());
     return bytes;
   }
 
   std::string digits(int count) {
     std::string text;
-    while (count-- > 0) text += static_cast<char>('0' + _random.below(10));
+    while (count-- > 0) text += static_cast<char>('0' + _identity.below(10));
     return text;
   }
 
   std::string uuid() {
     std::string text;
     for (const char place : std::string_view{"xxxxxxxx-xxxx-4xxx-xxxx-xxxxxxxxxxxx"}) {
-      text += place == 'x' ? "0123456789ABCDEF"[_random.below(16)] : place;
+      text += place == 'x' ? "0123456789ABCDEF"[_identity.below(16)] : place;
     }
     return text;
   }
 
-  Random _random;
+  std::uint64_t _seed;
+  Random _random{0};  // what an account is made of
+  Random _identity;   // what no two accounts share
   std::size_t _children;
   std::string _lastGmailUser;
 };

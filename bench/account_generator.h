@@ -11,6 +11,11 @@ namespace bench {
 // Accounts are of the types that devices have, with 15 to 25 keys each; every tenth is a cloud account with two
 // children (or as many as asked for), and one in four carries a blob of data. Some calendar accounts belong to a mail
 // account of the same user, as in files of early releases.
+//
+// Every hundred accounts are made up like the first hundred, under other names, so that what an account costs can be
+// compared between populations of whole hundreds.
+constexpr std::size_t kPopulationPeriod = 100;
+
 struct Population {
   std::size_t accounts = 1000;
   std::uint64_t version = 12;

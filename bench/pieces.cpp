@@ -102,6 +102,7 @@ Action serialize(const Population& population) {
 Store loaded(const Population& population) {
   static const bool isSet = [] {
     platform::setCurrent(makeMemoryDevice());
+    AccountsManager::_setShouldSkipNotifications(true);  // as in a run
     return true;
   }();
   use(isSet);
@@ -153,7 +154,9 @@ void update(AccountsManager& store) {
 }
 
 void remove(AccountsManager& store) {
-  for (std::size_t number = 0; number < kFew; ++number) store.deleteAccount(store.allBasicAccounts()[number]);
+  for (std::size_t number = 0; number < kFew; ++number) {
+    store.deleteAccount(AccountsManager::Account{store.allBasicAccounts()[store.count() / 2]});
+  }
 }
 
 void addChildren(AccountsManager& store) {

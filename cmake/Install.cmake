@@ -65,3 +65,13 @@ file(RELATIVE_PATH prefix_from_pkgconfig "/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/
 string(REGEX REPLACE "/$" "" prefix_from_pkgconfig "${prefix_from_pkgconfig}")
 configure_file("${CMAKE_SOURCE_DIR}/cmake/account-settings.pc.in" "${CMAKE_BINARY_DIR}/account-settings.pc" @ONLY)
 install(FILES "${CMAKE_BINARY_DIR}/account-settings.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig" COMPONENT development)
+
+# The build tree has the installed tree's shape, so its programs and libraries find each other by the same paths. What
+# CMake puts into a build tree otherwise ends in empty places, for which the linker searches the current directory.
+if(NOT CMAKE_SKIP_INSTALL_RPATH)
+  foreach(target accountplatform accountsettings migration-host accountctl accounts-migrator)
+    if(TARGET ${target})
+      set_target_properties(${target} PROPERTIES BUILD_WITH_INSTALL_RPATH ON)
+    endif()
+  endforeach()
+endif()

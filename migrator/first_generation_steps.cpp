@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <array>
+#include <unordered_map>
 
 #include "accountsettings/device_local_account.h"
 #include "accountsettings/store_watch.h"
@@ -103,21 +104,54 @@ void giveOwnTypeToGmailAndYahoo(BasicAccount& account) {
   }
 }
 
-Accounts calDAVAccountsOf(const AccountsManager& store) {
-  Accounts accounts;
-  std::ranges::copy_if(store.allBasicAccounts(), std::back_inserter(accounts),
-                       [](const auto& account) { return hasClassAmong(*account, {kCalDAVAccountClass}); });
-  return accounts;
-}
+// The calendar accounts of a store, found by the name that they log in with.
+class CalDAVAccounts {
+ public:
+  explicit CalDAVAccounts(const AccountsManager& store) {
+    for (const AccountsManager::Account& account : store.allBasicAccounts()) {
+      if (hasClassAmong(*account, {kCalDAVAccountClass})) add(account);
+    }
+  }
+
+  // In the order of the store.
+  [[nodiscard]] Accounts partnersOf(const BasicAccount& umbrella) const {
+    std::vector<std::size_t> places;
+    for (const std::string& username : AccountsDataMigrator::_expectedCalDAVUsernamesForAccount(umbrella)) {
+      const auto found = _placesByLogin.find(username);
+      if (found != _placesByLogin.end()) std::ranges::copy(found->second, std::back_inserter(places));
+    }
+    std::ranges::sort(places);
+    Accounts partners;
+    for (const std::size_t place : places) {
+      const AccountsManager::Account& candidate = _accounts[place];
+      if (AccountsDataMigrator::_calDAVAccount_matchesUmbrellaAccount(*candidate, umbrella)) {
+        partners.push_back(candidate);
+      }
+    }
+    return partners;
+  }
+
+ private:
+  // One without a login name is nobody's partner.
+  void add(const AccountsManager::Account& account) {
+    const Dictionary principal = dictionaryForKey(*account, kCalDAVPrincipalKey).value_or(Dictionary{});
+    const Text* const login = principal.text(kCalDAVLoginKey);
+    if (login == nullptr) return;
+    _placesByLogin[login->string()].push_back(_accounts.size());
+    _accounts.push_back(account);
+  }
+
+  Accounts _accounts;
+  std::unordered_map<std::string, std::vector<std::size_t>> _placesByLogin;
+};
 
 // Every partner is folded in, not just the first; one with two umbrellas is listed for each.
-void foldPartnersInto(BasicAccount& umbrella, const Accounts& candidates, Accounts& folded, StoreWatch* watch) {
+void foldPartnersInto(BasicAccount& umbrella, const CalDAVAccounts& candidates, Accounts& folded, StoreWatch* watch) {
   if (!hasClassAmong(umbrella, {kGmailAccountClass, kYahooAccountClass})) return;
-  for (const AccountsManager::Account& candidate : candidates) {
-    if (!AccountsDataMigrator::_calDAVAccount_matchesUmbrellaAccount(*candidate, umbrella)) continue;
+  for (const AccountsManager::Account& partner : candidates.partnersOf(umbrella)) {
     umbrella.setEnabled_forDataclass(true, kAccountDataclassCalendars);
-    folded.push_back(candidate);
-    if (watch != nullptr) watch->willBeFolded(*candidate, umbrella, "the same user's calendars at the same service");
+    folded.push_back(partner);
+    if (watch != nullptr) watch->willBeFolded(*partner, umbrella, "the same user's calendars at the same service");
   }
 }
 
@@ -170,7 +204,7 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A241(AccountsManager& store) {
 }
 
 bool AccountsDataMigrator::_migrateAccountsFrom7A242(AccountsManager& store) {
-  const Accounts candidates = calDAVAccountsOf(store);
+  const CalDAVAccounts candidates{store};
   Accounts folded;
   for (const AccountsManager::Account& account : store.allBasicAccounts()) {
     enableMailAndNotes(*account);

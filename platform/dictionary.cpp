@@ -1,5 +1,6 @@
 #include <algorithm>
-#include <mutex>
+#include <atomic>
+#include <memory>
 #include <unordered_map>
 
 #include "platform/property_value.h"
@@ -28,6 +29,8 @@ struct Dictionary::Contents {
 
   Contents() = default;
   Contents(const Contents& other) : entries{other.entries} {}
+  Contents& operator=(const Contents&) = delete;
+  ~Contents() { dropIndex(); }
 
   [[nodiscard]] const Entry* find(std::string_view key) const {
     if (entries.size() > kLargestWithoutIndex) return findIndexed(key);
@@ -38,28 +41,41 @@ struct Dictionary::Contents {
   }
   void append(Text key, PropertyValue value) {
     entries.push_back({std::move(key), std::move(value)});
-    if (!_index.empty()) _index.emplace(entries.back().key.view(), entries.size() - 1);
+    if (Index* const index = _index.load()) index->emplace(entries.back().key.view(), entries.size() - 1);
   }
   void erase(const Entry& entry) {
-    _index.clear();
+    dropIndex();
     entries.erase(entries.begin() + (&entry - entries.data()));
   }
 
  private:
-  // Shared contents may be searched by several threads; whoever needs the index first makes it.
   [[nodiscard]] const Entry* findIndexed(std::string_view key) const {
-    const std::scoped_lock lock{_indexing};
-    if (_index.empty()) _index = indexOf(entries);
-    const auto found = _index.find(key);
-    return found == _index.end() ? nullptr : &entries[found->second];
+    const Index& index = madeIndex();
+    const auto found = index.find(key);
+    return found == index.end() ? nullptr : &entries[found->second];
   }
 
-  mutable std::mutex _indexing;
-  mutable Index _index;
+  // Shared contents may be searched by several threads: whoever is first to have made the index gives it to the others.
+  [[nodiscard]] const Index& madeIndex() const {
+    if (const Index* const index = _index.load()) return *index;
+    auto made = std::make_unique<Index>(indexOf(entries));
+    Index* present = nullptr;
+    return _index.compare_exchange_strong(present, made.get()) ? *made.release() : *present;
+  }
+
+  void dropIndex() {
+    if (_index.load(std::memory_order_relaxed) != nullptr) delete _index.exchange(nullptr);
+  }
+
+  mutable std::atomic<Index*> _index = nullptr;
 };
 
 Dictionary::Dictionary(std::initializer_list<Entry> entries) {
   for (const Entry& entry : entries) set(entry.key, entry.value);
+}
+
+Dictionary::Dictionary(std::vector<Entry> entries) {
+  if (!entries.empty()) editable().entries = std::move(entries);
 }
 
 std::size_t Dictionary::size() const { return _contents == nullptr ? 0 : _contents->entries.size(); }
@@ -121,10 +137,14 @@ std::optional<PropertyValue> Dictionary::remove(std::string_view key) {
 
 bool operator==(const Dictionary& left, const Dictionary& right) {
   if (left.isIdenticalTo(right)) return true;
-  return left.size() == right.size() && std::all_of(left.begin(), left.end(), [&right](const Dictionary::Entry& entry) {
-           const PropertyValue* const other = right.find(entry.key);
-           return other != nullptr && *other == entry.value;
-         });
+  if (left.size() != right.size()) return false;
+  // Equal dictionaries mostly have one order, too.
+  const Dictionary::Entry* likely = right.begin();
+  return std::all_of(left.begin(), left.end(), [&](const Dictionary::Entry& entry) {
+    const PropertyValue* const other = likely->key == entry.key ? &likely->value : right.find(entry.key);
+    ++likely;
+    return other != nullptr && *other == entry.value;
+  });
 }
 
 }  // namespace platform

@@ -46,6 +46,8 @@ class ACCOUNT_EXPORT Dictionary {
 
   Dictionary() = default;
   Dictionary(std::initializer_list<Entry> entries);
+  // Of entries whose keys all differ; nobody looks whether they do.
+  explicit Dictionary(std::vector<Entry> entries);
 
   [[nodiscard]] std::size_t size() const;
   [[nodiscard]] bool empty() const { return size() == 0; }

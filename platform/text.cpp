@@ -45,9 +45,11 @@ std::size_t characterLength(std::string_view bytes) {
   return sequence.length;
 }
 
-std::size_t plainPrefix(std::string_view bytes) {
-  const auto* const odd = std::find_if(bytes.begin(), bytes.end(), [](char byte) { return byte <= 0; });
-  return static_cast<std::size_t>(odd - bytes.begin());
+// Whether eight bytes are all ASCII and none of them is NUL.
+bool arePlain(std::uint64_t bytes) {
+  constexpr std::uint64_t kOnes = 0x0101010101010101U;
+  constexpr std::uint64_t kHighBits = 0x8080808080808080U;
+  return ((bytes | (bytes - kOnes)) & kHighBits) == 0;
 }
 
 std::string repaired(std::string_view bytes) {
@@ -62,12 +64,23 @@ std::string repaired(std::string_view bytes) {
 }
 
 std::shared_ptr<const char> copyOf(std::string_view bytes) {
-  const std::shared_ptr<char[]> copy = std::make_shared<char[]>(bytes.size());
+  const std::shared_ptr<char[]> copy = std::make_shared_for_overwrite<char[]>(bytes.size() + 1);
   std::memcpy(copy.get(), bytes.data(), bytes.size());
+  copy[static_cast<std::ptrdiff_t>(bytes.size())] = '\0';
   return {copy, copy.get()};
 }
 
 }  // namespace
+
+std::size_t plainPrefix(std::string_view bytes) {
+  std::size_t length = 0;
+  for (std::uint64_t eight = 0; bytes.size() - length >= sizeof eight; length += sizeof eight) {
+    std::memcpy(&eight, bytes.data() + length, sizeof eight);
+    if (!arePlain(eight)) break;
+  }
+  while (length < bytes.size() && bytes[length] > 0) ++length;
+  return length;
+}
 
 bool isWellFormedText(std::string_view bytes) {
   for (bytes.remove_prefix(plainPrefix(bytes)); !bytes.empty();) {

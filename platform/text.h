@@ -40,24 +40,31 @@ class ACCOUNT_EXPORT Text {
 
   [[nodiscard]] std::string_view view() const { return {_characters.get(), _size}; }
   operator std::string_view() const { return view(); }
+  // The characters and a NUL behind them.
+  [[nodiscard]] const char* cString() const { return _characters == nullptr ? "" : _characters.get(); }
   [[nodiscard]] std::string string() const { return std::string{view()}; }
   [[nodiscard]] std::size_t size() const { return _size; }
   [[nodiscard]] bool empty() const { return _size == 0; }
 
-  friend bool operator==(const Text& left, const Text& right) {
-    return left._size == right._size &&
-           (left._characters.get() == right._characters.get() || left.view() == right.view());
-  }
-  friend bool operator==(const Text& left, std::string_view right) { return left.view() == right; }
-  friend bool operator==(const Text& left, StringConstant right) { return left.view() == right.view(); }
+  friend bool operator==(const Text& left, const Text& right) { return isSame(left.view(), right.view()); }
+  friend bool operator==(const Text& left, std::string_view right) { return isSame(left.view(), right); }
+  friend bool operator==(const Text& left, StringConstant right) { return isSame(left.view(), right.view()); }
   friend std::ostream& operator<<(std::ostream& stream, const Text& text) { return stream << text.view(); }
 
  private:
-  std::shared_ptr<const char> _characters;  // no owner where the text is a constant
+  // Texts that share their characters, as copies and the keys of one file do, need not be read.
+  static bool isSame(std::string_view left, std::string_view right) {
+    return left.size() == right.size() && (left.data() == right.data() || left == right);
+  }
+
+  std::shared_ptr<const char> _characters;  // ends with a NUL; no owner where the text is a constant
   std::size_t _size = 0;
 };
 
 // Whether the bytes are well-formed UTF-8 (Unicode 15, table 3-7) without NUL, so that a Text keeps them as they are.
 [[nodiscard]] ACCOUNT_EXPORT bool isWellFormedText(std::string_view bytes);
+
+// The length of the part before the first byte that is NUL or not ASCII.
+[[nodiscard]] ACCOUNT_EXPORT std::size_t plainPrefix(std::string_view bytes);
 
 }  // namespace platform

@@ -69,6 +69,22 @@ std::uint64_t BinaryPlistLayout::reference(const Object& container, std::size_t 
   return bigEndian(_file.subspan(container.payload + position * _referenceSize, _referenceSize));
 }
 
+std::size_t BinaryPlistLayout::extent(const Object& object) const {
+  const std::size_t payload = object.payload - object.marker;
+  switch (object.type) {
+    case Type::utf16: return payload + 2 * object.size;
+    case Type::array: return payload + _referenceSize * object.size;
+    case Type::dictionary: return payload + 2 * _referenceSize * object.size;
+    default: return payload + object.size;
+  }
+}
+
+std::size_t BinaryPlistLayout::objectArea() const { return _table - kHeader.size(); }
+
+bool BinaryPlistLayout::endsWithTable() const {
+  return _table + _objectCount * _offsetSize + kTrailerSize == _file.size();
+}
+
 std::optional<BinaryPlistLayout::Object> BinaryPlistLayout::fixed(Type type, std::size_t marker,
                                                                   std::size_t size) const {
   const std::size_t payload = marker + 1;

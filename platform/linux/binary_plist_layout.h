@@ -27,6 +27,12 @@ class BinaryPlistLayout {
   [[nodiscard]] std::size_t root() const { return _root; }
   [[nodiscard]] std::size_t referenceSize() const { return _referenceSize; }
 
+  // How many bytes the object takes, and how many there are for all objects together.
+  [[nodiscard]] std::size_t extent(const Object& object) const;
+  [[nodiscard]] std::size_t objectArea() const;
+  // Whether nothing stands between the offset table and the trailer.
+  [[nodiscard]] bool endsWithTable() const;
+
   // Nothing where the object is not wholly inside the object area.
   [[nodiscard]] std::optional<Object> object(std::size_t index) const;
   // The index that the n-th reference of a container holds; it may be beyond the table.

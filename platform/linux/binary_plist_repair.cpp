@@ -1,6 +1,7 @@
 #include "platform/linux/binary_plist_repair.h"
 
 #include <limits>
+#include <string_view>
 
 namespace platform {
 namespace {
@@ -11,6 +12,7 @@ constexpr std::uint8_t kEmptyAscii = 0x50;
 constexpr std::uint8_t kAscii = 0x5;
 constexpr std::uint8_t kArray = 0xA;
 constexpr std::uint8_t kOrderedSet = 0xB;
+constexpr std::uint8_t kSet = 0xC;
 constexpr std::uint8_t kInteger = 0x10;
 constexpr std::uint8_t kCountFollows = 0xF;
 constexpr std::uint8_t kNoUtf8 = 0xFF;  // becomes U+FFFD where the text is taken
@@ -76,6 +78,9 @@ void BinaryPlistRepair::repairUid(const Object& uid) {
 }
 
 void BinaryPlistRepair::repairAscii(const Object& text) {
+  const std::string_view characters{reinterpret_cast<const char*>(_file.data()) + text.payload, text.size};
+  if (plainPrefix(characters) == text.size) return;
+  _hasFoundOddities = true;
   for (std::size_t offset = text.payload; offset < text.payload + text.size; ++offset) {
     if (_file[offset] == 0) overwrite(offset, kNoUtf8);
   }
@@ -107,6 +112,7 @@ bool BinaryPlistRepair::repairContainer(Object& container) {
   if (_file[container.marker] >> 4U == kOrderedSet) {
     overwrite(container.marker, static_cast<std::uint8_t>(kArray << 4U | (_file[container.marker] & 0xFU)));
   }
+  if (_file[container.marker] >> 4U == kSet) _hasFoundOddities = true;
   return container.type != Type::dictionary || keepTextKeys(container);
 }
 

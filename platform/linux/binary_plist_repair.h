@@ -17,6 +17,9 @@ class BinaryPlistRepair {
   // Whether anything was overwritten. What was read of the file before may then be wrong where objects overlap.
   [[nodiscard]] bool hasRepaired() const { return _hasRepaired; }
 
+  // Whether anything was found that libplist reads as it should but would write differently.
+  [[nodiscard]] bool hasFoundOddities() const { return _hasFoundOddities; }
+
   void repairLeaf(const Object& leaf);
   // Makes an array of a set, and leaves out a dictionary's entries whose keys are no texts. False where a key is not to
   // be found. The container's size changes with it.
@@ -39,6 +42,7 @@ class BinaryPlistRepair {
   Bytes& _file;
   const BinaryPlistLayout& _layout;
   bool _hasRepaired = false;
+  bool _hasFoundOddities = false;
 };
 
 }  // namespace platform

@@ -57,6 +57,12 @@ class Scan {
 
   [[nodiscard]] bool hasRepaired() const { return _repair.hasRepaired(); }
 
+  // Whether the file holds what the root reaches, as it would be written, and nothing else.
+  [[nodiscard]] bool isPlain() const {
+    return !_repair.hasRepaired() && !_repair.hasFoundOddities() && _reached == _weights.size() &&
+           _reachedBytes == _layout.objectArea() && _layout.endsWithTable();
+  }
+
   [[nodiscard]] bool run() {
     if (!enter(_layout.root())) return false;
     while (!_open.empty()) {
@@ -84,6 +90,8 @@ class Scan {
   [[nodiscard]] bool enter(std::size_t index) {
     const auto object = _layout.object(index);
     if (!object) return false;
+    ++_reached;
+    _reachedBytes += _layout.extent(*object);
     const bool isContainer = object->type == Type::array || object->type == Type::dictionary;
     return isContainer ? open(index, *object) : weigh(index, *object);
   }
@@ -139,22 +147,25 @@ class Scan {
   std::vector<Frame> _open;      // the containers from the root to here
   std::uint64_t _references = 0;
   std::uint64_t _once = 0;
+  std::size_t _reached = 0;
+  std::size_t _reachedBytes = 0;
 };
 
 }  // namespace
 
-bool repairBinaryPlist(Bytes& file) {
+BinaryPlistFinding repairBinaryPlist(Bytes& file) {
   const auto layout = BinaryPlistLayout::of(file);
-  if (!layout) return false;
+  if (!layout) return BinaryPlistFinding::refused;
   // One pass repairs a file whose objects lie apart; the next finds it sound. Where objects overlap, a repair may have
   // broken another one, and a few more passes settle it or nothing does.
   constexpr int kPasses = 4;
   for (int pass = 0; pass < kPasses; ++pass) {
     Scan scan{file, *layout};
-    if (!scan.run()) return false;
-    if (!scan.hasRepaired()) return true;
+    if (!scan.run()) return BinaryPlistFinding::refused;
+    if (scan.hasRepaired()) continue;
+    return pass == 0 && scan.isPlain() ? BinaryPlistFinding::plain : BinaryPlistFinding::readable;
   }
-  return false;
+  return BinaryPlistFinding::refused;
 }
 
 }  // namespace platform

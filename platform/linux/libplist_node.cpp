@@ -5,6 +5,7 @@
 #include <array>
 #include <bit>
 #include <cstddef>
+#include <cstdlib>
 #include <limits>
 #include <string>
 
@@ -31,6 +32,14 @@ LibplistNode parseOneObject(const std::string& object) {
   return LibplistNode{node};
 }
 
+// Such seconds go through the library's own call as they are.
+bool isWholeInt32(double seconds) {
+  constexpr double kLimit = std::numeric_limits<std::int32_t>::max();
+  return seconds > -kLimit && seconds < kLimit &&
+         std::bit_cast<std::uint64_t>(seconds) ==
+             std::bit_cast<std::uint64_t>(static_cast<double>(static_cast<std::int32_t>(seconds)));
+}
+
 double writtenSeconds(plist_t node) {
   char* written = nullptr;
   std::uint32_t size = 0;
@@ -43,11 +52,41 @@ double writtenSeconds(plist_t node) {
   return std::bit_cast<double>(bits);
 }
 
+PropertyValue booleanOf(plist_t node) {
+  std::uint8_t truth = 0;
+  plist_get_bool_val(node, &truth);
+  return truth != 0;
+}
+
+PropertyValue integerOf(plist_t node) {
+  std::uint64_t bits = 0;
+  plist_get_uint_val(node, &bits);
+  if (isAboveInt64(node, bits)) return bits;
+  return static_cast<std::int64_t>(bits);
+}
+
+PropertyValue realOf(plist_t node) {
+  double real = 0;
+  plist_get_real_val(node, &real);
+  return real;
+}
+
+PropertyValue uidOf(plist_t node) {
+  Uid uid;
+  plist_get_uid_val(node, &uid.number);
+  return uid;
+}
+
 }  // namespace
 
 void LibplistNodeDeleter::operator()(void* node) const { plist_free(node); }
 
+void LibplistMemoryDeleter::operator()(void* memory) const { std::free(memory); }
+
 LibplistNode makeLibplistDate(double secondsSince2001) {
+  if (isWholeInt32(secondsSince2001)) {
+    return LibplistNode{plist_new_date(static_cast<std::int32_t>(secondsSince2001), 0)};
+  }
   std::string object{'\x33'};
   appendBigEndian(object, std::bit_cast<std::uint64_t>(secondsSince2001));
   return parseOneObject(object);
@@ -74,6 +113,56 @@ bool isAboveInt64(void* integerNode, std::uint64_t bits) {
   // The library keeps the number's width hidden, but compares it.
   const LibplistNode negative{plist_new_uint(bits)};
   return plist_compare_node_value(integerNode, negative.get()) == 0;
+}
+
+std::string_view textOfLibplist(void* stringNode) {
+  std::uint64_t size = 0;
+  const char* const characters = plist_get_string_ptr(stringNode, &size);
+  return characters == nullptr ? std::string_view{} : std::string_view{characters, size};
+}
+
+std::span<const std::uint8_t> dataOfLibplist(void* dataNode) {
+  std::uint64_t size = 0;
+  const char* const bytes = plist_get_data_ptr(dataNode, &size);
+  if (bytes == nullptr) return {};
+  return {reinterpret_cast<const std::uint8_t*>(bytes), size};
+}
+
+PropertyValue scalarOfLibplist(void* node) {
+  switch (plist_get_node_type(node)) {
+    case PLIST_BOOLEAN: return booleanOf(node);
+    case PLIST_UINT: return integerOf(node);
+    case PLIST_REAL: return realOf(node);
+    case PLIST_DATE: return Date{secondsOfLibplistDate(node)};
+    case PLIST_UID: return uidOf(node);
+    default: return Text{};
+  }
+}
+
+LibplistArrayItems::LibplistArrayItems(void* array) : _array{array} {
+  plist_array_iter iterator = nullptr;
+  plist_array_new_iter(array, &iterator);
+  _iterator.reset(iterator);
+}
+
+void* LibplistArrayItems::next() {
+  plist_t item = nullptr;
+  plist_array_next_item(_array, _iterator.get(), &item);
+  return item;
+}
+
+LibplistEntries::LibplistEntries(void* dictionary) : _dictionary{dictionary} {
+  plist_dict_iter iterator = nullptr;
+  plist_dict_new_iter(dictionary, &iterator);
+  _iterator.reset(iterator);
+}
+
+bool LibplistEntries::advance() {
+  char* key = nullptr;
+  _item = nullptr;
+  plist_dict_next_item(_dictionary, _iterator.get(), &key, &_item);
+  _key.reset(key);
+  return _item != nullptr;
 }
 
 }  // namespace platform

@@ -2,11 +2,19 @@
 
 #include <cstdint>
 #include <memory>
+#include <span>
+#include <string_view>
+
+#include "platform/property_value.h"
 
 namespace platform {
 
 struct LibplistNodeDeleter {
   void operator()(void* node) const;
+};
+
+struct LibplistMemoryDeleter {
+  void operator()(void* memory) const;
 };
 
 // A libplist tree without a parent, owned.
@@ -21,5 +29,39 @@ constexpr std::size_t kDeepestNesting = 256;
 [[nodiscard]] LibplistNode makeLibplistInteger(std::uint64_t aboveInt64);
 [[nodiscard]] double secondsOfLibplistDate(void* node);
 [[nodiscard]] bool isAboveInt64(void* integerNode, std::uint64_t bits);
+
+// What a node holds, without a copy; good until the node is changed or goes.
+[[nodiscard]] std::string_view textOfLibplist(void* stringNode);
+[[nodiscard]] std::span<const std::uint8_t> dataOfLibplist(void* dataNode);
+// The value of a node that is neither text nor data nor a container; an empty text for what no value is made of.
+[[nodiscard]] PropertyValue scalarOfLibplist(void* node);
+
+// Walks the items of an array node, each step at the same cost.
+class LibplistArrayItems {
+ public:
+  explicit LibplistArrayItems(void* array);
+  // The next item; null at the end.
+  [[nodiscard]] void* next();
+
+ private:
+  void* _array;
+  std::unique_ptr<void, LibplistMemoryDeleter> _iterator;
+};
+
+// The same for the entries of a dictionary node.
+class LibplistEntries {
+ public:
+  explicit LibplistEntries(void* dictionary);
+  // Moves to the next entry; false at the end.
+  [[nodiscard]] bool advance();
+  [[nodiscard]] const char* key() const { return _key.get(); }
+  [[nodiscard]] void* item() const { return _item; }
+
+ private:
+  void* _dictionary;
+  std::unique_ptr<void, LibplistMemoryDeleter> _iterator;
+  std::unique_ptr<char, LibplistMemoryDeleter> _key;
+  void* _item = nullptr;
+};
 
 }  // namespace platform

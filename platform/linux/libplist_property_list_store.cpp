@@ -1,5 +1,6 @@
 #include "platform/linux/libplist_property_list_store.h"
 
+#include "platform/linux/known_property_lists.h"
 #include "platform/linux/libplist_reader.h"
 #include "platform/linux/libplist_writer.h"
 
@@ -11,17 +12,26 @@ class LibplistPropertyListStore final : public PropertyListStore {
   explicit LibplistPropertyListStore(std::shared_ptr<FileSystem> files) : _files{std::move(files)} {}
 
   [[nodiscard]] std::optional<Dictionary> readDictionary(const Path& path) override {
-    Result<Bytes> bytes = _files->read(path, kLargestPropertyList);
-    if (!bytes.isOk()) return std::nullopt;
-    return parsePropertyList(bytes.take());
+    Result<Bytes> read = _files->read(path, kLargestPropertyList);
+    if (!read.isOk()) return std::nullopt;
+    Bytes bytes = read.take();
+    if (auto values = _known.valuesOf(bytes)) return values;
+    auto parsed = parsePropertyList(bytes);
+    if (!parsed) return std::nullopt;
+    _known.keep(std::move(bytes), parsed->values, parsed->isFaithful);
+    return std::move(parsed->values);
   }
 
   [[nodiscard]] SerializedPropertyList serialize(const Dictionary& dictionary) override {
-    return writePropertyList(dictionary);
+    if (auto bytes = _known.bytesOf(dictionary)) return {std::move(bytes), {}};
+    SerializedPropertyList list = writePropertyList(dictionary);
+    if (list.data) _known.keep(*list.data, dictionary, true);
+    return list;
   }
 
  private:
   std::shared_ptr<FileSystem> _files;
+  KnownPropertyLists _known;
 };
 
 }  // namespace

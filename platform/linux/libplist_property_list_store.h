@@ -8,7 +8,9 @@
 
 namespace platform {
 
-// Property lists through libplist. Files are read through `files` and nothing else opens any.
+// Property lists through libplist. Files are read through `files` and nothing else opens any. Each is read whenever it
+// is asked for; bytes that are the same as lately read or written ones are not parsed again, and values that are the
+// same as lately read or written ones not serialized again (see known_property_lists.h).
 //
 // libplist trusts what it is given: some files crash it, some keep it busy for ever or make it take all memory. So
 // every file is scanned first, and malformed values are repaired, in a copy of its bytes, into what libplist can carry:

@@ -1,117 +1,124 @@
 #include "platform/linux/libplist_reader.h"
 
-#include <clocale>
-#include <cstdlib>
-#include <memory>
-#include <string_view>
-#include <unordered_map>
-
 #include <plist/plist.h>
 
+#include <array>
+#include <clocale>
+#include <string_view>
+#include <unordered_map>
+#include <vector>
+
 #include "platform/linux/binary_plist_scan.h"
+#include "platform/linux/libplist_comparison.h"
 #include "platform/linux/libplist_node.h"
 #include "platform/linux/xml_plist_scan.h"
 
 namespace platform {
 namespace {
 
-struct Freeing {
-  void operator()(void* memory) const { std::free(memory); }
-};
-using Iterator = std::unique_ptr<void, Freeing>;
-using Characters = std::unique_ptr<char, Freeing>;
-
-// Turns a tree of libplist into values. Texts that a file repeats, its keys above all, become one Text.
-class Conversion {
+// Texts that files repeat (types, classes, data classes) become one Text; identifiers, which they do not repeat, are
+// longer. Only the latest of those that fall on one place is known, so nothing is kept of texts that all differ.
+class RecentTexts {
  public:
-  Dictionary dictionary(plist_t node) {
-    Dictionary dictionary;
-    dictionary.reserve(plist_dict_get_size(node));
-    plist_dict_iter rawIterator = nullptr;
-    plist_dict_new_iter(node, &rawIterator);
-    const Iterator iterator{rawIterator};
-    while (true) {
-      char* rawKey = nullptr;
-      plist_t item = nullptr;
-      plist_dict_next_item(node, iterator.get(), &rawKey, &item);
-      const Characters key{rawKey};
-      if (item == nullptr) return dictionary;
-      dictionary.set(interned(key.get()), value(item));
-    }
+  Text text(std::string_view characters) {
+    if (characters.size() > kLongest) return characters;
+    Text& recent = _texts[place(characters)];
+    if (recent != characters) recent = characters;
+    return recent;
   }
 
  private:
+  static constexpr std::size_t kLongest = 35;
+  static constexpr std::size_t kPlaces = 512;
+
+  static std::size_t place(std::string_view characters) {
+    std::uint64_t hash = characters.size();
+    for (const char character : characters) hash = hash * 31 + static_cast<unsigned char>(character);
+    return (hash ^ (hash >> 9U)) % kPlaces;
+  }
+
+  std::array<Text, kPlaces> _texts;
+};
+
+// Turns a tree of libplist into values. The keys of all its dictionaries become one Text each.
+class Conversion {
+ public:
+  Dictionary dictionary(plist_t node) {
+    const std::vector<Item> items = itemsOf(node);
+    std::vector<Dictionary::Entry> entries;
+    entries.reserve(items.size());
+    for (const Item& item : items) entries.push_back({item.key, value(item.node)});
+    return Dictionary{std::move(entries)};
+  }
+
+  [[nodiscard]] bool hasFoundRepeatedKeys() const { return _hasFoundRepeatedKeys; }
+
+ private:
+  struct Item {
+    Text key;
+    plist_t node;
+  };
+  struct Key {
+    Text text;
+    std::size_t dictionary = 0;  // the last one in which it was found, and its place there
+    std::size_t place = 0;
+  };
+
+  // A dictionary's items, of each key the last one at the first one's place.
+  std::vector<Item> itemsOf(plist_t node) {
+    ++_dictionaries;
+    std::vector<Item> items;
+    items.reserve(plist_dict_get_size(node));
+    LibplistEntries entries{node};
+    while (entries.advance()) {
+      Key& key = known(entries.key());
+      if (key.dictionary == _dictionaries) {
+        items[key.place].node = entries.item();
+        _hasFoundRepeatedKeys = true;
+        continue;
+      }
+      key.dictionary = _dictionaries;
+      key.place = items.size();
+      items.push_back({key.text, entries.item()});
+    }
+    return items;
+  }
+
+  // Bytes that are not UTF-8 change as they become a text, so two keys of the file may be one; the text tells.
+  Key& known(std::string_view characters) {
+    const auto found = _keys.find(characters);
+    if (found != _keys.end()) return found->second;
+    const Text text{characters};
+    return _keys.try_emplace(text.view(), Key{text}).first->second;
+  }
+
   PropertyValue value(plist_t node) {
     switch (plist_get_node_type(node)) {
-      case PLIST_BOOLEAN: return boolean(node);
-      case PLIST_UINT: return integer(node);
-      case PLIST_REAL: return real(node);
-      case PLIST_STRING: return text(node);
+      case PLIST_STRING: return _texts.text(textOfLibplist(node));
       case PLIST_ARRAY: return array(node);
       case PLIST_DICT: return dictionary(node);
-      case PLIST_DATE: return Date{secondsOfLibplistDate(node)};
       case PLIST_DATA: return data(node);
-      case PLIST_UID: return uid(node);
-      default: return Text{};
+      default: return scalarOfLibplist(node);
     }
   }
 
-  static PropertyValue boolean(plist_t node) {
-    std::uint8_t truth = 0;
-    plist_get_bool_val(node, &truth);
-    return truth != 0;
-  }
-  static PropertyValue integer(plist_t node) {
-    std::uint64_t bits = 0;
-    plist_get_uint_val(node, &bits);
-    if (isAboveInt64(node, bits)) return bits;
-    return static_cast<std::int64_t>(bits);
-  }
-  static PropertyValue real(plist_t node) {
-    double real = 0;
-    plist_get_real_val(node, &real);
-    return real;
-  }
-  static PropertyValue uid(plist_t node) {
-    Uid uid;
-    plist_get_uid_val(node, &uid.number);
-    return uid;
-  }
   static PropertyValue data(plist_t node) {
-    std::uint64_t size = 0;
-    const char* const bytes = plist_get_data_ptr(node, &size);
-    return bytes == nullptr ? Bytes{} : Bytes{bytes, bytes + size};
+    const std::span<const std::uint8_t> bytes = dataOfLibplist(node);
+    return Bytes{bytes.begin(), bytes.end()};
   }
-  PropertyValue text(plist_t node) {
-    std::uint64_t size = 0;
-    const char* const characters = plist_get_string_ptr(node, &size);
-    return characters == nullptr ? Text{} : interned({characters, size});
-  }
+
   PropertyValue array(plist_t node) {
     Array array;
     array.reserve(plist_array_get_size(node));
-    plist_array_iter rawIterator = nullptr;
-    plist_array_new_iter(node, &rawIterator);
-    const Iterator iterator{rawIterator};
-    while (true) {
-      plist_t item = nullptr;
-      plist_array_next_item(node, iterator.get(), &item);
-      if (item == nullptr) return array;
-      array.push_back(value(item));
-    }
+    LibplistArrayItems items{node};
+    while (const plist_t item = items.next()) array.push_back(value(item));
+    return array;
   }
 
-  Text interned(std::string_view characters) {
-    constexpr std::size_t kLongestInterned = 64;
-    if (characters.size() > kLongestInterned) return characters;
-    const auto known = _texts.find(characters);
-    if (known != _texts.end()) return known->second;
-    const Text text{characters};
-    if (text == characters) _texts.emplace(text.view(), text);
-    return text;
-  }
-
-  std::unordered_map<std::string_view, Text> _texts;  // keys are views of the values
+  std::unordered_map<std::string_view, Key> _keys;  // by views of their texts
+  RecentTexts _texts;
+  std::size_t _dictionaries = 0;
+  bool _hasFoundRepeatedKeys = false;
 };
 
 // libplist reads numbers by the process's locale, in which a decimal point may be a comma.
@@ -132,30 +139,48 @@ class PlainNumbers {
 
 const char* charactersOf(const Bytes& bytes) { return reinterpret_cast<const char*>(bytes.data()); }
 
-LibplistNode parseBinary(Bytes& bytes) {
-  if (!repairBinaryPlist(bytes)) return nullptr;
+struct Tree {
+  LibplistNode root;
+  bool isPlain = false;  // see BinaryPlistFinding
+};
+
+Tree parseBinary(Bytes& bytes) {
+  const BinaryPlistFinding finding = repairBinaryPlist(bytes);
+  if (finding == BinaryPlistFinding::refused) return {};
   plist_t root = nullptr;
   plist_from_bin(charactersOf(bytes), static_cast<std::uint32_t>(bytes.size()), &root);
-  return LibplistNode{root};
+  return {LibplistNode{root}, finding == BinaryPlistFinding::plain};
 }
 
-LibplistNode parseXml(Bytes& bytes) {
-  if (bytes.size() > kLargestXmlPropertyList || !repairXmlPlist(bytes)) return nullptr;
+Tree parseXml(Bytes& bytes) {
+  if (bytes.size() > kLargestXmlPropertyList || !repairXmlPlist(bytes)) return {};
   const PlainNumbers plainNumbers;
   plist_t root = nullptr;
   plist_from_xml(charactersOf(bytes), static_cast<std::uint32_t>(bytes.size()), &root);
-  return LibplistNode{root};
+  return {LibplistNode{root}};
+}
+
+// A tree whose root is a dictionary, or none.
+Tree parse(Bytes bytes) {
+  if (bytes.size() > kLargestPropertyList) return {};
+  const bool isBinary = std::string_view{charactersOf(bytes), bytes.size()}.starts_with("bplist");
+  Tree tree = isBinary ? parseBinary(bytes) : parseXml(bytes);
+  return plist_get_node_type(tree.root.get()) == PLIST_DICT ? std::move(tree) : Tree{};
 }
 
 }  // namespace
 
-std::optional<Dictionary> parsePropertyList(Bytes bytes) {
-  if (bytes.size() > kLargestPropertyList) return std::nullopt;
-  const bool isBinary = std::string_view{charactersOf(bytes), bytes.size()}.starts_with("bplist");
-  const LibplistNode root = isBinary ? parseBinary(bytes) : parseXml(bytes);
-  bytes = {};
-  if (plist_get_node_type(root.get()) != PLIST_DICT) return std::nullopt;
-  return Conversion{}.dictionary(root.get());
+std::optional<ParsedPropertyList> parsePropertyList(Bytes bytes) {
+  const Tree tree = parse(std::move(bytes));
+  if (tree.root == nullptr) return std::nullopt;
+  Conversion conversion;
+  Dictionary values = conversion.dictionary(tree.root.get());
+  return ParsedPropertyList{std::move(values), tree.isPlain && !conversion.hasFoundRepeatedKeys()};
+}
+
+bool readsBackAs(Bytes bytes, const Dictionary& values) {
+  const Tree tree = parse(std::move(bytes));
+  return tree.root != nullptr && holdsInOrder(tree.root.get(), values);
 }
 
 }  // namespace platform

@@ -10,8 +10,18 @@ namespace platform {
 constexpr std::size_t kLargestPropertyList = std::size_t{256} << 20U;
 constexpr std::size_t kLargestXmlPropertyList = std::size_t{16} << 20U;
 
+struct ParsedPropertyList {
+  Dictionary values;
+  // Whether the bytes are a binary property list that holds these values in their order and nothing else, so that they
+  // are as good as what would be written for the values.
+  bool isFaithful = false;
+};
+
 // The root dictionary of a property list in either form; nothing where it is refused. The bytes are this function's
 // own: values that are merely malformed are repaired in them.
-[[nodiscard]] std::optional<Dictionary> parsePropertyList(Bytes bytes);
+[[nodiscard]] std::optional<ParsedPropertyList> parsePropertyList(Bytes bytes);
+
+// Whether the property list, read again, holds exactly these values in their order.
+[[nodiscard]] bool readsBackAs(Bytes bytes, const Dictionary& values);
 
 }  // namespace platform

@@ -64,7 +64,7 @@ LibplistNode nodeOf(const PropertyValue& value);
 LibplistNode nodeOf(const Dictionary& dictionary) {
   LibplistNode node{plist_new_dict()};
   for (const auto& [key, value] : dictionary) {
-    plist_dict_set_item(node.get(), key.string().c_str(), nodeOf(value).release());
+    plist_dict_set_item(node.get(), key.cString(), nodeOf(value).release());
   }
   return node;
 }
@@ -86,7 +86,7 @@ LibplistNode nodeOf(const Bytes& data) {
 // No deeper than the nesting that inspection has let pass.
 LibplistNode nodeOf(const PropertyValue& value) {
   switch (value.kind()) {
-    case PropertyValue::Kind::string: return LibplistNode{plist_new_string(value.asText()->string().c_str())};
+    case PropertyValue::Kind::string: return LibplistNode{plist_new_string(value.asText()->cString())};
     case PropertyValue::Kind::integer: return nodeOf(*value.asInteger());
     case PropertyValue::Kind::real: return LibplistNode{plist_new_real(*value.asReal())};
     case PropertyValue::Kind::boolean: return LibplistNode{plist_new_bool(*value.asBoolean() ? 1 : 0)};
@@ -118,7 +118,7 @@ SerializedPropertyList writePropertyList(const Dictionary& dictionary) {
   if (!inspection.objection().empty()) return failure(inspection.objection());
   std::optional<Bytes> bytes = binaryOf(dictionary);
   if (!bytes) return failure("The property list could not be written");
-  if (parsePropertyList(*bytes) != dictionary) return failure("What was written does not read back the same");
+  if (!readsBackAs(*bytes, dictionary)) return failure("What was written does not read back the same");
   return {std::move(bytes), {}};
 }
 

@@ -6,6 +6,9 @@
 #include <systemd/sd-journal.h>
 #include <unistd.h>
 
+#include <atomic>
+#include <cstdint>
+#include <ctime>
 #include <exception>
 
 #include "platform/linux/single_line.h"
@@ -39,6 +42,43 @@ std::string syslogLine(const LogRecord& record) {
   return singleLine("[" + std::string{record.subsystem} + ":" + std::string{record.category} + "] " + record.text());
 }
 
+// Whether something stands at a path. Asked for every message, so what was found counts for a tenth of a second.
+class Presence {
+ public:
+  explicit Presence(const char* path) : _path{path} {}
+  bool operator()() const {
+    const std::int64_t now = milliseconds();
+    if (now >= _soundUntil.load(std::memory_order_relaxed)) {
+      _isThere.store(::access(_path, F_OK) == 0, std::memory_order_relaxed);
+      _soundUntil.store(now + kPatience, std::memory_order_relaxed);
+    }
+    return _isThere.load(std::memory_order_relaxed);
+  }
+
+ private:
+  static constexpr std::int64_t kPatience = 100;
+
+  static std::int64_t milliseconds() {
+    timespec now{};
+    ::clock_gettime(CLOCK_MONOTONIC_COARSE, &now);
+    return std::int64_t{now.tv_sec} * 1000 + now.tv_nsec / 1'000'000;
+  }
+
+  const char* _path;
+  mutable std::atomic<std::int64_t> _soundUntil = 0;
+  mutable std::atomic<bool> _isThere = false;
+};
+
+bool hasJournal() {
+  static const Presence socket{"/run/systemd/journal/socket"};
+  return socket();
+}
+
+bool hasSyslog() {
+  static const Presence socket{"/dev/log"};
+  return socket();
+}
+
 class LinuxSystemLog final : public SystemLog {
  public:
   explicit LinuxSystemLog(LogSinks sinks) : _sinks{std::move(sinks)} {}
@@ -64,9 +104,9 @@ class LinuxSystemLog final : public SystemLog {
 }  // namespace
 
 LogSinks systemLogSinks() {
-  return {.hasJournal = [] { return ::access("/run/systemd/journal/socket", F_OK) == 0; },
+  return {.hasJournal = &hasJournal,
           .sendToJournal = &sendFields,
-          .hasSyslog = [] { return ::access("/dev/log", F_OK) == 0; },
+          .hasSyslog = &hasSyslog,
           .sendToSyslog = [](const std::string& line) { ::syslog(LOG_USER | defaultLevel, "%s", line.c_str()); }};
 }
 

@@ -10,7 +10,8 @@
 
 namespace platform {
 
-// Where records can go. Each call asks anew, since the journal may start after this process.
+// Where records can go. Asked for every record, since the journal may start after this process; the device's own sinks
+// look again a tenth of a second after they last did.
 struct LogSinks {
   std::function<bool()> hasJournal;
   std::function<void(const std::vector<std::string>& fields)> sendToJournal;  // "NAME=value" each
