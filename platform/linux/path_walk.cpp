@@ -58,7 +58,7 @@ bool PathWalk::step(bool& isAtEnd) {
   const std::string name = std::move(_ahead.back());
   _ahead.pop_back();
   isAtEnd = _ahead.empty();
-  _leaf = ".";
+  _leaf.assign(1, '.');
   if (name == ".") return true;
   if (name == "..") return goUp();
   Thing thing = look(name);
