@@ -19,7 +19,7 @@ from device_case import HOST, DeviceTest
 SOURCES = Path(os.environ["SOURCE_TREE"])
 DOCUMENTS = [
     "README.md", "CONTRIBUTING.md", "docs/ACCOUNTCTL.md", "docs/ARCHITECTURE.md", "docs/CONFIGURATION.md",
-    "docs/EXPLAIN.md", "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MODULES.md", "docs/OPERATIONS.md", "docs/SNAPSHOTS.md",
+    "docs/EXPLAIN.md", "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MODULES.md", "docs/OPERATIONS.md", "docs/RELIABILITY.md", "docs/SNAPSHOTS.md",
 ]
 # It tells of a device after its update.
 MIGRATED = "docs/OPERATIONS.md"
