@@ -9,7 +9,8 @@ set(CMAKE_VISIBILITY_INLINES_HIDDEN ON)
 
 set(ACCOUNTS_SANITIZE "" CACHE STRING "Sanitizers to build with, as for -fsanitize=")
 option(ACCOUNTS_COVERAGE "Count executed lines and branches" OFF)
-option(ACCOUNTS_LINT "Run clang-tidy on every source that is compiled" OFF)
+set(ACCOUNTS_LINT "" CACHE STRING "What clang-tidy looks at as it is compiled: product, all, or nothing")
+set_property(CACHE ACCOUNTS_LINT PROPERTY STRINGS "" product all)
 
 find_program(CCACHE_PROGRAM ccache)
 if(CCACHE_PROGRAM)
