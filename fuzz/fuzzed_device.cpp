@@ -90,6 +90,21 @@ bool isAmong(std::string_view word, Words words) { return std::ranges::find(word
 
 Bytes secretBytes() { return {FuzzedDevice::kSecret.begin(), FuzzedDevice::kSecret.end()}; }
 
+// The library keeps the first log that it meets for the life of the process: one that writes to the device of the
+// moment.
+class PresentLog final : public platform::SystemLog {
+ public:
+  [[nodiscard]] bool hasReaders() const override { return device->hasReaders(); }
+  void write(const platform::LogRecord& record) override { device->write(record); }
+
+  std::shared_ptr<tests::FakeSystemLog> device;
+};
+
+std::shared_ptr<PresentLog> presentLog() {
+  static const auto log = std::make_shared<PresentLog>();
+  return log;
+}
+
 }  // namespace
 
 FuzzedDevice::FuzzedDevice(Input& input) : _input{input}, _store{platform::makeLibplistPropertyListStore(files)} {
@@ -97,7 +112,11 @@ FuzzedDevice::FuzzedDevice(Input& input) : _input{input}, _store{platform::makeL
     const Path path = Path{"/resources"} / (std::string{name} + ".plist");
     putReal(path, dictionaryAt(path));
   }
-  changePlatform([this](platform::Platform& services) { services.propertyLists = _store; });
+  presentLog()->device = systemLog;
+  changePlatform([this](platform::Platform& services) {
+    services.propertyLists = _store;
+    services.systemLog = presentLog();
+  });
   switchRecordsOn();
   putFiles();
 }

@@ -56,6 +56,7 @@ void requireOwn(const Path& directory, const FileAttributes& attributes) {
 
 void requireOwnDirectory(const Storage& storage, const Path& directory, Missing missing) {
   platform::Result<FileAttributes> attributes = storage.keeper->attributesOf(directory);
+  if (attributes.status().errorNumber() == ELOOP) requireSafeWay(storage, directory);  // says which link it was
   if (attributes.status().errorNumber() == ENOENT) {
     if (missing == Missing::isRefused) refuse(directory, "it does not exist");
     require(storage.files->createDirectories(directory, kOwnerAlone));

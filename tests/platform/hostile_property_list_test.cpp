@@ -23,7 +23,12 @@ constexpr std::size_t kMebibyte = std::size_t{1} << 20U;
 constexpr unsigned kGenerousSeconds = 60;  // a hang, not a slow machine
 
 // The sanitizers keep freed memory and pad what is not freed.
-#if defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
+#if defined(__has_feature)
+#if __has_feature(address_sanitizer) || __has_feature(thread_sanitizer)
+#define SANITIZED
+#endif
+#endif
+#if defined(SANITIZED) || defined(__SANITIZE_ADDRESS__) || defined(__SANITIZE_THREAD__)
 constexpr bool kCanMeasureMemory = false;
 #else
 constexpr bool kCanMeasureMemory = true;
