@@ -1,6 +1,8 @@
 """What the end-to-end tests share: a scratch directory, a device in it, and the programs to try."""
 
 import os
+import shutil
+import subprocess
 import tempfile
 import unittest
 from pathlib import Path
@@ -9,6 +11,16 @@ from device import SETTINGS, Device, run_host
 
 HOST = Path(os.environ["MIGRATION_HOST"])
 PLUGINS = Path(os.environ["TEST_PLUGINS"])
+
+
+def strace(*options):
+    return ["strace", "-f", *options]
+
+
+def can_trace_calls():
+    if not shutil.which("strace"):
+        return False
+    return subprocess.run(strace("-o", os.devnull, "true"), capture_output=True, check=False).returncode == 0
 
 
 class DeviceTest(unittest.TestCase):

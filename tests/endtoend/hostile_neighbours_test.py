@@ -17,7 +17,7 @@ import unittest
 from pathlib import Path
 
 from device import HOME, LEGACY_EXCHANGE, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY, TEMPORARY, Device
-from device_case import HOST, DeviceTest
+from device_case import HOST, DeviceTest, can_trace_calls, strace
 
 MOBILE = 501
 SECRET = "the-secret-of-somebody-else"
@@ -236,14 +236,20 @@ class NeighboursOfRoot(Neighbours, DeviceTest):
 
     def test_may_have_made_the_lock_file(self):
         device = self.make("lock")
-
-        def plant(path):
-            path.write_text("")
-            path.chmod(0o644)
-            os.chown(path, MOBILE, MOBILE)
-
-        run = self.assert_run_does_no_harm(device, prepare=lambda: in_private_tmp(plant, self.scratch))
+        run = self.assert_run_does_no_harm(device, prepare=lambda: in_private_tmp(give_to_mobile, self.scratch))
         self.assertEqual(0, run.status, run.errors)
+
+    @unittest.skipUnless(can_trace_calls(), "no strace here, or it may trace nothing")
+    def test_own_a_lock_file_that_is_never_opened_as_one_to_be_made(self):
+        """Where fs.protected_regular is set, the kernel lets nobody open another's file in /tmp in that way."""
+        device, log = self.make("lock"), self.scratch / "calls"
+        subprocess.run(
+            strace("-o", str(log), "-e", "trace=openat,openat2", str(HOST), "--root", str(device.root)),
+            preexec_fn=lambda: in_private_tmp(give_to_mobile, self.scratch), capture_output=True, timeout=LONG, check=False,
+        )
+        opened = [line for line in log.read_text().splitlines() if Path(LOCK).name in line]
+        self.assertNotEqual([], opened)
+        self.assertEqual([], [line for line in opened if "O_CREAT" in line])
 
 
 @unittest.skipIf(os.getuid() == 0, "as root, see above")
@@ -276,6 +282,12 @@ def in_private_tmp(plant, scratch):
         path.mkdir(parents=True, exist_ok=True)
         mount(f"/proc/self/fd/{descriptor}", path, None, bind | recursive)
     plant(Path(LOCK))
+
+
+def give_to_mobile(path):
+    path.write_text("")
+    path.chmod(0o644)
+    os.chown(path, MOBILE, MOBILE)
 
 
 def link_by_mount(target, path):

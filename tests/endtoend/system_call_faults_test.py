@@ -16,7 +16,7 @@ from collections import Counter
 from pathlib import Path
 
 from device import LEGACY_MAIL, SETTINGS, TEMPORARY, Device, plain_environment
-from device_case import HOST
+from device_case import HOST, can_trace_calls, strace
 
 READING = ["openat", "openat2", "read", "newfstatat"]
 CHANGING = ["write", "fsync", "renameat", "renameat2", "unlinkat", "mkdirat", "fchownat", "fchmod", "flock"]
@@ -24,15 +24,6 @@ ERRORS = ["ENOSPC", "EIO", "EACCES", "EROFS", "EINTR"]
 SAMPLE = 20  # kills, and as many errors, of each kind of device
 MEMORY = "/dev/shm"
 STANDING = {"Type": "LDAP", "Class": "LDAPAccount", "Identifier": "L", "Port": 389}
-
-
-def strace(*options):
-    return ["strace", "-f", *options]
-
-
-def is_usable():
-    ended = subprocess.run(strace("-o", os.devnull, "true"), capture_output=True, check=False) if shutil.which("strace") else None
-    return ended is not None and ended.returncode == 0
 
 
 def identifiers(path):
@@ -44,7 +35,7 @@ def identifiers(path):
 
 
 @unittest.skipIf(os.environ["SANITIZE"], "a sanitizer makes calls of its own, and looks for leaks in no traced program")
-@unittest.skipUnless(is_usable(), "no strace here, or it may trace nothing")
+@unittest.skipUnless(can_trace_calls(), "no strace here, or it may trace nothing")
 class SystemCallFaults(unittest.TestCase):
     def setUp(self):
         scratch = tempfile.TemporaryDirectory(dir=MEMORY if os.access(MEMORY, os.W_OK) else None)
