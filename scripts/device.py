@@ -146,7 +146,7 @@ def read_trace(trace):
 
 def _entry(path):
     status = path.lstat()
-    content = path.read_bytes() if stat.S_ISREG(status.st_mode) else b""
+    content = path.read_bytes() if stat.S_ISREG(status.st_mode) and os.access(path, os.R_OK) else b""
     return Entry(
         kind={stat.S_IFREG: "file", stat.S_IFDIR: "directory"}.get(stat.S_IFMT(status.st_mode), "other"),
         mode=stat.S_IMODE(status.st_mode),

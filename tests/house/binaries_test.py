@@ -65,6 +65,7 @@ def write_lists(libraries):
 
 class Binaries(unittest.TestCase):
     maxDiff = None
+    path = None  # the binary that is being looked at
     build_tree = Path(os.environ.get("BUILD_TREE", "."))
     library_directory = os.environ.get("LIBRARY_DIRECTORY", "lib")
 
@@ -78,9 +79,11 @@ class Binaries(unittest.TestCase):
         cls.libraries = [path for path in cls.binaries if not is_program(path)]
 
     def each(self, paths=None):
-        for path in self.binaries if paths is None else paths:
-            with self.subTest(path=str(path)):
-                yield path
+        for self.path in self.binaries if paths is None else paths:
+            yield self.path
+
+    def _formatMessage(self, *messages):
+        return f"{self.path}: {super()._formatMessage(*messages)}"
 
     def test_are_all_there_built_and_installed(self):
         names = [name_of(path) for path in self.binaries]
@@ -114,7 +117,7 @@ class Binaries(unittest.TestCase):
         for path in self.each():
             self.assertNotIn("TEXTREL", output_of("readelf", "-dW", path))
 
-    @unittest.skipIf(os.environ["SANITIZE"], "sanitizers export what they need themselves")
+    @unittest.skipIf(os.environ.get("SANITIZE"), "sanitizers export what they need themselves")
     def test_export_what_was_reviewed_and_nothing_else(self):
         for path in self.each(self.libraries):
             self.assertEqual(reviewed_for(name_of(path)), exported_by(path))
