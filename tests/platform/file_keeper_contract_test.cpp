@@ -124,6 +124,8 @@ TYPED_TEST(FileKeeperContract, SeesToItThatNoFileStandsAtAPath) {
   EXPECT_EQ(this->keeper.removeFile(this->subject.base).errorNumber(), EISDIR);
 }
 
+const FileAttributes kOurs{.owner = ::geteuid(), .group = ::getegid(), .permissions = 0600};
+
 TEST(LinuxFileKeeper, FollowsNoLinkAtAPathItself) {
   const ScratchDirectory scratch;
   scratch.put("target", "precious");
@@ -131,7 +133,7 @@ TEST(LinuxFileKeeper, FollowsNoLinkAtAPathItself) {
   const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
   EXPECT_EQ(keeper->attributesOf(scratch / "link").value().kind, FileKind::other);
   EXPECT_EQ(keeper->append(scratch / "link", bytes("x")).errorNumber(), ELOOP);
-  EXPECT_TRUE(keeper->restore(scratch / "link", bytes("new"), {.owner = ::geteuid(), .group = ::getegid()}).isOk());
+  EXPECT_TRUE(keeper->restore(scratch / "link", bytes("new"), kOurs).isOk());
   EXPECT_EQ(scratch.contents("target"), "precious");
   EXPECT_EQ(scratch.contents("link"), "new");
 }
@@ -140,7 +142,7 @@ TEST(LinuxFileKeeper, PutsAwayWhatADeadRestoreLeft) {
   const ScratchDirectory scratch;
   scratch.put(".restoring-file", "half a fi");
   const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
-  ASSERT_TRUE(keeper->restore(scratch / "file", bytes("file"), {.owner = ::geteuid(), .group = ::getegid()}).isOk());
+  ASSERT_TRUE(keeper->restore(scratch / "file", bytes("file"), kOurs).isOk());
   EXPECT_EQ(keeper->entriesOf(scratch.path()).value(), std::vector<std::string>{"file"});
 }
 
