@@ -6,23 +6,14 @@
 #include <string>
 #include <vector>
 
-#include "tests/reliability/scratch_device.h"
+#include "tests/reliability/device_forms.h"
 
+using tests::DeviceForm;
 using tests::Mishap;
 using tests::RunOutcome;
 using tests::ScratchDevice;
 
 namespace {
-
-struct Legacy {
-  const char* name;
-  bool mail;
-  bool exchange;
-  friend void PrintTo(const Legacy& given, std::ostream* stream) { *stream << given.name; }
-};
-
-constexpr Legacy kLegacyForms[] = {
-    {"none", false, false}, {"mail", true, false}, {"exchange", false, true}, {"both", true, true}};
 
 const std::pair<Mishap::Kind, std::string> kDeaths[] = {
     {Mishap::Kind::diesBefore, "before "}, {Mishap::Kind::diesWithin, "within "}, {Mishap::Kind::diesAfter, "after "}};
@@ -32,12 +23,6 @@ struct Numbers {
   int points = 0;
   int differentEnds = 0;
 };
-
-void prepare(ScratchDevice& device, std::optional<std::uint64_t> version, const Legacy& legacy) {
-  device.putSettings(version);
-  if (legacy.mail) device.putLegacyMail();
-  if (legacy.exchange) device.putLegacyExchange();
-}
 
 // The accounts that an uninterrupted run leaves. Accounts that a conversion replaces are gone after any run.
 using Survivors = std::vector<std::string>;
@@ -63,13 +48,11 @@ void expectEachAccountOnce(const ScratchDevice& device, const Survivors& survivo
   }
 }
 
-class DyingRuns : public testing::TestWithParam<std::tuple<int, Legacy>> {};
+class DyingRuns : public testing::TestWithParam<DeviceForm> {};
 
 TEST_P(DyingRuns, LoseNoAccountAndAreFinishedByTheNextRun) {
-  const auto [versionNumber, legacy] = GetParam();
-  const auto version = static_cast<std::uint64_t>(versionNumber);
   ScratchDevice untouched;
-  prepare(untouched, version, legacy);
+  prepare(untouched, GetParam());
   const RunOutcome whole = untouched.run();
   ASSERT_TRUE(whole.succeeded);
   const Survivors survivors = survivorsOf(untouched);
@@ -79,7 +62,7 @@ TEST_P(DyingRuns, LoseNoAccountAndAreFinishedByTheNextRun) {
       const std::string when =
           place + std::to_string(operation) + " of " + std::to_string(whole.operations) + " operations";
       ScratchDevice device;
-      prepare(device, version, legacy);
+      prepare(device, GetParam());
       ASSERT_TRUE(device.run({kind, operation}).died) << when;
       ASSERT_TRUE(device.comparableSettings()) << "no readable settings file " << when;
       expectNoAccountLost(device, survivors, when);
@@ -90,11 +73,11 @@ TEST_P(DyingRuns, LoseNoAccountAndAreFinishedByTheNextRun) {
       numbers.runs += 2;
     }
   }
-  std::cout << "version " << version << ", legacy files " << legacy.name << ": " << whole.operations << " operations, "
-            << numbers.points << " crash points, " << numbers.runs << " runs; " << numbers.differentEnds
+  std::cout << tests::described(GetParam()) << ": " << whole.operations << " operations, " << numbers.points
+            << " crash points, " << numbers.runs << " runs; " << numbers.differentEnds
             << " end unlike an uninterrupted run\n";
   // Only a chain that had already saved when the run died is not taken up again: its file says that it is current.
-  if (version == 12) {
+  if (std::get<0>(GetParam()) == 12) {
     EXPECT_EQ(numbers.differentEnds, 0);
   }
 }
@@ -123,11 +106,8 @@ TEST(DyingChain, IsNotTakenUpAgainAfterItsFirstSave) {
   FAIL() << "no save at all";
 }
 
-std::string nameOf(const testing::TestParamInfo<std::tuple<int, Legacy>>& info) {
-  return "FromVersion" + std::to_string(std::get<0>(info.param)) + "WithLegacy_" + std::get<1>(info.param).name;
-}
-
 INSTANTIATE_TEST_SUITE_P(OfEveryVersionAndLegacyForm, DyingRuns,
-                         testing::Combine(testing::Range(0, 13), testing::ValuesIn(kLegacyForms)), nameOf);
+                         testing::Combine(testing::Range(0, 13), testing::ValuesIn(tests::kLegacyForms)),
+                         tests::nameOf);
 
 }  // namespace

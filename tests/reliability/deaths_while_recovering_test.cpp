@@ -2,41 +2,21 @@
 // settings file is a whole one, no account is gone, and the third run finishes.
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <iostream>
 
-#include "tests/reliability/scratch_device.h"
+#include "tests/reliability/device_forms.h"
 
+using tests::DeviceForm;
 using tests::Mishap;
 using tests::RunOutcome;
 using tests::ScratchDevice;
 
 namespace {
 
+constexpr std::size_t kPairsTried = 3000;
 constexpr Mishap::Kind kDeaths[] = {Mishap::Kind::diesBefore, Mishap::Kind::diesWithin, Mishap::Kind::diesAfter};
 
-struct Case {
-  const char* name;
-  int version;
-  bool hasMail;
-  bool hasExchange;
-  friend void PrintTo(const Case& given, std::ostream* stream) { *stream << given.name; }
-};
-
-void prepare(ScratchDevice& device, const Case& given) {
-  device.putSettings(static_cast<std::uint64_t>(given.version));
-  if (given.hasMail) device.putLegacyMail();
-  if (given.hasExchange) device.putLegacyExchange();
-}
-
-// Some thousand pairs of deaths, or as many of them, evenly spread, as the environment asks for.
-std::size_t strideOver(std::size_t pairs) {
-  const char* const asked = std::getenv("FAILURE_SAMPLES");
-  const std::size_t samples = asked == nullptr ? 3000 : std::strtoul(asked, nullptr, 10);
-  return std::max<std::size_t>(1, pairs / std::max<std::size_t>(1, samples));
-}
-
-class DyingAgain : public testing::TestWithParam<Case> {
+class DyingAgain : public testing::TestWithParam<DeviceForm> {
  protected:
   DyingAgain() {
     prepare(_untouched, GetParam());
@@ -74,22 +54,20 @@ class DyingAgain : public testing::TestWithParam<Case> {
 
 TEST_P(DyingAgain, WhileRecoveringLosesNoAccountAndIsFinishedByTheNextRun) {
   const std::size_t pairs = _deaths.size() * _deaths.size();
-  const std::size_t stride = strideOver(pairs) | 1U;  // odd, so that a sample meets every kind of death
+  // Odd, so that a sample meets every kind of death.
+  const std::size_t stride = tests::strideOver(pairs, kPairsTried) | 1U;
   int tried = 0;
   for (std::size_t pair = 0; pair < pairs; pair += stride, ++tried) {
     dieTwice(_deaths[pair / _deaths.size()], _deaths[pair % _deaths.size()]);
     if (HasFatalFailure()) return;
   }
-  std::cout << GetParam().name << ": " << tried << " of " << pairs << " pairs of deaths, " << tried * 3 << " runs; in "
-            << _finishedBeforehand << " the second run ended before its death\n";
+  std::cout << tests::described(GetParam()) << ": " << tried << " of " << pairs << " pairs of deaths, " << tried * 3
+            << " runs; in " << _finishedBeforehand << " the second run ended before its death\n";
 }
 
-std::string nameOf(const testing::TestParamInfo<Case>& tested) { return tested.param.name; }
-
-INSTANTIATE_TEST_SUITE_P(From, DyingAgain,
-                         testing::Values(Case{"Version0WithLegacyFiles", 0, true, true},
-                                         Case{"Version6WithLegacyMail", 6, true, false},
-                                         Case{"Version12", 12, false, false}),
-                         nameOf);
+INSTANTIATE_TEST_SUITE_P(OfSomeVersions, DyingAgain,
+                         testing::Values(DeviceForm{0, tests::kBothLegacyFiles}, DeviceForm{6, tests::kLegacyMailOnly},
+                                         DeviceForm{12, tests::kNoLegacyFiles}),
+                         tests::nameOf);
 
 }  // namespace

@@ -3,44 +3,24 @@
 // itself is out of reach.
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <iostream>
 
-#include "tests/reliability/scratch_device.h"
+#include "tests/reliability/device_forms.h"
 
+using tests::DeviceForm;
 using tests::RunOutcome;
 using tests::ScratchDevice;
 
 namespace {
 
-struct Case {
-  const char* name;
-  int version;
-  bool hasLegacy;
-  friend void PrintTo(const Case& given, std::ostream* stream) { *stream << given.name; }
-};
-
-void prepare(ScratchDevice& device, const Case& given) {
-  device.putSettings(static_cast<std::uint64_t>(given.version));
-  if (given.hasLegacy) device.putLegacyMail();
-  if (given.hasLegacy) device.putLegacyExchange();
-}
-
-// Every allocation, or as many of them, evenly spread, as the environment asks for.
-std::size_t strideOver(std::size_t allocations) {
-  const char* const asked = std::getenv("FAILURE_SAMPLES");
-  const std::size_t samples = asked == nullptr ? allocations : std::strtoul(asked, nullptr, 10);
-  return std::max<std::size_t>(1, allocations / std::max<std::size_t>(1, samples));
-}
-
-class ShortOfMemory : public testing::TestWithParam<Case> {};
+class ShortOfMemory : public testing::TestWithParam<DeviceForm> {};
 
 TEST_P(ShortOfMemory, RunsLoseNoAccountAndAreFinishedByTheNextRun) {
   ScratchDevice untouched;
   prepare(untouched, GetParam());
   const RunOutcome whole = untouched.run();
   ASSERT_TRUE(whole.succeeded);
-  const std::size_t stride = strideOver(whole.allocations);
+  const std::size_t stride = tests::strideOver(whole.allocations, whole.allocations);
   int runs = 0;
   int succeeded = 0;
   for (std::size_t failing = 1; failing <= whole.allocations; failing += stride) {
@@ -59,15 +39,13 @@ TEST_P(ShortOfMemory, RunsLoseNoAccountAndAreFinishedByTheNextRun) {
     succeeded += outcome.succeeded ? 1 : 0;
     ++runs;
   }
-  std::cout << GetParam().name << ": " << whole.allocations << " allocations, " << runs << " of them failed; "
-            << succeeded << " runs succeeded all the same\n";
+  std::cout << tests::described(GetParam()) << ": " << whole.allocations << " allocations, " << runs
+            << " of them failed; " << succeeded << " runs succeeded all the same\n";
 }
 
-std::string nameOf(const testing::TestParamInfo<Case>& tested) { return tested.param.name; }
-
-INSTANTIATE_TEST_SUITE_P(From, ShortOfMemory,
-                         testing::Values(Case{"Version0WithLegacyFiles", 0, true}, Case{"Version6", 6, false},
-                                         Case{"Version12", 12, false}),
-                         nameOf);
+INSTANTIATE_TEST_SUITE_P(OfSomeVersions, ShortOfMemory,
+                         testing::Values(DeviceForm{0, tests::kBothLegacyFiles}, DeviceForm{6, tests::kNoLegacyFiles},
+                                         DeviceForm{12, tests::kNoLegacyFiles}),
+                         tests::nameOf);
 
 }  // namespace

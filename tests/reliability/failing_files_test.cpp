@@ -8,8 +8,9 @@
 #include <iostream>
 #include <iterator>
 
-#include "tests/reliability/scratch_device.h"
+#include "tests/reliability/device_forms.h"
 
+using tests::DeviceForm;
 using tests::Mishap;
 using tests::RunOutcome;
 using tests::ScratchDevice;
@@ -17,12 +18,6 @@ using tests::ScratchDevice;
 namespace {
 
 class FailingRuns : public testing::TestWithParam<std::tuple<int, bool>> {};
-
-void prepare(ScratchDevice& device, int version, bool withLegacy) {
-  device.putSettings(static_cast<std::uint64_t>(version));
-  if (withLegacy) device.putLegacyMail();
-  if (withLegacy) device.putLegacyExchange();
-}
 
 struct Message {
   const char* operation;  // how it begins
@@ -76,15 +71,16 @@ void expectMessageOf(const RunOutcome& outcome) {
 
 TEST_P(FailingRuns, LeaveAWholeSettingsFileAndNoTemporaryOne) {
   const auto [version, withLegacy] = GetParam();
+  const DeviceForm form{version, withLegacy ? tests::kBothLegacyFiles : tests::kNoLegacyFiles};
   ScratchDevice counted;
-  prepare(counted, version, withLegacy);
+  prepare(counted, form);
   const int operations = counted.run().operations;
   int runs = 0;
   for (const Mishap::Kind kind : {Mishap::Kind::failsOnce, Mishap::Kind::failsFromThenOn}) {
     for (const int error : {ENOSPC, EIO, EACCES, EROFS, EINTR}) {
       for (int operation = 1; operation <= operations; ++operation) {
         ScratchDevice device;
-        prepare(device, version, withLegacy);
+        prepare(device, form);
         const RunOutcome outcome = device.run({kind, operation, error});
         EXPECT_FALSE(outcome.crashed) << "operation " << operation << " error " << error;
         EXPECT_FALSE(outcome.heldLock) << "operation " << operation << " error " << error;
@@ -98,8 +94,7 @@ TEST_P(FailingRuns, LeaveAWholeSettingsFileAndNoTemporaryOne) {
       }
     }
   }
-  std::cout << "version " << version << (withLegacy ? " with" : " without") << " legacy files: " << operations
-            << " operations, " << runs << " faults\n";
+  std::cout << tests::described(form) << ": " << operations << " operations, " << runs << " faults\n";
 }
 
 INSTANTIATE_TEST_SUITE_P(OfSomeVersions, FailingRuns, testing::Combine(testing::Values(0, 6, 11, 12), testing::Bool()));

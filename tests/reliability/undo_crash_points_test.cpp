@@ -6,8 +6,10 @@
 #include <cstdlib>
 #include <iostream>
 
+#include "tests/reliability/device_forms.h"
 #include "tests/reliability/undoable_runs.h"
 
+using tests::DeviceForm;
 using tests::EndState;
 using tests::Mishap;
 using tests::ScratchDevice;
@@ -15,30 +17,14 @@ using tests::UndoOutcome;
 
 namespace {
 
-struct Legacy {
-  const char* name;
-  bool mail;
-  bool exchange;
-};
-
-constexpr Legacy kLegacyForms[] = {
-    {"none", false, false}, {"mail", true, false}, {"exchange", false, true}, {"both", true, true}};
 constexpr Mishap::Kind kDeaths[] = {Mishap::Kind::diesBefore, Mishap::Kind::diesAfter};
-
-void PrintTo(const Legacy& legacy, std::ostream* out) { *out << "legacy files " << legacy.name; }
-
-void prepare(ScratchDevice& device, int version, const Legacy& legacy) {
-  device.putSettings(static_cast<std::uint64_t>(version));
-  if (legacy.mail) device.putLegacyMail();
-  if (legacy.exchange) device.putLegacyExchange();
-}
 
 bool isEveryPointTried() { return std::getenv("EVERY_POINT") != nullptr; }
 
-class Undo : public testing::TestWithParam<std::tuple<int, Legacy>> {
+class Undo : public testing::TestWithParam<DeviceForm> {
  protected:
   void SetUp() override {
-    prepare(undisturbed, version, legacy);
+    prepare(undisturbed, GetParam());
     whole = runUndoable(undisturbed);
     ASSERT_TRUE(whole.succeeded);
     end = endStateOf(undisturbed);
@@ -57,13 +43,10 @@ class Undo : public testing::TestWithParam<std::tuple<int, Legacy>> {
   [[nodiscard]] bool isAsAfterUndisturbedRuns(const EndState& state) const { return state == end || state == endOfTwo; }
 
   void print(const std::string& what, int operations, int runs) const {
-    std::cout << "version " << version << ", legacy files " << legacy.name << ", " << what << ": " << operations
-              << " operations, " << points << " points, " << runs << " runs; " << different
-              << " end unlike an undisturbed run\n";
+    std::cout << tests::described(GetParam()) << ", " << what << ": " << operations << " operations, " << points
+              << " points, " << runs << " runs; " << different << " end unlike an undisturbed run\n";
   }
 
-  const int version = std::get<0>(GetParam());
-  const Legacy legacy = std::get<1>(GetParam());
   ScratchDevice undisturbed;
   UndoOutcome whole;
   EndState end;
@@ -79,7 +62,7 @@ TEST_P(DyingUndoableRuns, AreFinishedByTheNextLikeUndisturbedOnes) {
   for (const Mishap::Kind death : kDeaths) {
     for (int operation = 1; operation <= whole.operations; operation += stride) {
       ScratchDevice device;
-      prepare(device, version, legacy);
+      prepare(device, GetParam());
       const std::string when = "having died at operation " + std::to_string(operation);
       ASSERT_TRUE(runUndoable(device, {death, operation}).died) << when;
       ASSERT_TRUE(device.comparableSettings()) << when;
@@ -93,12 +76,13 @@ class RunsDyingAgain : public Undo {};
 
 // The second run dies, too, at every operation of what it does before the plug-in is called.
 TEST_P(RunsDyingAgain, AreFinishedByTheNextLikeUndisturbedOnes) {
+  const auto [version, legacy] = GetParam();
   const bool isEveryFirst = version == 0 && legacy.mail && legacy.exchange;
   const int firstStride = !isEveryPointTried() ? 31 : isEveryFirst ? 1 : 7;
   for (int first = whole.operationsAhead; first <= whole.operations; first += firstStride) {
     for (int second = 1;; second += stride) {
       ScratchDevice device;
-      prepare(device, version, legacy);
+      prepare(device, GetParam());
       const std::string when = "having died at operations " + std::to_string(first) + " and " + std::to_string(second);
       ASSERT_TRUE(runUndoable(device, {Mishap::Kind::diesAfter, first}).died) << when;
       const UndoOutcome again = runUndoable(device, {Mishap::Kind::diesAfter, second});
@@ -114,7 +98,7 @@ class DyingRestores : public Undo {
   // The operations of a restore after one run.
   [[nodiscard]] int operationsOfARestore() const {
     ScratchDevice counted;
-    prepare(counted, version, legacy);
+    prepare(counted, GetParam());
     EXPECT_TRUE(runUndoable(counted).succeeded);
     return restoreFirst(counted).operations;
   }
@@ -125,7 +109,7 @@ TEST_P(DyingRestores, AreFinishedByTheNextExactly) {
   for (const Mishap::Kind death : kDeaths) {
     for (int operation = 1; operation <= operations; operation += stride) {
       ScratchDevice device;
-      prepare(device, version, legacy);
+      prepare(device, GetParam());
       const auto before = exactStateOf(device);
       ASSERT_TRUE(runUndoable(device).succeeded);
       ASSERT_TRUE(restoreFirst(device, {death, operation}).died) << operation;
@@ -146,7 +130,7 @@ TEST_P(DyingRestores, AreFinishedByTheNextRun) {
   const int operations = operationsOfARestore();
   for (int operation = 1; operation <= operations; operation += stride) {
     ScratchDevice device;
-    prepare(device, version, legacy);
+    prepare(device, GetParam());
     ASSERT_TRUE(runUndoable(device).succeeded);
     ASSERT_TRUE(restoreFirst(device, {Mishap::Kind::diesAfter, operation}).died) << operation;
     ASSERT_TRUE(runUndoable(device).succeeded) << operation;
@@ -157,15 +141,11 @@ TEST_P(DyingRestores, AreFinishedByTheNextRun) {
   print("running after a restore", operations, 3 * points);
 }
 
-std::string nameOf(const testing::TestParamInfo<std::tuple<int, Legacy>>& info) {
-  return "FromVersion" + std::to_string(std::get<0>(info.param)) + "WithLegacy_" + std::get<1>(info.param).name;
-}
+const auto kEveryDevice = testing::Combine(testing::Range(0, 13), testing::ValuesIn(tests::kLegacyForms));
+const auto kSomeDevices = testing::Combine(testing::Values(0, 6, 11, 12), testing::ValuesIn(tests::kLegacyForms));
 
-const auto kEveryDevice = testing::Combine(testing::Range(0, 13), testing::ValuesIn(kLegacyForms));
-const auto kSomeDevices = testing::Combine(testing::Values(0, 6, 11, 12), testing::ValuesIn(kLegacyForms));
-
-INSTANTIATE_TEST_SUITE_P(OfEveryVersionAndLegacyForm, DyingUndoableRuns, kEveryDevice, nameOf);
-INSTANTIATE_TEST_SUITE_P(OfSomeVersions, RunsDyingAgain, kSomeDevices, nameOf);
-INSTANTIATE_TEST_SUITE_P(OfSomeVersions, DyingRestores, kSomeDevices, nameOf);
+INSTANTIATE_TEST_SUITE_P(OfEveryVersionAndLegacyForm, DyingUndoableRuns, kEveryDevice, tests::nameOf);
+INSTANTIATE_TEST_SUITE_P(OfSomeVersions, RunsDyingAgain, kSomeDevices, tests::nameOf);
+INSTANTIATE_TEST_SUITE_P(OfSomeVersions, DyingRestores, kSomeDevices, tests::nameOf);
 
 }  // namespace

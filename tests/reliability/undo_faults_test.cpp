@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <iostream>
 
+#include "tests/reliability/device_forms.h"
 #include "tests/reliability/undoable_runs.h"
 
 using tests::Mishap;
@@ -13,22 +14,18 @@ using tests::UndoOutcome;
 
 namespace {
 
-void prepare(ScratchDevice& device) {
-  device.putSettings(6);
-  device.putLegacyMail();
-  device.putLegacyExchange();
-}
+const tests::DeviceForm kDevice{6, tests::kBothLegacyFiles};
 
 class Faults : public testing::TestWithParam<Mishap::Kind> {};
 
 TEST_P(Faults, WhileTakingASnapshotLeaveTheDeviceAsItWasOrDoNotMatter) {
   ScratchDevice counted;
-  prepare(counted);
+  prepare(counted, kDevice);
   const int ahead = runUndoable(counted).operationsAhead;
   int refused = 0;
   for (int operation = 1; operation <= ahead; ++operation) {
     ScratchDevice device;
-    prepare(device);
+    prepare(device, kDevice);
     const auto before = exactStateOf(device);
     const UndoOutcome outcome = runUndoable(device, {GetParam(), operation, ENOSPC});
     EXPECT_FALSE(outcome.crashed) << operation;
@@ -47,12 +44,12 @@ TEST_P(Faults, WhileTakingASnapshotLeaveTheDeviceAsItWasOrDoNotMatter) {
 
 TEST_P(Faults, DuringARunCostNoAccount) {
   ScratchDevice whole;
-  prepare(whole);
+  prepare(whole, kDevice);
   const UndoOutcome counted = runUndoable(whole);
   const auto markers = whole.markersInSettings();
   for (int operation = counted.operationsAhead + 1; operation <= counted.operations; ++operation) {
     ScratchDevice device;
-    prepare(device);
+    prepare(device, kDevice);
     EXPECT_FALSE(runUndoable(device, {GetParam(), operation, ENOSPC}).crashed) << operation;
     ASSERT_TRUE(restoreFirst(device).succeeded) << operation;
     ASSERT_TRUE(runUndoable(device).succeeded) << operation;
@@ -63,13 +60,13 @@ TEST_P(Faults, DuringARunCostNoAccount) {
 
 TEST_P(Faults, DuringARestoreLeaveTheDeviceAsItWasOrAreMadeGoodByTheNext) {
   ScratchDevice counted;
-  prepare(counted);
+  prepare(counted, kDevice);
   ASSERT_TRUE(runUndoable(counted).succeeded);
   const int operations = restoreFirst(counted).operations;
   int refused = 0;
   for (int operation = 1; operation <= operations; ++operation) {
     ScratchDevice device;
-    prepare(device);
+    prepare(device, kDevice);
     ASSERT_TRUE(runUndoable(device).succeeded);
     const auto migrated = exactStateOf(device);
     const UndoOutcome outcome = restoreFirst(device, {GetParam(), operation, EIO});
