@@ -62,13 +62,17 @@ Tree parsed(const char* bytes, std::uint32_t size) {
   return Tree{tree};
 }
 
+Memory iteratorOver(plist_t from, void (*make)(plist_t, void**)) {
+  void* iterator = nullptr;
+  make(from, &iterator);
+  return Memory{iterator};
+}
+
 plist_t built(plist_t from);
 
 plist_t builtDictionary(plist_t from) {
   const plist_t dictionary = plist_new_dict();
-  plist_dict_iter raw = nullptr;
-  plist_dict_new_iter(from, &raw);
-  const Memory iterator{raw};
+  const Memory iterator = iteratorOver(from, &plist_dict_new_iter);
   while (true) {
     char* key = nullptr;
     plist_t item = nullptr;
@@ -81,9 +85,7 @@ plist_t builtDictionary(plist_t from) {
 
 plist_t builtArray(plist_t from) {
   const plist_t array = plist_new_array();
-  plist_array_iter raw = nullptr;
-  plist_array_new_iter(from, &raw);
-  const Memory iterator{raw};
+  const Memory iterator = iteratorOver(from, &plist_array_new_iter);
   while (true) {
     plist_t item = nullptr;
     plist_array_next_item(from, iterator.get(), &item);
