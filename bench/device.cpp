@@ -6,7 +6,7 @@
 #include <fstream>
 #include <stdexcept>
 
-#include "bench/silent_services.h"
+#include "bench/silence.h"
 #include "platform/linux/libplist_property_list_store.h"
 #include "platform/linux/linux_platform.h"
 

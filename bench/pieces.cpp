@@ -5,6 +5,7 @@
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/log_handle.h"
 #include "bench/memory_device.h"
+#include "bench/unchanging_files.h"
 #include "migrator/accounts_data_migrator.h"
 #include "platform/description.h"
 #include "platform/linux/libplist_property_list_store.h"
@@ -50,10 +51,8 @@ Action compareEqual(const Population& population) {
 }
 
 Action compareIdentical(const Population& population) {
-  return [left = settingsOf(population)] {
-    const Dictionary right = left;
-    use(left == right);
-  };
+  const Dictionary settings = settingsOf(population);
+  return [left = settings, right = settings] { use(left == right); };
 }
 
 Action describe(const Population& population) {
@@ -64,21 +63,12 @@ Action describe(const Population& population) {
 
 // --- Property lists ---
 
-class OneFile final : public platform::FileSystem {
+class OneFile final : public UnchangingFiles {
  public:
   explicit OneFile(Bytes bytes) : _bytes{std::move(bytes)} {}
-  using Path = platform::Path;
-  using Status = platform::Status;
   [[nodiscard]] std::optional<platform::FileKind> kindOf(const Path& /*path*/) override { return std::nullopt; }
   platform::Result<Bytes> read(const Path& /*path*/, std::size_t /*limit*/) override { return _bytes; }
-  Status create(const Path& /*path*/, std::span<const std::uint8_t> /*bytes*/) override { return {}; }
-  Status replace(const Path& /*path*/, std::span<const std::uint8_t> /*bytes*/) override { return {}; }
-  Status copy(const Path& /*from*/, const Path& /*to*/) override { return {}; }
-  Status remove(const Path& /*path*/) override { return {}; }
-  Status createDirectories(const Path& /*path*/, unsigned /*permissions*/) override { return {}; }
-  Status setOwner(const Path& /*path*/, std::string_view /*owner*/, std::string_view /*group*/) override { return {}; }
   [[nodiscard]] std::optional<Path> temporaryName() override { return std::nullopt; }
-  Status rename(const Path& /*from*/, const Path& /*to*/) override { return {}; }
 
  private:
   Bytes _bytes;

@@ -5,25 +5,10 @@
 
 #include "platform/linux/libplist_property_list_store.h"
 #include "platform/linux/rehearsal_file_system.h"
+#include "platform/silent_services.h"
 
 namespace host {
 namespace {
-
-class SilentSystemLog final : public platform::SystemLog {
- public:
-  [[nodiscard]] bool hasReaders() const override { return false; }
-  void write(const platform::LogRecord& /*record*/) override {}
-};
-
-class SilentPreferencesChangedNotice final : public platform::PreferencesChangedNotice {
- public:
-  void post(std::string_view /*domain*/, std::string_view /*key*/) override {}
-};
-
-class SilentCloudTabsNotice final : public platform::CloudTabsNotice {
- public:
-  void post(bool /*enabled*/) override {}
-};
 
 // Where there is no lock file, nobody holds the lock, and taking it leaves nothing behind.
 class NobodysLock final : public platform::ExclusiveFileLock {
@@ -55,9 +40,9 @@ void rehearseOn(platform::Platform& platform, const std::filesystem::path& lockD
   platform.files = platform::makeRehearsalFileSystem(platform.files, platform.directories->systemRoot());
   platform.propertyLists = platform::makeLibplistPropertyListStore(platform.files);
   platform.locks = std::make_shared<RehearsalLocks>(std::move(platform.locks), lockDirectory);
-  platform.systemLog = std::make_shared<SilentSystemLog>();
-  platform.preferencesChanged = std::make_shared<SilentPreferencesChangedNotice>();
-  platform.cloudTabs = std::make_shared<SilentCloudTabsNotice>();
+  platform.systemLog = std::make_shared<platform::SilentSystemLog>();
+  platform.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
+  platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();
 }
 
 }  // namespace host
