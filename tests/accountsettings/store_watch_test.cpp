@@ -14,13 +14,8 @@ using Lines = std::vector<std::string>;
 
 class WatchedStore : public AccountStore {
  protected:
-  WatchedStore() { observe(recorder); }
+  WatchedStore() { device.setObserver(recorder); }
 
-  static void observe(std::shared_ptr<platform::RunObserver> observer) {
-    platform::Platform services = platform::current();
-    services.observer = std::move(observer);
-    platform::setCurrent(std::move(services));
-  }
   Store loadOutdated(const Array& accounts) {
     putFile(accounts, 3);
     return AccountsManager::initInsideOfMigration();
@@ -135,7 +130,7 @@ TEST_F(WatchedStore, IsWatchedByNobodyWhereNobodyWantsFacts) {
   const std::size_t before = StoreWatch::statesTaken();
   recorder->isWanted = false;
   for (const auto& observer : {std::shared_ptr<platform::RunObserver>{recorder}, {}}) {
-    observe(observer);
+    device.setObserver(observer);
     const Store store = loadOutdated({properties("a")});
     store->insertAccount(account("b"));
     store->saveAllAccounts();
@@ -159,7 +154,7 @@ class FailingObserver final : public platform::RunObserver {
 
 TEST_F(WatchedStore, IsAsItWouldBeWithAnObserverThatFails) {
   const auto failing = std::make_shared<FailingObserver>();
-  observe(failing);
+  device.setObserver(failing);
   const Store store = loadOutdated({properties("a")});
   store->insertAccount(account("b"));
   store->saveAllAccounts();

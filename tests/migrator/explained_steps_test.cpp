@@ -17,11 +17,7 @@ using tests::FactRecorder;
 
 class ExplainedSteps : public tests::StepTest {
  protected:
-  ExplainedSteps() {
-    platform::Platform services = platform::current();
-    services.observer = recorder;
-    platform::setCurrent(services);
-  }
+  ExplainedSteps() { device.setObserver(recorder); }
 
   // The facts of one stage.
   [[nodiscard]] std::vector<std::string> told(std::string_view stage) const {

@@ -33,11 +33,7 @@ class Stages final : public platform::RunObserver {
 
 class Dispatch : public tests::StepTest {
  protected:
-  Dispatch() {
-    platform::Platform observed = platform::current();
-    observed.observer = stages;
-    platform::setCurrent(observed);
-  }
+  Dispatch() { device.setObserver(stages); }
 
   void expectStepsFrom(std::size_t first) const {
     std::vector<std::string> expected;

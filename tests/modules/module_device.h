@@ -13,6 +13,7 @@
 #include "platform/linux/linux_platform.h"
 #include "tests/modules/sample_journal.h"
 #include "tests/support/account_configuration.h"
+#include "tests/support/assertion_failures.h"
 #include "tests/support/fake_platform.h"
 #include "tests/support/scratch_directory.h"
 
@@ -32,9 +33,8 @@ class ModuleDevice : public ::testing::Test {
     device.directories->root = _scratch.path();
     std::filesystem::create_directories(root() / "usr/lib");
     std::filesystem::copy(SAMPLE_MODULES_DIR, root() / "usr/lib/samples");
-    auto services = platform::current();
-    services.modules = platform::makeLinuxPlatform().modules;
-    platform::setCurrent(std::move(services));
+    device.changePlatform(
+        [](platform::Platform& services) { services.modules = platform::makeLinuxPlatform().modules; });
     device.files->putDirectory(root() / "var/mobile/Library/Preferences");
     putAccountConfiguration(device);
   }
@@ -52,15 +52,10 @@ class ModuleDevice : public ::testing::Test {
   // What the sample modules were asked to do since this was last called.
   static std::vector<std::string> journal() { return std::exchange(samples::journal(), {}); }
 
-  // The message of the assertion failure that the call ends with; else a text that no failure has.
+  // The message of the assertion failure that the call ends in; where it ends in none, a text that no failure has.
   template <typename Call>
   static std::string failureOf(const Call& call) {
-    try {
-      call();
-    } catch (const AssertionFailure& failure) {
-      return failure.message();
-    }
-    return "(no failure)";
+    return tests::failureOf(call).message();
   }
 
  private:

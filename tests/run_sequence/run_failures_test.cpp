@@ -127,7 +127,7 @@ TEST_F(RunFailures, LockThatCannotBeMadeForWantOfMemoryFailsTheRun) {
 }
 
 TEST_F(RunFailures, ObserverThatThrowsAtTheEndOfAStageFailsNothing) {
-  device.changePlatform([](platform::Platform& services) { services.observer = std::make_shared<ThrowingObserver>(); });
+  device.setObserver(std::make_shared<ThrowingObserver>());
   EXPECT_TRUE(migrator.performMigration());
 }
 

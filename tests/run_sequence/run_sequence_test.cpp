@@ -303,7 +303,7 @@ TEST_F(RunSequence, WithoutALockNoFileIsTouched) {
 }
 
 TEST_F(RunSequence, IsRunWithoutAnybodyWatching) {
-  device.changePlatform([](platform::Platform& services) { services.observer = nullptr; });
+  device.setObserver(nullptr);
   device.put(kLegacyMailFile, legacyMail("M1"));
   EXPECT_TRUE(migrator.performMigration());
 }

@@ -15,8 +15,6 @@ namespace tests {
 using Account = accountsettings::AccountsManager::Account;
 using Accounts = accountsettings::AccountsManager::Accounts;
 
-inline const Path kSettingsFile = "/var/mobile/Library/Preferences/com.vorlix.accountsettings.plist";
-
 // A property dictionary that makes an account, with further properties after the three that it needs.
 [[nodiscard]] inline Dictionary properties(std::string_view identifier,
                                            std::initializer_list<Dictionary::Entry> more = {},

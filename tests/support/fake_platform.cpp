@@ -174,6 +174,16 @@ FakeDevice::FakeDevice() {
   files->putDirectory("/var/mobile/tmp");
 }
 
+void FakeDevice::changePlatform(const std::function<void(platform::Platform&)>& change) {
+  platform::Platform services = platform::current();
+  change(services);
+  platform::setCurrent(std::move(services));
+}
+
+void FakeDevice::setObserver(std::shared_ptr<platform::RunObserver> observer) {
+  changePlatform([&observer](platform::Platform& services) { services.observer = std::move(observer); });
+}
+
 void FakeDevice::put(const Path& path, const Dictionary& dictionary) {
   files->put(path, propertyLists->bytesFor(dictionary));
 }

@@ -22,6 +22,8 @@ using platform::Path;
 using platform::PropertyValue;
 using platform::Text;
 
+inline const Path kSettingsFile = "/var/mobile/Library/Preferences/com.vorlix.accountsettings.plist";
+
 class FakeBaseDirectories final : public platform::BaseDirectories {
  public:
   Path root = "/";
@@ -216,6 +218,11 @@ class FakeDevice {
   std::shared_ptr<FakeLocalizedStrings> strings = std::make_shared<FakeLocalizedStrings>();
   std::shared_ptr<FakeUniqueIdentifiers> identifiers = std::make_shared<FakeUniqueIdentifiers>();
   std::shared_ptr<FakeClock> clock = std::make_shared<FakeClock>();
+
+  // From here on the process's platform is as `change` leaves it.
+  void changePlatform(const std::function<void(platform::Platform&)>& change);
+  // Lets it watch runs; null lets nobody.
+  void setObserver(std::shared_ptr<platform::RunObserver> observer);
 
   // Writes a property list; reads one back (an empty dictionary where there is none).
   void put(const Path& path, const Dictionary& dictionary);

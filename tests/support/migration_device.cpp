@@ -10,16 +10,7 @@ MigrationDevice::MigrationDevice() {
   files->putDirectory(kLegacyMailFile.parent_path());
 }
 
-void MigrationDevice::changePlatform(const std::function<void(platform::Platform&)>& change) {
-  platform::Platform services = platform::current();
-  change(services);
-  platform::setCurrent(std::move(services));
-}
-
-void MigrationDevice::observe() {
-  changePlatform(
-      [this](platform::Platform& services) { services.observer = std::make_shared<RecordingObserver>(outputs); });
-}
+void MigrationDevice::observe() { setObserver(std::make_shared<RecordingObserver>(outputs)); }
 
 void MigrationDevice::switchRecordsOn() {
   preferences->switches[{"com.vorlix.accountsettings-logging", "ASSaveMigrationInformation"}] = true;

@@ -9,7 +9,6 @@
 
 namespace tests {
 
-inline const Path kSettingsFile = "/var/mobile/Library/Preferences/com.vorlix.accountsettings.plist";
 inline const Path kLegacyExchangeFile = "/var/mobile/Library/Preferences/com.vorlix.DataAccess.plist";
 inline const Path kLegacyMailFile = "/var/mobile/Library/Mail/Accounts.plist";
 inline const Path kRemovalSentinel = "/var/mobile/Library/Preferences/.removingOldAccounts";
@@ -34,8 +33,6 @@ class MigrationDevice : public FakeDevice {
  public:
   MigrationDevice();
 
-  // From here on the device's platform is as `change` leaves it.
-  void changePlatform(const std::function<void(platform::Platform&)>& change);
   void observe();  // records the stages in `outputs`
   void switchRecordsOn();
   void putSettings(std::int64_t version, Array accounts);
