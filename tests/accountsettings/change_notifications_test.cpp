@@ -178,10 +178,11 @@ TEST_F(ChangeNotifications, TellOfAReplacedAccountsRemovalOnly) {
 }
 
 TEST_F(ChangeNotifications, DescribeOnlyWhatChangedSinceTheLastSave) {
-  const Store store = load({exchange("a", {kNotes})});
+  const Store store = load({exchange("a", {kNotes}), exchange("b", {kNotes})});
   store->allBasicAccounts()[0]->setDisplayName("Home");
+  store->deleteAccountWithIdentifier("b");
   save(store);
-  EXPECT_THAT(whoHeard(), ElementsAre("NotesNotifier"));
+  EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(2, "b", {kNotes}), entry(1, "a", {kNotes})));
   save(store);
   EXPECT_THAT(whoHeard(), IsEmpty());
 }
@@ -197,8 +198,6 @@ TEST_F(ChangeNotifications, TellAfterTheyWereSwitchedOffOfEverythingSinceTheyLas
   EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(2, "a", {kNotes})));
 }
 
-TEST_F(ChangeNotifications, AreNotSkippedToBeginWith) { EXPECT_FALSE(AccountsManager::_shouldSkipNotifications()); }
-
 TEST_F(ChangeNotifications, TellAfterAFailedSaveOfItsChangesWithTheNext) {
   const Store store = load({exchange("a", {kNotes})});
   store->allBasicAccounts()[0]->setDisplayName("Home");
@@ -211,7 +210,9 @@ TEST_F(ChangeNotifications, TellAfterAFailedSaveOfItsChangesWithTheNext) {
 }
 
 TEST_F(ChangeNotifications, YieldNothingForATypeWithoutNotifiers) {
-  putNotifiers("CalDAV", {Dictionary{{"Type", "FullAccount"}}, "no dictionary"});
+  Dictionary creator = notifier("CalendarsNotifier", {kCalendars});
+  creator.set("Type", "FullAccount");
+  putNotifiers("CalDAV", {creator, "no dictionary"});
   const Store store = load({});
   store->insertAccount(account("a", {{"Enabled Dataclasses", Array{kCalendars}}}));
   save(store);
@@ -291,30 +292,30 @@ class FaultsOfNotifiers : public ChangeNotifications {
     store->allBasicAccounts()[0]->setDisplayName("Home");
     return failureOf([&] { store->saveAllAccounts(); });
   }
-  static std::string failureOfSearch() {
-    return failureOf([] { (void)AccountsManager::_notifierClassNamesForAccountType_dataclass("Exchange", kMail); });
+  static std::string failureOfSearch(std::string_view type = "Exchange") {
+    return failureOf([type] { (void)AccountsManager::_notifierClassNamesForAccountType_dataclass(type, kMail); });
   }
   static constexpr const char* kFind = "+[AccountsManager _notifierClassNamesForAccountType:dataclass:]: ";
+  static std::string missing(std::string_view what) {
+    return kFind + ("Malformed AccountCreators information. Could not find the " + std::string{what});
+  }
 };
 
 TEST_F(FaultsOfNotifiers, IncludeATypeThatTheConfigurationDoesNotKnow) {
   putNotifiers("CalDAV", {});
-  EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the "
-                                                   "information for the type Exchange"});
+  EXPECT_EQ(failureOfSearch(), missing("information for the type Exchange"));
 }
 
 TEST_F(FaultsOfNotifiers, IncludeAConfigurationThatCannotBeRead) {
   device.files->nodes.erase("/resources/AccountCreators.plist");
-  EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the "
-                                                   "information for the type Exchange"});
+  EXPECT_EQ(failureOfSearch(), missing("information for the type Exchange"));
 }
 
 TEST_F(FaultsOfNotifiers, IncludeAMissingFramework) {
   putNotifiers("Exchange",
                {Dictionary{{"Type", "NotifierAccount"},
                            {"Description", Dictionary{{"Class", "X"}, {"Supported Dataclasses", Array{kMail}}}}}});
-  EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the path to "
-                                                   "the framework for the notifier with type Exchange"});
+  EXPECT_EQ(failureOfSearch(), missing("path to the framework for the notifier with type Exchange"));
 }
 
 TEST_F(FaultsOfNotifiers, IncludeAModuleThatCannotBeOpened) {
@@ -325,13 +326,12 @@ TEST_F(FaultsOfNotifiers, IncludeAModuleThatCannotBeOpened) {
 }
 
 TEST_F(FaultsOfNotifiers, IncludeAMissingOrEmptyClassName) {
-  Dictionary description{{"Framework", "/Modules/Test"}, {"Supported Dataclasses", Array{kMail}}};
-  for (int round = 0; round < 2; ++round) {
-    const Array entries{Dictionary{{"Type", "NotifierAccount"}, {"Description", description}}};
-    putNotifiers("Exchange", entries);
-    EXPECT_EQ(failureOfSearch(), kFind + std::string{"Malformed AccountCreators information. Could not find the name "
-                                                     "of the class for notificatinos with the type Exchange"});
-    description.set("Class", "");
+  const Dictionary nameless{{"Framework", "/Modules/Test"}, {"Supported Dataclasses", Array{kMail}}};
+  const Dictionary entry{{"Type", "NotifierAccount"}, {"Description", nameless}};
+  device.put("/resources/AccountCreators.plist",
+             Dictionary{{"Exchange", Array{entry}}, {"LDAP", Array{notifier("", {kMail})}}});
+  for (const std::string type : {"Exchange", "LDAP"}) {
+    EXPECT_EQ(failureOfSearch(type), missing("name of the class for notificatinos with the type " + type));
   }
 }
 

@@ -36,6 +36,10 @@ class SupportingMigrations : public AccountStore {
 
 TEST_F(SupportingMigrations, WritesDataVersionTwelve) { EXPECT_EQ(AccountsManager::currentVersion(), 12U); }
 
+TEST_F(SupportingMigrations, SkipsNoNotificationsToBeginWith) {
+  EXPECT_FALSE(AccountsManager::_shouldSkipNotifications());
+}
+
 TEST_F(SupportingMigrations, SetsTheDataVersionOfAStoreAndNothingElse) {
   const Store store = load({properties("a")});
   store->setDataVersion(UINT64_MAX);
