@@ -76,6 +76,7 @@ std::optional<Dictionary> FakePropertyListStore::readDictionary(const Path& path
 }
 
 platform::SerializedPropertyList FakePropertyListStore::serialize(const Dictionary& dictionary) {
+  if (serializesNothing) return {};
   if (!serializeError.empty() && !serializesDespiteError) return {std::nullopt, serializeError};
   return {bytesFor(dictionary), serializeError};
 }

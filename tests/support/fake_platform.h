@@ -45,7 +45,8 @@ class FakePropertyListStore final : public platform::PropertyListStore {
 
   std::string serializeError;  // where set, serialising fails with it
   bool serializesDespiteError = false;
-  std::vector<Path> reads;  // every path that was asked for, in order
+  bool serializesNothing = false;  // and does not say why
+  std::vector<Path> reads;         // every path that was asked for, in order
   // Called before each read, so that a test can change a file at that moment.
   std::function<void(const Path&)> beforeRead;
 
