@@ -148,10 +148,11 @@ TEST_F(EditingAccounts, RemovesAllAccountsOfATypeForWhichNoneIsGiven) {
 TEST_F(EditingAccounts, PutsGivenAccountsInThePlaceOfTheirIdentifierAndAppendsTheRest) {
   const Store store = storeOf({account("m", {}, "Mail"), account("a"), account("n", {}, "Mail")});
   const Account replacing = withChildren("n", {properties("c")}, "Mail");
-  store->replaceAccountsWithTypes_withAccounts({"Mail"}, {account("new", {}, "Mail"), replacing});
-  EXPECT_EQ(allOf(store), (Lines{"a", "n", "new", "c"}));
+  const Account appended = withChildren("new", {properties("d")}, "Mail");
+  store->replaceAccountsWithTypes_withAccounts({"Mail"}, {appended, replacing});
+  EXPECT_EQ(allOf(store), (Lines{"a", "n", "new", "c", "d"}));
   EXPECT_EQ(store->accountWithIdentifier("n"), replacing);
-  EXPECT_NE(store->accountWithIdentifier("new"), nullptr);
+  EXPECT_EQ(store->accountWithIdentifier("d"), appended);
 }
 
 TEST_F(EditingAccounts, ReplacesAnAccountOfTheSameIdentifierWhateverItsType) {

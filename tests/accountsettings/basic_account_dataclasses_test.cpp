@@ -85,6 +85,12 @@ TEST_F(RecordDataclasses, ARestrictedOneIsNeitherProvisionedNorEnabledButStaysSt
   EXPECT_EQ(storedIn(*account), stored);
 }
 
+TEST_F(RecordDataclasses, NothingIsProvisionedWhereAllThatTheServiceGrantsIsRestricted) {
+  device.restrictions->restrictions[ManagedFeature::cloudBackup] = Restriction::notAllowed;
+  const auto account = make("VorlixAccount", {{"Provisioned Dataclasses", Array{kAccountDataclassBackup}}});
+  EXPECT_EQ(account->provisionedDataclasses(), Dataclasses{});
+}
+
 TEST_F(RecordDataclasses, EachForbiddenFeatureRestrictsItsOwn) {
   const std::vector<std::pair<ManagedFeature, std::unordered_set<std::string_view>>> table{
       {ManagedFeature::cloudDocumentSync, {kAccountDataclassQuorvel, kAccountDataclassKeyValue}},

@@ -223,6 +223,7 @@ TEST_F(Record, KeepsAKeysPlaceWhenItIsOverwritten) {
   const auto account = make({{"DisplayName", "N"}, {"Type", "CalDAV"}, {"Class", "X"}, {"Identifier", "A"}});
   account->setDisplayName("M");
   EXPECT_EQ(account->properties().begin()->key, Text{"DisplayName"});
+  EXPECT_EQ(account->displayName(), Text{"M"});
 }
 
 TEST_F(Record, TakesAnotherClassNameThroughItsSetter) {

@@ -71,6 +71,14 @@ TEST_F(DeviceLocal, IsTheFullAccountOfARecordWhoseCreatorNamesItsClass) {
   EXPECT_EQ(full->properties(), record->properties());
 }
 
+TEST_F(DeviceLocal, IsMadeFromPropertiesForACreatorThatNamesItsClassForTheType) {
+  const auto* const info =
+      dynamic_cast<const AccountClassInfo*>(platform::current().classes->classNamed("DeviceLocalAccount"));
+  ASSERT_NE(info, nullptr);
+  const auto made = info->initWithProperties(DeviceLocalAccount::basicAccountProperties());
+  EXPECT_NE(std::dynamic_pointer_cast<DeviceLocalAccount>(made), nullptr);
+}
+
 TEST_F(DeviceLocal, NamesItsTypeByTheDevicesClass) {
   const std::vector<std::pair<std::optional<PropertyValue>, std::string>> table{
       {std::nullopt, "ON_MY_DEVICE_TYPE_FERROX"},

@@ -4,7 +4,6 @@
 
 #include <algorithm>
 
-#include "accountsettings/product_values.h"
 #include "tests/support/account_store.h"
 
 namespace tests {
@@ -62,8 +61,8 @@ TEST_F(FixingMailAccounts, DerivesTheClassFromThePath) {
       {"Mail/Nimbra-x", "NimbraAccount"},
       {"Mail/AOL-x", "AOLAccount"},
       {"Mail/Mailboxes", "LocalAccount"},
-      {"Mail/IMAP-anna" + std::string{accountsettings::kGmailAccountPathFragment.view()}, "GmailAccount"},
-      {"Mail/IMAP-anna" + std::string{accountsettings::kYahooAccountPathFragment.view()}, "YahooAccount"},
+      {"Mail/IMAP-anna@gmail.com@imap.gmail.com", "GmailAccount"},
+      {"Mail/IMAP-anna@imap.mail.yahoo.com", "YahooAccount"},
       {"Mail/POP-x", "POPAccount"},
       {"Mail/IMAP-x", "IMAPAccount"}};
   for (const auto& [path, className] : cases) {
@@ -74,14 +73,9 @@ TEST_F(FixingMailAccounts, DerivesTheClassFromThePath) {
 }
 
 TEST_F(FixingMailAccounts, LetsTheEarlierFragmentOfTheTableWinWhereverItStands) {
-  const std::vector<std::string> inOrder{"Mail/Lumo-",
-                                         "Mail/Nimbra-",
-                                         "Mail/AOL-",
-                                         "Mail/Mailboxes",
-                                         std::string{accountsettings::kGmailAccountPathFragment.view()},
-                                         std::string{accountsettings::kYahooAccountPathFragment.view()},
-                                         "Mail/POP-",
-                                         "Mail/IMAP-"};
+  const std::vector<std::string> inOrder{
+      "Mail/Lumo-",           "Mail/Nimbra-", "Mail/AOL-", "Mail/Mailboxes", "gmail.com@imap.gmail.com",
+      "@imap.mail.yahoo.com", "Mail/POP-",    "Mail/IMAP-"};
   const std::vector<const char*> classes{"WexmoAccount", "NimbraAccount", "AOLAccount", "LocalAccount",
                                          "GmailAccount", "YahooAccount",  "POPAccount", "IMAPAccount"};
   for (std::size_t first = 0; first < inOrder.size(); ++first) {
