@@ -90,9 +90,8 @@ TEST_F(RunFailures, WhatIsNoExceptionFailsTheRunToo) {
 
 TEST_F(RunFailures, MissingConfigurationFailsTheRun) {
   device.files->nodes.erase("/resources/AccountTypesProperties.plist");
-  EXPECT_FALSE(migrator.performMigration());
-  EXPECT_THAT(device.console->lines.back(), testing::StartsWith("AccountsDataMigrator: The migration was given up. "));
-  expectCleanedUp();
+  expectGivenUp(
+      "Assertion failure in +[BasicAccount initialize], BasicAccount: Could not find AccountTypesProperties.plist");
 }
 
 TEST_F(RunFailures, StagesEndAlsoWhereOneIsLeftByAnException) {

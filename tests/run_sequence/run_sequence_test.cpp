@@ -31,6 +31,20 @@ Dictionary legacyMail(std::string_view identifier) {
   return {{"MailAccounts", Array{Dictionary{{"AccountType", "IMAPAccount"}, {"uniqueId", identifier}}}}};
 }
 
+// Does something when one stage of a run begins.
+class StageWatch final : public platform::RunObserver {
+ public:
+  StageWatch(std::string_view stage, std::function<void()> work) : _stage{stage}, _work{std::move(work)} {}
+  void stageBegan(std::string_view stage) override {
+    if (stage == _stage) _work();
+  }
+  void stageEnded(std::string_view) override {}
+
+ private:
+  std::string _stage;
+  std::function<void()> _work;
+};
+
 class RunSequence : public testing::Test {
  protected:
   RunSequence() { device.observe(); }
@@ -126,6 +140,29 @@ TEST_F(RunSequence, VersionStepsFindTheConvertedAccountsAndTheLoadedVersion) {
   };
   EXPECT_TRUE(migrator.performMigration());
   EXPECT_EQ(versionSteps().runs, 1);
+}
+
+TEST_F(RunSequence, StoreIsStampedBeforeItIsSavedEvenAfterFailedVersionSteps) {
+  device.putSettings(3, {});
+  std::vector<std::uint64_t> versionsAtSave;
+  versionSteps().answer = false;
+  versionSteps().work = [&](AccountsManager& store) {
+    device.propertyLists->beforeRead = [&](const Path&) { versionsAtSave.push_back(store.dataVersion()); };
+  };
+  EXPECT_FALSE(migrator.performMigration());
+  EXPECT_THAT(versionsAtSave, ElementsAre(12));
+}
+
+TEST_F(RunSequence, StoreIsGoneBeforeTheLegacyFilesAre) {
+  device.put(kLegacyMailFile, legacyMail("M1"));
+  std::weak_ptr<accountsettings::BasicAccount> account;
+  versionSteps().work = [&](AccountsManager& store) { account = store.accountWithIdentifier("M1"); };
+  bool isGone = false;
+  device.changePlatform([&](platform::Platform& services) {
+    services.observer = std::make_shared<StageWatch>("legacy removal", [&] { isGone = account.expired(); });
+  });
+  EXPECT_TRUE(migrator.performMigration());
+  EXPECT_TRUE(isGone);
 }
 
 TEST_F(RunSequence, FailedConversionShowsOnlyOnTheConsoleAndItsFileIsDeleted) {
@@ -265,6 +302,7 @@ TEST_F(RunSequence, ReportHoldsTheInputsAndTheResultInTheirOrder) {
 
 TEST_F(RunSequence, NoReportIsMadeWhileRecordsAreOff) {
   device.put(kLegacyMailFile, legacyMail("M1"));
+  migrator._collatedMigrationData.emplace();
   EXPECT_TRUE(migrator.performMigration());
   EXPECT_FALSE(migrator._collatedMigrationData.has_value());
   EXPECT_FALSE(device.files->exists(kReportDirectory));
