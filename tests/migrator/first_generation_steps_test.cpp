@@ -328,6 +328,18 @@ TEST_F(MailAndCalDAV, FoldsEveryPartnerOfAnUmbrella) {
   EXPECT_EQ(store->count(), 1U);
 }
 
+TEST_F(MailAndCalDAV, DeletesPartnersInTheOrderOfTheStoreWhateverTheirLogins) {
+  Dictionary ofWholeName = googlePartner("D", "jane");
+  ofWholeName.set("CalDAVPrincipalConfiguration",
+                  Dictionary{{"Login_Key", "jane@example"}, {"CalDAV_Server_Key", "www.google.com"}});
+  load({gmail("G", "jane@example"), googlePartner("C", "jane"), ofWholeName});
+  migrate();
+  const std::vector<std::string> messages = device.logMessages();
+  ASSERT_EQ(messages.size(), 2U);
+  EXPECT_THAT(messages[0], testing::HasSubstr("Identifier = \"C\""));
+  EXPECT_THAT(messages[1], testing::HasSubstr("Identifier = \"D\""));
+}
+
 TEST_F(MailAndCalDAV, DeletesAPartnerOfTwoUmbrellasTwice) {
   load({gmail("G", "jane@example"), gmail("H", "jane@elsewhere"), googlePartner("C", "jane")});
   migrate();

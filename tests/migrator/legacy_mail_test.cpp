@@ -178,7 +178,9 @@ TEST_F(LegacyMail, DeliveryAccountWhoseClassIsNoTextGetsTheGenericOne) {
 
 TEST_F(LegacyMail, IncomingAccountWithoutClassYieldsNothing) {
   EXPECT_EQ(convert({{"uniqueId", "M1"}}), nullptr);
-  EXPECT_EQ(convert({{"uniqueId", "M1"}, {"AccountType", 3}}), nullptr);
+  EXPECT_EQ(convert({{"uniqueId", "M1"}, {"AccountType", 3}, {"Type", "Unknown"}}), nullptr);
+  EXPECT_THAT(device.logMessages(), ElementsAre("Missing account class.", "Missing account class."))
+      << "the type is the incoming one whatever the description says";
 }
 
 struct UsernameRow {

@@ -142,7 +142,7 @@ TEST_F(MigrationRecords, ReportDirectoryThatCannotBeMadeIsReported) {
                           "at " +
                               kReportDirectory.string() + " [Error = Could not createDirectories " +
                               kReportDirectory.string() + ": Input/output error (errno 5)]"));
-  EXPECT_FALSE(device.files->exists(kReportFile));
+  EXPECT_THAT(device.files->calls, Not(Contains("replace " + kReportFile.string())));
 }
 
 TEST_F(MigrationRecords, FileInTheDirectorysPlaceIsReported) {
@@ -152,6 +152,7 @@ TEST_F(MigrationRecords, FileInTheDirectorysPlaceIsReported) {
   EXPECT_THAT(device.console->lines, ElementsAre(kSaving, "AccountMigrator warning: " + kReportDirectory.string() +
                                                               " already exists and is not a directory"));
   EXPECT_EQ(device.files->contents(kReportDirectory), "a file");
+  EXPECT_THAT(device.files->calls, Not(Contains("replace " + kReportFile.string())));
 }
 
 TEST_F(MigrationRecords, NobodyHearsOfAReportThatCannotBeSerialisedOrWritten) {

@@ -118,6 +118,22 @@ TEST_F(HostedParents, TakeOverWhatBelongsToTheWholeAccount) {
                   {"Class", "NimbraAccount"}}));
 }
 
+TEST_F(HostedParents, HoldTheirEntriesInOneOrderWhateverTheMailAccounts) {
+  Dictionary reversed;
+  for (auto entry = kHostedMail.end(); entry != kHostedMail.begin();) {
+    --entry;
+    reversed.set(entry->key, entry->value);
+  }
+  load({reversed});
+  migrate();
+  std::vector<std::string> keys;
+  for (const auto& entry : at(0).properties()) keys.push_back(entry.key.string());
+  EXPECT_THAT(keys,
+              ElementsAre("Username", "DisplayName", "Enabled Dataclasses", "Provisioned Dataclasses", "ChildAccounts",
+                          "CalDAVEnabled", "Subscribed Calendars", "DAExoSubscribedCalendarInfos", "Type String",
+                          "Short Type String", "Type", "Class", "Identifier", "Sync Identifier"));
+}
+
 TEST_F(HostedParents, LeaveTheRestWithTheMailAccountWhichBecomesTheLastChild) {
   load({kHostedMail});
   migrate();

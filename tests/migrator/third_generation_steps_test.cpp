@@ -108,6 +108,18 @@ TEST_F(PrimaryAccount, IsElseTheFirstCloudAccountWithItsStatus) {
   EXPECT_EQ(value(2, "Type String"), kAbsent);
 }
 
+TEST_F(PrimaryAccount, IsElseTheFirstWithItsStatusWhateverOtherCloudAccountsStandBefore) {
+  const Dictionary separate = account("VorlixAccount", "Any", "V", {{kStatus, 2}});
+  const Array children{account("Nimbra", "NimbraAccount", "1")};
+  for (const Dictionary& before :
+       {cloud("K", {{kStatus, 1}}), cloud("K", {{kStatus, 2}, {"ChildAccounts", children}})}) {
+    load({before, separate});
+    migrate();
+    EXPECT_EQ(value(0, "primaryAccount"), kAbsent);
+    EXPECT_EQ(value(1, "primaryAccount"), PropertyValue{true});
+  }
+}
+
 TEST_F(PrimaryAccount, MayBeASeparateCloudAccountThatDoesNotLocateTheDevice) {
   load({cloud("K", {{kStatus, 2}})});
   migrate();

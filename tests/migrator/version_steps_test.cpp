@@ -191,6 +191,9 @@ TEST_F(Dispatch, CollectsNothingWhereNoReportIsWanted) {
   load({}, 11);
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
   EXPECT_FALSE(migrator._collatedMigrationData.has_value());
+  migrator._collatedMigrationData.emplace();
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_TRUE(migrator._collatedMigrationData->empty());
 }
 
 TEST_F(Dispatch, FindsTheSettingsFileByItsPathAlone) {
