@@ -65,7 +65,7 @@ class WrittenStep(KitTest):
         self.rewrite(SOURCE, UNWRITTEN, "}", WRITTEN + "}")
         self.rewrite(TESTS, FAILING, ";\n", PASSING)
         self.build()
-        self.assertIn("[  PASSED  ] 4 tests.", self.generated_tests())
+        self.assertIn("0 of 4 tests failed.", self.generated_tests())
         self.golden_devices()
 
 
