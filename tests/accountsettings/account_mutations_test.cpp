@@ -43,6 +43,7 @@ TEST_F(EditingAccounts, InsertsNothingUnderAnIdentifierThatIsRegistered) {
   store->insertAccount(account("a", {{"Port", 2}}));
   EXPECT_EQ(store->allBasicAccounts(), (Accounts{registered}));
   EXPECT_EQ(store->accountWithIdentifier("a"), registered);
+  EXPECT_EQ(device.logMessages().size(), 2U) << "each attempt is logged, and no refusal";
 }
 
 TEST_F(EditingAccounts, UpdatesEveryPlaceOfTheIdentifier) {
@@ -60,6 +61,7 @@ TEST_F(EditingAccounts, UpdatesNothingWhereTheAccountIsNotInTheStore) {
   store->updateAccount(withChildren("b", {properties("c")}));
   EXPECT_EQ(allOf(store), (Lines{"a"}));
   EXPECT_EQ(store->accountWithIdentifier("b"), nullptr);
+  EXPECT_EQ(messagesOf("-[AccountsManager updateAccount:]").size(), 1U);
 }
 
 TEST_F(EditingAccounts, UpdatesARecordByItself) {
@@ -95,6 +97,7 @@ TEST_F(EditingAccounts, DeletesNothingFromTheOrderWhereNoneHasTheIdentifier) {
   const Store store = storeOf({account("a")});
   store->deleteAccount(account("b"));
   EXPECT_EQ(orderOf(store), (Lines{"a"}));
+  EXPECT_EQ(messagesOf("-[AccountsManager deleteAccount:]").size(), 1U);
 }
 
 TEST_F(EditingAccounts, DeletesATopLevelAccountByItsIdentifier) {

@@ -4,6 +4,7 @@
 
 #include <algorithm>
 
+#include "accountsettings/assertion_failure.h"
 #include "tests/support/account_store.h"
 
 namespace tests {
@@ -114,6 +115,15 @@ TEST_F(FixingMailAccounts, AnnouncesARepairAfterAFailedSaveToo) {
   store->insertAccount(made(mail("MailAccount", "Mail/IMAP-x")));
   device.files->failing = {"rename"};
   store->saveAllAccounts();
+  EXPECT_EQ(notices(), 1);
+}
+
+TEST_F(FixingMailAccounts, AnnouncesARepairBeforeAnybodyIsToldOfTheSave) {
+  const Store store = load({});
+  const Account account = made(mail("MailAccount", "Mail/IMAP-x"));
+  account->setEnabled_forDataclass(true, "com.vorlix.Dataclass.Mail");
+  store->insertAccount(account);
+  EXPECT_THROW(store->saveAllAccounts(), accountsettings::AssertionFailure);  // the configuration names no notifiers
   EXPECT_EQ(notices(), 1);
 }
 

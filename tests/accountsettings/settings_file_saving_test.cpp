@@ -226,6 +226,18 @@ TEST_F(SavingAccounts, OffersTheAccountsToTheFixersFromTheLastToTheFirst) {
   EXPECT_NE(messages[1].find("Identifier = \"a\""), std::string::npos);
 }
 
+TEST_F(SavingAccounts, SaysThatItSavesThenWhatItFixesThenWhatIsWrongInTheFileThenWhatItMerges) {
+  const Store store = load({properties("a"), Dictionary{{"Type", "CalDAV"}}});
+  store->allBasicAccounts()[0]->_forcedSetAccountProperty_forKey("Mail", "Type");
+  device.systemLog->lines.clear();
+  store->saveAllAccounts();
+  Lines beginnings;
+  for (const std::string& message : device.logMessages()) beginnings.push_back(message.substr(0, message.find(" {")));
+  EXPECT_EQ(beginnings, (Lines{"Saving all accounts", "Could not fix the class of the mail account:",
+                               "Missing account class.", "ERROR: Failed to create a BasicAccount from", "Merging inmem",
+                               "Merged to", "Calculated Properties - Type: Mail, Properties:"}));
+}
+
 struct Failure {
   const char* name;
   std::function<void(FakeDevice&)> arrange;
