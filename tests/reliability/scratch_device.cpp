@@ -40,11 +40,15 @@ class Report {
   explicit Report(const std::filesystem::path& path)
       : _file{::open(path.c_str(), O_WRONLY | O_CREAT | O_APPEND | O_CLOEXEC, 0600)} {}
   void line(std::string_view text) const {
-    static_cast<void>(::write(_file, text.data(), text.size()));
-    static_cast<void>(::write(_file, "\n", 1));
+    put(text);
+    put("\n");
   }
 
  private:
+  void put(std::string_view text) const {
+    if (::write(_file, text.data(), text.size()) != static_cast<ssize_t>(text.size())) std::abort();
+  }
+
   int _file;
 };
 

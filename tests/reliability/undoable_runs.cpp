@@ -99,7 +99,8 @@ bool restore(Child& child) {
     status = kRefused;
   }
   child.operations[1] = child.files->operations();
-  static_cast<void>(::write(out, child.operations.data(), sizeof child.operations));
+  constexpr auto size = static_cast<ssize_t>(sizeof child.operations);
+  if (::write(out, child.operations.data(), sizeof child.operations) != size) std::abort();
   ::_exit(status);
 }
 
@@ -112,7 +113,8 @@ UndoOutcome inChild(const std::filesystem::path& root, const Mishap& mishap, boo
   ::waitpid(child, &status, 0);
   ::close(pipe[1]);
   std::array<int, 2> operations{};
-  static_cast<void>(::read(pipe[0], operations.data(), sizeof operations));
+  // A child that died has said nothing.
+  if (::read(pipe[0], operations.data(), sizeof operations) < 0) throw std::runtime_error{"no answer from a child"};
   ::close(pipe[0]);
   const int code = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
   return {.died = code == kDied,
