@@ -111,7 +111,7 @@ class ACCOUNT_EXPORT AccountsManager {
       std::string_view type, bool beginningOfSentence);
   // Internal: the child index.
   void _loadChildrenFromAccount(const Account& account);
-  void _removeChildrenForAccountWithIdentifier(std::string_view identifier);
+  void _removeChildrenForAccountWithIdentifier(const Text& identifier);
 
   // --- Mutations and merge (accounts_manager_mutations.cpp, accounts_manager_merge.cpp); in memory until saved ---
 
@@ -184,7 +184,7 @@ class ACCOUNT_EXPORT AccountsManager {
   AccountsByID _topLevelAccountsByID;
   Accounts _orderedTopLevelAccounts;
   AccountsByID _childAccountsByID;
-  platform::InsertionOrderedMap<std::string> _childAccountIDToParentAccountID;
+  platform::InsertionOrderedMap<Text> _childAccountIDToParentAccountID;
   // The children that were indexed when each parent was last registered; one that another parent has taken over since
   // may still stand here, so `_childAccountIDToParentAccountID` decides.
   platform::InsertionOrderedMap<std::vector<Text>> _childIdentifiersByParentID;

@@ -37,7 +37,7 @@ Account AccountsManager::accountWithIdentifier(std::string_view identifier) cons
   if (const Account* const account = _topLevelAccountsByID.find(identifier)) return *account;
   const Account* const child = _childAccountsByID.find(identifier);
   const std::optional<Text> childIdentifier = child == nullptr ? std::nullopt : (*child)->identifier();
-  const std::string* const parentIdentifier =
+  const Text* const parentIdentifier =
       childIdentifier ? _childAccountIDToParentAccountID.find(*childIdentifier) : nullptr;
   return parentIdentifier == nullptr ? nullptr : foundIn(_topLevelAccountsByID, *parentIdentifier);
 }
@@ -152,7 +152,7 @@ void AccountsManager::_loadChild(const PropertyValue& properties, const Account&
     return;
   }
   _childAccountsByID.set(*identifier, child);
-  _childAccountIDToParentAccountID.set(*identifier, parentIdentifier.string());
+  _childAccountIDToParentAccountID.set(*identifier, parentIdentifier);
   if (std::vector<Text>* const indexed = _childIdentifiersByParentID.find(parentIdentifier)) {
     indexed->push_back(*identifier);
   } else {
@@ -160,15 +160,15 @@ void AccountsManager::_loadChild(const PropertyValue& properties, const Account&
   }
 }
 
-void AccountsManager::_removeChildrenForAccountWithIdentifier(std::string_view identifier) {
+void AccountsManager::_removeChildrenForAccountWithIdentifier(const Text& identifier) {
   const std::vector<Text>* const indexed = _childIdentifiersByParentID.find(identifier);
   if (indexed == nullptr) return;
   // The argument may be text of a record that goes here.
-  const std::string parentIdentifier{identifier};
+  const Text parentIdentifier = identifier;
   const std::vector<Text> children = *indexed;
   _childIdentifiersByParentID.remove(parentIdentifier);
   for (const Text& child : children) {
-    const std::string* const recorded = _childAccountIDToParentAccountID.find(child);
+    const Text* const recorded = _childAccountIDToParentAccountID.find(child);
     const bool isTakenOverByAnotherParent = recorded == nullptr || *recorded != parentIdentifier;
     if (isTakenOverByAnotherParent) continue;
     _childAccountIDToParentAccountID.remove(child);

@@ -148,9 +148,9 @@ void AccountsManager::_moveChild(const Account& child, const Replacement& replac
 }
 
 void AccountsManager::_takeFromRecordedParent(const Text& child, const Account& newParent) {
-  const std::string* const recorded = _childAccountIDToParentAccountID.find(child);
+  const Text* const recorded = _childAccountIDToParentAccountID.find(child);
   if (recorded == nullptr) return;
-  const bool isAlreadyThere = newParent != nullptr && newParent->identifier() == Text{*recorded};
+  const bool isAlreadyThere = newParent != nullptr && newParent->identifier() == *recorded;
   const Account parent = isAlreadyThere ? newParent : accountWithIdentifier(*recorded);
   if (parent != nullptr) removeChildWithIdentifier_fromAccount(child, parent);
 }

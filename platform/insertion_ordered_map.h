@@ -1,10 +1,11 @@
 #pragma once
 
 #include <list>
-#include <string>
 #include <string_view>
 #include <unordered_map>
 #include <utility>
+
+#include "platform/text.h"
 
 namespace platform {
 
@@ -14,7 +15,7 @@ namespace platform {
 template <typename Value>
 class InsertionOrderedMap {
  public:
-  using Entry = std::pair<const std::string, Value>;
+  using Entry = std::pair<const Text, Value>;
   using const_iterator = typename std::list<Entry>::const_iterator;
 
   InsertionOrderedMap() = default;
@@ -46,13 +47,13 @@ class InsertionOrderedMap {
     return place == _places.end() ? nullptr : &place->second->second;
   }
 
-  void set(std::string_view key, Value value) {
+  void set(Text key, Value value) {
     if (Value* const present = find(key)) {
       *present = std::move(value);
       return;
     }
-    _entries.emplace_back(std::string{key}, std::move(value));
-    _places.emplace(_entries.back().first, std::prev(_entries.end()));
+    _entries.emplace_back(std::move(key), std::move(value));
+    _places.emplace(_entries.back().first.view(), std::prev(_entries.end()));
   }
 
   // Answers whether the key was there.

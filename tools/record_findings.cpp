@@ -62,7 +62,8 @@ class Examination {
   void examineChildren(const Dictionary& parent);
   void examineChild(const PropertyValue& element);
   void note(const Dictionary& record, bool isChild);
-  [[nodiscard]] std::string placeFoundUnder(const AccountsManager& store, const std::string& identifier) const;
+  [[nodiscard]] std::string placeFoundUnder(const AccountsManager& store,
+                                            const accountsettings::Text& identifier) const;
 
   std::string _place;  // of the record that is looked at
   Findings _findings;
@@ -176,10 +177,10 @@ void Examination::note(const Dictionary& record, bool isChild) {
 }
 
 // A child's identifier leads to its parent, so what is found then is a child: the last one.
-std::string Examination::placeFoundUnder(const AccountsManager& store, const std::string& identifier) const {
+std::string Examination::placeFoundUnder(const AccountsManager& store, const accountsettings::Text& identifier) const {
   const auto& order = store.allBasicAccounts();
   const auto found = store.accountWithIdentifier(identifier);
-  if (found->identifier() != accountsettings::Text{identifier}) {
+  if (found->identifier() != identifier) {
     return _placesByIdentifier.find(identifier)->back().place;
   }
   return _loadedPlaces[static_cast<std::size_t>(std::ranges::find(order, found) - order.begin())];
@@ -192,7 +193,7 @@ void Examination::compare(const Array& accounts) {
     const auto found = placeFoundUnder(*store, identifier);
     for (const auto& [place, isChild] : places) {
       if (place == found) continue;
-      _findings.push_back({"duplicate-identifier", place, identifier, found + " has the same identifier",
+      _findings.push_back({"duplicate-identifier", place, identifier.string(), found + " has the same identifier",
                            std::string{"a migration keeps both, but finds only that one"} +
                                (isChild ? "" : ", and saves its values in place of these")});
     }

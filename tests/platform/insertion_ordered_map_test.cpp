@@ -11,7 +11,7 @@ namespace {
 
 std::vector<std::string> keysOf(const InsertionOrderedMap<int>& map) {
   std::vector<std::string> keys;
-  for (const auto& entry : map) keys.push_back(entry.first);
+  for (const auto& entry : map) keys.push_back(entry.first.string());
   return keys;
 }
 
