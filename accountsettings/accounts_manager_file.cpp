@@ -36,12 +36,12 @@ void logCalculated(const BasicAccount& account, const Dictionary& merged) {
                      dataclasses);
 }
 
-std::optional<Bytes> serialized(const Dictionary& root) {
-  platform::SerializedPropertyList list = platform::current().propertyLists->serialize(root);
-  if (!list.data || !list.errorDescription.empty()) {
+std::shared_ptr<const Bytes> serialized(const Dictionary& root) {
+  const platform::SerializedPropertyList list = platform::current().propertyLists->serialize(root);
+  if (list.data == nullptr || !list.errorDescription.empty()) {
     _ASLogSystem().log(kSave, "Failed to serialize account settings data: %@", list.errorDescription);
   }
-  return std::move(list.data);
+  return list.data;
 }
 
 Status giveToOwner(FileSystem& files, const Path& path) {
@@ -61,11 +61,11 @@ Status moveOntoSettingsFile(FileSystem& files, const Path& temporary) {
 
 // The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails or is
 // thrown, no temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
-Status replaceSettingsFile(const std::optional<Bytes>& data) {
+Status replaceSettingsFile(const std::shared_ptr<const Bytes>& data) {
   FileSystem& files = *platform::current().files;
   const std::optional<Path> temporary = files.temporaryName();
   if (!temporary) return Status::failure(EEXIST, "find a name for a temporary file");
-  if (!data) return Status::failure(EINVAL, "serialize the accounts");
+  if (data == nullptr) return Status::failure(EINVAL, "serialize the accounts");
   if (Status made = files.create(*temporary, *data); !made.isOk()) return made;
   Status status;
   try {

@@ -35,7 +35,7 @@ class ValuesInMemory final : public platform::PropertyListStore {
   }
   [[nodiscard]] platform::SerializedPropertyList serialize(const Dictionary& dictionary) override {
     _values = dictionary;
-    return {Bytes{0}, {}};
+    return {std::make_shared<const Bytes>(Bytes{0}), {}};
   }
 
  private:

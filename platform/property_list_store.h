@@ -1,5 +1,6 @@
 #pragma once
 
+#include <memory>
 #include <optional>
 #include <string>
 
@@ -9,8 +10,8 @@
 namespace platform {
 
 struct SerializedPropertyList {
-  std::optional<Bytes> data;
-  std::string errorDescription;  // empty where nothing went wrong
+  std::shared_ptr<const Bytes> data;  // null where there is none; the store may keep it, too
+  std::string errorDescription;       // empty where nothing went wrong
 };
 
 // Property lists as files and bytes. Reads the binary and the XML form and writes the binary form, version 1.0.

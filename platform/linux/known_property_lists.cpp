@@ -38,23 +38,23 @@ bool isWrittenAlike(const PropertyValue& left, const PropertyValue& right) {
 std::optional<Dictionary> KnownPropertyLists::valuesOf(std::span<const std::uint8_t> bytes) {
   const std::scoped_lock lock{_guard};
   const auto known =
-      std::ranges::find_if(_lists, [bytes](const Known& each) { return std::ranges::equal(each.bytes, bytes); });
+      std::ranges::find_if(_lists, [bytes](const Known& each) { return std::ranges::equal(*each.bytes, bytes); });
   if (known == _lists.end()) return std::nullopt;
   makeLatest(known);
   return _lists.back().values;
 }
 
-std::optional<Bytes> KnownPropertyLists::bytesOf(const Dictionary& values) {
+std::shared_ptr<const Bytes> KnownPropertyLists::bytesOf(const Dictionary& values) {
   const std::scoped_lock lock{_guard};
   const auto known = std::ranges::find_if(
       _lists, [&values](const Known& each) { return each.isFaithful && isWrittenAlike(each.values, values); });
-  if (known == _lists.end()) return std::nullopt;
+  if (known == _lists.end()) return nullptr;
   makeLatest(known);
   return _lists.back().bytes;
 }
 
-void KnownPropertyLists::keep(Bytes bytes, Dictionary values, bool isFaithful) {
-  if (bytes.size() > kLargestList) return;
+void KnownPropertyLists::keep(std::shared_ptr<const Bytes> bytes, Dictionary values, bool isFaithful) {
+  if (bytes->size() > kLargestList) return;
   const std::scoped_lock lock{_guard};
   if (_lists.size() == kMostLists) _lists.erase(_lists.begin());
   _lists.push_back({std::move(bytes), std::move(values), isFaithful});

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <memory>
 #include <mutex>
 #include <optional>
 #include <span>
@@ -19,15 +20,15 @@ namespace platform {
 class KnownPropertyLists {
  public:
   [[nodiscard]] std::optional<Dictionary> valuesOf(std::span<const std::uint8_t> bytes);
-  // Bytes that hold exactly these values, in their order, and nothing else.
-  [[nodiscard]] std::optional<Bytes> bytesOf(const Dictionary& values);
+  // Bytes that hold exactly these values, in their order, and nothing else; null where none are known.
+  [[nodiscard]] std::shared_ptr<const Bytes> bytesOf(const Dictionary& values);
 
   // `isFaithful`: whether the bytes hold nothing but the values, so that they may be written for them.
-  void keep(Bytes bytes, Dictionary values, bool isFaithful);
+  void keep(std::shared_ptr<const Bytes> bytes, Dictionary values, bool isFaithful);
 
  private:
   struct Known {
-    Bytes bytes;
+    std::shared_ptr<const Bytes> bytes;
     Dictionary values;
     bool isFaithful;
   };

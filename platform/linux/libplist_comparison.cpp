@@ -43,7 +43,7 @@ bool holdsInOrder(void* tree, const Dictionary& values) {
   if (values.size() != plist_dict_get_size(tree)) return false;
   LibplistEntries entries{tree};
   return std::all_of(values.begin(), values.end(), [&entries](const Dictionary::Entry& entry) {
-    return entries.advance() && entry.key == std::string_view{entries.key()} && holds(entries.item(), entry.value);
+    return entries.advance() && entries.hasKey(entry.key.cString()) && holds(entries.item(), entry.value);
   });
 }
 

@@ -158,11 +158,19 @@ LibplistEntries::LibplistEntries(void* dictionary) : _dictionary{dictionary} {
 }
 
 bool LibplistEntries::advance() {
-  char* key = nullptr;
   _item = nullptr;
-  plist_dict_next_item(_dictionary, _iterator.get(), &key, &_item);
-  _key.reset(key);
+  plist_dict_next_item(_dictionary, _iterator.get(), nullptr, &_item);
   return _item != nullptr;
+}
+
+LibplistText LibplistEntries::key() const {
+  char* key = nullptr;
+  plist_dict_get_item_key(_item, &key);
+  return LibplistText{key};
+}
+
+bool LibplistEntries::hasKey(const char* key) const {
+  return plist_key_val_compare(plist_dict_item_get_key(_item), key) == 0;
 }
 
 }  // namespace platform

@@ -20,6 +20,9 @@ struct LibplistMemoryDeleter {
 // A libplist tree without a parent, owned.
 using LibplistNode = std::unique_ptr<void, LibplistNodeDeleter>;
 
+// Characters that the library allocated, up to a NUL.
+using LibplistText = std::unique_ptr<char, LibplistMemoryDeleter>;
+
 // How deep containers may nest: libplist frees, copies and writes a tree recursively.
 constexpr std::size_t kDeepestNesting = 256;
 
@@ -54,13 +57,13 @@ class LibplistEntries {
   explicit LibplistEntries(void* dictionary);
   // Moves to the next entry; false at the end.
   [[nodiscard]] bool advance();
-  [[nodiscard]] const char* key() const { return _key.get(); }
+  [[nodiscard]] LibplistText key() const;
+  [[nodiscard]] bool hasKey(const char* key) const;  // without a copy
   [[nodiscard]] void* item() const { return _item; }
 
  private:
   void* _dictionary;
   std::unique_ptr<void, LibplistMemoryDeleter> _iterator;
-  std::unique_ptr<char, LibplistMemoryDeleter> _key;
   void* _item = nullptr;
 };
 

@@ -18,14 +18,14 @@ class LibplistPropertyListStore final : public PropertyListStore {
     if (auto values = _known.valuesOf(bytes)) return values;
     auto parsed = parsePropertyList(bytes);
     if (!parsed) return std::nullopt;
-    _known.keep(std::move(bytes), parsed->values, parsed->isFaithful);
+    _known.keep(std::make_shared<const Bytes>(std::move(bytes)), parsed->values, parsed->isFaithful);
     return std::move(parsed->values);
   }
 
   [[nodiscard]] SerializedPropertyList serialize(const Dictionary& dictionary) override {
     if (auto bytes = _known.bytesOf(dictionary)) return {std::move(bytes), {}};
     SerializedPropertyList list = writePropertyList(dictionary);
-    if (list.data) _known.keep(*list.data, dictionary, true);
+    if (list.data != nullptr) _known.keep(list.data, dictionary, true);
     return list;
   }
 

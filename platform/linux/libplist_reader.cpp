@@ -71,7 +71,7 @@ class Conversion {
     items.reserve(plist_dict_get_size(node));
     LibplistEntries entries{node};
     while (entries.advance()) {
-      Key& key = known(entries.key());
+      Key& key = known(entries.key().get());
       if (key.dictionary == _dictionaries) {
         items[key.place].node = entries.item();
         _hasFoundRepeatedKeys = true;
@@ -144,12 +144,16 @@ struct Tree {
   bool isPlain = false;  // see BinaryPlistFinding
 };
 
+LibplistNode treeOf(const Bytes& binary) {
+  plist_t root = nullptr;
+  plist_from_bin(charactersOf(binary), static_cast<std::uint32_t>(binary.size()), &root);
+  return LibplistNode{root};
+}
+
 Tree parseBinary(Bytes& bytes) {
   const BinaryPlistFinding finding = repairBinaryPlist(bytes);
   if (finding == BinaryPlistFinding::refused) return {};
-  plist_t root = nullptr;
-  plist_from_bin(charactersOf(bytes), static_cast<std::uint32_t>(bytes.size()), &root);
-  return {LibplistNode{root}, finding == BinaryPlistFinding::plain};
+  return {treeOf(bytes), finding == BinaryPlistFinding::plain};
 }
 
 Tree parseXml(Bytes& bytes) {
@@ -178,9 +182,9 @@ std::optional<ParsedPropertyList> parsePropertyList(Bytes bytes) {
   return ParsedPropertyList{std::move(values), tree.isPlain && !conversion.hasFoundRepeatedKeys()};
 }
 
-bool readsBackAs(Bytes bytes, const Dictionary& values) {
-  const Tree tree = parse(std::move(bytes));
-  return tree.root != nullptr && holdsInOrder(tree.root.get(), values);
+bool readsBackAs(const Bytes& safe, const Dictionary& values) {
+  const LibplistNode tree = treeOf(safe);
+  return plist_get_node_type(tree.get()) == PLIST_DICT && holdsInOrder(tree.get(), values);
 }
 
 }  // namespace platform

@@ -21,7 +21,7 @@ struct ParsedPropertyList {
 // own: values that are merely malformed are repaired in them.
 [[nodiscard]] std::optional<ParsedPropertyList> parsePropertyList(Bytes bytes);
 
-// Whether the property list, read again, holds exactly these values in their order.
-[[nodiscard]] bool readsBackAs(Bytes bytes, const Dictionary& values);
+// Whether a binary property list that is safe for libplist holds exactly these values in their order.
+[[nodiscard]] bool readsBackAs(const Bytes& safe, const Dictionary& values);
 
 }  // namespace platform

@@ -5,6 +5,7 @@
 
 #include <plist/plist.h>
 
+#include "platform/linux/binary_plist_scan.h"
 #include "platform/linux/libplist_node.h"
 #include "platform/linux/libplist_reader.h"
 
@@ -99,16 +100,16 @@ LibplistNode nodeOf(const PropertyValue& value) {
   return nullptr;
 }
 
-std::optional<Bytes> binaryOf(const Dictionary& dictionary) {
+// No bytes where libplist refuses.
+Bytes binaryOf(plist_t tree) {
   char* written = nullptr;
   std::uint32_t size = 0;
-  plist_to_bin(nodeOf(dictionary).get(), &written, &size);
-  if (written == nullptr) return std::nullopt;
+  plist_to_bin(tree, &written, &size);
   const std::unique_ptr<char, decltype(&plist_to_bin_free)> owned{written, &plist_to_bin_free};
-  return Bytes{written, written + size};
+  return written == nullptr ? Bytes{} : Bytes{written, written + size};
 }
 
-SerializedPropertyList failure(std::string description) { return {std::nullopt, std::move(description)}; }
+SerializedPropertyList failure(std::string description) { return {nullptr, std::move(description)}; }
 
 }  // namespace
 
@@ -116,10 +117,15 @@ SerializedPropertyList writePropertyList(const Dictionary& dictionary) {
   Inspection inspection;
   inspection.inspect(dictionary);
   if (!inspection.objection().empty()) return failure(inspection.objection());
-  std::optional<Bytes> bytes = binaryOf(dictionary);
-  if (!bytes) return failure("The property list could not be written");
-  if (!readsBackAs(*bytes, dictionary)) return failure("What was written does not read back the same");
-  return {std::move(bytes), {}};
+  LibplistNode tree = nodeOf(dictionary);
+  Bytes bytes = binaryOf(tree.get());
+  if (bytes.empty()) return failure("The property list could not be written");
+  // Before the tree goes: a large block that is asked for when thousands of small ones have just been given back makes
+  // the C library sort them all.
+  const bool isSafe = repairBinaryPlist(bytes) != BinaryPlistFinding::refused;
+  tree.reset();
+  if (!isSafe || !readsBackAs(bytes, dictionary)) return failure("What was written does not read back the same");
+  return {std::make_shared<const Bytes>(std::move(bytes)), {}};
 }
 
 }  // namespace platform

@@ -77,8 +77,8 @@ std::optional<Dictionary> FakePropertyListStore::readDictionary(const Path& path
 
 platform::SerializedPropertyList FakePropertyListStore::serialize(const Dictionary& dictionary) {
   if (serializesNothing) return {};
-  if (!serializeError.empty() && !serializesDespiteError) return {std::nullopt, serializeError};
-  return {bytesFor(dictionary), serializeError};
+  if (!serializeError.empty() && !serializesDespiteError) return {nullptr, serializeError};
+  return {std::make_shared<const Bytes>(bytesFor(dictionary)), serializeError};
 }
 
 std::optional<bool> FakePreferencesStore::boolean(std::string_view domain, std::string_view key) const {
