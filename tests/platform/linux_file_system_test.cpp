@@ -42,10 +42,12 @@ class LinuxFiles : public testing::Test {
   [[nodiscard]] std::ptrdiff_t entries(std::string_view name = "") const {
     return std::distance(fs::directory_iterator{scratch / name}, {});
   }
-  void nameTheCaller(std::string_view name) const {
-    scratch.put("etc/passwd",
-                "root:x:0:0::/:/bin/sh\n" + std::string{name} + ":x:" + std::to_string(::getuid()) + ":0::/:\n");
-    scratch.put("etc/group", "root:x:0:\n" + std::string{name} + ":x:" + std::to_string(::getgid()) + ":\n");
+  // Below entries with a comment, and with members.
+  void nameTheCaller(std::string_view name, const std::string& comment = {}) const {
+    scratch.put("etc/passwd", "root:x:0:0:" + comment + ":/:/bin/sh\n" + std::string{name} +
+                                  ":x:" + std::to_string(::getuid()) + ":0::/:\n");
+    scratch.put("etc/group",
+                "root:x:0:" + comment + "\n" + std::string{name} + ":x:" + std::to_string(::getgid()) + ":\n");
   }
 };
 
@@ -211,6 +213,12 @@ TEST_F(LinuxFiles, AreGivenToTheAccountsOfTheDeviceAndNotOfTheCaller) {
   scratch.put("file", "text");
   EXPECT_TRUE(files->setOwner(scratch / "file", "known-only-to-the-device", "known-only-to-the-device").isOk());
   EXPECT_EQ(files->setOwner(scratch / "file", "daemon", "daemon").errorNumber(), ENOENT);
+}
+
+TEST_F(LinuxFiles, AreGivenToAnAccountBehindOneWithALongEntry) {
+  nameTheCaller("mobile", std::string(70'000, 'x'));
+  scratch.put("file", "text");
+  EXPECT_TRUE(files->setOwner(scratch / "file", "mobile", "mobile").isOk());
 }
 
 TEST_F(LinuxFiles, AreGivenByNumber) {
