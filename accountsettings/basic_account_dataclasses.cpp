@@ -139,13 +139,12 @@ Dataclasses BasicAccount::_orderedDataclasses(const Dataclasses& dataclasses) {
 }
 
 std::unordered_set<std::string_view> BasicAccount::_profileRestrictedDataclasses() {
-  const platform::ProfileRestrictions& service = *platform::current().restrictions;
+  const std::vector<platform::Restriction> answers = platform::current().restrictions->restrictions(kManagedFeatures);
   std::unordered_set<std::string_view> restricted;
-  for (const ManagedFeature feature : kManagedFeatures) {
-    if (service.restriction(feature) != platform::Restriction::notAllowed) continue;
-    for (const ManagedDataclass& each : kManagedDataclasses) {
-      if (each.feature == feature) restricted.insert(each.dataclass);
-    }
+  for (const ManagedDataclass& each : kManagedDataclasses) {
+    const auto asked = std::ranges::find(kManagedFeatures, each.feature) - kManagedFeatures.begin();
+    if (answers[static_cast<std::size_t>(asked)] == platform::Restriction::notAllowed)
+      restricted.insert(each.dataclass);
   }
   return restricted;
 }

@@ -1,3 +1,6 @@
+#include <algorithm>
+#include <iterator>
+
 #include "platform/linux/device_configuration.h"
 
 namespace platform {
@@ -14,16 +17,23 @@ std::string_view keyOf(ManagedFeature feature) {
   return {};
 }
 
+Restriction restrictionIn(const Dictionary& profiles, ManagedFeature feature) {
+  const PropertyValue* const value = profiles.find(keyOf(feature));
+  const bool* const isAllowed = value == nullptr ? nullptr : value->asBoolean();
+  if (isAllowed == nullptr) return Restriction::notSet;
+  return *isAllowed ? Restriction::allowed : Restriction::notAllowed;
+}
+
 class LinuxProfileRestrictions final : public ProfileRestrictions {
  public:
   explicit LinuxProfileRestrictions(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
 
-  [[nodiscard]] Restriction restriction(ManagedFeature feature) const override {
+  [[nodiscard]] std::vector<Restriction> restrictions(std::span<const ManagedFeature> features) const override {
     const Dictionary profiles = _configuration.ofSystem("profile-restrictions.plist").value_or(Dictionary{});
-    const PropertyValue* const value = profiles.find(keyOf(feature));
-    const bool* const isAllowed = value == nullptr ? nullptr : value->asBoolean();
-    if (isAllowed == nullptr) return Restriction::notSet;
-    return *isAllowed ? Restriction::allowed : Restriction::notAllowed;
+    std::vector<Restriction> answers;
+    std::ranges::transform(features, std::back_inserter(answers),
+                           [&profiles](ManagedFeature feature) { return restrictionIn(profiles, feature); });
+    return answers;
   }
 
  private:

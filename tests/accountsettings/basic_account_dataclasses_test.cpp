@@ -78,7 +78,7 @@ TEST_F(RecordDataclasses, ProvisionedOnesAreInheritedFromTheParent) {
 }
 
 TEST_F(RecordDataclasses, ARestrictedOneIsNeitherProvisionedNorEnabledButStaysStored) {
-  device.restrictions->restrictions[ManagedFeature::cloudBackup] = Restriction::notAllowed;
+  device.restrictions->profiles[ManagedFeature::cloudBackup] = Restriction::notAllowed;
   const Array stored{kAccountDataclassBackup, kMail};
   const auto account = make("VorlixAccount", {{"Enabled Dataclasses", stored}});
   EXPECT_EQ(account->enabledDataclasses(), Dataclasses{kMail});
@@ -99,13 +99,13 @@ TEST_F(RecordDataclasses, EachForbiddenFeatureRestrictsItsOwn) {
       {ManagedFeature::cloudBackup, {kAccountDataclassBackup}},
       {ManagedFeature::cardsWhileLocked, {kAccountDataclassTickora}}};
   for (const auto& [feature, dataclasses] : table) {
-    device.restrictions->restrictions = {{feature, Restriction::notAllowed}};
+    device.restrictions->profiles = {{feature, Restriction::notAllowed}};
     EXPECT_EQ(BasicAccount::_profileRestrictedDataclasses(), dataclasses);
   }
 }
 
 TEST_F(RecordDataclasses, OnlyAnExplicitProhibitionRestricts) {
-  device.restrictions->restrictions = {{ManagedFeature::mediaStream, Restriction::allowed},
+  device.restrictions->profiles = {{ManagedFeature::mediaStream, Restriction::allowed},
                                        {ManagedFeature::cloudBackup, Restriction::notSet}};
   EXPECT_TRUE(BasicAccount::_profileRestrictedDataclasses().empty());
 }

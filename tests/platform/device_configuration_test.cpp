@@ -3,6 +3,8 @@
 #include <gtest/gtest.h>
 #include <sys/utsname.h>
 
+#include <array>
+
 #include "tests/support/fake_platform.h"
 #include "tests/support/real_device.h"
 
@@ -84,31 +86,43 @@ const FeatureName features[] = {{ManagedFeature::cloudDocumentSync, "CloudDocume
                                 {ManagedFeature::cloudBackup, "CloudBackup"},
                                 {ManagedFeature::cardsWhileLocked, "CardsWhileLocked"}};
 
+Restriction restrictionOf(const platform::ProfileRestrictions& query, ManagedFeature feature) {
+  return query.restrictions(std::array{feature}).at(0);
+}
+
 TEST(ProfileRestrictions, AllowDisallowOrLeaveOpenEachFeature) {
   for (const auto& [feature, name] : features) {
     const RealDevice device;
     const auto& query = *device.services.restrictions;
-    EXPECT_EQ(query.restriction(feature), Restriction::notSet) << name;
+    EXPECT_EQ(restrictionOf(query, feature), Restriction::notSet) << name;
     device.put(restrictions, "<key>" + name + "</key><true/>");
-    EXPECT_EQ(query.restriction(feature), Restriction::allowed) << name;
+    EXPECT_EQ(restrictionOf(query, feature), Restriction::allowed) << name;
     device.put(restrictions, "<key>" + name + "</key><false/>");
-    EXPECT_EQ(query.restriction(feature), Restriction::notAllowed) << name;
+    EXPECT_EQ(restrictionOf(query, feature), Restriction::notAllowed) << name;
     device.put(restrictions, "<key>" + name + "</key><integer>1</integer>");
-    EXPECT_EQ(query.restriction(feature), Restriction::notSet) << name;
+    EXPECT_EQ(restrictionOf(query, feature), Restriction::notSet) << name;
   }
 }
 
 TEST(ProfileRestrictions, OfOneFeatureSayNothingOfAnother) {
   const RealDevice device;
   device.put(restrictions, "<key>MediaStream</key><false/>");
-  EXPECT_EQ(device.services.restrictions->restriction(ManagedFeature::sharedStreams), Restriction::notSet);
+  EXPECT_EQ(restrictionOf(*device.services.restrictions, ManagedFeature::sharedStreams), Restriction::notSet);
+}
+
+TEST(ProfileRestrictions, OfSeveralFeaturesAreAnsweredInTheirOrder) {
+  const RealDevice device;
+  device.put(restrictions, "<key>MediaStream</key><false/><key>CloudBackup</key><true/>");
+  const std::array asked{ManagedFeature::cloudBackup, ManagedFeature::sharedStreams, ManagedFeature::mediaStream};
+  EXPECT_EQ(device.services.restrictions->restrictions(asked),
+            (std::vector{Restriction::allowed, Restriction::notSet, Restriction::notAllowed}));
 }
 
 TEST(ProfileRestrictions, OfATestAreWhatTheTestSays) {
   FakeProfileRestrictions query;
-  query.restrictions[ManagedFeature::mediaStream] = Restriction::notAllowed;
-  EXPECT_EQ(query.restriction(ManagedFeature::mediaStream), Restriction::notAllowed);
-  EXPECT_EQ(query.restriction(ManagedFeature::cloudBackup), Restriction::notSet);
+  query.profiles[ManagedFeature::mediaStream] = Restriction::notAllowed;
+  EXPECT_EQ(restrictionOf(query, ManagedFeature::mediaStream), Restriction::notAllowed);
+  EXPECT_EQ(restrictionOf(query, ManagedFeature::cloudBackup), Restriction::notSet);
 }
 
 // What connections answer is the same on a device and in a test.

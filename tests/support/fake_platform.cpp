@@ -114,9 +114,14 @@ std::optional<PropertyValue> FakeDeviceInfoQuery::answer(std::string_view key) c
   return lookedUp(answers, key);
 }
 
-platform::Restriction FakeProfileRestrictions::restriction(platform::ManagedFeature feature) const {
-  asked.push_back(feature);
-  return lookedUp(restrictions, feature).value_or(platform::Restriction::notSet);
+std::vector<platform::Restriction> FakeProfileRestrictions::restrictions(
+    std::span<const platform::ManagedFeature> features) const {
+  std::vector<platform::Restriction> answers;
+  for (const platform::ManagedFeature feature : features) {
+    asked.push_back(feature);
+    answers.push_back(lookedUp(profiles, feature).value_or(platform::Restriction::notSet));
+  }
+  return answers;
 }
 
 std::unique_ptr<platform::TetheredSyncConnection> FakeTetheredSyncQuery::connect() {

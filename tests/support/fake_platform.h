@@ -140,9 +140,10 @@ class FakeDeviceInfoQuery final : public platform::DeviceInfoQuery {
 
 class FakeProfileRestrictions final : public platform::ProfileRestrictions {
  public:
-  std::map<platform::ManagedFeature, platform::Restriction> restrictions;
+  std::map<platform::ManagedFeature, platform::Restriction> profiles;
   mutable std::vector<platform::ManagedFeature> asked;
-  [[nodiscard]] platform::Restriction restriction(platform::ManagedFeature feature) const override;
+  [[nodiscard]] std::vector<platform::Restriction> restrictions(
+      std::span<const platform::ManagedFeature> features) const override;
 };
 
 class FakeTetheredSyncQuery final : public platform::TetheredSyncQuery {
