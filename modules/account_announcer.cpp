@@ -2,7 +2,6 @@
 // describes them.
 
 #include <sdbus-c++/sdbus-c++.h>
-#include <systemd/sd-bus.h>
 
 #include <chrono>
 #include <map>
@@ -13,6 +12,7 @@
 
 #include "accountsettings/account_objects.h"
 #include "accountsettings/vocabulary.h"
+#include "platform/linux/bus/system_bus.h"
 
 namespace modules {
 namespace {
@@ -25,23 +25,6 @@ using Entry = std::map<std::string, sdbus::Variant>;
 constexpr const char* kPath = "/com/vorlix/Accounts";
 constexpr const char* kInterface = "com.vorlix.Accounts1";
 constexpr std::chrono::seconds kPatience{1};
-
-// Whether the bus takes connections now. A socket may stand there before its daemon does; a connection that simply
-// waits for the answer would then wait for minutes.
-bool busAnswers() {
-  sd_bus* opened = nullptr;
-  if (::sd_bus_open_system(&opened) < 0) return false;
-  const std::unique_ptr<sd_bus, decltype(&::sd_bus_close_unref)> bus{opened, &::sd_bus_close_unref};
-  const auto end = std::chrono::steady_clock::now() + kPatience;
-  while (::sd_bus_is_ready(bus.get()) == 0) {
-    const int progress = ::sd_bus_process(bus.get(), nullptr);
-    if (progress < 0) return false;
-    if (progress > 0) continue;
-    const auto left = std::chrono::duration_cast<std::chrono::microseconds>(end - std::chrono::steady_clock::now());
-    if (left.count() <= 0 || ::sd_bus_wait(bus.get(), static_cast<std::uint64_t>(left.count())) < 0) return false;
-  }
-  return ::sd_bus_is_ready(bus.get()) > 0;
-}
 
 // Returns once the bus has taken everything that was sent before, so that signals keep their order whoever sends the
 // next one, and none is lost when the process ends.
@@ -59,7 +42,7 @@ void waitForBus(sdbus::IConnection& connection) {
 template <typename... Arguments>
 void announce(const char* signalName, const Arguments&... arguments) noexcept {
   try {
-    if (!busAnswers()) return;
+    if (platform::openSystemBus() == nullptr) return;  // sdbus would wait for one that does not answer
     const auto connection = sdbus::createSystemBusConnection();
     const auto object = sdbus::createObject(*connection, kPath);
     auto signal = object->createSignal(kInterface, signalName);

@@ -1,71 +1,42 @@
 #include "platform/linux/bus_notices.h"
 
-#include <sdbus-c++/sdbus-c++.h>
-#include <systemd/sd-bus.h>
-
-#include <chrono>
-#include <exception>
+#include <mutex>
 #include <string>
+
+#include "platform/linux/bus/system_bus.h"
 
 namespace platform {
 namespace {
 
 constexpr const char* noticesPath = "/com/vorlix/Notices";
 constexpr const char* noticesInterface = "com.vorlix.Notices1";
-constexpr std::chrono::microseconds patience = std::chrono::seconds{1};
-
-// Whether the bus takes connections now. A socket may well be there before its daemon is (early in the start of a
-// device); a connection that simply waits for the answer would then wait for minutes.
-bool busAnswers() {
-  sd_bus* opened = nullptr;
-  if (::sd_bus_open_system(&opened) < 0) return false;
-  const std::unique_ptr<sd_bus, decltype(&::sd_bus_close_unref)> bus{opened, &::sd_bus_close_unref};
-  const auto end = std::chrono::steady_clock::now() + patience;
-  while (::sd_bus_is_ready(bus.get()) == 0) {
-    const int progress = ::sd_bus_process(bus.get(), nullptr);
-    if (progress < 0) return false;
-    if (progress > 0) continue;
-    const auto left = std::chrono::duration_cast<std::chrono::microseconds>(end - std::chrono::steady_clock::now());
-    if (left.count() <= 0 || ::sd_bus_wait(bus.get(), static_cast<std::uint64_t>(left.count())) < 0) return false;
-  }
-  return ::sd_bus_is_ready(bus.get()) > 0;
-}
 
 }  // namespace
 
 class SystemBus {
  public:
+  // `types` is the D-Bus signature of the arguments.
   template <typename... Arguments>
-  void emit(const char* member, const Arguments&... arguments) noexcept {
-    const bool wasConnected = _notices != nullptr;
-    if (tryToEmit(member, arguments...) || !wasConnected) return;
-    tryToEmit(member, arguments...);
+  void emit(const char* member, const char* types, Arguments... arguments) {
+    const std::scoped_lock lock{_guard};
+    const bool wasConnected = _connection != nullptr;
+    if (tryToEmit(member, types, arguments...) || !wasConnected) return;
+    tryToEmit(member, types, arguments...);
   }
 
  private:
   template <typename... Arguments>
-  bool tryToEmit(const char* member, const Arguments&... arguments) noexcept {
-    try {
-      if (!connect()) return false;
-      _notices->emitSignal(member).onInterface(noticesInterface).withArguments(arguments...);
-      return true;
-    } catch (const std::exception&) {
-      _notices = nullptr;
-      _connection = nullptr;
-      return false;
-    }
+  bool tryToEmit(const char* member, const char* types, Arguments... arguments) {
+    if (_connection == nullptr) _connection = openSystemBus();
+    if (_connection == nullptr) return false;
+    const int sent =
+        ::sd_bus_emit_signal(_connection.get(), noticesPath, noticesInterface, member, types, arguments...);
+    if (sent < 0) _connection.reset();
+    return sent >= 0;
   }
 
-  bool connect() {
-    if (_notices) return true;
-    if (!busAnswers()) return false;
-    _connection = sdbus::createSystemBusConnection();
-    _notices = sdbus::createObject(*_connection, noticesPath);
-    return true;
-  }
-
-  std::unique_ptr<sdbus::IConnection> _connection;
-  std::unique_ptr<sdbus::IObject> _notices;
+  std::mutex _guard;
+  SystemBusConnection _connection;
 };
 
 namespace {
@@ -74,7 +45,7 @@ class BusPreferencesChangedNotice final : public PreferencesChangedNotice {
  public:
   explicit BusPreferencesChangedNotice(std::shared_ptr<SystemBus> bus) : _bus{std::move(bus)} {}
   void post(std::string_view domain, std::string_view key) override {
-    _bus->emit("PreferencesChanged", std::string{domain}, std::string{key});
+    _bus->emit("PreferencesChanged", "ss", std::string{domain}.c_str(), std::string{key}.c_str());
   }
 
  private:
@@ -84,7 +55,7 @@ class BusPreferencesChangedNotice final : public PreferencesChangedNotice {
 class BusCloudTabsNotice final : public CloudTabsNotice {
  public:
   explicit BusCloudTabsNotice(std::shared_ptr<SystemBus> bus) : _bus{std::move(bus)} {}
-  void post(bool enabled) override { _bus->emit("CloudTabs", enabled); }
+  void post(bool enabled) override { _bus->emit("CloudTabs", "b", enabled ? 1 : 0); }
 
  private:
   std::shared_ptr<SystemBus> _bus;

@@ -1,11 +1,12 @@
 #include "platform/linux/linux_base_directories.h"
 
-#include <dlfcn.h>
 #include <pwd.h>
 #include <unistd.h>
 
 #include <cstdlib>
 #include <vector>
+
+#include "platform/linux/own_directory.h"
 
 namespace platform {
 namespace {
@@ -28,17 +29,8 @@ path homeOfProcess() {
   return found != nullptr && *found->pw_dir == '/' ? wholePath(found->pw_dir) : path{"/"};
 }
 
-// A place of the library's own, by which it is found in the file tree.
-void anchor() {}
-
 // The build gives the way from the library's directory to the resources; it is the same built and installed.
-path besideThisLibrary() {
-  Dl_info library{};
-  if (::dladdr(reinterpret_cast<const void*>(&anchor), &library) == 0) return wholePath(ACCOUNT_RESOURCES_FROM_LIBRARY);
-  std::error_code failed;
-  const path file = std::filesystem::canonical(library.dli_fname, failed);
-  return wholePath((failed ? wholePath(library.dli_fname) : file).parent_path() / ACCOUNT_RESOURCES_FROM_LIBRARY);
-}
+path besideThisLibrary() { return wholePath(ownDirectory() / ACCOUNT_RESOURCES_FROM_LIBRARY); }
 
 class LinuxBaseDirectories final : public BaseDirectories {
  public:

@@ -1,21 +1,9 @@
 #include "platform/linux/linux_clock.h"
 
-#include <unicode/gregocal.h>
-#include <unicode/smpdtfmt.h>
+#include "platform/linux/icu_library.h"
 
 namespace platform {
 namespace {
-
-icu::UnicodeString unicode(std::string_view text) {
-  return icu::UnicodeString::fromUTF8({text.data(), static_cast<std::int32_t>(text.size())});
-}
-
-// The Gregorian calendar at all times, also before it was introduced.
-std::unique_ptr<icu::Calendar> prolepticCalendar(const icu::Locale& locale, UErrorCode& error) {
-  auto calendar = std::make_unique<icu::GregorianCalendar>(icu::TimeZone::detectHostTimeZone(), locale, error);
-  if (U_SUCCESS(error) != 0) calendar->setGregorianChange(U_DATE_MIN, error);
-  return calendar;
-}
 
 Instant systemInstant() { return std::chrono::floor<std::chrono::milliseconds>(std::chrono::system_clock::now()); }
 
@@ -24,18 +12,8 @@ class LinuxClock final : public Clock {
   explicit LinuxClock(std::function<Instant()> now) : _now{std::move(now)} {}
 
   [[nodiscard]] std::string currentLocalTime(std::string_view pattern) const override {
-    const icu::Locale locale{"en", "US", "POSIX"};
-    UErrorCode error = U_ZERO_ERROR;
-    auto calendar = prolepticCalendar(locale, error);
-    icu::SimpleDateFormat format{unicode(pattern), locale, error};
-    if (U_FAILURE(error) != 0) return {};
-    format.adoptCalendar(calendar.release());
-    const auto sinceEpoch = static_cast<UDate>(_now().time_since_epoch().count());
-    icu::UnicodeString text;
-    // A letter that stands for nothing shows only now.
-    format.format(sinceEpoch, text, nullptr, error);
-    std::string utf8;
-    return U_SUCCESS(error) != 0 ? text.toUTF8String(utf8) : std::string{};
+    const IcuFunctions* const icu = icuFunctions();
+    return icu == nullptr ? std::string{} : icu->localTime(_now().time_since_epoch().count(), pattern);
   }
 
  private:

@@ -1,14 +1,12 @@
 #include "platform/linux/linux_localized_strings.h"
 
-#include <unicode/locid.h>
-#include <unicode/uloc.h>
-
 #include <algorithm>
-#include <array>
 #include <cstdlib>
 #include <map>
 #include <mutex>
 #include <vector>
+
+#include "platform/linux/icu_library.h"
 
 namespace platform {
 namespace {
@@ -31,18 +29,18 @@ bool isLanguageName(std::string_view name) {
   });
 }
 
+// The locale in which there is no user and no language. A device starts in it, and ICU is not needed to know that.
+bool isOfNobody(std::string_view locale) {
+  const std::string_view name = locale.substr(0, locale.find('.'));
+  return name.empty() || name == "C" || name == "POSIX";
+}
+
 // The user's language and the more general ones, then English.
 std::vector<std::string> languages() {
   const std::string environment = localeOfEnvironment();
-  std::string name = icu::Locale::createCanonical(environment.c_str()).getBaseName();
-  std::vector<std::string> names;
-  while (!environment.empty() && isLanguageName(name)) {
-    names.push_back(name);
-    std::array<char, ULOC_FULLNAME_CAPACITY> parent{};
-    UErrorCode error = U_ZERO_ERROR;
-    ::uloc_getParent(name.c_str(), parent.data(), static_cast<std::int32_t>(parent.size()), &error);
-    name = U_SUCCESS(error) != 0 ? parent.data() : "";
-  }
+  const IcuFunctions* const icu = isOfNobody(environment) ? nullptr : icuFunctions();
+  std::vector<std::string> names = icu == nullptr ? std::vector<std::string>{} : icu->localeNames(environment);
+  names.erase(std::ranges::find_if_not(names, isLanguageName), names.end());
   names.emplace_back(baseLanguage);
   return names;
 }
