@@ -86,7 +86,7 @@ TEST_F(RecordDataclasses, ARestrictedOneIsNeitherProvisionedNorEnabledButStaysSt
 }
 
 TEST_F(RecordDataclasses, NothingIsProvisionedWhereAllThatTheServiceGrantsIsRestricted) {
-  device.restrictions->restrictions[ManagedFeature::cloudBackup] = Restriction::notAllowed;
+  device.restrictions->profiles[ManagedFeature::cloudBackup] = Restriction::notAllowed;
   const auto account = make("VorlixAccount", {{"Provisioned Dataclasses", Array{kAccountDataclassBackup}}});
   EXPECT_EQ(account->provisionedDataclasses(), Dataclasses{});
 }
