@@ -54,6 +54,12 @@ TEST_F(Strings, FallBackFromRegionToLanguageToEnglish) {
   EXPECT_EQ(strings->text(table, "B"), "base");  // what the language has there is no text
 }
 
+TEST_F(Strings, TakeAnEmptyVariableForOneThatIsNotSet) {
+  ::setenv("LC_ALL", "", 1);
+  ::setenv("LANG", "de", 1);
+  EXPECT_EQ(strings->text(table, "A"), "Farbe");
+}
+
 TEST_F(Strings, FollowTheEnvironmentsOrder) {
   ::setenv("LANG", "en", 1);
   ::setenv("LC_MESSAGES", "de", 1);
