@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "bench/pieces.h"
+#include "platform/linux/linux_platform.h"
 
 namespace {
 
@@ -24,6 +25,12 @@ void measure(benchmark::State& state, const bench::Piece& piece) {
   state.SetItemsProcessed(state.iterations() * state.range(0));
 }
 
+// What every line costs on a device, where nobody reads it, beyond the log of the pieces.
+void askTheDevicesLog(benchmark::State& state) {
+  const auto log = platform::makeLinuxPlatform().systemLog;
+  for ([[maybe_unused]] auto each : state) benchmark::DoNotOptimize(log->hasReaders());
+}
+
 bool isSingleOperation(std::string_view name) {
   return name == "look-up" || name == "insert" || name == "update" || name == "remove";
 }
@@ -41,6 +48,7 @@ int main(int count, char** arguments) {
     auto* const withMany = benchmark::RegisterBenchmark(piece.name, function)->Unit(benchmark::kMicrosecond);
     withMany->Args({10000, 0})->Args({10000, 2})->Args({10000, 20})->Iterations(kFewIterations);
   }
+  benchmark::RegisterBenchmark("the device's log", &askTheDevicesLog);
   benchmark::Initialize(&count, arguments);
   if (benchmark::ReportUnrecognizedArguments(count, arguments)) return 1;
   benchmark::RunSpecifiedBenchmarks();

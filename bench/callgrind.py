@@ -47,6 +47,18 @@ def instructions(profile, library):
     return total, inside
 
 
+def of_pieces(program, names, populations, library):
+    """For each named piece, or every one, its instructions outside the library on each population."""
+    chosen = [option for name in names for option in ("--piece", name)]
+    listed = subprocess.run([program, *chosen], check=True, capture_output=True, text=True).stdout.splitlines()
+    parts = outside(
+        library, [program, *chosen, *populations], "--toggle-collect=measuredPiece", "--dump-after=measuredPiece"
+    )[1:]
+    if len(parts) != len(listed) * len(populations):
+        raise RuntimeError(f"{len(parts)} parts were counted, not {len(populations)} for each of {len(listed)} pieces")
+    return {name: parts[index * len(populations) :][: len(populations)] for index, name in enumerate(listed)}
+
+
 def outside(library, command, *options):
     """Runs the command under callgrind; answers the instructions outside the library, by part where it dumps several."""
     with tempfile.TemporaryDirectory() as directory:

@@ -1,12 +1,11 @@
 """That no piece of a run costs more for each account the more accounts there are: counted, never timed."""
 
 import os
-import subprocess
 import unittest
 
-from callgrind import outside
+from callgrind import of_pieces
 
-PROGRAM = os.environ["GROWTH"]
+PROGRAM = os.environ["BENCH_COUNT"]
 # Multiples of a hundred, so that both are of the same accounts (see bench/account_generator.h).
 FEW, MANY = 100, 400
 # A piece that walks all accounts for each costs four times as much an account. What is allowed beyond the same is for
@@ -15,16 +14,22 @@ MOST = 1.1
 
 
 class Growth(unittest.TestCase):
+    def assert_at_most(self, name, unit, before, after):
+        with self.subTest(name):
+            growth = after / before
+            print(f"\n{name}: {before:.0f} and {after:.0f} instructions {unit}, {growth:.2f} times", end="", flush=True)
+            self.assertLessEqual(growth, MOST)
+
     def test_of_every_piece_is_no_more_than_linear(self):
-        names = subprocess.run([PROGRAM], check=True, capture_output=True, text=True).stdout.splitlines()
-        options = ["--toggle-collect=measuredPiece", "--dump-after=measuredPiece"]
-        counts = outside("libplist", [PROGRAM, FEW, MANY], *options)
-        self.assertEqual(len(counts), 2 * len(names) + 1, "each piece is counted twice")
-        for name, few, many in zip(names, counts[1::2], counts[2::2]):
-            with self.subTest(name):
-                growth = (many / MANY) / (few / FEW)
-                print(f"\n{name}: {few / FEW:.0f} and {many / MANY:.0f} instructions an account, {growth:.2f} times", end="", flush=True)
-                self.assertLessEqual(growth, MOST)
+        for name, (few, many) in of_pieces(PROGRAM, [], [FEW, MANY], "libplist").items():
+            self.assert_at_most(name, "an account", few / FEW, many / MANY)
+
+    def test_of_one_change_does_not_come_from_the_children_of_other_accounts(self):
+        changes = ["insert", "update", "remove"]
+        counted = of_pieces(PROGRAM, changes, [f"{MANY}/0", f"{MANY}/20"], "libplist")
+        self.assertEqual(set(changes), set(counted))
+        for name, (without, beside) in counted.items():
+            self.assert_at_most(name, "without and beside children", without, beside)
 
 
 if __name__ == "__main__":
