@@ -188,7 +188,9 @@ class ACCOUNT_EXPORT AccountsManager {
   // The children that were indexed when each parent was last registered; one that another parent has taken over since
   // may still stand here, so `_childAccountIDToParentAccountID` decides.
   platform::InsertionOrderedMap<std::vector<Text>> _childIdentifiersByParentID;
-  platform::InsertionOrderedMap<Dictionary> _originalAccountsByID;
+  // In their order, the last of each identifier counting. Every load makes it and few look anything up in it, so an
+  // index is made by those.
+  std::vector<std::pair<Text, Dictionary>> _originalAccountsByID;
   std::uint64_t _dataVersion = 0;
   std::vector<std::unique_ptr<RuntimeFixer>> _runtimeFixers;
   std::unique_ptr<StoreWatch> _watch;  // null unless a run is observed

@@ -168,9 +168,10 @@ void AccountsManager::_tellFixers(bool saved) {
 
 void AccountsManager::_setOriginalAccountDictionaries() {
   _originalAccountsByID.clear();
+  _originalAccountsByID.reserve(_orderedTopLevelAccounts.size());
   for (const Account& account : _orderedTopLevelAccounts) {
     if (const std::optional<Text> identifier = account->identifier()) {
-      _originalAccountsByID.set(*identifier, account->propertiesToSave());
+      _originalAccountsByID.emplace_back(*identifier, account->propertiesToSave());
     } else {
       _ASLogSystem().log("-[AccountsManager _setOriginalAccountDictionaries]",
                          "%@ returned a nil identifier. Account properties may not get saved", account->properties());

@@ -194,17 +194,19 @@ void AccountsManager::_sendNotificationsForChangedAccounts() {
 }
 
 AccountsManager::NotificationTable AccountsManager::_notificationTable() const {
+  platform::InsertionOrderedMap<Dictionary> originals;
+  for (const auto& [identifier, original] : _originalAccountsByID) originals.set(identifier, original);
   NotificationTable table;
   const auto add = [&](ChangeType change, const Dictionary* original, const Dictionary* current) {
     _addNotificationToDictionary_forChangeType_originalProperties_currentProperties(table, change, original, current);
   };
-  for (const auto& [identifier, original] : _originalAccountsByID) {
+  for (const auto& [identifier, original] : originals) {
     if (!_topLevelAccountsByID.contains(identifier)) add(ChangeType::removed, &original, nullptr);
   }
   for (const auto& [identifier, account] : _topLevelAccountsByID) {
-    if (!_originalAccountsByID.contains(identifier)) add(ChangeType::added, nullptr, &account->propertiesToSave());
+    if (!originals.contains(identifier)) add(ChangeType::added, nullptr, &account->propertiesToSave());
   }
-  for (const auto& [identifier, original] : _originalAccountsByID) {
+  for (const auto& [identifier, original] : originals) {
     const Account* const account = _topLevelAccountsByID.find(identifier);
     if (account != nullptr) add(ChangeType::present, &original, &(*account)->propertiesToSave());
   }

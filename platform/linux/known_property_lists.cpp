@@ -37,19 +37,20 @@ bool isWrittenAlike(const PropertyValue& left, const PropertyValue& right) {
 
 std::optional<Dictionary> KnownPropertyLists::valuesOf(std::span<const std::uint8_t> bytes) {
   const std::scoped_lock lock{_guard};
-  const auto known =
-      std::ranges::find_if(_lists, [bytes](const Known& each) { return std::ranges::equal(*each.bytes, bytes); });
-  if (known == _lists.end()) return std::nullopt;
-  makeLatest(known);
+  const auto known = std::ranges::find_if(
+      _lists.rbegin(), _lists.rend(), [bytes](const Known& each) { return std::ranges::equal(*each.bytes, bytes); });
+  if (known == _lists.rend()) return std::nullopt;
+  makeLatest(std::prev(known.base()));
   return _lists.back().values;
 }
 
 std::shared_ptr<const Bytes> KnownPropertyLists::bytesOf(const Dictionary& values) {
   const std::scoped_lock lock{_guard};
-  const auto known = std::ranges::find_if(
-      _lists, [&values](const Known& each) { return each.isFaithful && isWrittenAlike(each.values, values); });
-  if (known == _lists.end()) return nullptr;
-  makeLatest(known);
+  const auto known = std::ranges::find_if(_lists.rbegin(), _lists.rend(), [&values](const Known& each) {
+    return each.isFaithful && isWrittenAlike(each.values, values);
+  });
+  if (known == _lists.rend()) return nullptr;
+  makeLatest(std::prev(known.base()));
   return _lists.back().bytes;
 }
 
