@@ -106,7 +106,7 @@ TEST_F(RecordDataclasses, EachForbiddenFeatureRestrictsItsOwn) {
 
 TEST_F(RecordDataclasses, OnlyAnExplicitProhibitionRestricts) {
   device.restrictions->profiles = {{ManagedFeature::mediaStream, Restriction::allowed},
-                                       {ManagedFeature::cloudBackup, Restriction::notSet}};
+                                   {ManagedFeature::cloudBackup, Restriction::notSet}};
   EXPECT_TRUE(BasicAccount::_profileRestrictedDataclasses().empty());
 }
 
