@@ -12,7 +12,7 @@ void anchor() {}
 
 std::filesystem::path ownDirectory() {
   Dl_info library{};
-  if (::dladdr(reinterpret_cast<const void*>(&anchor), &library) == 0) return std::filesystem::current_path();
+  if (::dladdr(reinterpret_cast<const void*>(&anchor), &library) == 0) return "/";  // where nothing of ours is found
   std::error_code failed;
   const std::filesystem::path file = std::filesystem::canonical(library.dli_fname, failed);
   return (failed ? std::filesystem::absolute(library.dli_fname) : file).parent_path();
