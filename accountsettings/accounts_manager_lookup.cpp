@@ -163,13 +163,11 @@ void AccountsManager::_loadChild(const PropertyValue& properties, const Account&
 void AccountsManager::_removeChildrenForAccountWithIdentifier(const Text& identifier) {
   const std::vector<Text>* const indexed = _childIdentifiersByParentID.find(identifier);
   if (indexed == nullptr) return;
-  // The argument may be text of a record that goes here.
-  const Text parentIdentifier = identifier;
   const std::vector<Text> children = *indexed;
-  _childIdentifiersByParentID.remove(parentIdentifier);
+  _childIdentifiersByParentID.remove(identifier);
   for (const Text& child : children) {
     const Text* const recorded = _childAccountIDToParentAccountID.find(child);
-    const bool isTakenOverByAnotherParent = recorded == nullptr || *recorded != parentIdentifier;
+    const bool isTakenOverByAnotherParent = recorded == nullptr || *recorded != identifier;
     if (isTakenOverByAnotherParent) continue;
     _childAccountIDToParentAccountID.remove(child);
     _childAccountsByID.remove(child);
