@@ -52,6 +52,14 @@ TREASURE = plistlib.dumps({
 })
 
 
+def can_mount_privately():
+    """A process whose root is no mount point, as in a chroot, cannot keep its mounts from everybody else."""
+    return subprocess.run(["unshare", "--mount", "true"], capture_output=True, check=False).returncode == 0
+
+
+WITH_A_TMP_OF_ITS_OWN = unittest.skipUnless(can_mount_privately(), "no private mounts can be had here")
+
+
 def put_away(path):
     """Makes room at the path."""
     if path.is_dir() and not path.is_symlink():
@@ -220,6 +228,7 @@ class NeighboursOfRoot(Neighbours, DeviceTest):
     def kinds(planted):
         return planted
 
+    @WITH_A_TMP_OF_ITS_OWN
     def test_of_the_lock_cannot_make_a_run_wait_or_write(self):
         device = self.make("lock")
         for kind, plant in planters({"outside": str(self.treasures[1])}, self.treasures[1] / "Accounts.plist").items():
@@ -234,11 +243,13 @@ class NeighboursOfRoot(Neighbours, DeviceTest):
                 run = self.assert_run_does_no_harm(device, prepare=lambda plant=plant: in_private_tmp(plant, self.scratch))
                 self.assertEqual(0 if kind == "hard link" else 1, run.status, run.errors)
 
+    @WITH_A_TMP_OF_ITS_OWN
     def test_may_have_made_the_lock_file(self):
         device = self.make("lock")
         run = self.assert_run_does_no_harm(device, prepare=lambda: in_private_tmp(give_to_mobile, self.scratch))
         self.assertEqual(0, run.status, run.errors)
 
+    @WITH_A_TMP_OF_ITS_OWN
     @unittest.skipUnless(can_trace_calls(), "no strace here, or it may trace nothing")
     def test_own_a_lock_file_that_is_never_opened_as_one_to_be_made(self):
         """Where fs.protected_regular is set, the kernel lets nobody open another's file in /tmp in that way."""
