@@ -26,7 +26,9 @@ endif()
 add_compile_options(
   -Wall -Wextra -Wpedantic -Wshadow -Wconversion -Wsign-conversion -Wold-style-cast -Wnon-virtual-dtor
   -Woverloaded-virtual -Wcast-qual -Wformat=2 -Werror
-  -fstack-protector-strong)
+  -fstack-protector-strong
+  # Messages name a source by its place in the tree, and no binary holds a path of the machine that built it.
+  "-fmacro-prefix-map=${CMAKE_SOURCE_DIR}/=")
 add_link_options(-Wl,-z,relro,-z,now,-z,noexecstack)
 
 if(ACCOUNTS_SANITIZE)
