@@ -7,8 +7,8 @@
 #include <stdexcept>
 
 #include "bench/silence.h"
-#include "platform/linux/libplist_property_list_store.h"
 #include "platform/linux/linux_platform.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace bench {
 namespace {

@@ -8,7 +8,7 @@
 #include "bench/unchanging_files.h"
 #include "migrator/accounts_data_migrator.h"
 #include "platform/description.h"
-#include "platform/linux/libplist_property_list_store.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace bench {
 namespace {

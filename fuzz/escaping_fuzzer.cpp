@@ -9,7 +9,7 @@
 #include "fuzz/require.h"
 #include "migrator/accounts_data_migrator.h"
 #include "platform/description.h"
-#include "platform/linux/single_line.h"
+#include "platform/linux/logs/single_line.h"
 #include "platform/message.h"
 #include "tools/failure.h"
 #include "tools/key_value.h"

@@ -2,7 +2,7 @@
 
 #include <algorithm>
 
-#include "platform/linux/libplist_property_list_store.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace fuzz {
 namespace {

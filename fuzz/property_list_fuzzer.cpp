@@ -3,7 +3,7 @@
 #include <memory>
 
 #include "fuzz/require.h"
-#include "platform/linux/libplist_property_list_store.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 #include "tests/support/fake_file_system.h"
 
 // Any bytes are refused or read; what is read can be written and read back with the same value.

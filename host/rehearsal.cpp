@@ -3,8 +3,8 @@
 #include <memory>
 #include <utility>
 
-#include "platform/linux/libplist_property_list_store.h"
-#include "platform/linux/rehearsal_file_system.h"
+#include "platform/linux/files/rehearsal_file_system.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 #include "platform/silent_services.h"
 
 namespace host {

@@ -5,7 +5,7 @@
 
 #include "host/say.h"
 #include "host/snapshots/listing.h"
-#include "platform/linux/linux_file_keeper.h"
+#include "platform/linux/files/linux_file_keeper.h"
 
 namespace host {
 namespace {

@@ -7,7 +7,7 @@
 #include <string_view>
 #include <utility>
 
-#include "platform/linux/descriptor.h"
+#include "platform/linux/files/descriptor.h"
 #include "platform/run_fact.h"
 #include "platform/status.h"
 

@@ -12,7 +12,7 @@
 
 #include "accountsettings/account_objects.h"
 #include "accountsettings/vocabulary.h"
-#include "platform/linux/bus/system_bus.h"
+#include "platform/linux/logs/bus/system_bus.h"
 
 namespace modules {
 namespace {

@@ -3,7 +3,7 @@
 #include <algorithm>
 
 #include "host/snapshots/problem.h"
-#include "platform/linux/linux_file_locks.h"
+#include "platform/linux/files/linux_file_locks.h"
 
 namespace host::snapshots {
 namespace {

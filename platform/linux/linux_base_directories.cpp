@@ -6,7 +6,7 @@
 #include <cstdlib>
 #include <vector>
 
-#include "platform/linux/own_directory.h"
+#include "platform/linux/files/own_directory.h"
 
 namespace platform {
 namespace {

@@ -1,4 +1,4 @@
-#include "platform/linux/linux_clock.h"
+#include "platform/linux/device/linux_clock.h"
 
 #include <gtest/gtest.h>
 

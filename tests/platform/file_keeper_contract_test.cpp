@@ -5,7 +5,7 @@
 
 #include <cerrno>
 
-#include "platform/linux/linux_file_keeper.h"
+#include "platform/linux/files/linux_file_keeper.h"
 #include "platform/linux/linux_platform.h"
 #include "tests/support/fake_file_keeper.h"
 #include "tests/support/scratch_directory.h"

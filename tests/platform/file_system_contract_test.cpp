@@ -6,8 +6,8 @@
 #include <filesystem>
 #include <iterator>
 
+#include "platform/linux/files/rehearsal_file_system.h"
 #include "platform/linux/linux_platform.h"
-#include "platform/linux/rehearsal_file_system.h"
 #include "tests/support/fake_file_system.h"
 #include "tests/support/scratch_directory.h"
 

@@ -7,8 +7,8 @@
 #include <new>
 
 #include "platform/linux/linux_platform.h"
-#include "platform/linux/linux_system_log.h"
-#include "platform/linux/single_line.h"
+#include "platform/linux/logs/linux_system_log.h"
+#include "platform/linux/logs/single_line.h"
 #include "tests/support/fake_platform.h"
 
 namespace tests {

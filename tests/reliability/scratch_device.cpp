@@ -13,8 +13,8 @@
 #include <stdexcept>
 
 #include "migrator/accounts_data_migrator.h"
-#include "platform/linux/libplist_property_list_store.h"
 #include "platform/linux/linux_platform.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 #include "tests/reliability/scarce_memory.h"
 
 namespace tests {

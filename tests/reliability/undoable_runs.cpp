@@ -14,9 +14,9 @@
 #include "host/snapshots/problem.h"
 #include "host/snapshots/undo.h"
 #include "migrator/accounts_data_migrator.h"
-#include "platform/linux/libplist_property_list_store.h"
-#include "platform/linux/linux_file_keeper.h"
+#include "platform/linux/files/linux_file_keeper.h"
 #include "platform/linux/linux_platform.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 #include "tests/support/fake_platform.h"
 #include "tests/support/mishap_file_keeper.h"
 

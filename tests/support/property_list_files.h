@@ -7,7 +7,7 @@
 #include <utility>
 #include <vector>
 
-#include "platform/linux/libplist_property_list_store.h"
+#include "platform/linux/property_lists/libplist_property_list_store.h"
 #include "tests/support/fake_file_system.h"
 
 namespace tests {

@@ -1,0 +1,13 @@
+#include "platform/linux/device/device_configuration.h"
+
+namespace platform {
+
+std::optional<Dictionary> DeviceConfiguration::ofSystem(std::string_view name) const {
+  return propertyLists->readDictionary(directories->systemRoot() / "etc/vorlix" / name);
+}
+
+std::optional<Dictionary> DeviceConfiguration::ofUser(std::string_view name) const {
+  return propertyLists->readDictionary(directories->home() / "Library/Preferences" / name);
+}
+
+}  // namespace platform

@@ -1,0 +1,17 @@
+#include "platform/linux/device/device_configuration.h"
+
+namespace platform {
+namespace {
+
+class LinuxSystemAccountQuery final : public SystemAccountQuery {
+ public:
+  [[nodiscard]] Text hostedServiceStatusKey() const override { return StringConstant{"hostedServiceStatus"}; }
+  [[nodiscard]] Text primaryAccountKey() const override { return StringConstant{"primaryAccount"}; }
+  [[nodiscard]] Text systemAccountTypeString() const override { return StringConstant{"Cirrant"}; }
+};
+
+}  // namespace
+
+std::shared_ptr<SystemAccountQuery> makeSystemAccountQuery() { return std::make_shared<LinuxSystemAccountQuery>(); }
+
+}  // namespace platform

@@ -1,0 +1,28 @@
+#pragma once
+
+#include <sys/types.h>
+
+#include <filesystem>
+#include <optional>
+#include <string>
+
+#include "platform/linux/files/path_resolution.h"
+
+namespace platform {
+
+// The numbers behind account names on a device: on the running system as its name services know them, in a file tree
+// elsewhere by that tree's own etc/passwd and etc/group.
+class AccountNames {
+ public:
+  explicit AccountNames(std::filesystem::path systemRoot)
+      : _root{std::move(systemRoot)}, _paths{FileTrees{.systemRoot = _root}} {}
+
+  [[nodiscard]] std::optional<uid_t> user(const std::string& name) const;
+  [[nodiscard]] std::optional<gid_t> group(const std::string& name) const;
+
+ private:
+  std::filesystem::path _root;
+  PathResolver _paths;
+};
+
+}  // namespace platform

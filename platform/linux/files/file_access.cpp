@@ -1,0 +1,89 @@
+#include "platform/linux/files/file_access.h"
+
+#include <fcntl.h>
+
+#include <cerrno>
+
+namespace platform {
+namespace {
+
+int errorForKind(mode_t mode) {
+  if (S_ISREG(mode)) return 0;
+  if (S_ISDIR(mode)) return EISDIR;
+  return S_ISLNK(mode) ? ELOOP : EINVAL;
+}
+
+bool refuse(int errorNumber) {
+  if (errorNumber == 0) return false;
+  errno = errorNumber;
+  return true;
+}
+
+}  // namespace
+
+bool isEntryName(const std::string& leaf) { return !leaf.empty() && leaf != "." && leaf != ".."; }
+
+Descriptor openRegularFile(const Place& place) {
+  struct stat status {};
+  if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return {};
+  if (refuse(errorForKind(status.st_mode))) return {};
+  constexpr int flags = O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW;
+  Descriptor file{retried([&] { return ::openat(place.parent.number(), place.leaf.c_str(), flags); })};
+  if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return {};
+  if (refuse(errorForKind(status.st_mode))) return {};
+  return file;
+}
+
+Descriptor openOwnFile(const Place& place) {
+  Descriptor file = openRegularFile(place);
+  struct stat status {};
+  struct stat holder {};
+  if (!file.isOpen() || ::fstat(file.number(), &status) != 0 || ::fstat(place.parent.number(), &holder) != 0) return {};
+  const bool mayBePlanted = status.st_uid != holder.st_uid || (holder.st_mode & S_IWOTH) != 0;
+  if (refuse(status.st_nlink > 1 && mayBePlanted ? EMLINK : 0)) return {};
+  return file;
+}
+
+Descriptor makeFile(const Place& place) {
+  constexpr int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags, 0600)};
+  if (!file.isOpen() || ::fchmod(file.number(), 0600) == 0) return file;
+  const int cause = errno;
+  ::unlinkat(place.parent.number(), place.leaf.c_str(), 0);
+  errno = cause;
+  return {};
+}
+
+bool writeAll(int descriptor, const void* bytes, std::size_t size) {
+  const auto* next = static_cast<const char*>(bytes);
+  while (size > 0) {
+    const ssize_t written = retried([&] { return ::write(descriptor, next, size); });
+    if (written < 0) return false;
+    next += written;
+    size -= static_cast<std::size_t>(written);
+  }
+  return true;
+}
+
+ssize_t readSome(int descriptor, void* buffer, std::size_t size) {
+  std::size_t filled = 0;
+  while (filled < size) {
+    const ssize_t count =
+        retried([&] { return ::read(descriptor, static_cast<char*>(buffer) + filled, size - filled); });
+    if (count < 0) return -1;
+    if (count == 0) break;
+    filled += static_cast<std::size_t>(count);
+  }
+  return static_cast<ssize_t>(filled);
+}
+
+bool sync(const Descriptor& file) {
+  return retried([&] { return ::fsync(file.number()); }) == 0 || errno == EINVAL;
+}
+
+Descriptor openForSync(const Descriptor& directory) {
+  constexpr int flags = O_RDONLY | O_DIRECTORY | O_CLOEXEC;
+  return Descriptor{retried([&] { return ::openat(directory.number(), ".", flags); })};
+}
+
+}  // namespace platform

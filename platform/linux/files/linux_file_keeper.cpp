@@ -1,0 +1,160 @@
+#include "platform/linux/files/linux_file_keeper.h"
+
+#include <dirent.h>
+#include <fcntl.h>
+
+#include <algorithm>
+#include <array>
+#include <cerrno>
+#include <memory>
+
+#include "platform/linux/files/path_resolution.h"
+
+namespace platform {
+namespace {
+
+constexpr mode_t kAllPermissions = 07777;
+
+FileKind kindOf(mode_t mode) {
+  if (S_ISREG(mode)) return FileKind::file;
+  return S_ISDIR(mode) ? FileKind::directory : FileKind::other;
+}
+
+FileAttributes attributesFrom(const struct stat& status) {
+  return {.kind = kindOf(status.st_mode),
+          .size = static_cast<std::uint64_t>(status.st_size),
+          .owner = status.st_uid,
+          .group = status.st_gid,
+          .permissions = status.st_mode & kAllPermissions,
+          .modifiedSeconds = status.st_mtim.tv_sec,
+          .modifiedNanoseconds = status.st_mtim.tv_nsec};
+}
+
+bool appendToFile(const Place& place, std::span<const std::uint8_t> bytes) {
+  const int flags = O_WRONLY | O_APPEND | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+  const Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags)};
+  struct stat before {};
+  if (!file.isOpen() || ::fstat(file.number(), &before) != 0) return false;
+  errno = EINVAL;
+  if (!S_ISREG(before.st_mode)) return false;
+  if (writeAll(file.number(), bytes.data(), bytes.size()) && sync(file)) return true;
+  const int cause = errno;
+  if (retried([&] { return ::ftruncate(file.number(), before.st_size); }) == 0) static_cast<void>(sync(file));
+  errno = cause;
+  return false;
+}
+
+// The owner comes before the permissions, of which a change of owner takes some away.
+bool makeAsBefore(int file, const FileAttributes& attributes) {
+  struct stat made {};
+  if (::fstat(file, &made) != 0) return false;
+  const bool isOwned = made.st_uid == attributes.owner && made.st_gid == attributes.group;
+  if (!isOwned && ::fchown(file, attributes.owner, attributes.group) != 0) return false;
+  if (::fchmod(file, attributes.permissions & kAllPermissions) != 0) return false;
+  const std::array<timespec, 2> times{
+      timespec{.tv_sec = 0, .tv_nsec = UTIME_OMIT},
+      timespec{.tv_sec = attributes.modifiedSeconds, .tv_nsec = attributes.modifiedNanoseconds}};
+  return ::futimens(file, times.data()) == 0;
+}
+
+bool isDirectory(const Place& place) {
+  struct stat status {};
+  return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+         S_ISDIR(status.st_mode);
+}
+
+bool putInPlace(const Place& place, const std::string& beside, std::span<const std::uint8_t> bytes,
+                const FileAttributes& attributes) {
+  const int parent = place.parent.number();
+  const Descriptor file = makeFile({Descriptor{::openat(parent, ".", O_PATH | O_DIRECTORY | O_CLOEXEC)}, beside});
+  return file.isOpen() && writeAll(file.number(), bytes.data(), bytes.size()) &&
+         makeAsBefore(file.number(), attributes) && sync(file) && changeEntries(place.parent, [&] {
+           return ::renameat(parent, beside.c_str(), parent, place.leaf.c_str()) == 0;
+         });
+}
+
+bool restoreFile(const Place& place, std::span<const std::uint8_t> bytes, const FileAttributes& attributes) {
+  errno = EISDIR;
+  if (isDirectory(place)) return false;
+  const std::string beside = ".restoring-" + place.leaf;
+  if (::unlinkat(place.parent.number(), beside.c_str(), 0) != 0 && errno != ENOENT) return false;
+  if (putInPlace(place, beside, bytes, attributes)) return true;
+  const int cause = errno;
+  ::unlinkat(place.parent.number(), beside.c_str(), 0);
+  errno = cause;
+  return false;
+}
+
+bool removeAndSync(const Place& place) {
+  return changeEntries(place.parent, [&place] {
+    return ::unlinkat(place.parent.number(), place.leaf.c_str(), 0) == 0 || errno == ENOENT;
+  });
+}
+
+bool readEntries(const Place& place, std::vector<std::string>& names) {
+  const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
+  const int directory = ::openat(place.parent.number(), place.leaf.c_str(), flags);
+  if (directory < 0) return false;
+  const std::unique_ptr<DIR, int (*)(DIR*)> stream{::fdopendir(directory), &::closedir};
+  if (!stream) return false;
+  errno = 0;
+  while (const dirent* const entry = ::readdir(stream.get())) {
+    if (isEntryName(entry->d_name)) names.emplace_back(entry->d_name);
+  }
+  std::ranges::sort(names);
+  return errno == 0;
+}
+
+class LinuxFileKeeper final : public FileKeeper {
+ public:
+  explicit LinuxFileKeeper(const FileTrees& trees) : _paths{trees} {}
+
+  Result<FileAttributes> attributesOf(const Path& path) override {
+    struct stat status {};
+    Status outcome = at(path, "look at", [&](const Place& place) {
+      return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
+    });
+    if (!outcome.isOk()) return outcome;
+    return attributesFrom(status);
+  }
+
+  Result<std::vector<std::string>> entriesOf(const Path& directory) override {
+    std::vector<std::string> names;
+    Status outcome = at(directory, "list", [&](const Place& place) { return readEntries(place, names); });
+    if (!outcome.isOk()) return outcome;
+    return names;
+  }
+
+  Status append(const Path& path, std::span<const std::uint8_t> bytes) override {
+    return at(path, "add to", [bytes](const Place& place) { return appendToFile(place, bytes); });
+  }
+
+  Status restore(const Path& path, std::span<const std::uint8_t> bytes, const FileAttributes& attributes) override {
+    return at(path, "restore", [&](const Place& place) { return restoreFile(place, bytes, attributes); });
+  }
+
+  // Nothing stands in a directory that is missing.
+  Status removeFile(const Path& path) override {
+    Status removed = at(path, "remove", &removeAndSync);
+    return removed.errorNumber() == ENOENT ? Status{} : removed;
+  }
+
+ private:
+  template <typename Action>
+  Status at(const Path& path, const char* verb, const Action& action) {
+    const Place place = _paths.openParent(path);
+    if (place.parent.isOpen() && action(place)) return {};
+    const int cause = errno;
+    return Status::failure(cause, std::string{verb} + " " + path.string());
+  }
+
+  PathResolver _paths;
+};
+
+}  // namespace
+
+std::shared_ptr<FileKeeper> makeFileKeeper(const BaseDirectories& directories) {
+  return std::make_shared<LinuxFileKeeper>(treesOf(directories));
+}
+
+}  // namespace platform
