@@ -8,9 +8,10 @@
 #include "fuzz/input.h"
 #include "fuzz/require.h"
 #include "migrator/accounts_data_migrator.h"
+#include "platform/characters.h"
 #include "platform/description.h"
-#include "platform/linux/logs/single_line.h"
 #include "platform/message.h"
+#include "platform/text.h"
 #include "tools/failure.h"
 #include "tools/key_value.h"
 #include "tools/table.h"
@@ -81,13 +82,14 @@ void checkDescription(const Text& text) {
 }
 
 bool isClean(std::string_view text) {
+  if (!platform::isWellFormedText(text)) return text.empty();
   for (std::size_t place = 0; place < text.size(); ++place) {
     const auto byte = static_cast<unsigned char>(text[place]);
     if ((byte < 0x20 && byte != '\t') || byte == 0x7F) return false;
-    const std::string_view here = text.substr(place);
-    const auto next = static_cast<unsigned char>(here.size() >= 2 ? here[1] : 0);
-    if (byte == 0xC2 && next >= 0x80 && next < 0xA0) return false;
-    if (here.starts_with("\u2028") || here.starts_with("\u2029")) return false;
+    const std::string_view character = text.substr(place, 3);
+    if (character >= "\u0080" && character.substr(0, 2) <= "\u009F") return false;
+    if (character >= "\u2028" && character <= "\u202E") return false;
+    if (character >= "\u2066" && character <= "\u2069") return false;
   }
   return true;
 }

@@ -1,6 +1,7 @@
 #include "platform/text.h"
 
-#include <algorithm>
+#include <utf8.h>
+
 #include <cstdint>
 #include <cstring>
 
@@ -9,42 +10,6 @@ namespace {
 
 constexpr std::string_view kReplacementCharacter = "\xEF\xBF\xBD";
 
-bool isContinuation(char byte) { return (static_cast<unsigned char>(byte) & 0xC0U) == 0x80U; }
-
-// The smallest and largest second byte that may follow a lead byte, and the length of the whole sequence; length 0 for
-// a byte that leads nothing.
-struct Sequence {
-  std::size_t length;
-  std::uint8_t secondFrom;
-  std::uint8_t secondTo;
-};
-
-Sequence sequenceLedBy(char lead) {
-  const auto byte = static_cast<std::uint8_t>(lead);
-  if (byte >= 0x01 && byte <= 0x7F) return {1, 0, 0};
-  if (byte >= 0xC2 && byte <= 0xDF) return {2, 0x80, 0xBF};
-  if (byte == 0xE0) return {3, 0xA0, 0xBF};
-  if (byte == 0xED) return {3, 0x80, 0x9F};
-  if (byte >= 0xE1 && byte <= 0xEF) return {3, 0x80, 0xBF};
-  if (byte == 0xF0) return {4, 0x90, 0xBF};
-  if (byte >= 0xF1 && byte <= 0xF3) return {4, 0x80, 0xBF};
-  if (byte == 0xF4) return {4, 0x80, 0x8F};
-  return {0, 0, 0};
-}
-
-// The length of the well-formed character at the front; 0 where there is none.
-std::size_t characterLength(std::string_view bytes) {
-  const Sequence sequence = sequenceLedBy(bytes.front());
-  if (sequence.length == 0 || sequence.length > bytes.size()) return 0;
-  if (sequence.length == 1) return 1;
-  const auto second = static_cast<std::uint8_t>(bytes[1]);
-  if (second < sequence.secondFrom || second > sequence.secondTo) return 0;
-  for (std::size_t index = 2; index < sequence.length; ++index) {
-    if (!isContinuation(bytes[index])) return 0;
-  }
-  return sequence.length;
-}
-
 // Whether eight bytes are all ASCII and none of them is NUL.
 bool arePlain(std::uint64_t bytes) {
   constexpr std::uint64_t kOnes = 0x0101010101010101U;
@@ -52,15 +17,27 @@ bool arePlain(std::uint64_t bytes) {
   return ((bytes | (bytes - kOnes)) & kHighBits) == 0;
 }
 
+// Adds the bytes, none of which is NUL, with U+FFFD for each byte that is part of no character.
+void appendRepaired(std::string& text, std::string_view bytes) {
+  while (true) {
+    const auto* const end = utf8::find_invalid(bytes.begin(), bytes.end());
+    text.append(bytes.begin(), end);
+    if (end == bytes.end()) return;
+    text += kReplacementCharacter;
+    bytes.remove_prefix(static_cast<std::size_t>(end - bytes.begin()) + 1);
+  }
+}
+
 std::string repaired(std::string_view bytes) {
   std::string text;
   text.reserve(bytes.size());
-  while (!bytes.empty()) {
-    const std::size_t length = characterLength(bytes);
-    text.append(length == 0 ? kReplacementCharacter : bytes.substr(0, length));
-    bytes.remove_prefix(std::max<std::size_t>(length, 1));
+  while (true) {
+    const std::string_view piece = bytes.substr(0, bytes.find('\0'));
+    appendRepaired(text, piece);
+    if (piece.size() == bytes.size()) return text;
+    text += kReplacementCharacter;
+    bytes.remove_prefix(piece.size() + 1);
   }
-  return text;
 }
 
 std::shared_ptr<const char> copyOf(std::string_view bytes) {
@@ -83,12 +60,8 @@ std::size_t plainPrefix(std::string_view bytes) {
 }
 
 bool isWellFormedText(std::string_view bytes) {
-  for (bytes.remove_prefix(plainPrefix(bytes)); !bytes.empty();) {
-    const std::size_t length = characterLength(bytes);
-    if (length == 0) return false;
-    bytes.remove_prefix(length);
-  }
-  return true;
+  bytes.remove_prefix(plainPrefix(bytes));
+  return bytes.find('\0') == std::string_view::npos && utf8::is_valid(bytes.begin(), bytes.end());
 }
 
 Text::Text(std::string_view characters) {

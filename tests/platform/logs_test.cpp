@@ -8,7 +8,6 @@
 
 #include "platform/linux/linux_platform.h"
 #include "platform/linux/logs/linux_system_log.h"
-#include "platform/linux/logs/single_line.h"
 #include "tests/support/fake_platform.h"
 
 namespace tests {
@@ -150,25 +149,6 @@ TEST(ConsoleLog, OfTheTestsKeepsTheMessages) {
   FakeConsoleLog console{outputs};
   console.write("Migrating accounts");
   EXPECT_THAT(console.lines, ElementsAre("Migrating accounts"));
-}
-
-struct Line {
-  std::string text;
-  std::string line;
-};
-
-TEST(SingleLine, ShowsWhatWouldBreakOrControlIt) {
-  const Line cases[] = {{"plain \xc3\xa9", "plain \xc3\xa9"},
-                        {"a\tb", "a\tb"},
-                        {"a\nb\rc", "a\\nb\\rc"},
-                        {std::string("\0\v\f", 3), "\\x00\\x0b\\x0c"},
-                        {"\x1b[31m\x7f", "\\x1b[31m\\x7f"},
-                        {"\xc2\x85\xc2\x9b\xc2\xa0", "\\x85\\x9b\xc2\xa0"},
-                        {"\xc2[\xc2\n", "\xc2[\xc2\\n"},
-                        {"\u2028\u2029\u2030", "\\u2028\\u2029\u2030"},
-                        {"cut \xc2", "cut \xc2"},
-                        {"", ""}};
-  for (const auto& [text, line] : cases) EXPECT_EQ(platform::singleLine(text), line);
 }
 
 }  // namespace

@@ -7,8 +7,8 @@
 #include <ctime>
 #include <exception>
 
+#include "platform/characters.h"
 #include "platform/linux/files/file_access.h"
-#include "platform/linux/logs/single_line.h"
 
 namespace platform {
 namespace {

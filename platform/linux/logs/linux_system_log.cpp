@@ -11,7 +11,7 @@
 #include <ctime>
 #include <exception>
 
-#include "platform/linux/logs/single_line.h"
+#include "platform/characters.h"
 
 namespace platform {
 namespace {
