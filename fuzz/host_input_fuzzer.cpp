@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "commandline/ending.h"
 #include "fuzz/input.h"
 #include "fuzz/require.h"
 #include "host/options.h"
@@ -66,7 +67,12 @@ std::vector<std::pair<std::string, Place>> placesOf(const host::Options& options
 }
 
 void checkOptions(const std::vector<std::string>& arguments) {
-  const auto read = parsed(arguments);
+  std::variant<host::Options, host::Answer> read;
+  try {
+    read = parsed(arguments);
+  } catch (const commandline::WrongUse&) {
+    return;
+  }
   if (const auto* const answer = std::get_if<host::Answer>(&read)) {
     require(!answer->text.empty(), "an answer that says nothing");
     return;

@@ -35,16 +35,14 @@ struct Options {
   SnapshotOptions snapshots;
 };
 
-// What is to be printed instead of a run, and to whom.
+// What is to be printed on standard output instead of a run.
 struct Answer {
   std::string text;
-  bool isWrongUse = false;  // one line for standard error; else for standard output
 };
 
-// Reads the arguments that follow the program's name. Options are written `--name VALUE` or `--name=VALUE`, in full; a
-// value that begins with two hyphens only in the second form. Wrong use is: an option that is unknown or given twice, a
-// value that is missing or empty, any other argument, a root that is no directory, and options that contradict each
-// other or lack the one that they need.
+// Reads the arguments that follow the program's name, as commandline/options.h says. Throws commandline::WrongUse for
+// what is said there, for an argument that is no option, for a root that is no directory, and for options that
+// contradict each other or lack the one that they need.
 [[nodiscard]] std::variant<Options, Answer> parseArguments(std::span<const char* const> arguments);
 
 }  // namespace host

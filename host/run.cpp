@@ -2,17 +2,17 @@
 
 #include <unistd.h>
 
-#include <cstdio>
 #include <memory>
 #include <utility>
 
+#include "commandline/ending.h"
+#include "commandline/text.h"
 #include "host/explanation_output.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
 #include "host/run_watch.h"
 #include "host/say.h"
 #include "host/snapshot_steps.h"
-#include "host/snapshots/problem.h"
 #include "host/trace.h"
 #include "host/traced_services.h"
 #include "platform/temporary_directory.h"
@@ -20,10 +20,7 @@
 namespace host {
 namespace {
 
-// Ends a run before it began; what is wrong has been said.
-struct Refusal {
-  ExitStatus status;
-};
+using commandline::Ending;
 
 // What watches a run from outside. The watch is null where nobody asks for anything that it could tell.
 struct Watchers {
@@ -37,8 +34,7 @@ std::shared_ptr<Trace> openTrace(const Options& options) {
   if (!options.trace) return nullptr;
   auto opened = Trace::open(*options.trace);
   if (opened.isOk()) return opened.take();
-  say(opened.status().description());
-  throw Refusal{ExitStatus::wrongUse};
+  throw Ending{ExitStatus::wrongUse, opened.status().description()};
 }
 
 Watchers watchersFor(const Options& options) {
@@ -62,10 +58,7 @@ platform::Platform platformFor(const Options& options, const Watchers& watchers)
 
 std::unique_ptr<platform::DataClassMigrator> load(const Options& options) {
   auto loaded = loadMigrator(platform::current(), options.plugin ? *options.plugin : installedPlugin());
-  if (const auto* const error = std::get_if<std::string>(&loaded)) {
-    say(*error);
-    throw Refusal{ExitStatus::noPlugin};
-  }
+  if (const auto* const error = std::get_if<std::string>(&loaded)) throw Ending{ExitStatus::noPlugin, *error};
   return std::get<std::unique_ptr<platform::DataClassMigrator>>(std::move(loaded));
 }
 
@@ -84,13 +77,14 @@ bool perform(platform::DataClassMigrator& migrator, const SnapshotOptions& optio
 void explain(const Options& options, const Watchers& watchers, const Outcome& outcome) {
   if (options.explain == Explain::notAsked) return;
   const Explanation& explanation = watchers.watch->explanation();
-  const std::string text =
-      options.explain == Explain::json ? jsonDocumentOf(explanation, outcome) : textOf(explanation, outcome);
-  const bool isWritten = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
-  if (std::fflush(stdout) != 0 || !isWritten) say("the explanation could not be written to standard output");
+  const std::string text = options.explain == Explain::json ? jsonDocumentOf(explanation, outcome)
+                                                            : commandline::printableLines(textOf(explanation, outcome));
+  if (!commandline::print(text)) say("the explanation could not be written to standard output");
 }
 
-ExitStatus runInSteps(const Options& options) {
+}  // namespace
+
+ExitStatus run(const Options& options) {
   const Watchers watchers = watchersFor(options);
   platform::setCurrent(platformFor(options, watchers));
   if (isForSnapshots(options.snapshots)) return workOnSnapshots(options.snapshots);
@@ -101,19 +95,6 @@ ExitStatus runInSteps(const Options& options) {
   explain(options, watchers,
           {.dataClass = migrator->dataClassName(), .success = success, .isRehearsal = options.isRehearsal});
   return success ? ExitStatus::migrated : ExitStatus::notMigrated;
-}
-
-}  // namespace
-
-ExitStatus run(const Options& options) {
-  try {
-    return runInSteps(options);
-  } catch (const Refusal& refusal) {
-    return refusal.status;
-  } catch (const snapshots::Problem& problem) {
-    say(problem.what());
-    return problem.kind() == snapshots::Problem::Kind::wrongUse ? ExitStatus::wrongUse : ExitStatus::noSnapshot;
-  }
 }
 
 }  // namespace host

@@ -1,11 +1,13 @@
 #pragma once
 
-#include <string>
+#include <string_view>
+
+#include "commandline/program.h"
 
 namespace host {
 
-// Says one line of the program's own on standard error, "migration-host: " in front of it. Out of memory even for that,
-// it says so.
-void say(const std::string& line) noexcept;
+constexpr std::string_view kProgram = "migration-host";
+
+inline void say(std::string_view line) noexcept { commandline::say(kProgram, line); }
 
 }  // namespace host

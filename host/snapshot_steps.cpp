@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <utility>
 
+#include "commandline/text.h"
 #include "host/say.h"
 #include "host/snapshots/listing.h"
 #include "platform/linux/files/linux_file_keeper.h"
@@ -24,9 +25,10 @@ snapshots::UndoPlace placeFor(const SnapshotOptions& options) {
 void list(const SnapshotOptions& options) {
   const snapshots::Storage storage{platform::current().files,
                                    platform::makeFileKeeper(*platform::current().directories)};
-  const std::string text = options.listing == Listing::json ? listingAsJson(storage, *options.directory)
-                                                            : listingForPeople(storage, *options.directory);
-  std::fputs(text.c_str(), stdout);
+  const std::string text = options.listing == Listing::json
+                               ? listingAsJson(storage, *options.directory)
+                               : commandline::printableLines(listingForPeople(storage, *options.directory));
+  static_cast<void>(commandline::print(text));
 }
 
 void restore(const SnapshotOptions& options) {

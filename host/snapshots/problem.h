@@ -1,26 +1,23 @@
 #pragma once
 
 #include <cstdint>
-#include <stdexcept>
 #include <string>
 
+#include "commandline/ending.h"
 #include "platform/status.h"
 
 namespace host::snapshots {
 
-// Why something that was asked of the snapshots is not done; its text is one line for the caller. Thrown.
-class Problem : public std::runtime_error {
+// Why something that was asked of the snapshots is not done.
+class Problem : public commandline::Ending {
  public:
+  // The exit status that each ends the host with.
   enum class Kind : std::uint8_t {
-    wrongUse,  // it should not have been asked
-    failed,    // it could not be done
+    wrongUse = 2,  // it should not have been asked
+    failed = 5,    // it could not be done
   };
 
-  Problem(Kind kind, const std::string& text) : std::runtime_error{text}, _kind{kind} {}
-  [[nodiscard]] Kind kind() const { return _kind; }
-
- private:
-  Kind _kind;
+  Problem(Kind kind, const std::string& text) : Ending{kind, text} {}
 };
 
 // Throws where the call failed, with its description.
