@@ -5,6 +5,7 @@
 #include <string>
 #include <vector>
 
+#include "commandline/table.h"
 #include "fuzz/input.h"
 #include "fuzz/require.h"
 #include "migrator/accounts_data_migrator.h"
@@ -12,9 +13,8 @@
 #include "platform/description.h"
 #include "platform/message.h"
 #include "platform/text.h"
-#include "tools/failure.h"
 #include "tools/key_value.h"
-#include "tools/table.h"
+#include "tools/options.h"
 
 namespace {
 
@@ -102,10 +102,10 @@ void checkLines(const std::string& text) {
 }
 
 void checkTables(const Text& text) {
-  const std::string shown = tools::printable(text);
+  const std::string shown = platform::printable(text);
   require(isClean(shown) && shown.find('\t') == std::string::npos, "an unprintable character");
-  require(tools::printable(shown) == shown, "printable text is changed");
-  const std::string lines = tools::table({{text.string(), "x", text.string()}, {"", text.string()}});
+  require(platform::printable(shown) == shown, "printable text is changed");
+  const std::string lines = commandline::table({{text.string(), "x", text.string()}, {"", text.string()}});
   require(std::ranges::count(lines, '\n') == 2, "not one line a row");
 }
 

@@ -5,7 +5,6 @@
 
 #include "tools/account_view.h"
 #include "tools/commands.h"
-#include "tools/failure.h"
 #include "tools/key_value.h"
 
 namespace tools {

@@ -6,7 +6,6 @@
 #include <utility>
 #include <vector>
 
-#include "tools/failure.h"
 #include "tools/session.h"
 
 namespace tools {

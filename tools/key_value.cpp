@@ -2,7 +2,7 @@
 
 #include <nlohmann/json.hpp>
 
-#include "tools/failure.h"
+#include "tools/options.h"
 
 namespace tools {
 namespace {

@@ -1,38 +1,26 @@
+#include <unistd.h>
+
 #include <algorithm>
-#include <csignal>
-#include <cstdio>
-#include <exception>
-#include <iterator>
-#include <span>
-#include <string>
-#include <string_view>
 
 #include "accountsettings/assertion_failure.h"
+#include "commandline/program.h"
+#include "commandline/table.h"
 #include "tools/commands.h"
-#include "tools/failure.h"
 #include "tools/options.h"
-#include "tools/table.h"
 
 namespace {
 
 using tools::ExitStatus;
 using tools::Failure;
 
+constexpr std::string_view kProgram = "accountctl";
+constexpr std::size_t kUsualColumns = 80;
+
 constexpr std::string_view kUsageHead =
     "Usage: accountctl [OPTION]... COMMAND [ARGUMENT]...\n"
     "Reads and changes a device's accounts.\n"
     "\n";
-constexpr std::string_view kUsageOptions =
-    "\n"
-    "  --root DIR       the root of the device's file tree (default: /)\n"
-    "  --home DIR       the mobile user's home directory (default: the process's;\n"
-    "                   with --root, var/mobile in it)\n"
-    "  --resources DIR  the configuration, in place of the installed one\n"
-    "  --modules        open the account modules under --root, too, and tell them of\n"
-    "                   changes; else nobody is told of a change under another root\n"
-    "  --json           print JSON\n"
-    "  --help           print this text\n"
-    "  --version        print the version\n"
+constexpr std::string_view kUsageTail =
     "\n"
     "DATACLASS is written Mail or com.vorlix.Dataclass.Mail, VALUE is a text;\n"
     "KEY:=JSON gives any other value. Credentials are never printed.\n"
@@ -40,84 +28,58 @@ constexpr std::string_view kUsageOptions =
     "Exit status: 0 done, 1 failed or findings, 2 wrong use, 3 no such account,\n"
     "4 the configuration or a module is at fault.\n";
 
-// A reader that went away and a file that may not grow are failed writes, not the end of a half-done change.
-void surviveFailedWrites() {
-  std::signal(SIGPIPE, SIG_IGN);
-  std::signal(SIGXFSZ, SIG_IGN);
+std::string usageOf(const tools::Command& command) {
+  return std::string{command.name} + (command.arguments.empty() ? "" : " ") + std::string{command.arguments};
 }
 
-void say(std::string_view message) noexcept {
-  try {
-    const auto line = "accountctl: " + tools::printable(message) + "\n";
-    std::fwrite(line.data(), 1, line.size(), stderr);
-  } catch (...) {
-    std::fputs("accountctl: out of memory\n", stderr);
-  }
+std::string help() {
+  auto page = commandline::pageOn(STDOUT_FILENO);
+  page.columns = page.columns.value_or(kUsualColumns);
+  std::vector<commandline::Meaning> list;
+  for (const auto& command : tools::commands()) list.push_back({usageOf(command), std::string{command.summary}});
+  return std::string{kUsageHead} + commandline::meanings(list, page) + "\n" + tools::helpOfOptions(page) +
+         std::string{kUsageTail};
 }
 
-std::string usage() {
-  std::vector<std::vector<std::string>> rows;
-  for (const auto& command : tools::commands()) {
-    const auto blank = command.arguments.empty() ? "" : " ";
-    rows.push_back(
-        {"", std::string{command.name} + blank + std::string{command.arguments}, std::string{command.summary}});
-  }
-  return std::string{kUsageHead} + tools::table(rows) + std::string{kUsageOptions};
+const tools::Command& commandNamed(const std::string& name) {
+  const auto& all = tools::commands();
+  const auto found = std::ranges::find(all, name, &tools::Command::name);
+  if (found != all.end()) return *found;
+  std::vector<std::string> names;
+  for (const auto& each : all) names.emplace_back(each.name);
+  throw commandline::WrongUse{"unknown command: " + name, commandline::hintFor(name, names)};
 }
 
 const tools::Command& commandOf(const tools::Options& options) {
-  if (options.command.empty()) throw Failure{ExitStatus::wrongUse, "no command is given (see --help)"};
-  const auto& all = tools::commands();
-  const auto found = std::ranges::find(all, options.command, &tools::Command::name);
-  if (found == all.end()) {
-    throw Failure{ExitStatus::wrongUse, "unknown command: " + options.command + " (see --help)"};
-  }
+  if (options.command.empty()) throw commandline::WrongUse{"no command is given"};
+  const auto& command = commandNamed(options.command);
   const auto count = options.arguments.size();
-  if (count < found->fewestArguments || count > found->mostArguments) {
-    throw Failure{ExitStatus::wrongUse, "usage: accountctl " + options.command + (found->arguments.empty() ? "" : " ") +
-                                            std::string{found->arguments}};
-  }
-  return *found;
+  if (count >= command.fewestArguments && count <= command.mostArguments) return command;
+  throw Failure{ExitStatus::wrongUse, "usage: accountctl " + usageOf(command)};
 }
 
-tools::Outcome run(std::span<const char* const> arguments) {
+tools::Outcome perform(std::span<const char* const> arguments) {
   const auto options = tools::parseArguments(arguments);
-  if (options.printsHelp) return usage();
+  if (options.printsHelp) return help();
   if (options.printsVersion) return std::string{"accountctl " ACCOUNTCTL_VERSION "\n"};
   const auto& command = commandOf(options);
   tools::Session session{options};
-  return command.run(session, options.arguments, options.printsJson);
-}
-
-ExitStatus print(const tools::Outcome& outcome) {
-  const auto& output = outcome.output;
-  const bool isWritten = std::fwrite(output.data(), 1, output.size(), stdout) == output.size();
-  if (isWritten && std::fflush(stdout) == 0) return outcome.status;
-  say("the output could not be written");
-  return ExitStatus::failed;
-}
-
-ExitStatus performed(std::span<const char* const> arguments) {
   try {
-    return print(run(arguments));
-  } catch (const Failure& failure) {
-    say(failure.what());
-    return failure.status();
+    return command.run(session, options.arguments, options.printsJson);
   } catch (const accountsettings::AssertionFailure& failure) {
-    say(failure.what());
-    return ExitStatus::faultyInstallation;
-  } catch (const std::exception& thrown) {
-    say(thrown.what());
-  } catch (...) {
-    say("the command ended in an unknown failure");
+    throw Failure{ExitStatus::faultyInstallation, failure.what()};
   }
-  return ExitStatus::failed;
+}
+
+int obey(std::span<const char* const> arguments) {
+  const auto outcome = perform(arguments);
+  if (!commandline::print(outcome.output)) throw Failure{ExitStatus::failed, "the output could not be written"};
+  return static_cast<int>(outcome.status);
 }
 
 }  // namespace
 
 int main(int count, char** arguments) {
-  surviveFailedWrites();
-  const std::span<const char* const> all{arguments, static_cast<std::size_t>(count)};
-  return static_cast<int>(performed(all.subspan(all.empty() ? 0 : 1)));
+  return commandline::runProgram(kProgram, {arguments, static_cast<std::size_t>(count)},
+                                 static_cast<int>(ExitStatus::failed), obey);
 }

@@ -4,9 +4,25 @@
 #include <string>
 #include <vector>
 
+#include "commandline/ending.h"
+#include "commandline/options.h"
+#include "commandline/terminal.h"
 #include "platform/linux/linux_platform.h"
 
 namespace tools {
+
+// The program's exit statuses are a contract: scripts tell by them what became of what they asked.
+enum class ExitStatus : int {
+  done = 0,
+  failed = 1,              // the accounts could not be read or saved; the file is as it was
+  findings = 1,            // a file that was to be verified has faults; for scripts as good as one that cannot be read
+  wrongUse = 2,            // what was asked makes no sense; nothing was changed
+  noSuchAccount = 3,       // nothing was changed
+  faultyInstallation = 4,  // the configuration or a module is at fault; the message says whether the change was saved
+};
+
+// Ends a command that cannot do what it was asked.
+using Failure = commandline::Ending;
 
 // What the command line asks for. Every path is absolute.
 struct Options {
@@ -23,10 +39,11 @@ struct Options {
   [[nodiscard]] bool opensModules() const;
 };
 
-// Reads the arguments that follow the program's name. Options stand before or after the command, written `--name VALUE`
-// or `--name=VALUE`, in full; `--` ends them. Throws Failure (wrong use) for an option that is unknown or given twice,
-// a value that is missing or empty, a root
-// that is no directory, and a word that is not UTF-8.
+// Reads the arguments that follow the program's name, as commandline/options.h says. Throws Failure (wrong use) for
+// what is said there, for a root that is no directory, and for a word that is not UTF-8.
 [[nodiscard]] Options parseArguments(std::span<const char* const> arguments);
+
+// The help's lines on the options.
+[[nodiscard]] std::string helpOfOptions(const commandline::Page& page);
 
 }  // namespace tools

@@ -3,9 +3,9 @@
 #include <optional>
 
 #include "accountsettings/service_objects.h"
+#include "commandline/table.h"
 #include "tools/account_view.h"
 #include "tools/commands.h"
-#include "tools/table.h"
 
 namespace tools {
 namespace {
@@ -14,14 +14,14 @@ using accountsettings::ServiceAccountObject;
 using accountsettings::ServiceAddress;
 using accountsettings::Text;
 using Json = nlohmann::ordered_json;
-using Rows = std::vector<std::vector<std::string>>;
+using Rows = std::vector<commandline::Row>;
 
 std::string textOf(const std::optional<Text>& text) { return text ? text->string() : std::string{}; }
 
-std::vector<std::string> rowOf(const BasicAccount& account, std::string_view indentation) {
-  return {std::string{indentation} + textOf(account.identifier()), textOf(account.type()),
-          textOf(account.accountClass()), nameOf(account),
-          joinedDataclasses(account.enabledDataclasses().value_or(BasicAccount::Dataclasses{}))};
+commandline::Row rowOf(const BasicAccount& account, std::string_view indentation) {
+  return commandline::Row{std::string{indentation} + textOf(account.identifier()), textOf(account.type()),
+                          textOf(account.accountClass()), nameOf(account),
+                          joinedDataclasses(account.enabledDataclasses().value_or(BasicAccount::Dataclasses{}))};
 }
 
 Json treeOf(ChildrenByParent& byParent, const BasicAccount& account) {
@@ -92,7 +92,7 @@ Outcome listAccounts(Session& session, const Words&, bool asJson) {
     rows.push_back(rowOf(*account, ""));
     for (const auto& child : byParent[account.get()]) rows.push_back(rowOf(*child, "  "));
   }
-  return table(rows);
+  return commandline::table(rows);
 }
 
 Outcome showAccount(Session& session, const Words& arguments, bool asJson) {
@@ -100,7 +100,8 @@ Outcome showAccount(Session& session, const Words& arguments, bool asJson) {
   const auto service = serviceOf(session, *account);
   auto byParent = childrenByParent(session.accounts());
   if (!asJson) {
-    return table(summaryOf(byParent, account, service)) + "Properties\n" + table(propertiesOf(*account));
+    return commandline::table(summaryOf(byParent, account, service)) + "Properties\n" +
+           commandline::table(propertiesOf(*account));
   }
   auto report = treeOf(byParent, *account);
   report["service"] = jsonOf(service);
@@ -118,7 +119,7 @@ Outcome listTypes(Session&, const Words&, bool asJson) {
     report["types"].push_back({{"type", type.string()}, {"supported", tools::jsonOf(dataclasses)}});
     rows.push_back({type.string(), joinedDataclasses(dataclasses)});
   }
-  return asJson ? report.dump(2) + "\n" : table(rows);
+  return asJson ? report.dump(2) + "\n" : commandline::table(rows);
 }
 
 }  // namespace tools

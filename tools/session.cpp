@@ -8,7 +8,6 @@
 
 #include "platform/linux/linux_platform.h"
 #include "platform/temporary_directory.h"
-#include "tools/failure.h"
 
 namespace tools {
 namespace {

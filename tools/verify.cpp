@@ -3,10 +3,10 @@
 #include <nlohmann/json.hpp>
 #include <optional>
 
+#include "commandline/text.h"
 #include "platform/platform.h"
 #include "tools/commands.h"
 #include "tools/findings.h"
-#include "tools/table.h"
 
 namespace tools {
 namespace {
@@ -14,6 +14,7 @@ namespace {
 using accountsettings::Array;
 using accountsettings::Dictionary;
 using accountsettings::Text;
+using commandline::printable;
 using platform::Path;
 using Json = nlohmann::ordered_json;
 

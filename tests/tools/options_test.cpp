@@ -4,8 +4,6 @@
 
 #include <ostream>
 
-#include "tools/failure.h"
-
 namespace tools {
 namespace {
 
