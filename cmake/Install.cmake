@@ -1,6 +1,6 @@
 # What `cmake --install` leaves behind: a tree in which everything finds everything else from wherever the tree stands.
 # Each file belongs to one component: library (what programs that use accounts need to run), development (what they need
-# to build), host (what a device needs to migrate), tools. The packages are made of them.
+# to build), host (what a device needs to migrate), tools, rehearse. The packages are made of them.
 
 include(CMakePackageConfigHelpers)
 
@@ -34,7 +34,7 @@ if(TARGET accounts-migrator)
   add_dependencies(product accounts-migrator)
   install(TARGETS accounts-migrator LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}/account-settings" COMPONENT host)
 endif()
-foreach(rest account_modules resources)
+foreach(rest account_modules rehearse resources)
   if(TARGET ${rest})
     add_dependencies(product ${rest})
   endif()

@@ -1,0 +1,47 @@
+"""Which images are meant: those named on the command line, and those in lists, which may be longer than memory."""
+
+import os
+import shutil
+import sys
+import tempfile
+
+from migration_rehearse.campaign import in_shard
+
+STANDARD_INPUT = "-"
+
+
+class Listing:
+    """The paths of images, in the order in which they are named; iterated as often as need be. Lists hold one path a line,
+    or end each with a zero byte. Raises OSError where a list cannot be read."""
+
+    def __init__(self, named, lists, shard=(1, 1), is_zero_ended=False):
+        self.named = named
+        self.shard = shard
+        self.end = b"\0" if is_zero_ended else b"\n"
+        self.lists = [_spooled(sys.stdin.buffer) if each == STANDARD_INPUT else open(each, "rb") for each in lists]
+
+    def __iter__(self):
+        return (path for path in self._all() if in_shard(path, self.shard))
+
+    def count(self):
+        return sum(1 for _ in self)
+
+    def _all(self):
+        yield from self.named
+        for file in self.lists:
+            file.seek(0)
+            yield from (os.fsdecode(line) for line in self._lines(file) if line)
+
+    def _lines(self, file):
+        rest = b""
+        while block := file.read(1 << 16):
+            *whole, rest = (rest + block).split(self.end)
+            yield from whole
+        yield rest
+
+
+def _spooled(stream):
+    """What can be read once only, kept on disk so that it can be read again."""
+    file = tempfile.TemporaryFile()
+    shutil.copyfileobj(stream, file)
+    return file
