@@ -1,0 +1,78 @@
+"""Hosts that hang, crash, eat memory or talk without end, as a hostile image might make them: each ends as one row."""
+
+import unittest
+
+from rehearse_case import RehearseTest
+
+# What a run of this host does is said by a file of the device.
+HOST = """#!/usr/bin/python3
+import os, resource, signal, sys, time
+if "--version" in sys.argv:
+    sys.exit(print("migration-host 9.9"))
+what = open(sys.argv[sys.argv.index("--root") + 1] + "/etc/passwd").read().split(":")[0]
+if what == "hang":
+    signal.signal(signal.SIGTERM, signal.SIG_IGN); time.sleep(600)
+if what == "spin":
+    while True: pass
+if what == "crash":
+    os.kill(os.getpid(), signal.SIGSEGV)
+if what == "eat":
+    held = []
+    try:
+        while True: held.append(b"x" * (1 << 24))
+    except MemoryError:
+        sys.exit(1)
+if what == "talk":
+    while True: sys.stdout.write("x" * 65536)
+if what == "orphan" and os.fork() == 0:
+    time.sleep(600)
+if what == "murder":
+    os.kill(os.getppid(), signal.SIGKILL)
+if what == "refuse":
+    sys.stderr.write("it is a link\\n"); sys.exit(8)
+if what == "silent":
+    sys.exit(0)
+if what == "quote":
+    print(sys.argv[sys.argv.index("--root") + 1], os.environ); sys.exit(0)
+print('{"stages": [], "result": {"success": true, "verdict": "kept", "lost": []}}')
+"""
+
+
+class HostileHosts(RehearseTest):
+    def rehearsing(self, *kinds, status=3):
+        program = self.scratch / "host"
+        program.write_text(HOST)
+        program.chmod(0o755)
+        images = []
+        for kind in kinds:
+            images.append(self.image(kind))
+            (images[-1] / "etc/passwd").write_text(f"{kind}:x:1:1::/:/bin/sh\n")
+        self.rehearse("--host", program, "--plugin", program, "--timeout", 2, "--memory", "300M", "--max-output", "1M",
+                      "--workers", 3, *images, status=status)
+        return {name: " ".join(each).strip() for name, each in self.verdicts().items()}
+
+    def test_are_one_row_each_with_the_reason(self):
+        self.assertEqual(
+            {"hang": "unrehearsed timeout", "spin": "unrehearsed timeout", "crash": "unrehearsed crashed",
+             "eat": "unrehearsed memory", "talk": "unrehearsed too-much-output", "silent": "unrehearsed no-explanation",
+             "quote": "unrehearsed no-explanation", "refuse": "refused", "fine": "kept"},
+            self.rehearsing("hang", "spin", "crash", "eat", "talk", "silent", "quote", "refuse", "fine"))
+
+    def test_that_take_their_worker_with_them_take_nobody_elses_results(self):
+        others = [f"other{number}" for number in range(12)]
+        found = self.rehearsing("murder", *others)
+        self.assertEqual("unrehearsed worker-died", found.pop("murder"))
+        self.assertEqual(dict.fromkeys(others, "kept"), found)
+
+    def test_leave_no_process_behind(self):
+        self.assertEqual({"orphan": "unrehearsed timeout"}, self.rehearsing("orphan"))
+
+    def test_are_tried_again_when_asked(self):
+        self.rehearsing("crash")
+        program = self.scratch / "host"
+        self.rehearse("--host", program, "--plugin", program, "--again", self.scratch / "crash", status=3)
+        self.assertEqual([(1,)], self.rows("SELECT count(*) FROM rehearsals"))
+
+
+if __name__ == "__main__":
+    unittest.main()

@@ -1,0 +1,105 @@
+"""The result file by itself: merged, full, and not one at all."""
+
+import os
+import resource
+import sqlite3
+import subprocess
+import unittest
+
+from migration_rehearse.results import Release, ResultFault, Results
+from migration_rehearse.rehearsal import Rehearsed
+from rehearse_case import REHEARSE, RehearseTest
+
+FACTS = {("load", "loaded", ""): 1, ("save", "saved", ""): 2}
+
+
+class ResultFiles(RehearseTest):
+    def filled(self, name, contents, digest="d", facts=FACTS):
+        path = self.scratch / name
+        with Results(path) as results:
+            release = results.release("1", digest)
+            for content in contents:
+                results.add(content, release, Rehearsed("lost", losses={"code": 3}, facts=facts, fingerprint=b"f" * 16))
+        return path
+
+    def counts(self, path):
+        return [self.rows(f"SELECT count(*) FROM {table}", path)[0][0] for table in ("rehearsals", "facts", "losses")]
+
+    def test_merged_have_what_any_had_once(self):
+        first, second = self.filled("first", "abc"), self.filled("second", "bcde")
+        self.command("merge", first, second)
+        self.assertEqual([5, 10, 5], self.counts(first))
+        self.command("merge", first, second)
+        self.assertEqual([5, 10, 5], self.counts(first))
+
+    def test_merged_keep_releases_and_facts_apart_by_their_names(self):
+        first = self.filled("first", "a")
+        second = self.filled("second", "a", "other", {("load", "dropped", "x"): 7, **FACTS})
+        self.command("merge", self.scratch / "new", first, second)
+        rows = self.rows("SELECT digest, stage, action, code, count FROM facts JOIN kinds ON kinds.id = kind JOIN"
+                         " rehearsals ON rehearsals.id = rehearsal JOIN releases ON releases.id = release",
+                         self.scratch / "new")
+        self.assertIn(("other", "load", "dropped", "x", 7), rows)
+        self.assertEqual(5, len(rows))
+
+    def test_of_shards_are_together_those_of_one_call(self):
+        images = self.fleet(12)
+        parts = [self.scratch / name for name in ("a", "b", "c")]
+        for number, part in enumerate(parts, 1):
+            subprocess.run([REHEARSE, "--results", part, "--shard", f"{number}/3", *images], stdout=subprocess.DEVNULL)
+        self.command("merge", *parts)
+        self.rehearse(*images, status=1)
+        self.assertEqual(self.told(), self.told(parts[0]))
+
+    def test_are_not_merged_with_what_is_none(self):
+        (self.scratch / "none").write_text("no database at all, but long enough to be looked at" * 20)
+        target = self.filled("target", "a")
+        for other in ("none", "missing", "target"):
+            self.command("merge", target, self.scratch / other, status=4)
+        self.assertEqual([1, 2, 1], self.counts(target))
+
+    def test_of_another_program_or_schema_are_left_alone(self):
+        foreign = sqlite3.connect(self.scratch / "foreign")
+        foreign.execute("CREATE TABLE mine (x)")
+        foreign.close()
+        newer = self.filled("newer", "a")
+        opened = sqlite3.connect(newer)
+        opened.execute("PRAGMA user_version = 99")
+        opened.close()
+        for name in ("foreign", "newer"):
+            with self.assertRaises(ResultFault):
+                Results(self.scratch / name)
+
+    def test_that_are_full_end_the_work_with_what_came_before(self):
+        with self.assertRaisesRegex(ResultFault, "full"):
+            with Results(self.file) as results:
+                release = results.release("1", "d")
+                results.database.execute("PRAGMA max_page_count = 60")
+                for number in range(10_000):
+                    results.add(str(number), release, Rehearsed("kept", facts=FACTS))
+                    results.commit()
+        kept = self.counts(self.file)[0]
+        self.assertTrue(10 < kept < 10_000)
+        with Results(self.file) as results:
+            results.add("more", Release(1, "1", "d"), Rehearsed("kept"))
+        self.assertEqual(kept + 1, self.counts(self.file)[0])
+
+    def test_that_cannot_grow_end_the_program_with_4_and_it_goes_on_later(self):
+        images = self.fleet(30)
+        limit = 64 << 10  # bytes, and a fleet's results are more
+        told = self.rehearse(*images, status=4, preexec_fn=lambda: resource.setrlimit(resource.RLIMIT_FSIZE, (limit, limit)))
+        self.assertRegex(told, "results.sqlite: ")
+        self.rehearse(*images, status=1)
+        self.assertEqual(30, len(self.verdicts()))
+
+    def test_in_a_directory_that_is_not_there_end_with_4(self):
+        self.assertIn("unable to open", self.rehearse("/", status=4, results=self.scratch / "no/where"))
+
+    def test_have_any_name(self):
+        odd = self.scratch / "a%20b?c#d é"
+        self.rehearse(self.image("one"), results=odd)
+        self.assertTrue(os.path.getsize(odd))
+
+
+if __name__ == "__main__":
+    unittest.main()
