@@ -8,7 +8,7 @@ set(CPACK_PACKAGE_DIRECTORY "${CMAKE_BINARY_DIR}/packages")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
 set(CPACK_STRIP_FILES ON)
 set(CPACK_VERBATIM_VARIABLES ON)
-set(CPACK_COMPONENTS_ALL library development host tools)
+set(CPACK_COMPONENTS_ALL library development host tools rehearse)
 set(CPACK_PRE_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/FinishPackages.cmake")
 set(CPACK_POST_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/TrimPackages.cmake")
 set(CPACK_PACKAGING_SOURCES "${CMAKE_SOURCE_DIR}/packaging")
@@ -48,6 +48,13 @@ settings that an earlier release of the system left behind, and converts the
 mail and Exchange accounts of its first releases.")
 debian_package(TOOLS accountctl utils "${same_library}" "accounts of a device - command-line client
 accountctl lists, verifies and changes the accounts of a device.")
+debian_package(REHEARSE migration-rehearse admin
+  "migration-host (= ${PROJECT_VERSION}), python3 (>= 3.11), python3-libarchive-c, util-linux"
+  "accounts of a device - rehearsals over many device images
+migration-rehearse tells what an upgrade of the account settings would do to
+many device images and archives, none of which it changes.")
+set(CPACK_DEBIAN_REHEARSE_PACKAGE_SUGGESTS python3-distributed)
+set(CPACK_DEBIAN_REHEARSE_PACKAGE_ARCHITECTURE all)
 
 # control_files(COMPONENT FILE...): packaging/COMPONENT.FILE as the package's control file FILE.
 function(control_files component)

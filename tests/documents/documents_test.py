@@ -8,6 +8,7 @@ on one device, a copy of the example "first-generation". What cannot be run here
 
 import os
 import re
+import shutil
 import subprocess
 import unittest
 from pathlib import Path
@@ -19,14 +20,14 @@ from device_case import HOST, DeviceTest
 SOURCES = Path(os.environ["SOURCE_TREE"])
 DOCUMENTS = [
     "README.md", "CONTRIBUTING.md", "docs/ACCOUNTCTL.md", "docs/ARCHITECTURE.md", "docs/CONFIGURATION.md",
-    "docs/EXPLAIN.md", "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MODULES.md", "docs/OPERATIONS.md", "docs/RELIABILITY.md", "docs/SNAPSHOTS.md",
+    "docs/EXPLAIN.md", "docs/FLEET.md", "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MODULES.md", "docs/OPERATIONS.md", "docs/RELIABILITY.md", "docs/SNAPSHOTS.md",
 ]
 # It tells of a device after its update.
 MIGRATED = "docs/OPERATIONS.md"
 BLOCK = re.compile(r"^(?:<!-- not run: (?P<reason>.+) -->\n)?```(?P<language>[a-z]*)\n(?P<text>.*?)^```$", re.M | re.S)
 MIGRATE = "migration-host --home /var/mobile --snapshots /var/lib/account-settings/snapshots"
 PROGRAMS = re.compile(
-    r"^(?:sudo )?(?:migration-host|accountctl|\./|tools/|cmake|ctest|cpack|apt|dpkg|systemctl|journalctl)"
+    r"^(?:sudo )?(?:migration-host|migration-rehearse|accountctl|\./|tools/|cmake|ctest|cpack|apt|dpkg|systemctl|journalctl)"
     r"(?!.*\[OPTION\])", re.M,  # a synopsis is no command
 )
 # Whatever device a command names, it is the test's own that it gets.
@@ -61,6 +62,15 @@ def pattern_of(lines):
     return "".join(parts)
 
 
+# What the sanitizers keep beside a program's memory is more than any limit of it.
+REHEARSE = """#!/bin/sh
+case "$SANITIZE $1" in
+  ' '* | *' merge' | *' report' | *' compare' | *' anonymise') exec "{program}" "$@" ;;
+  *) exec "{program}" --memory 0 "$@" ;;
+esac
+"""
+
+
 class Documents(DeviceTest):
     def setUp(self):
         super().setUp()
@@ -71,14 +81,17 @@ class Documents(DeviceTest):
             "/var/mobile": self.tree.root / "var/mobile",
             "/var/lib/account-settings": self.tree.root / "var/lib/account-settings",
             "/etc/vorlix": self.tree.root / "etc/vorlix",
+            "/srv/images": self.scratch / "images",
             "/tmp": self.scratch / "tmp",
         }
+        shutil.copytree(self.tree.root, self.places["/srv/images"] / "one")
         programs = self.scratch / "programs"
         for directory in (programs, self.scratch / "tmp", self.scratch / "work"):
             directory.mkdir()
-        for program in (HOST, ACCOUNTCTL):
+        rehearse = HOST.with_name("migration-rehearse")
+        for program, text in ((HOST, WRAPPER), (ACCOUNTCTL, WRAPPER), (rehearse, REHEARSE)):
             wrapper = programs / program.name
-            wrapper.write_text(WRAPPER.format(program=program, root=self.tree.root))
+            wrapper.write_text(text.format(program=program, root=self.tree.root))
             wrapper.chmod(0o755)
         self.environment = {**plain_environment(), "PATH": f"{programs}:{os.environ['PATH']}", "LC_ALL": "C.UTF-8"}
 

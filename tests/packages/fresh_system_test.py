@@ -78,7 +78,7 @@ class FreshSystem(unittest.TestCase):
             shutil.copy(file, directory)
 
     def install_what_they_need(self):
-        own = "libaccountsettings1"
+        own = ("libaccountsettings1", "migration-host")
         needs = []
         for file in package_files().values():
             depends = run("dpkg-deb", "--field", file, "Depends").strip().split(", ")

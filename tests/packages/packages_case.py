@@ -6,7 +6,7 @@ from pathlib import Path
 
 SOURCES = Path(os.environ["SOURCE_TREE"])
 PACKAGES = SOURCES / "build" / "package" / "packages"
-NAMES = ["accountctl", "libaccountsettings-dev", "libaccountsettings1", "migration-host"]
+NAMES = ["accountctl", "libaccountsettings-dev", "libaccountsettings1", "migration-host", "migration-rehearse"]
 
 
 def package_files():

@@ -11,7 +11,11 @@ from device import plain_environment
 from device_case import HOST
 
 SOURCES = Path(os.environ["SOURCE_TREE"])
-PAGES = {HOST: "migration-host.8", ACCOUNTCTL: "accountctl.1"}
+PAGES = {
+    HOST: "migration-host.8",
+    ACCOUNTCTL: "accountctl.1",
+    HOST.with_name("migration-rehearse"): "migration-rehearse.1",
+}
 
 
 def help_of(program):
