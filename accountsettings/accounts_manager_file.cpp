@@ -1,4 +1,3 @@
-#include <cerrno>
 #include <ranges>
 #include <tuple>
 
@@ -17,6 +16,7 @@ namespace {
 using platform::Bytes;
 using platform::FileSystem;
 using platform::Path;
+using platform::Result;
 using platform::Status;
 
 constexpr const char* kSave = "-[AccountsManager saveAllAccounts]";
@@ -36,12 +36,12 @@ void logCalculated(const BasicAccount& account, const Dictionary& merged) {
                      dataclasses);
 }
 
-std::shared_ptr<const Bytes> serialized(const Dictionary& root) {
-  const platform::SerializedPropertyList list = platform::current().propertyLists->serialize(root);
-  if (list.data == nullptr || !list.errorDescription.empty()) {
-    _ASLogSystem().log(kSave, "Failed to serialize account settings data: %@", list.errorDescription);
+Result<std::shared_ptr<const Bytes>> serialized(const Dictionary& root) {
+  Result<std::shared_ptr<const Bytes>> list = platform::current().propertyLists->serialize(root);
+  if (!list.isOk()) {
+    _ASLogSystem().log(kSave, "Failed to serialize account settings data: %@", list.status().reason());
   }
-  return list.data;
+  return list;
 }
 
 Status giveToOwner(FileSystem& files, const Path& path) {
@@ -61,20 +61,21 @@ Status moveOntoSettingsFile(FileSystem& files, const Path& temporary) {
 
 // The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails or is
 // thrown, no temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
-Status replaceSettingsFile(const std::shared_ptr<const Bytes>& data) {
+Status replaceSettingsFile(const Result<std::shared_ptr<const Bytes>>& data) {
   FileSystem& files = *platform::current().files;
-  const std::optional<Path> temporary = files.temporaryName();
-  if (!temporary) return Status::failure(EEXIST, "find a name for a temporary file");
-  if (data == nullptr) return Status::failure(EINVAL, "serialize the accounts");
-  if (Status made = files.create(*temporary, *data); !made.isOk()) return made;
+  const Result<Path> name = files.temporaryName();
+  if (!name.isOk()) return name.status();
+  if (!data.isOk()) return data.status();
+  const Path& temporary = name.value();
+  if (Status made = files.create(temporary, *data.value()); !made.isOk()) return made;
   Status status;
   try {
-    status = moveOntoSettingsFile(files, *temporary);
+    status = moveOntoSettingsFile(files, temporary);
   } catch (...) {
-    std::ignore = files.remove(*temporary);
+    std::ignore = files.remove(temporary);
     throw;
   }
-  if (!status.isOk()) std::ignore = files.remove(*temporary);
+  if (!status.isOk()) std::ignore = files.remove(temporary);
   return status;
 }
 
@@ -105,7 +106,7 @@ std::shared_ptr<AccountsManager> AccountsManager::initInsideOfMigration() {
 
 std::shared_ptr<AccountsManager> AccountsManager::_loadedFromFile(std::unique_ptr<StoreWatch> watch) {
   const Dictionary file =
-      platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist()).value_or(Dictionary{});
+      platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist()).valueOr({});
   std::shared_ptr<AccountsManager> store = _loaded(file.array(kPlistAccountsKey), std::move(watch));
   store->setDataVersion(versionIn(file));
   if (store->_watch) store->_watch->loadedAll(store->_orderedTopLevelAccounts, store->_dataVersion);

@@ -11,14 +11,14 @@ using platform::ExclusiveFileLock;
 
 bool shouldSkipNotifications = false;
 
-bool existsAt(const platform::Path& path) { return platform::current().files->kindOf(path).has_value(); }
+bool existsAt(const platform::Path& path) { return platform::current().files->kindOf(path).isOk(); }
 
 // Nothing where the file cannot be read, or where it has no version.
 std::optional<std::int64_t> savedVersion() {
-  const std::optional<Dictionary> file =
+  const platform::Result<Dictionary> file =
       platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist());
-  if (!file) return std::nullopt;
-  const PropertyValue* const entry = file->find(kPlistVersionKey);
+  if (!file.isOk()) return std::nullopt;
+  const PropertyValue* const entry = file.value().find(kPlistVersionKey);
   const std::optional<std::int64_t> version = entry == nullptr ? std::nullopt : entry->integerValue();
   if (!version) {
     _ASLogSystem().log("+[AccountsManager(MigrationSupport) accountSettingsNeedsToBeMigrated]",
@@ -36,8 +36,8 @@ void requireOutParameter(const bool* parameter, std::string_view message) {
 }  // namespace
 
 std::unique_ptr<ExclusiveFileLock> AccountsManager::createAndLockMigrationLock() {
-  std::unique_ptr<ExclusiveFileLock> lock = platform::current().locks->lockNamed(kMigrationLockName);
-  return lock != nullptr && lock->lock() ? std::move(lock) : nullptr;
+  auto lock = platform::current().locks->lockNamed(kMigrationLockName);
+  return lock.isOk() && lock.value()->lock().isOk() ? lock.take() : nullptr;
 }
 
 void AccountsManager::releaseMigrationLock(std::unique_ptr<ExclusiveFileLock> lock) {

@@ -41,8 +41,8 @@ void openNotifierModule(const Dictionary& description, std::string_view accountT
          accountType);
   }
   const std::string path = modulePath(*framework);
-  if (const std::optional<std::string> error = platform::current().modules->open(path)) {
-    fail(kFind, "Could not load the account creator framework %@. Error %s", path, *error);
+  if (const platform::Status opened = platform::current().modules->open(path); !opened.isOk()) {
+    fail(kFind, "Could not load the account creator framework %@. Error %s", path, opened.reason());
   }
 }
 

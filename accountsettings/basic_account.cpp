@@ -75,7 +75,9 @@ std::shared_ptr<BasicAccount> BasicAccount::init() {
   failAssertion("-[BasicAccount init]", kSourceFile, "Don't use this method");
 }
 
-std::optional<std::string> BasicAccount::createNewAccountUID() { return platform::current().identifiers->makeUuid(); }
+std::optional<std::string> BasicAccount::createNewAccountUID() {
+  return platform::current().identifiers->makeUuid().optional();
+}
 
 bool BasicAccount::_acceptProperties(const Dictionary& properties) {
   static constexpr const char* kMethod = "-[BasicAccount initWithProperties:]";

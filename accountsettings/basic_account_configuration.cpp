@@ -33,7 +33,7 @@ platform::Path configurationFile(std::string_view name) {
   return platform::current().directories->resources() / (std::string{name} + ".plist");
 }
 
-std::optional<Dictionary> readConfiguration(std::string_view name) {
+platform::Result<Dictionary> readConfiguration(std::string_view name) {
   return platform::current().propertyLists->readDictionary(configurationFile(name));
 }
 
@@ -77,14 +77,14 @@ AccountType accountType(const Dictionary& properties, bool keepsNotes) {
 
 AccountTypes loadAccountTypes() {
   static constexpr std::string_view kMethod = "+[BasicAccount initialize]";
-  if (!platform::current().files->kindOf(configurationFile("AccountTypesProperties"))) {
+  if (!platform::current().files->kindOf(configurationFile("AccountTypesProperties")).isOk()) {
     failAssertion(kMethod, "BasicAccount", "Could not find AccountTypesProperties.plist");
   }
-  const std::optional<Dictionary> file = readConfiguration("AccountTypesProperties");
-  if (!file) failAssertion(kMethod, "BasicAccount", "Could not load the dataclasses configuration file");
+  const platform::Result<Dictionary> file = readConfiguration("AccountTypesProperties");
+  if (!file.isOk()) failAssertion(kMethod, "BasicAccount", "Could not load the dataclasses configuration file");
   const bool keepsNotes = BasicAccount::isMultitaskingEnabled();
   AccountTypes types;
-  for (const auto& [type, properties] : *file) {
+  for (const auto& [type, properties] : file.value()) {
     const Dictionary* const section = properties.asDictionary();
     types.set(type, accountType(section == nullptr ? Dictionary{} : *section, keepsNotes));
   }
@@ -202,9 +202,11 @@ bool BasicAccount::_isValidAccountType(std::string_view type) {
   return !type.empty() && types.contains(type);
 }
 
-std::optional<Dictionary> BasicAccount::_dataclassesProperties() { return readConfiguration("DataclassesProperties"); }
+std::optional<Dictionary> BasicAccount::_dataclassesProperties() {
+  return readConfiguration("DataclassesProperties").optional();
+}
 
-std::optional<Dictionary> BasicAccount::_creatorsInfo() { return readConfiguration("AccountCreators"); }
+std::optional<Dictionary> BasicAccount::_creatorsInfo() { return readConfiguration("AccountCreators").optional(); }
 
 const Dictionary* BasicAccount::_accountCreationMap() {
   if (const Dictionary* const kept = creators.load(std::memory_order_acquire)) return kept;

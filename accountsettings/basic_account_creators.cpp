@@ -75,9 +75,10 @@ bool isASCII(std::string_view text) {
 
 void openModule(const std::string& path) {
   // The loader is handed an ASCII path; one that has no such form cannot be opened.
-  const std::optional<std::string> error =
-      isASCII(path) ? platform::current().modules->open(path) : "the path is not ASCII";
-  if (error) failLookup("Could not load the account creator framework %@. Error %s", path, *error);
+  const platform::Status opened =
+      isASCII(path) ? platform::current().modules->open(path)
+                    : platform::Status::failure(platform::Cause::unsuitable, "open a module", "the path is not ASCII");
+  if (!opened.isOk()) failLookup("Could not load the account creator framework %@. Error %s", path, opened.reason());
 }
 
 // Only full accounts have loaders.

@@ -106,8 +106,8 @@ std::optional<Text> DeviceLocalAccount::syncStoreIdentifier() const { return ide
 
 std::string DeviceLocalAccount::tetheredSourceForDataClass(std::string_view dataclass) {
   const auto connection = platform::current().tetheredSync->connect();
-  if (connection == nullptr) return std::string{kThisDevice.view()};
-  const std::optional<PropertyValue> value = connection->value(kTetheredSyncDomain, tetheredSyncKey(dataclass));
+  if (!connection.isOk()) return std::string{kThisDevice.view()};
+  const std::optional<PropertyValue> value = connection.value()->value(kTetheredSyncDomain, tetheredSyncKey(dataclass));
   const Dictionary* const dictionary = value ? value->asDictionary() : nullptr;
   const Text* const system = dictionary == nullptr ? nullptr : dictionary->text("SyncingOS");
   return system == nullptr ? std::string{kThisDevice.view()} : system->string();

@@ -25,7 +25,7 @@ class CountingFiles final : public platform::FileSystem {
   CountingFiles(std::shared_ptr<FileSystem> inner, Path settings, std::shared_ptr<FileCounts> counts)
       : _inner{std::move(inner)}, _settings{std::move(settings)}, _counts{std::move(counts)}, _values{values()} {}
 
-  [[nodiscard]] std::optional<platform::FileKind> kindOf(const Path& path) override { return _inner->kindOf(path); }
+  platform::Result<platform::FileKind> kindOf(const Path& path) override { return _inner->kindOf(path); }
   platform::Result<platform::Bytes> read(const Path& path, std::size_t limit) override {
     if (path == _settings) ++_counts->reads;
     return _inner->read(path, limit);
@@ -42,7 +42,7 @@ class CountingFiles final : public platform::FileSystem {
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
     return _inner->setOwner(path, owner, group);
   }
-  [[nodiscard]] std::optional<Path> temporaryName() override { return _inner->temporaryName(); }
+  platform::Result<Path> temporaryName() override { return _inner->temporaryName(); }
   Status rename(const Path& from, const Path& to) override {
     Status renamed = _inner->rename(from, to);
     if (to == _settings && renamed.isOk()) countSave();
@@ -51,7 +51,7 @@ class CountingFiles final : public platform::FileSystem {
 
  private:
   [[nodiscard]] std::optional<platform::Dictionary> values() const {
-    return platform::makeLibplistPropertyListStore(_inner)->readDictionary(_settings);
+    return platform::makeLibplistPropertyListStore(_inner)->readDictionary(_settings).optional();
   }
   void countSave() {
     ++_counts->saves;
@@ -78,7 +78,7 @@ void makeDevice(const Path& root, const Population& population) {
   writeTable(root / "etc/group", "mobile:*:" + std::to_string(::getgid()) + ":");
   const platform::Platform services = platform::makeLinuxPlatform({.systemRoot = root});
   const auto list = services.propertyLists->serialize(settingsOf(population));
-  if (!list.data || !services.files->create(root / kSettingsFile, *list.data).isOk()) {
+  if (!list.isOk() || !services.files->create(root / kSettingsFile, *list.value()).isOk()) {
     throw std::runtime_error{"the settings file cannot be written below " + root.string()};
   }
 }

@@ -18,9 +18,9 @@ constexpr const char* kRoot = "/nonexistent-device";
 class ReadOnlyFiles final : public UnchangingFiles {
  public:
   explicit ReadOnlyFiles(std::shared_ptr<FileSystem> real) : _real{std::move(real)} {}
-  [[nodiscard]] std::optional<FileKind> kindOf(const Path& path) override { return _real->kindOf(path); }
+  platform::Result<FileKind> kindOf(const Path& path) override { return _real->kindOf(path); }
   platform::Result<Bytes> read(const Path& path, std::size_t limit) override { return _real->read(path, limit); }
-  [[nodiscard]] std::optional<Path> temporaryName() override { return Path{kRoot} / "temporary"; }
+  platform::Result<Path> temporaryName() override { return Path{kRoot} / "temporary"; }
 
  private:
   std::shared_ptr<FileSystem> _real;
@@ -30,17 +30,17 @@ class ReadOnlyFiles final : public UnchangingFiles {
 class ValuesInMemory final : public platform::PropertyListStore {
  public:
   explicit ValuesInMemory(std::shared_ptr<PropertyListStore> real) : _real{std::move(real)} {}
-  [[nodiscard]] std::optional<Dictionary> readDictionary(const Path& path) override {
-    return path.native().starts_with(kRoot) ? _values : _real->readDictionary(path);
+  platform::Result<Dictionary> readDictionary(const Path& path) override {
+    return path.native().starts_with(kRoot) ? platform::Result<Dictionary>{_values} : _real->readDictionary(path);
   }
-  [[nodiscard]] platform::SerializedPropertyList serialize(const Dictionary& dictionary) override {
+  platform::Result<std::shared_ptr<const Bytes>> serialize(const Dictionary& dictionary) override {
     _values = dictionary;
-    return {std::make_shared<const Bytes>(Bytes{0}), {}};
+    return std::make_shared<const Bytes>(Bytes{0});
   }
 
  private:
   std::shared_ptr<PropertyListStore> _real;
-  std::optional<Dictionary> _values;
+  Dictionary _values;
 };
 
 }  // namespace

@@ -1,5 +1,6 @@
 #include "bench/pieces.h"
 
+#include <cerrno>
 #include <memory>
 
 #include "accountsettings/accounts_manager.h"
@@ -66,11 +67,13 @@ Action describe(const Population& population) {
 class OneFile final : public UnchangingFiles {
  public:
   explicit OneFile(Bytes bytes) : _bytes{std::move(bytes)} {}
-  [[nodiscard]] std::optional<platform::FileKind> kindOf(const Path& /*path*/) override { return std::nullopt; }
+  platform::Result<platform::FileKind> kindOf(const Path& /*path*/) override { return nothing(); }
   platform::Result<Bytes> read(const Path& /*path*/, std::size_t /*limit*/) override { return _bytes; }
-  [[nodiscard]] std::optional<Path> temporaryName() override { return std::nullopt; }
+  platform::Result<Path> temporaryName() override { return nothing(); }
 
  private:
+  static platform::Status nothing() { return platform::Status::failure(ENOENT, "find anything"); }
+
   Bytes _bytes;
 };
 
@@ -79,7 +82,7 @@ std::shared_ptr<platform::PropertyListStore> listStore(Bytes file) {
 }
 
 Action parse(const Population& population) {
-  Bytes file = *listStore({})->serialize(settingsOf(population)).data;
+  Bytes file = *listStore({})->serialize(settingsOf(population)).value();
   return [store = listStore(std::move(file))] { use(store->readDictionary("/file")); };
 }
 

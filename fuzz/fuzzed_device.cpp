@@ -121,7 +121,9 @@ FuzzedDevice::FuzzedDevice(Input& input) : _input{input}, _store{platform::makeL
   putFiles();
 }
 
-std::optional<Dictionary> FuzzedDevice::settings() const { return _store->readDictionary(tests::kSettingsFile); }
+std::optional<Dictionary> FuzzedDevice::settings() const {
+  return _store->readDictionary(tests::kSettingsFile).optional();
+}
 
 std::optional<Bytes> FuzzedDevice::settingsBytes() const {
   const auto node = files->nodes.find(tests::kSettingsFile);
@@ -196,7 +198,7 @@ Array FuzzedDevice::accounts(int depth) {
 }
 
 void FuzzedDevice::putReal(const Path& path, const Dictionary& contents) const {
-  files->put(path, *_store->serialize(contents).data);
+  files->put(path, *_store->serialize(contents).value());
 }
 
 void FuzzedDevice::putFile(const Path& path, const Dictionary& contents) {

@@ -20,7 +20,8 @@ std::filesystem::path installedPlugin() {
 
 std::variant<std::unique_ptr<platform::DataClassMigrator>, std::string> loadMigrator(
     const platform::Platform& platform, const std::filesystem::path& plugin) {
-  if (const auto error = platform.modules->open(plugin.string())) return "cannot load the plug-in: " + *error;
+  const platform::Status opened = platform.modules->open(plugin.string());
+  if (!opened.isOk()) return "cannot load the plug-in: " + opened.reason();
   const auto* const found = platform.classes->classNamed(kMigratorClass);
   if (found == nullptr) return noPlugin(plugin, "it defines no class " + std::string{kMigratorClass});
   const auto* const migratorClass = dynamic_cast<const platform::DataClassMigratorClass*>(found);

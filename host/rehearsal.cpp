@@ -13,7 +13,7 @@ namespace {
 // Where there is no lock file, nobody holds the lock, and taking it leaves nothing behind.
 class NobodysLock final : public platform::ExclusiveFileLock {
  public:
-  bool lock() override { return true; }
+  platform::Status lock() override { return {}; }
   void unlock() override {}
 };
 
@@ -22,7 +22,7 @@ class RehearsalLocks final : public platform::ExclusiveFileLocks {
   RehearsalLocks(std::shared_ptr<platform::ExclusiveFileLocks> inner, std::filesystem::path directory)
       : _inner{std::move(inner)}, _directory{std::move(directory)} {}
 
-  [[nodiscard]] std::unique_ptr<platform::ExclusiveFileLock> lockNamed(std::string_view name) override {
+  platform::Result<std::unique_ptr<platform::ExclusiveFileLock>> lockNamed(std::string_view name) override {
     std::error_code ignored;
     const auto status = std::filesystem::symlink_status(_directory / name, ignored);
     if (!std::filesystem::exists(status)) return std::make_unique<NobodysLock>();

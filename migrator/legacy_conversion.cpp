@@ -26,7 +26,7 @@ Dictionary renamed(const Dictionary& description, std::span<const Rename> rename
 }
 
 Dictionary readLegacyFile(const std::string& path) {
-  return platform::current().propertyLists->readDictionary(path).value_or(Dictionary{});
+  return platform::current().propertyLists->readDictionary(path).valueOr({});
 }
 
 namespace {

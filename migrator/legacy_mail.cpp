@@ -71,8 +71,8 @@ void cutHostedUsername(Dictionary& record) {
 void setSyncIdentifier(BasicAccount& account, const Dictionary& record) {
   if (const Text* const identifier = record.text(kAccountIdentifier)) {
     account.setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
-  } else if (const std::optional<std::string> made = platform::current().identifiers->makeUuid()) {
-    account.setAccountProperty_forKey(*made, kAccountSyncIdentifier);
+  } else if (const auto made = platform::current().identifiers->makeUuid(); made.isOk()) {
+    account.setAccountProperty_forKey(made.value(), kAccountSyncIdentifier);
   }
 }
 

@@ -53,7 +53,7 @@ std::string AccountsDataMigrator::_absolutePathToOldAccountsInfoRemovalSentinel(
 }
 
 bool AccountsDataMigrator::_failedToRemoveOldAccountsInfo() {
-  return platform::current().files->kindOf(_absolutePathToOldAccountsInfoRemovalSentinel()).has_value();
+  return platform::current().files->kindOf(_absolutePathToOldAccountsInfoRemovalSentinel()).isOk();
 }
 
 bool AccountsDataMigrator::_removeOldAccountsInfo() {

@@ -31,8 +31,8 @@ Path reportDirectory() {
 // Answers whether reports can be written there.
 bool prepareReportDirectory(const Path& directory) {
   platform::FileSystem& files = *platform::current().files;
-  const std::optional<FileKind> kind = files.kindOf(directory);
-  if (!kind) {
+  const platform::Result<FileKind> kind = files.kindOf(directory);
+  if (!kind.isOk()) {
     const platform::Status made = files.createDirectories(directory, kOpenToEverybody);
     if (made.isOk()) return true;
     writeToConsole(
@@ -40,7 +40,7 @@ bool prepareReportDirectory(const Path& directory) {
         directory.native(), made.description());
     return false;
   }
-  if (*kind == FileKind::directory) return true;
+  if (kind == FileKind::directory) return true;
   writeToConsole("AccountMigrator warning: %@ already exists and is not a directory", directory.native());
   return false;
 }
@@ -48,10 +48,10 @@ bool prepareReportDirectory(const Path& directory) {
 // A binary property list, whatever its ".txt" says. Nobody hears of a report that cannot be written.
 void writeReport(const Path& directory, const Dictionary& report) {
   const platform::Platform& services = platform::current();
-  const std::string name =
-      platform::message("AccountMigrationInformation-%@.txt", {services.clock->currentLocalTime(kReportTimePattern)});
-  const platform::SerializedPropertyList serialized = services.propertyLists->serialize(report);
-  if (serialized.data) std::ignore = services.files->replace(directory / name, *serialized.data);
+  const std::string time = services.clock->currentLocalTime(kReportTimePattern).valueOr({});
+  const std::string name = platform::message("AccountMigrationInformation-%@.txt", {time});
+  const auto serialized = services.propertyLists->serialize(report);
+  if (serialized.isOk()) std::ignore = services.files->replace(directory / name, *serialized.value());
 }
 
 }  // namespace
@@ -61,7 +61,7 @@ void AccountsDataMigrator::_copyAsideAccountsPlist() {
   platform::FileSystem& files = *platform::current().files;
   const Path source = AccountsManager::fullPathToAccountSettingsPlist();
   const Path destination = copyPath(source);
-  if (files.kindOf(destination) && !files.remove(destination).isOk()) {
+  if (files.kindOf(destination).isOk() && !files.remove(destination).isOk()) {
     writeToConsole("Couldn't remove existing accountsettings copy at %@", destination.native());
   }
   const platform::Status copied = files.copy(source, destination);
@@ -85,7 +85,7 @@ void AccountsDataMigrator::_saveCollatedMigrationInformation() {
   if (_collatedMigrationData) {
     const Path settingsFile = AccountsManager::fullPathToAccountSettingsPlist();
     _collatedMigrationData->set(kSavedSettingsKey,
-                                platform::current().propertyLists->readDictionary(settingsFile).value_or(Dictionary{}));
+                                platform::current().propertyLists->readDictionary(settingsFile).valueOr({}));
   }
   const Path directory = reportDirectory();
   // The directory is made also for a run that migrated nothing and so has nothing to report.

@@ -36,7 +36,7 @@ std::uint64_t versionOf(const Dictionary& settings) {
 Dictionary settingsFile() {
   return platform::current()
       .propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist())
-      .value_or(Dictionary{});
+      .valueOr({});
 }
 
 }  // namespace
@@ -57,7 +57,7 @@ bool AccountsDataMigrator::_migrateNewAccountsInfo(AccountsManager& store) {
 }
 
 bool AccountsDataMigrator::_newAccountsInformationPresent() {
-  return platform::current().files->kindOf(AccountsManager::fullPathToAccountSettingsPlist()).has_value();
+  return platform::current().files->kindOf(AccountsManager::fullPathToAccountSettingsPlist()).isOk();
 }
 
 // Nothing changed between the first two releases but the version.

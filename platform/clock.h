@@ -3,6 +3,8 @@
 #include <string>
 #include <string_view>
 
+#include "platform/status.h"
+
 namespace platform {
 
 // The time of day, as text.
@@ -11,8 +13,9 @@ class Clock {
   virtual ~Clock() = default;
 
   // The current time in the local time zone, formatted by a Unicode date pattern (UTS #35) in the locale en_US_POSIX
-  // and the proleptic Gregorian calendar. Empty where the pattern is invalid or no time zone data can be read.
-  [[nodiscard]] virtual std::string currentLocalTime(std::string_view pattern) const = 0;
+  // and the proleptic Gregorian calendar. Unsuitable is a pattern that is invalid; other causes are those of the
+  // device.
+  virtual Result<std::string> currentLocalTime(std::string_view pattern) const = 0;
 };
 
 }  // namespace platform

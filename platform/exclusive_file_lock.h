@@ -3,6 +3,8 @@
 #include <memory>
 #include <string_view>
 
+#include "platform/status.h"
+
 namespace platform {
 
 // A lock that at most one holder on the device has at a time, whatever process it is in. The kernel gives it back when
@@ -11,8 +13,8 @@ class ExclusiveFileLock {
  public:
   virtual ~ExclusiveFileLock() = default;  // gives the lock back where it is held
 
-  // Waits until nobody else holds the lock, then holds it. Answers whether it is held.
-  virtual bool lock() = 0;
+  // Waits until nobody else holds the lock, then holds it.
+  virtual Status lock() = 0;
   virtual void unlock() = 0;
 };
 
@@ -20,8 +22,8 @@ class ExclusiveFileLock {
 class ExclusiveFileLocks {
  public:
   virtual ~ExclusiveFileLocks() = default;
-  // A lock object, not yet held; null where none can be made.
-  [[nodiscard]] virtual std::unique_ptr<ExclusiveFileLock> lockNamed(std::string_view name) = 0;
+  // A lock object, not yet held; never null.
+  virtual Result<std::unique_ptr<ExclusiveFileLock>> lockNamed(std::string_view name) = 0;
 };
 
 }  // namespace platform

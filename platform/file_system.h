@@ -3,7 +3,6 @@
 #include <cstddef>
 #include <cstdint>
 #include <filesystem>
-#include <optional>
 #include <span>
 #include <string>
 #include <string_view>
@@ -29,9 +28,9 @@ class FileSystem {
  public:
   virtual ~FileSystem() = default;
 
-  // What stands at the path, links followed; nothing where nothing does or where it cannot be told. A link that is not
-  // to be followed is itself what stands there. Nothing is opened.
-  [[nodiscard]] virtual std::optional<FileKind> kindOf(const Path& path) = 0;
+  // What stands at the path, links followed; ENOENT or ENOTDIR where nothing does, another error where it cannot be
+  // told. A link that is not to be followed is itself what stands there. Nothing is opened.
+  virtual Result<FileKind> kindOf(const Path& path) = 0;
 
   // The whole contents of a regular file, links followed. Anything that is no regular file, or that is larger than
   // `sizeLimit` bytes, or that has a second name and may be somebody else's (EMLINK), is refused without being read,
@@ -61,9 +60,9 @@ class FileSystem {
   // (EMLINK), which would be given away with it, and what stands in the place of what was made there (ESTALE).
   virtual Status setOwner(const Path& path, std::string_view owner, std::string_view group) = 0;
 
-  // A name for a temporary file in the process's default temporary directory, at which nothing stands; nothing where
-  // none can be had. The name is a proposal: only `create` makes sure that nobody else takes it.
-  [[nodiscard]] virtual std::optional<Path> temporaryName() = 0;
+  // A name for a temporary file in the process's default temporary directory, at which nothing stands. The
+  // name is a proposal: only `create` makes sure that nobody else takes it.
+  virtual Result<Path> temporaryName() = 0;
 
   // Moves a file onto a path in one step, replacing what is there.
   virtual Status rename(const Path& from, const Path& to) = 0;

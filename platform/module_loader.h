@@ -1,7 +1,8 @@
 #pragma once
 
-#include <optional>
 #include <string>
+
+#include "platform/status.h"
 
 namespace platform {
 
@@ -9,8 +10,8 @@ namespace platform {
 class ModuleLoader {
  public:
   virtual ~ModuleLoader() = default;
-  // Opens the module at the path with all its symbols resolved at once. Nothing on success; else the text of the error.
-  [[nodiscard]] virtual std::optional<std::string> open(const std::string& path) = 0;
+  // Opens the module at the path with all its symbols resolved at once. The reason of a failure names the path.
+  virtual Status open(const std::string& path) = 0;
 };
 
 }  // namespace platform

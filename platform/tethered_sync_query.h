@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "platform/property_value.h"
+#include "platform/status.h"
 
 namespace platform {
 
@@ -20,8 +21,8 @@ class TetheredSyncConnection {
 class TetheredSyncQuery {
  public:
   virtual ~TetheredSyncQuery() = default;
-  // Null where the service cannot be reached.
-  [[nodiscard]] virtual std::unique_ptr<TetheredSyncConnection> connect() = 0;
+  // A failure where the service cannot be reached; never null.
+  virtual Result<std::unique_ptr<TetheredSyncConnection>> connect() = 0;
 };
 
 }  // namespace platform

@@ -17,8 +17,9 @@ using accountsettings::Array;
 // In the place of the device's loader while none of its modules may be opened.
 class ClosedModuleLoader final : public platform::ModuleLoader {
  public:
-  [[nodiscard]] std::optional<std::string> open(const std::string&) override {
-    return "modules under another root are opened only with --modules";
+  platform::Status open(const std::string&) override {
+    return platform::Status::failure(platform::Cause::unsafe, "open a module",
+                                     "modules under another root are opened only with --modules");
   }
 };
 
@@ -33,10 +34,11 @@ class SettingsFromElsewhere final : public platform::PropertyListStore {
  public:
   SettingsFromElsewhere(std::shared_ptr<PropertyListStore> store, platform::Path file)
       : _store{std::move(store)}, _file{std::move(file)} {}
-  [[nodiscard]] std::optional<accountsettings::Dictionary> readDictionary(const platform::Path& path) override {
+  platform::Result<accountsettings::Dictionary> readDictionary(const platform::Path& path) override {
     return _store->readDictionary(path == AccountsManager::fullPathToAccountSettingsPlist() ? _file : path);
   }
-  [[nodiscard]] platform::SerializedPropertyList serialize(const accountsettings::Dictionary& dictionary) override {
+  platform::Result<std::shared_ptr<const platform::Bytes>> serialize(
+      const accountsettings::Dictionary& dictionary) override {
     return _store->serialize(dictionary);
   }
 
@@ -88,7 +90,7 @@ void Session::loadAccounts() {
   const auto path = AccountsManager::fullPathToAccountSettingsPlist();
   const auto& platform = platform::current();
   // The store takes a file that it cannot read for an empty one; saving would then lose what is in it.
-  if (platform.files->kindOf(path) && !platform.propertyLists->readDictionary(path)) {
+  if (platform.files->kindOf(path).isOk() && !platform.propertyLists->readDictionary(path).isOk()) {
     throw Failure{ExitStatus::failed, "the account settings cannot be read: " + path.string()};
   }
   _accounts = AccountsManager::init();

@@ -47,12 +47,13 @@ Finding unreadable(const Path& path, platform::FileKind kind) {
 Examined examine(const Path& path) {
   const auto& platform = platform::current();
   const auto kind = platform.files->kindOf(path);
-  if (!kind) return {path, false, 0, {}};
+  if (!kind.isOk()) return {path, false, 0, {}};
   const auto file = platform.propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist());
-  if (!file) return {path, true, 0, {unreadable(path, *kind)}};
-  Examined examined{path, true, recordsIn(*file).size(), findingsOfRoot(*file)};
-  append(examined.findings, findingsOfVersion(*file));
-  append(examined.findings, findingsOfRecords(recordsIn(*file)));
+  if (!file.isOk()) return {path, true, 0, {unreadable(path, kind.value())}};
+  const Dictionary& root = file.value();
+  Examined examined{path, true, recordsIn(root).size(), findingsOfRoot(root)};
+  append(examined.findings, findingsOfVersion(root));
+  append(examined.findings, findingsOfRecords(recordsIn(root)));
   return examined;
 }
 

@@ -30,9 +30,10 @@ Undo::Undo(UndoPlace place, Missing missing)
 }
 
 Undo::HeldLock Undo::hold(platform::ExclusiveFileLocks& locks, const std::string& name) {
-  HeldLock lock = locks.lockNamed(name);
-  if (lock == nullptr || !lock->lock()) fail("the lock " + name + " cannot be taken");
-  return lock;
+  platform::Result<HeldLock> lock = locks.lockNamed(name);
+  const platform::Status held = lock.isOk() ? lock.value()->lock() : lock.status();
+  if (!held.isOk()) fail("the lock " + name + " cannot be taken: " + held.reason());
+  return lock.take();
 }
 
 void Undo::requireSameDevice() const {
@@ -48,7 +49,7 @@ std::optional<std::int64_t> Undo::dataVersion(const Manifest& manifest) const {
   const auto settings = std::ranges::find(manifest.files, Part::settings, &KeptFile::part);
   if (settings == manifest.files.end()) return std::nullopt;
   const auto contents = _place.services.propertyLists->readDictionary(settings->path);
-  const auto* const version = contents ? contents->find(manifest.versionKey) : nullptr;
+  const auto* const version = contents.isOk() ? contents.value().find(manifest.versionKey) : nullptr;
   return version == nullptr ? std::nullopt : version->integerValue();
 }
 

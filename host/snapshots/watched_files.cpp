@@ -52,7 +52,7 @@ Status WatchedFiles::settled(const Path& path, Status outcome) {
   return outcome;
 }
 
-std::optional<platform::FileKind> WatchedFiles::kindOf(const Path& path) { return _storage.files->kindOf(path); }
+platform::Result<platform::FileKind> WatchedFiles::kindOf(const Path& path) { return _storage.files->kindOf(path); }
 
 platform::Result<platform::Bytes> WatchedFiles::read(const Path& path, std::size_t sizeLimit) {
   return _storage.files->read(path, sizeLimit);
@@ -91,7 +91,7 @@ Status WatchedFiles::setOwner(const Path& path, std::string_view owner, std::str
   return _storage.files->setOwner(path, owner, group);
 }
 
-std::optional<Path> WatchedFiles::temporaryName() {
+platform::Result<Path> WatchedFiles::temporaryName() {
   _isSaving = true;
   return _storage.files->temporaryName();
 }

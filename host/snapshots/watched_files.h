@@ -21,7 +21,7 @@ class WatchedFiles final : public platform::FileSystem {
   // replacing the settings.
   [[nodiscard]] bool hasLastSaveFailed() const { return _isSaving; }
 
-  [[nodiscard]] std::optional<platform::FileKind> kindOf(const Path& path) override;
+  platform::Result<platform::FileKind> kindOf(const Path& path) override;
   platform::Result<platform::Bytes> read(const Path& path, std::size_t sizeLimit) override;
   platform::Status create(const Path& path, std::span<const std::uint8_t> bytes) override;
   platform::Status replace(const Path& path, std::span<const std::uint8_t> bytes) override;
@@ -29,7 +29,7 @@ class WatchedFiles final : public platform::FileSystem {
   platform::Status remove(const Path& path) override;
   platform::Status createDirectories(const Path& path, unsigned permissions) override;
   platform::Status setOwner(const Path& path, std::string_view owner, std::string_view group) override;
-  [[nodiscard]] std::optional<Path> temporaryName() override;
+  platform::Result<Path> temporaryName() override;
   platform::Status rename(const Path& from, const Path& to) override;
 
  private:

@@ -9,22 +9,29 @@
 namespace platform {
 namespace {
 
+constexpr const char* kAttempt = "open a module";
+
 // What the linker would stumble over: it takes an empty path for the program itself, looks for a bare name elsewhere,
 // and waits for the other side of a pipe.
-std::optional<std::string> obstacle(const std::string& path) {
+Status obstacle(const std::string& path) {
   struct stat status {};
-  if (::stat(path.c_str(), &status) != 0) return std::generic_category().message(errno);
-  return S_ISREG(status.st_mode) ? std::nullopt : std::optional<std::string>{"not a regular file"};
+  if (::stat(path.c_str(), &status) != 0) {
+    const int error = errno;
+    const Cause cause = Status::failure(error, {}).cause();
+    return Status::failure(cause, kAttempt, path + ": " + std::generic_category().message(error));
+  }
+  if (S_ISREG(status.st_mode)) return {};
+  return Status::failure(Cause::unsuitable, kAttempt, path + ": not a regular file");
 }
 
 class LinuxModuleLoader final : public ModuleLoader {
  public:
-  [[nodiscard]] std::optional<std::string> open(const std::string& path) override {
-    if (const auto problem = obstacle(path)) return path + ": " + *problem;
+  Status open(const std::string& path) override {
+    if (Status problem = obstacle(path); !problem.isOk()) return problem;
     const std::string file = path.find('/') == std::string::npos ? "./" + path : path;
-    if (::dlopen(file.c_str(), RTLD_NOW | RTLD_NODELETE) != nullptr) return std::nullopt;
+    if (::dlopen(file.c_str(), RTLD_NOW | RTLD_NODELETE) != nullptr) return {};
     const char* const error = ::dlerror();
-    return error == nullptr ? path + ": cannot be opened" : error;
+    return Status::failure(Cause::other, kAttempt, error == nullptr ? path + ": cannot be opened" : error);
   }
 };
 

@@ -272,9 +272,6 @@ INSTANTIATE_TEST_SUITE_P(
         Failure{"WithoutSerialisation",
                 [](FakeDevice& device) { device.propertyLists->serializeError = "out of ink"; },
                 {"Failed to serialize account settings data: out of ink", "Failed to save accounts to filesystem."}},
-        Failure{"WithoutDataOrAReason",
-                [](FakeDevice& device) { device.propertyLists->serializesNothing = true; },
-                {"Failed to serialize account settings data: ", "Failed to save accounts to filesystem."}},
         Failure{"WithoutATemporaryName",
                 [](FakeDevice& device) { device.files->hasTemporaryNames = false; },
                 {"Failed to save accounts to filesystem."}},
@@ -290,17 +287,6 @@ INSTANTIATE_TEST_SUITE_P(
                 [](FakeDevice& device) { device.files->failing = {"rename"}; },
                 {"Failed to save accounts to filesystem."}}),
     [](const auto& failure) { return failure.param.name; });
-
-TEST_F(SavingAccounts, SavesDataThatCameWithAnErrorAndSaysTheError) {
-  const Store store = load({properties("a")});
-  store->allBasicAccounts()[0]->setAccountProperty_forKey(2, "Port");
-  device.propertyLists->serializeError = "low on ink";
-  device.propertyLists->serializesDespiteError = true;
-  AccountsManager::_setShouldSkipNotifications(true);
-  store->saveAllAccounts();
-  EXPECT_EQ(fileAccounts(), (Array{properties("a", {{"Port", 2}})}));
-  EXPECT_EQ(messagesOf(kSave).back(), "Failed to serialize account settings data: low on ink");
-}
 
 TEST_F(SavingAccounts, SucceedsAfterAFailure) {
   const Store store = load({properties("a")});

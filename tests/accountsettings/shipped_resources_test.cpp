@@ -18,7 +18,7 @@ class ShippedResources : public testing::Test {
   ShippedResources() { platform::setCurrent(services); }
 
   [[nodiscard]] Dictionary file(const std::string& name) const {
-    return services.propertyLists->readDictionary(services.directories->resources() / name).value_or(Dictionary{});
+    return services.propertyLists->readDictionary(services.directories->resources() / name).valueOr({});
   }
   [[nodiscard]] Dictionary types() const { return file("AccountTypesProperties.plist"); }
   [[nodiscard]] Dictionary table(const std::string& language, const std::string& name) const {

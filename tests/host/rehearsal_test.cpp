@@ -33,8 +33,8 @@ class RehearsedPlatform : public testing::Test {
 TEST_F(RehearsedPlatform, LeavesNoLockFileWhereThereIsNone) {
   const auto lock = rehearsal.locks->lockNamed(kLock);
   ASSERT_NE(lock, nullptr);
-  EXPECT_TRUE(lock->lock());
-  lock->unlock();
+  EXPECT_TRUE(lock.value()->lock().isOk());
+  lock.value()->unlock();
   EXPECT_FALSE(std::filesystem::exists(scratch / kLock));
 }
 
@@ -42,13 +42,13 @@ TEST_F(RehearsedPlatform, WaitsForWhoeverHoldsTheLock) {
   using std::chrono::steady_clock;
   constexpr std::chrono::milliseconds patience{200};
   const auto held = device.locks->lockNamed(kLock);
-  ASSERT_TRUE(held->lock());
+  ASSERT_TRUE(held.value()->lock().isOk());
   std::thread holder{[&] {
     std::this_thread::sleep_for(patience);
-    held->unlock();
+    held.value()->unlock();
   }};
   const auto began = steady_clock::now();
-  EXPECT_TRUE(rehearsal.locks->lockNamed(kLock)->lock());
+  EXPECT_TRUE(rehearsal.locks->lockNamed(kLock).value()->lock().isOk());
   EXPECT_GE(steady_clock::now() - began, patience / 2);
   holder.join();
 }
@@ -58,9 +58,9 @@ TEST_F(RehearsedPlatform, HasALogThatNobodyReads) { EXPECT_FALSE(rehearsal.syste
 TEST_F(RehearsedPlatform, ReadsThePropertyListsThatTheRehearsalWrote) {
   const auto path = scratch / "list.plist";
   const auto serialized = rehearsal.propertyLists->serialize({{"Key", "value"}});
-  ASSERT_TRUE(rehearsal.files->create(path, *serialized.data).isOk());
+  ASSERT_TRUE(rehearsal.files->create(path, *serialized.value()).isOk());
   EXPECT_EQ(rehearsal.propertyLists->readDictionary(path), (platform::Dictionary{{"Key", "value"}}));
-  EXPECT_FALSE(device.propertyLists->readDictionary(path));
+  EXPECT_EQ(device.propertyLists->readDictionary(path).cause(), platform::Cause::missing);
 }
 
 TEST_F(RehearsedPlatform, SaysOnTheConsoleWhatARunWould) { EXPECT_EQ(rehearsal.console, device.console); }

@@ -1,5 +1,6 @@
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
+#include <cerrno>
 
 #include <algorithm>
 #include <atomic>
@@ -227,8 +228,9 @@ TEST_F(LegacyMail, AccountWithoutIdentifierGetsAFreshSyncIdentifier) {
 // Makes one identifier and no more.
 class LastIdentifier final : public platform::UniqueIdentifiers {
  public:
-  std::optional<std::string> makeUuid() override {
-    return _isLeft ? (_isLeft = false, std::optional<std::string>{"LAST"}) : std::nullopt;
+  platform::Result<std::string> makeUuid() override {
+    if (std::exchange(_isLeft, false)) return "LAST";
+    return platform::Status::failure(EIO, "make an identifier");
   }
 
  private:

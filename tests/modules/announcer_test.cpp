@@ -59,7 +59,7 @@ class EditedDevice {
     std::ofstream{root() / below} << text;
   }
   [[nodiscard]] Dictionary firstAccount() const {
-    const auto settings = platform::makeLinuxPlatform().propertyLists->readDictionary(root() / kSettings);
+    const auto settings = platform::makeLinuxPlatform().propertyLists->readDictionary(root() / kSettings).optional();
     return *settings.value().array("Accounts")->at(0).asDictionary();
   }
 

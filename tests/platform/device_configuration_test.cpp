@@ -128,12 +128,12 @@ TEST(ProfileRestrictions, OfATestAreWhatTheTestSays) {
 // What connections answer is the same on a device and in a test.
 void expectAnswers(platform::TetheredSyncQuery& query) {
   const auto connection = query.connect();
-  ASSERT_TRUE(connection);
+  ASSERT_TRUE(connection.isOk());
   constexpr std::string_view domain = "com.vorlix.mobile.tethered_sync";
   const Dictionary notes{{"SyncingOS", "Windows"}};
-  EXPECT_EQ(connection->value(domain, "Notes"), PropertyValue{notes});
-  EXPECT_EQ(connection->value(domain, "Contacts"), std::nullopt);
-  EXPECT_EQ(connection->value(domain, std::nullopt), (PropertyValue{Dictionary{{"Notes", notes}}}));
+  EXPECT_EQ(connection.value()->value(domain, "Notes"), PropertyValue{notes});
+  EXPECT_EQ(connection.value()->value(domain, "Contacts"), std::nullopt);
+  EXPECT_EQ(connection.value()->value(domain, std::nullopt), (PropertyValue{Dictionary{{"Notes", notes}}}));
 }
 
 TEST(TetheredSync, AnswersWithTheUsersFile) {
@@ -151,18 +151,18 @@ TEST(TetheredSync, OfATestAnswersWhatTheTestSays) {
 
 TEST(TetheredSync, IsOutOfReachWithoutAFileAndWithOneThatCannotBeRead) {
   const RealDevice device;
-  EXPECT_FALSE(device.services.tetheredSync->connect());
+  EXPECT_EQ(device.services.tetheredSync->connect().cause(), platform::Cause::missing);
   device.root.put(tetheredSync, "no property list");
-  EXPECT_FALSE(device.services.tetheredSync->connect());
+  EXPECT_EQ(device.services.tetheredSync->connect().cause(), platform::Cause::malformed);
   FakeTetheredSyncQuery query;
   query.isReachable = false;
-  EXPECT_FALSE(query.connect());
+  EXPECT_FALSE(query.connect().isOk());
 }
 
 TEST(TetheredSync, KnowsNoOtherDomain) {
   const RealDevice device;
   device.put(tetheredSync, "<key>Notes</key><true/>");
-  EXPECT_EQ(device.services.tetheredSync->connect()->value("another.domain", "Notes"), std::nullopt);
+  EXPECT_EQ(device.services.tetheredSync->connect().value()->value("another.domain", "Notes"), std::nullopt);
 }
 
 struct TypeName {

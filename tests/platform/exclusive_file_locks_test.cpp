@@ -48,27 +48,27 @@ TYPED_TEST_SUITE(LocksContract, Subjects);
 
 TYPED_TEST(LocksContract, GiveALockBackAndTakeItAgain) {
   const auto lock = this->locks.lockNamed(name);
-  ASSERT_TRUE(lock);
-  EXPECT_TRUE(lock->lock());
-  lock->unlock();
-  EXPECT_TRUE(lock->lock());
+  ASSERT_TRUE(lock.isOk());
+  EXPECT_TRUE(lock.value()->lock().isOk());
+  lock.value()->unlock();
+  EXPECT_TRUE(lock.value()->lock().isOk());
 }
 
 TYPED_TEST(LocksContract, HoldNothingBeforeTheyAreTaken) {
   const auto idle = this->locks.lockNamed(name);
-  EXPECT_TRUE(this->locks.lockNamed(name)->lock());
+  EXPECT_TRUE(this->locks.lockNamed(name).value()->lock().isOk());
 }
 
 TYPED_TEST(LocksContract, AreFreeAgainOnceTheirHolderIsGone) {
-  EXPECT_TRUE(this->locks.lockNamed(name)->lock());
-  EXPECT_TRUE(this->locks.lockNamed(name)->lock());
+  EXPECT_TRUE(this->locks.lockNamed(name).value()->lock().isOk());
+  EXPECT_TRUE(this->locks.lockNamed(name).value()->lock().isOk());
 }
 
 TYPED_TEST(LocksContract, OfDifferentNamesAreHeldTogether) {
   const auto first = this->locks.lockNamed("first");
   const auto second = this->locks.lockNamed("second");
-  EXPECT_TRUE(first->lock());
-  EXPECT_TRUE(second->lock());
+  EXPECT_TRUE(first.value()->lock().isOk());
+  EXPECT_TRUE(second.value()->lock().isOk());
 }
 
 class LinuxLocks : public testing::Test {
@@ -82,7 +82,7 @@ class LinuxLocks : public testing::Test {
   [[nodiscard]] ChildProcess::Task holdForEver() const {
     return [this](const auto& say) {
       const auto lock = locks->lockNamed(name);
-      if (lock == nullptr || !lock->lock()) return;
+      if (!lock.isOk() || !lock.value()->lock().isOk()) return;
       say();
       ::pause();
     };
@@ -91,21 +91,21 @@ class LinuxLocks : public testing::Test {
 
 TEST_F(LinuxLocks, KeepASecondProcessWaitingUntilTheFirstGivesItBack) {
   const auto lock = locks->lockNamed(name);
-  ASSERT_TRUE(lock->lock());
+  ASSERT_TRUE(lock.value()->lock().isOk());
   const ChildProcess second{holdForEver()};
   EXPECT_FALSE(second.says(aMoment));
-  lock->unlock();
+  lock.value()->unlock();
   EXPECT_TRUE(second.says(longEnough));
 }
 
 TEST_F(LinuxLocks, KeepASecondHolderOfTheSameProcessWaiting) {
   const auto lock = locks->lockNamed(name);
-  ASSERT_TRUE(lock->lock());
+  ASSERT_TRUE(lock.value()->lock().isOk());
   std::atomic<bool> isHeld = false;
-  std::jthread second{[&] { isHeld = locks->lockNamed(name)->lock(); }};
+  std::jthread second{[&] { isHeld = locks->lockNamed(name).value()->lock().isOk(); }};
   std::this_thread::sleep_for(aMoment);
   EXPECT_FALSE(isHeld);
-  lock->unlock();
+  lock.value()->unlock();
   second.join();
   EXPECT_TRUE(isHeld);
 }
@@ -132,7 +132,7 @@ TEST_F(LinuxLocks, AreWaitedForAcrossSignals) {
     std::this_thread::sleep_for(aMoment);
     holder.kill();
   }};
-  EXPECT_TRUE(locks->lockNamed(name)->lock());
+  EXPECT_TRUE(locks->lockNamed(name).value()->lock().isOk());
   EXPECT_GT(signals, 0);
 }
 
@@ -144,7 +144,7 @@ TEST_F(LinuxLocks, AreTakenOnTheFileThatStandsThereAfterTheWait) {
   const ChildProcess holderOfTheNewFile{holdForEver()};
   ASSERT_TRUE(holderOfTheNewFile.says(longEnough));
   const ChildProcess waiter{[&waiting](const auto& say) {
-    if (waiting->lock()) say();
+    if (waiting.value()->lock().isOk()) say();
   }};
   holder.kill();
   EXPECT_FALSE(waiter.says(aMoment));
@@ -152,14 +152,14 @@ TEST_F(LinuxLocks, AreTakenOnTheFileThatStandsThereAfterTheWait) {
 
 TEST_F(LinuxLocks, LieOnAFileThatEverybodyMayReadWhateverTheMask) {
   ::umask(0777);
-  ASSERT_TRUE(locks->lockNamed(name)->lock());
+  ASSERT_TRUE(locks->lockNamed(name).value()->lock().isOk());
   EXPECT_EQ(permissionsOf(file), 0644U);
 }
 
 TEST_F(LinuxLocks, AreTakenWithoutWritingRights) {
   scratch.put(name, "");
   fs::permissions(file, fs::perms{0444});
-  EXPECT_TRUE(locks->lockNamed(name)->lock());
+  EXPECT_TRUE(locks->lockNamed(name).value()->lock().isOk());
 }
 
 TEST_F(LinuxLocks, AreOpenedForReadingAndNotInheritedByPrograms) {
@@ -194,31 +194,34 @@ TEST_F(LinuxLocks, OfRootKeepOtherUsersWaitingToo) {
   if (::getuid() != 0) GTEST_SKIP() << "only root can be two users";
   fs::permissions(scratch.path(), fs::perms{01777});
   const auto lock = locks->lockNamed(name);
-  ASSERT_TRUE(lock->lock());
+  ASSERT_TRUE(lock.value()->lock().isOk());
   const ChildProcess stranger{[this](const auto& say) {
     if (::setgroups(0, nullptr) == 0 && ::setuid(somebodyElse) == 0) holdForEver()(say);
   }};
   EXPECT_FALSE(stranger.says(aMoment));
-  lock->unlock();
+  lock.value()->unlock();
   EXPECT_TRUE(stranger.says(longEnough));
 }
 
 TEST_F(LinuxLocks, AreRefusedOnAnythingButAFile) {
   fs::create_symlink(scratch / "elsewhere", file);
-  EXPECT_FALSE(locks->lockNamed(name));
+  EXPECT_EQ(locks->lockNamed(name).cause(), platform::Cause::unsafe);
   EXPECT_FALSE(fs::exists(scratch / "elsewhere"));
   ASSERT_EQ(::mkfifo((scratch / "pipe").c_str(), 0666), 0);
-  EXPECT_FALSE(locks->lockNamed("pipe"));
+  EXPECT_EQ(locks->lockNamed("pipe").status().errorNumber(), EINVAL);
   fs::create_directory(scratch / "directory");
-  EXPECT_FALSE(locks->lockNamed("directory"));
+  EXPECT_EQ(locks->lockNamed("directory").status().errorNumber(), EISDIR);
 }
 
 TEST_F(LinuxLocks, AreNamedByAPlainFileName) {
-  for (const std::string_view wrong : {"", ".", "..", "/", "a/b", "../name"}) EXPECT_FALSE(locks->lockNamed(wrong));
+  for (const std::string_view wrong : {"", ".", "..", "/", "a/b", "../name"}) {
+    EXPECT_EQ(locks->lockNamed(wrong).status().errorNumber(), EINVAL) << wrong;
+  }
 }
 
 TEST_F(LinuxLocks, CannotBeMadeWithoutTheirDirectory) {
-  EXPECT_FALSE(platform::makeLinuxPlatform({.lockDirectory = scratch / "nothing"}).locks->lockNamed(name));
+  const auto elsewhere = platform::makeLinuxPlatform({.lockDirectory = scratch / "nothing"}).locks;
+  EXPECT_EQ(elsewhere->lockNamed(name).cause(), platform::Cause::missing);
 }
 
 }  // namespace

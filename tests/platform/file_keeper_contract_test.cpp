@@ -14,6 +14,7 @@ namespace tests {
 namespace {
 
 using platform::Bytes;
+using platform::Cause;
 using platform::FileAttributes;
 using platform::FileKind;
 using platform::Path;
@@ -118,7 +119,7 @@ TYPED_TEST(FileKeeperContract, ListsADirectoryInOrder) {
 TYPED_TEST(FileKeeperContract, SeesToItThatNoFileStandsAtAPath) {
   this->put("file", "text");
   EXPECT_TRUE(this->keeper.removeFile(this->at("file")).isOk());
-  EXPECT_EQ(this->files.kindOf(this->at("file")), std::nullopt);
+  EXPECT_EQ(this->files.kindOf(this->at("file")).cause(), Cause::missing);
   EXPECT_TRUE(this->keeper.removeFile(this->at("file")).isOk());
   EXPECT_TRUE(this->keeper.removeFile(this->at("nothing/file")).isOk());
   EXPECT_EQ(this->keeper.removeFile(this->subject.base).errorNumber(), EISDIR);

@@ -48,7 +48,7 @@ void expectSettled(const std::string& file, Outcome expected) {
     files.files->put("/file.plist", file);
     rusage before{};
     getrusage(RUSAGE_SELF, &before);
-    const bool isAccepted = files.store->readDictionary("/file.plist").has_value();
+    const bool isAccepted = files.store->readDictionary("/file.plist").isOk();
     rusage after{};
     getrusage(RUSAGE_SELF, &after);
     const auto grownBytes = static_cast<std::size_t>(after.ru_maxrss - before.ru_maxrss) * 1024;

@@ -28,22 +28,24 @@ const Dictionary kAccount{{"Identifier", "one"}, {"Port", 993}, {"Names", Array{
 
 TEST(KnownPropertyLists, GiveTheValuesThatWereReadBefore) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).data;
+  const Bytes bytes = *lists.store->serialize(kAccount).value();
   const Dictionary first = *lists.read(bytes);
   EXPECT_TRUE(lists.read(bytes)->isIdenticalTo(first));
 }
 
 TEST(KnownPropertyLists, AreReadFromTheFileEachTime) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).data;
+  const Bytes bytes = *lists.store->serialize(kAccount).value();
   EXPECT_TRUE(lists.read(bytes).has_value());
   static_cast<void>(lists.files->remove("/file.plist"));
-  EXPECT_FALSE(lists.store->readDictionary("/file.plist").has_value());
+  EXPECT_FALSE(lists.store->readDictionary("/file.plist").isOk());
 }
 
 TEST(KnownPropertyLists, DoNotHideAChangeThatKeepsSizeAndTime) {
   const tests::RealDevice device;
-  const auto read = [&device] { return *device.services.propertyLists->readDictionary(device.root / "list.plist"); };
+  const auto read = [&device] {
+    return device.services.propertyLists->readDictionary(device.root / "list.plist").take();
+  };
   device.put("list.plist", "<key>Name</key><string>before</string>");
   const auto time = std::filesystem::last_write_time(device.root / "list.plist");
   EXPECT_EQ(read().text("Name")->view(), "before");
@@ -54,7 +56,7 @@ TEST(KnownPropertyLists, DoNotHideAChangeThatKeepsSizeAndTime) {
 
 TEST(KnownPropertyLists, AreNotChangedByWhoeverEditsTheirValues) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).data;
+  const Bytes bytes = *lists.store->serialize(kAccount).value();
   Dictionary edited = *lists.read(bytes);
   edited.set("Port", 143);
   EXPECT_EQ(*lists.read(bytes), kAccount);
@@ -62,33 +64,34 @@ TEST(KnownPropertyLists, AreNotChangedByWhoeverEditsTheirValues) {
 
 TEST(KnownPropertyLists, GiveTheirBytesForTheSameValues) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).data;
+  const Bytes bytes = *lists.store->serialize(kAccount).value();
   PropertyListFiles others;
-  EXPECT_EQ(*others.store->serialize(*others.read(bytes)).data, bytes);
+  EXPECT_EQ(*others.store->serialize(*others.read(bytes)).value(), bytes);
 }
 
 TEST(KnownPropertyLists, DoNotHideAnEdit) {
   PropertyListFiles lists;
-  Dictionary edited = *lists.read(*lists.store->serialize(kAccount).data);
+  Dictionary edited = *lists.read(*lists.store->serialize(kAccount).value());
   edited.set("Names", Array{"a", "c"});
-  EXPECT_EQ(*lists.read(*lists.store->serialize(edited).data), edited);
+  EXPECT_EQ(*lists.read(*lists.store->serialize(edited).value()), edited);
 }
 
 TEST(KnownPropertyLists, DoNotHideAnEditThatIsTakenBack) {
   PropertyListFiles lists;
-  const Bytes before = *lists.store->serialize(kAccount).data;
+  const Bytes before = *lists.store->serialize(kAccount).value();
   Dictionary edited = kAccount;
   edited.set("Port", 143);
-  const Bytes between = *lists.store->serialize(edited).data;
+  const Bytes between = *lists.store->serialize(edited).value();
   edited.set("Port", 993);
-  EXPECT_EQ(*lists.store->serialize(edited).data, before);
+  EXPECT_EQ(*lists.store->serialize(edited).value(), before);
   EXPECT_NE(before, between);
 }
 
 TEST(KnownPropertyLists, TellKindsOfOneValueApart) {
   PropertyListFiles lists;
   static_cast<void>(lists.store->serialize(Dictionary{{"IsActive", true}}));
-  EXPECT_EQ(*lists.read(*lists.store->serialize(Dictionary{{"IsActive", 1}}).data)->find("IsActive"), PropertyValue{1});
+  EXPECT_EQ(*lists.read(*lists.store->serialize(Dictionary{{"IsActive", 1}}).value())->find("IsActive"),
+            PropertyValue{1});
 }
 
 TEST(KnownPropertyLists, TellOrdersOfKeysApart) {
@@ -96,14 +99,14 @@ TEST(KnownPropertyLists, TellOrdersOfKeysApart) {
   const Dictionary ordered{{"Inner", Dictionary{{"a", 1}, {"b", 2}}}};
   const Dictionary reversed{{"Inner", Dictionary{{"b", 2}, {"a", 1}}}};
   static_cast<void>(lists.store->serialize(ordered));
-  const Dictionary read = *lists.read(*lists.store->serialize(reversed).data);
+  const Dictionary read = *lists.read(*lists.store->serialize(reversed).value());
   EXPECT_EQ(read.dictionary("Inner")->begin()->key.view(), "b");
 }
 
 // What a save writes for a file that was read, unchanged.
 Bytes rewritten(const std::string& file) {
   PropertyListFiles lists;
-  return *lists.store->serialize(*lists.read(file)).data;
+  return *lists.store->serialize(*lists.read(file)).value();
 }
 
 TEST(KnownPropertyLists, AreNotWrittenAgainWithWhatNobodyReaches) {
@@ -140,10 +143,10 @@ TEST(KnownPropertyLists, AreWrittenInTheBinaryFormWhereTheyWereXml) {
 
 TEST(KnownPropertyLists, AreFew) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).data;
+  const Bytes bytes = *lists.store->serialize(kAccount).value();
   const Dictionary first = *lists.read(bytes);
   for (int number = 0; number < 10; ++number) {
-    static_cast<void>(lists.read(*lists.store->serialize(Dictionary{{"Number", number}}).data));
+    static_cast<void>(lists.read(*lists.store->serialize(Dictionary{{"Number", number}}).value()));
   }
   const Dictionary again = *lists.read(bytes);
   EXPECT_FALSE(again.isIdenticalTo(first));

@@ -10,6 +10,7 @@
 
 using platform::Array;
 using platform::Bytes;
+using platform::Cause;
 using platform::Date;
 using platform::Dictionary;
 using platform::PropertyValue;
@@ -59,9 +60,8 @@ Dictionary nested(int containers) {
 TEST(PropertyListStore, KeepsEveryKindThroughAWriteAndARead) {
   PropertyListFiles files;
   const auto written = files.store->serialize(everyKind());
-  EXPECT_EQ(written.errorDescription, "");
-  ASSERT_TRUE(written.data);
-  const auto read = files.read(*written.data);
+  ASSERT_TRUE(written.isOk()) << written.status().description();
+  const auto read = files.read(*written.value());
   ASSERT_TRUE(read);
   EXPECT_EQ(*read, everyKind());
   EXPECT_EQ(keysOf(*read), keysOf(everyKind()));
@@ -69,16 +69,46 @@ TEST(PropertyListStore, KeepsEveryKindThroughAWriteAndARead) {
 
 TEST(PropertyListStore, WritesVersionOneOfTheBinaryForm) {
   const auto written = PropertyListFiles{}.store->serialize({});
-  ASSERT_TRUE(written.data);
-  EXPECT_EQ(std::string(written.data->begin(), written.data->begin() + 8), "bplist00");
+  ASSERT_TRUE(written.isOk());
+  EXPECT_EQ(std::string(written.value()->begin(), written.value()->begin() + 8), "bplist00");
 }
 
 TEST(PropertyListStore, ReadsThroughTheFileSystemAlone) {
   PropertyListFiles files;
-  EXPECT_FALSE(files.store->readDictionary("/absent.plist"));
+  EXPECT_EQ(files.store->readDictionary("/absent.plist").cause(), Cause::missing);
   EXPECT_EQ(files.files->calls, std::vector<std::string>{"read /absent.plist"});
   files.files->failing.insert("read");
   EXPECT_FALSE(files.read(xmlWith("")));
+}
+
+struct Refusal {
+  std::string file;
+  Cause cause;
+};
+
+TEST(PropertyListStore, TellsWhyItReadsNothing) {
+  const std::string sound = xmlWith("<key>k</key><true/>");
+  const Refusal cases[] = {
+      {"", Cause::malformed},
+      {sound.substr(0, sound.size() * 6 / 10), Cause::malformed},
+      {"bplist00", Cause::malformed},
+      {"<plist><array/></plist>", Cause::unsuitable},
+      {tests::BinaryFile{.objects = {"\xA0"}}.bytes(), Cause::unsuitable},
+      {tests::BinaryFile{.objects = {std::string{"\xD1\x01\x00", 3}, "\x51k"}}.bytes(), Cause::excessive}};
+  for (const auto& [file, cause] : cases) {
+    PropertyListFiles files;
+    files.files->put("/file.plist", file);
+    EXPECT_EQ(files.store->readDictionary("/file.plist").cause(), cause) << file;
+  }
+}
+
+TEST(PropertyListStore, PassesOnWhyAFileCannotBeRead) {
+  PropertyListFiles files;
+  files.files->failing.insert("read");
+  EXPECT_EQ(files.store->readDictionary("/file.plist").status().errorNumber(), EIO);
+  files.files->failing.clear();
+  files.files->putDirectory("/file.plist");
+  EXPECT_EQ(files.store->readDictionary("/file.plist").cause(), Cause::other);
 }
 
 TEST(PropertyListStore, ReadsTheXmlForm) {
@@ -136,24 +166,23 @@ TEST(PropertyListStore, SharesTheKeysOfAFile) {
 TEST(PropertyListStore, WritesAndReads256NestedContainersButNotOneMore) {
   PropertyListFiles files;
   const auto written = files.store->serialize(nested(256));
-  ASSERT_TRUE(written.data) << written.errorDescription;
-  EXPECT_EQ(files.read(*written.data), nested(256));
-  EXPECT_FALSE(files.store->serialize(nested(257)).data);
-  EXPECT_NE(files.store->serialize(nested(257)).errorDescription, "");
+  ASSERT_TRUE(written.isOk()) << written.status().description();
+  EXPECT_EQ(files.read(*written.value()), nested(256));
+  EXPECT_EQ(files.store->serialize(nested(257)).cause(), Cause::excessive);
 }
 
 TEST(PropertyListStore, RefusesToWriteWhatUnfoldsBeyondAllMemory) {
   PropertyValue doubled{"leaf"};
   for (int level = 0; level < 40; ++level) doubled = Array{doubled, doubled};
   const auto written = PropertyListFiles{}.store->serialize({{"k", doubled}});
-  EXPECT_FALSE(written.data);
-  EXPECT_EQ(written.errorDescription, "The property list is too large");
+  EXPECT_EQ(written.cause(), Cause::excessive);
+  EXPECT_EQ(written.status().reason(), "The property list is too large");
 }
 
 TEST(PropertyListStore, RefusesToWriteAUidThatItCouldNotReadBack) {
   const auto written = PropertyListFiles{}.store->serialize({{"k", Uid{std::uint64_t{1} << 32U}}});
-  EXPECT_FALSE(written.data);
-  EXPECT_EQ(written.errorDescription, "A UID is larger than 32 bits");
+  EXPECT_EQ(written.cause(), Cause::unsuitable);
+  EXPECT_EQ(written.status().reason(), "A UID is larger than 32 bits");
 }
 
 TEST(PropertyListStore, WritesWhatSharesItsPartsInFull) {
@@ -161,8 +190,8 @@ TEST(PropertyListStore, WritesWhatSharesItsPartsInFull) {
   const Dictionary dictionary{{"a", part}, {"b", Array{part, part}}};
   PropertyListFiles files;
   const auto written = files.store->serialize(dictionary);
-  ASSERT_TRUE(written.data);
-  EXPECT_EQ(files.read(*written.data), dictionary);
+  ASSERT_TRUE(written.isOk());
+  EXPECT_EQ(files.read(*written.value()), dictionary);
 }
 
 }  // namespace

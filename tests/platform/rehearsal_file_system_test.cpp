@@ -18,6 +18,7 @@ namespace tests {
 namespace {
 
 using platform::Bytes;
+using platform::Cause;
 using platform::FileKind;
 using platform::Path;
 
@@ -54,7 +55,7 @@ TEST_F(Rehearsal, ReplacesAFileInMemoryOnly) {
 
 TEST_F(Rehearsal, RemovesAFileInMemoryOnly) {
   ASSERT_TRUE(files->remove(scratch / "directory/file").isOk());
-  EXPECT_EQ(files->kindOf(scratch / "directory/file"), std::nullopt);
+  EXPECT_EQ(files->kindOf(scratch / "directory/file").cause(), Cause::missing);
   EXPECT_TRUE(files->create(scratch / "directory/file", bytes("again")).isOk());
   EXPECT_EQ(scratch.contents("directory/file"), "as it is");
 }
@@ -63,14 +64,14 @@ TEST_F(Rehearsal, HidesWhatLayInARemovedDirectoryAlsoOnceItIsMadeAgain) {
   ASSERT_TRUE(files->remove(scratch / "directory").isOk());
   EXPECT_EQ(files->read(scratch / "directory/below/other", 100).status().errorNumber(), ENOENT);
   ASSERT_TRUE(files->createDirectories(scratch / "directory/below", 0755).isOk());
-  EXPECT_EQ(files->kindOf(scratch / "directory/below/other"), std::nullopt);
+  EXPECT_EQ(files->kindOf(scratch / "directory/below/other").cause(), Cause::missing);
   EXPECT_EQ(scratch.contents("directory/below/other"), "as it is");
 }
 
 TEST_F(Rehearsal, MovesAFileOfTheDeviceInMemoryOnly) {
   ASSERT_TRUE(files->rename(scratch / "directory/file", scratch / "directory/below/other").isOk());
   EXPECT_EQ(textAt("directory/below/other"), "as it is");
-  EXPECT_EQ(files->kindOf(scratch / "directory/file"), std::nullopt);
+  EXPECT_EQ(files->kindOf(scratch / "directory/file").cause(), Cause::missing);
   EXPECT_EQ(scratch.contents("directory/file"), "as it is");
 }
 
@@ -125,10 +126,10 @@ TEST_F(Rehearsal, ProposesTemporaryNamesInADirectoryThatItMade) {
   ASSERT_TRUE(files->createDirectories(directory, 0700).isOk());
   ::setenv("TMPDIR", directory.c_str(), 1);
   const auto first = files->temporaryName();
-  ASSERT_TRUE(first);
-  EXPECT_EQ(first->parent_path(), directory);
-  ASSERT_TRUE(files->create(*first, bytes("text")).isOk());
-  EXPECT_NE(files->temporaryName(), first);
+  ASSERT_TRUE(first.isOk());
+  EXPECT_EQ(first.value().parent_path(), directory);
+  ASSERT_TRUE(files->create(first.value(), bytes("text")).isOk());
+  EXPECT_NE(files->temporaryName(), first.value());
   EXPECT_FALSE(std::filesystem::exists(directory));
 }
 

@@ -28,9 +28,9 @@ TYPED_TEST_SUITE(IdentifiersContract, Subjects);
 
 TYPED_TEST(IdentifiersContract, AreRandomUuidsInUpperCase) {
   const auto identifier = this->identifiers->makeUuid();
-  ASSERT_TRUE(identifier);
-  EXPECT_EQ(identifier->size(), 36U);
-  EXPECT_THAT(*identifier, testing::MatchesRegex("[0-9A-F]+-[0-9A-F]+-4[0-9A-F]+-[89AB][0-9A-F]+-[0-9A-F]+"));
+  ASSERT_TRUE(identifier.isOk());
+  EXPECT_EQ(identifier.value().size(), 36U);
+  EXPECT_THAT(identifier.value(), testing::MatchesRegex("[0-9A-F]+-[0-9A-F]+-4[0-9A-F]+-[89AB][0-9A-F]+-[0-9A-F]+"));
 }
 
 TYPED_TEST(IdentifiersContract, NeverComeTwice) {
@@ -41,7 +41,7 @@ TYPED_TEST(IdentifiersContract, NeverComeTwice) {
 TEST(IdentifiersOfATest, CanBeUnavailable) {
   FakeUniqueIdentifiers identifiers;
   identifiers.canMake = false;
-  EXPECT_EQ(identifiers.makeUuid(), std::nullopt);
+  EXPECT_FALSE(identifiers.makeUuid().isOk());
 }
 
 }  // namespace

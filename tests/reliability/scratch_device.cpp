@@ -240,14 +240,14 @@ RunOutcome ScratchDevice::run(const Mishap& mishap, std::size_t failingAllocatio
 
 void ScratchDevice::write(const std::filesystem::path& path, const Dictionary& contents) const {
   const platform::Platform services = platform::makeLinuxPlatform(optionsFor(_root));
-  const platform::SerializedPropertyList list = services.propertyLists->serialize(contents);
-  if (!list.data || !services.files->replace(_root / path, *list.data).isOk()) {
+  const auto list = services.propertyLists->serialize(contents);
+  if (!list.isOk() || !services.files->replace(_root / path, *list.value()).isOk()) {
     throw std::runtime_error{"cannot write " + path.string()};
   }
 }
 
 std::optional<Dictionary> ScratchDevice::read(const std::filesystem::path& path) const {
-  return platform::makeLinuxPlatform(optionsFor(_root)).propertyLists->readDictionary(_root / path);
+  return platform::makeLinuxPlatform(optionsFor(_root)).propertyLists->readDictionary(_root / path).optional();
 }
 
 std::map<std::string, int> ScratchDevice::markersInSettings() const {

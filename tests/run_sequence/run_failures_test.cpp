@@ -36,7 +36,7 @@ class ThrowingObserver final : public platform::RunObserver {
 
 class ThrowingLocks final : public platform::ExclusiveFileLocks {
  public:
-  [[nodiscard]] std::unique_ptr<platform::ExclusiveFileLock> lockNamed(std::string_view) override {
+  platform::Result<std::unique_ptr<platform::ExclusiveFileLock>> lockNamed(std::string_view) override {
     throw std::bad_alloc{};
   }
 };

@@ -39,9 +39,9 @@ Status FakeFileSystem::begin(const std::string& verb, const Path& path, const st
   return {};
 }
 
-std::optional<FileKind> FakeFileSystem::kindOf(const Path& path) {
+platform::Result<FileKind> FakeFileSystem::kindOf(const Path& path) {
   const auto node = nodes.find(path);
-  if (node == nodes.end()) return std::nullopt;
+  if (node == nodes.end()) return Status::failure(ENOENT, "look at " + path.string());
   return node->second.isDirectory ? FileKind::directory : FileKind::file;
 }
 
@@ -131,9 +131,9 @@ Status FakeFileSystem::setOwner(const Path& path, std::string_view owner, std::s
   return {};
 }
 
-std::optional<Path> FakeFileSystem::temporaryName() {
+platform::Result<Path> FakeFileSystem::temporaryName() {
   calls.emplace_back("temporaryName");
-  if (!hasTemporaryNames) return std::nullopt;
+  if (!hasTemporaryNames) return Status::failure(EEXIST, "find a temporary name");
   return Path{"/var/mobile/tmp/file" + std::to_string(++_temporaryNames)};
 }
 

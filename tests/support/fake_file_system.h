@@ -34,7 +34,7 @@ class FakeFileSystem final : public platform::FileSystem {
   [[nodiscard]] bool exists(const platform::Path& path) const { return nodes.contains(path); }
   [[nodiscard]] std::string contents(const platform::Path& path) const;
 
-  [[nodiscard]] std::optional<platform::FileKind> kindOf(const platform::Path& path) override;
+  platform::Result<platform::FileKind> kindOf(const platform::Path& path) override;
   platform::Result<platform::Bytes> read(const platform::Path& path, std::size_t sizeLimit) override;
   platform::Status create(const platform::Path& path, std::span<const std::uint8_t> bytes) override;
   platform::Status replace(const platform::Path& path, std::span<const std::uint8_t> bytes) override;
@@ -42,7 +42,7 @@ class FakeFileSystem final : public platform::FileSystem {
   platform::Status remove(const platform::Path& path) override;
   platform::Status createDirectories(const platform::Path& path, unsigned permissions) override;
   platform::Status setOwner(const platform::Path& path, std::string_view owner, std::string_view group) override;
-  [[nodiscard]] std::optional<platform::Path> temporaryName() override;
+  platform::Result<platform::Path> temporaryName() override;
   platform::Status rename(const platform::Path& from, const platform::Path& to) override;
 
  private:

@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cerrno>
 #include <cstdio>
 #include <stdexcept>
 
@@ -21,12 +22,12 @@ class FakeExclusiveFileLock final : public platform::ExclusiveFileLock {
   ~FakeExclusiveFileLock() override {
     if (_isHeld) _locks.held.erase(_name);
   }
-  bool lock() override {
+  platform::Status lock() override {
     _locks.calls.push_back("lock " + _name);
-    if (!_locks.canLock) return false;
+    if (!_locks.canLock) return platform::Status::failure(EIO, "take the lock " + _name);
     if (!_locks.held.insert(_name).second) throw std::logic_error{"would wait for ever"};
     _isHeld = true;
-    return true;
+    return {};
   }
   void unlock() override {
     _locks.calls.push_back("unlock " + _name);
@@ -67,18 +68,18 @@ Bytes FakePropertyListStore::bytesFor(const Dictionary& dictionary) {
   return bytes;
 }
 
-std::optional<Dictionary> FakePropertyListStore::readDictionary(const Path& path) {
+platform::Result<Dictionary> FakePropertyListStore::readDictionary(const Path& path) {
   reads.push_back(path);
   if (beforeRead) beforeRead(path);
   const auto bytes = _files->read(path, SIZE_MAX);
-  if (!bytes.isOk()) return std::nullopt;
-  return lookedUp(_dictionaries, bytes.value());
+  if (!bytes.isOk()) return bytes.status();
+  if (auto known = lookedUp(_dictionaries, bytes.value())) return *std::move(known);
+  return platform::Status::failure(platform::Cause::malformed, "read " + path.string(), "it is no property list");
 }
 
-platform::SerializedPropertyList FakePropertyListStore::serialize(const Dictionary& dictionary) {
-  if (serializesNothing) return {};
-  if (!serializeError.empty() && !serializesDespiteError) return {nullptr, serializeError};
-  return {std::make_shared<const Bytes>(bytesFor(dictionary)), serializeError};
+platform::Result<std::shared_ptr<const Bytes>> FakePropertyListStore::serialize(const Dictionary& dictionary) {
+  if (serializeError.empty()) return std::make_shared<const Bytes>(bytesFor(dictionary));
+  return platform::Status::failure(platform::Cause::other, "serialize the property list", serializeError);
 }
 
 std::optional<bool> FakePreferencesStore::boolean(std::string_view domain, std::string_view key) const {
@@ -103,9 +104,10 @@ void FakeConsoleLog::write(std::string_view message) {
   _outputs.push_back("console " + std::string{message});
 }
 
-std::unique_ptr<platform::ExclusiveFileLock> FakeExclusiveFileLocks::lockNamed(std::string_view name) {
+platform::Result<std::unique_ptr<platform::ExclusiveFileLock>> FakeExclusiveFileLocks::lockNamed(
+    std::string_view name) {
   calls.push_back("make " + std::string{name});
-  if (!canMakeLocks) return nullptr;
+  if (!canMakeLocks) return platform::Status::failure(EIO, "open the lock file " + std::string{name});
   return std::make_unique<FakeExclusiveFileLock>(*this, std::string{name});
 }
 
@@ -124,8 +126,8 @@ std::vector<platform::Restriction> FakeProfileRestrictions::restrictions(
   return answers;
 }
 
-std::unique_ptr<platform::TetheredSyncConnection> FakeTetheredSyncQuery::connect() {
-  if (!isReachable) return nullptr;
+platform::Result<std::unique_ptr<platform::TetheredSyncConnection>> FakeTetheredSyncQuery::connect() {
+  if (!isReachable) return platform::Status::failure(ECONNREFUSED, "connect");
   return std::make_unique<FakeTetheredSyncConnection>(*this);
 }
 
@@ -133,23 +135,25 @@ platform::ExternalSources FakeExternalSourcesQuery::enabledSources(platform::Syn
   return lookedUp(sources, type).value_or(platform::ExternalSources{});
 }
 
-std::optional<std::string> FakeModuleLoader::open(const std::string& path) {
+platform::Status FakeModuleLoader::open(const std::string& path) {
   opened.push_back(path);
-  return lookedUp(errors, path);
+  const auto error = errors.find(path);
+  if (error == errors.end()) return {};
+  return platform::Status::failure(platform::Cause::other, "open a module", error->second);
 }
 
 std::optional<std::string> FakeLocalizedStrings::text(std::string_view table, std::string_view key) const {
   return lookedUp(texts, std::pair{std::string{table}, std::string{key}});
 }
 
-std::optional<std::string> FakeUniqueIdentifiers::makeUuid() {
-  if (!canMake) return std::nullopt;
+platform::Result<std::string> FakeUniqueIdentifiers::makeUuid() {
+  if (!canMake) return platform::Status::failure(EIO, "make an identifier");
   std::array<char, 37> text{};
   std::snprintf(text.data(), text.size(), "00000000-0000-4000-8000-%012d", ++made);
-  return text.data();
+  return std::string{text.data()};
 }
 
-std::string FakeClock::currentLocalTime(std::string_view pattern) const {
+platform::Result<std::string> FakeClock::currentLocalTime(std::string_view pattern) const {
   patterns.emplace_back(pattern);
   return time;
 }
@@ -194,9 +198,7 @@ void FakeDevice::put(const Path& path, const Dictionary& dictionary) {
   files->put(path, propertyLists->bytesFor(dictionary));
 }
 
-Dictionary FakeDevice::dictionaryAt(const Path& path) {
-  return propertyLists->readDictionary(path).value_or(Dictionary{});
-}
+Dictionary FakeDevice::dictionaryAt(const Path& path) { return propertyLists->readDictionary(path).valueOr({}); }
 
 std::vector<std::string> FakeDevice::logMessages() const {
   std::vector<std::string> messages;

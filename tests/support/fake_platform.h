@@ -44,15 +44,13 @@ class FakePropertyListStore final : public platform::PropertyListStore {
   explicit FakePropertyListStore(std::shared_ptr<FakeFileSystem> files) : _files{std::move(files)} {}
 
   std::string serializeError;  // where set, serialising fails with it
-  bool serializesDespiteError = false;
-  bool serializesNothing = false;  // and does not say why
-  std::vector<Path> reads;         // every path that was asked for, in order
+  std::vector<Path> reads;     // every path that was asked for, in order
   // Called before each read, so that a test can change a file at that moment.
   std::function<void(const Path&)> beforeRead;
 
   [[nodiscard]] Bytes bytesFor(const Dictionary& dictionary);
-  [[nodiscard]] std::optional<Dictionary> readDictionary(const Path& path) override;
-  [[nodiscard]] platform::SerializedPropertyList serialize(const Dictionary& dictionary) override;
+  platform::Result<Dictionary> readDictionary(const Path& path) override;
+  platform::Result<std::shared_ptr<const Bytes>> serialize(const Dictionary& dictionary) override;
 
  private:
   std::shared_ptr<FakeFileSystem> _files;
@@ -128,7 +126,7 @@ class FakeExclusiveFileLocks final : public platform::ExclusiveFileLocks {
   std::set<std::string> held;
   std::vector<std::string> calls;  // "make NAME", "lock NAME", "unlock NAME"
 
-  [[nodiscard]] std::unique_ptr<platform::ExclusiveFileLock> lockNamed(std::string_view name) override;
+  platform::Result<std::unique_ptr<platform::ExclusiveFileLock>> lockNamed(std::string_view name) override;
 };
 
 class FakeDeviceInfoQuery final : public platform::DeviceInfoQuery {
@@ -152,7 +150,7 @@ class FakeTetheredSyncQuery final : public platform::TetheredSyncQuery {
   Dictionary domain;               // what every domain holds
   std::vector<std::string> asked;  // "DOMAIN KEY", "DOMAIN" without a key
   int openConnections = 0;
-  [[nodiscard]] std::unique_ptr<platform::TetheredSyncConnection> connect() override;
+  platform::Result<std::unique_ptr<platform::TetheredSyncConnection>> connect() override;
 };
 
 class FakeExternalSourcesQuery final : public platform::ExternalSourcesQuery {
@@ -172,7 +170,7 @@ class FakeModuleLoader final : public platform::ModuleLoader {
  public:
   std::vector<std::string> opened;            // every call, in order
   std::map<std::string, std::string> errors;  // by path
-  [[nodiscard]] std::optional<std::string> open(const std::string& path) override;
+  platform::Status open(const std::string& path) override;
 };
 
 class FakeLocalizedStrings final : public platform::LocalizedStrings {
@@ -186,14 +184,14 @@ class FakeUniqueIdentifiers final : public platform::UniqueIdentifiers {
  public:
   bool canMake = true;
   int made = 0;
-  [[nodiscard]] std::optional<std::string> makeUuid() override;
+  platform::Result<std::string> makeUuid() override;
 };
 
 class FakeClock final : public platform::Clock {
  public:
   std::string time = "2011-10-12-9-10-5";
   mutable std::vector<std::string> patterns;
-  [[nodiscard]] std::string currentLocalTime(std::string_view pattern) const override;
+  platform::Result<std::string> currentLocalTime(std::string_view pattern) const override;
 };
 
 // A whole device in memory. Making one sets it as the process's platform.

@@ -40,9 +40,10 @@ auto MishapFileSystem::change(std::string_view verb, const Path& path, const Ope
   return run(verb, path, operation, failed, halfDone);
 }
 
-std::optional<FileKind> MishapFileSystem::kindOf(const Path& path) {
+Result<FileKind> MishapFileSystem::kindOf(const Path& path) {
   return run(
-      "kindOf", path, [&] { return _inner->kindOf(path); }, [] { return std::optional<FileKind>{}; });
+      "kindOf", path, [&] { return _inner->kindOf(path); },
+      [&] { return Result<FileKind>{Status::failure(_mishap.errorNumber, "look at " + path.string())}; });
 }
 Result<Bytes> MishapFileSystem::read(const Path& path, std::size_t sizeLimit) {
   return run(
@@ -81,9 +82,10 @@ Status MishapFileSystem::createDirectories(const Path& path, unsigned permission
 Status MishapFileSystem::setOwner(const Path& path, std::string_view owner, std::string_view group) {
   return change("setOwner", path, [&] { return _inner->setOwner(path, owner, group); });
 }
-std::optional<Path> MishapFileSystem::temporaryName() {
+Result<Path> MishapFileSystem::temporaryName() {
   return run(
-      "temporaryName", {}, [&] { return _inner->temporaryName(); }, [] { return std::optional<Path>{}; });
+      "temporaryName", {}, [&] { return _inner->temporaryName(); },
+      [&] { return Result<Path>{Status::failure(_mishap.errorNumber, "find a temporary name")}; });
 }
 Status MishapFileSystem::rename(const Path& from, const Path& to) {
   return change("rename", from, [&] { return _inner->rename(from, to); });

@@ -70,7 +70,7 @@ class PropertyListFiles {
 
   std::optional<platform::Dictionary> read(platform::Bytes bytes) {
     files->put("/file.plist", std::move(bytes));
-    return store->readDictionary("/file.plist");
+    return store->readDictionary("/file.plist").optional();
   }
   std::optional<platform::Dictionary> read(std::string_view bytes) {
     return read(platform::Bytes{bytes.begin(), bytes.end()});

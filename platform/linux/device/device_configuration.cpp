@@ -2,11 +2,11 @@
 
 namespace platform {
 
-std::optional<Dictionary> DeviceConfiguration::ofSystem(std::string_view name) const {
+Result<Dictionary> DeviceConfiguration::ofSystem(std::string_view name) const {
   return propertyLists->readDictionary(directories->systemRoot() / "etc/vorlix" / name);
 }
 
-std::optional<Dictionary> DeviceConfiguration::ofUser(std::string_view name) const {
+Result<Dictionary> DeviceConfiguration::ofUser(std::string_view name) const {
   return propertyLists->readDictionary(directories->home() / "Library/Preferences" / name);
 }
 

@@ -18,9 +18,9 @@ struct DeviceConfiguration {
   std::shared_ptr<BaseDirectories> directories;
   std::shared_ptr<PropertyListStore> propertyLists;
 
-  // The dictionary in ROOT/etc/vorlix/NAME or HOME/Library/Preferences/NAME; nothing where it cannot be read.
-  [[nodiscard]] std::optional<Dictionary> ofSystem(std::string_view name) const;
-  [[nodiscard]] std::optional<Dictionary> ofUser(std::string_view name) const;
+  // The dictionary in ROOT/etc/vorlix/NAME or HOME/Library/Preferences/NAME.
+  [[nodiscard]] Result<Dictionary> ofSystem(std::string_view name) const;
+  [[nodiscard]] Result<Dictionary> ofUser(std::string_view name) const;
 };
 
 // ROOT/etc/vorlix/device-info.plist: the keys of the questions. Without an answer there, "CPUArchitecture" is the

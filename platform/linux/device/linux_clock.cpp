@@ -11,9 +11,13 @@ class LinuxClock final : public Clock {
  public:
   explicit LinuxClock(std::function<Instant()> now) : _now{std::move(now)} {}
 
-  [[nodiscard]] std::string currentLocalTime(std::string_view pattern) const override {
+  Result<std::string> currentLocalTime(std::string_view pattern) const override {
     const IcuFunctions* const icu = icuFunctions();
-    return icu == nullptr ? std::string{} : icu->localTime(_now().time_since_epoch().count(), pattern);
+    if (icu == nullptr) return Status::failure(Cause::missing, "tell the time", "there is no date library");
+    std::optional<std::string> time = icu->localTime(_now().time_since_epoch().count(), pattern);
+    if (time) return *std::move(time);
+    return Status::failure(Cause::unsuitable, "tell the time",
+                           "there is no such date pattern: " + std::string{pattern});
   }
 
  private:

@@ -25,7 +25,7 @@ class LinuxDeviceInfoQuery final : public DeviceInfoQuery {
   explicit LinuxDeviceInfoQuery(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
 
   [[nodiscard]] std::optional<PropertyValue> answer(std::string_view key) const override {
-    const Dictionary info = _configuration.ofSystem("device-info.plist").value_or(Dictionary{});
+    const Dictionary info = _configuration.ofSystem("device-info.plist").valueOr({});
     const PropertyValue* const value = info.find(key);
     if (value != nullptr && isOfTheKeysKind(key, *value)) return *value;
     return key == architectureKey ? machineArchitecture() : std::nullopt;

@@ -25,7 +25,7 @@ class LinuxExternalSourcesQuery final : public ExternalSourcesQuery {
   explicit LinuxExternalSourcesQuery(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
 
   [[nodiscard]] ExternalSources enabledSources(SyncDataType type) const override {
-    const Dictionary entries = _configuration.ofUser("com.vorlix.external-sources.plist").value_or(Dictionary{});
+    const Dictionary entries = _configuration.ofUser("com.vorlix.external-sources.plist").valueOr({});
     if (const Array* const sources = entries.array(keyOf(type))) return {*sources, std::nullopt};
     if (const Dictionary* const entry = entries.dictionary(keyOf(type))) return sourcesWithin(*entry);
     return {};

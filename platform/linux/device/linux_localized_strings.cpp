@@ -65,8 +65,8 @@ class LinuxLocalizedStrings final : public LocalizedStrings {
     const std::scoped_lock lock{_guard};
     const auto known = _tables.find(name);
     if (known != _tables.end()) return known->second;
-    auto entries = _propertyLists->readDictionary(_directories->resources() / "strings" / name);
-    return _tables.emplace(name, std::move(entries).value_or(Dictionary{})).first->second;
+    Dictionary entries = _propertyLists->readDictionary(_directories->resources() / "strings" / name).valueOr({});
+    return _tables.emplace(name, std::move(entries)).first->second;
   }
 
   std::shared_ptr<BaseDirectories> _directories;

@@ -14,8 +14,8 @@ class LinuxPreferencesStore final : public PreferencesStore {
   void synchronize(std::string_view domain) override {
     const bool isFileName = domain.find('/') == std::string_view::npos;
     const Path file = _directories->home() / "Library/Preferences" / (std::string{domain} + ".plist");
-    auto contents = isFileName ? _propertyLists->readDictionary(file) : std::nullopt;
-    _domains.insert_or_assign(std::string{domain}, std::move(contents).value_or(Dictionary{}));
+    Dictionary contents = isFileName ? _propertyLists->readDictionary(file).valueOr({}) : Dictionary{};
+    _domains.insert_or_assign(std::string{domain}, std::move(contents));
   }
 
   [[nodiscard]] std::optional<bool> boolean(std::string_view domain, std::string_view key) const override {

@@ -29,7 +29,7 @@ class LinuxProfileRestrictions final : public ProfileRestrictions {
   explicit LinuxProfileRestrictions(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
 
   [[nodiscard]] std::vector<Restriction> restrictions(std::span<const ManagedFeature> features) const override {
-    const Dictionary profiles = _configuration.ofSystem("profile-restrictions.plist").value_or(Dictionary{});
+    const Dictionary profiles = _configuration.ofSystem("profile-restrictions.plist").valueOr({});
     std::vector<Restriction> answers;
     std::ranges::transform(features, std::back_inserter(answers),
                            [&profiles](ManagedFeature feature) { return restrictionIn(profiles, feature); });

@@ -26,10 +26,10 @@ class LinuxTetheredSyncQuery final : public TetheredSyncQuery {
  public:
   explicit LinuxTetheredSyncQuery(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
 
-  [[nodiscard]] std::unique_ptr<TetheredSyncConnection> connect() override {
-    std::optional<Dictionary> contents = _configuration.ofUser(std::string{tetheredSyncDomain} + ".plist");
-    if (!contents) return nullptr;
-    return std::make_unique<LinuxTetheredSyncConnection>(*std::move(contents));
+  Result<std::unique_ptr<TetheredSyncConnection>> connect() override {
+    Result<Dictionary> contents = _configuration.ofUser(std::string{tetheredSyncDomain} + ".plist");
+    if (!contents.isOk()) return contents.status();
+    return std::make_unique<LinuxTetheredSyncConnection>(contents.take());
   }
 
  private:

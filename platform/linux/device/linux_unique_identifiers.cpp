@@ -9,12 +9,12 @@ namespace {
 
 class LinuxUniqueIdentifiers final : public UniqueIdentifiers {
  public:
-  [[nodiscard]] std::optional<std::string> makeUuid() override {
+  Result<std::string> makeUuid() override {
     std::array<unsigned char, 16> uuid{};
     ::uuid_generate_random(uuid.data());
     std::array<char, UUID_STR_LEN> text{};
     ::uuid_unparse_upper(uuid.data(), text.data());
-    return text.data();
+    return std::string{text.data()};
   }
 };
 

@@ -35,6 +35,11 @@ class Room {
   std::size_t _size = _small.size();
 };
 
+// `error` is 0 where everything was read and the name was not there.
+Status notFound(int error, const std::string& name) {
+  return Status::failure(error == 0 ? ENOENT : error, "find the account " + name);
+}
+
 using File = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
 
 File openTable(const Place& place) {
@@ -44,9 +49,9 @@ File openTable(const Place& place) {
   return {file, &std::fclose};
 }
 
-std::optional<uid_t> userInTable(const Place& place, const std::string& name) {
+Result<uid_t> userInTable(const Place& place, const std::string& name) {
   const File table = openTable(place);
-  if (!table) return std::nullopt;
+  if (!table) return notFound(errno, name);
   Room room;
   passwd entry{};
   passwd* found = nullptr;
@@ -56,12 +61,12 @@ std::optional<uid_t> userInTable(const Place& place, const std::string& name) {
   while (room.ask(next) == 0) {
     if (name == found->pw_name) return found->pw_uid;
   }
-  return std::nullopt;
+  return notFound(0, name);
 }
 
-std::optional<gid_t> groupInTable(const Place& place, const std::string& name) {
+Result<gid_t> groupInTable(const Place& place, const std::string& name) {
   const File table = openTable(place);
-  if (!table) return std::nullopt;
+  if (!table) return notFound(errno, name);
   Room room;
   struct group entry {};
   struct group* found = nullptr;
@@ -71,27 +76,29 @@ std::optional<gid_t> groupInTable(const Place& place, const std::string& name) {
   while (room.ask(next) == 0) {
     if (name == found->gr_name) return found->gr_gid;
   }
-  return std::nullopt;
+  return notFound(0, name);
 }
 
 }  // namespace
 
-std::optional<uid_t> AccountNames::user(const std::string& name) const {
+Result<uid_t> AccountNames::user(const std::string& name) const {
   if (_root != "/") return userInTable(_paths.openParentOfTarget(_root / "etc/passwd"), name);
   Room room;
   passwd entry{};
   passwd* found = nullptr;
-  room.ask([&](char* data, std::size_t size) { return ::getpwnam_r(name.c_str(), &entry, data, size, &found); });
-  return found == nullptr ? std::nullopt : std::optional{found->pw_uid};
+  const int error =
+      room.ask([&](char* data, std::size_t size) { return ::getpwnam_r(name.c_str(), &entry, data, size, &found); });
+  return found == nullptr ? Result<uid_t>{notFound(error, name)} : found->pw_uid;
 }
 
-std::optional<gid_t> AccountNames::group(const std::string& name) const {
+Result<gid_t> AccountNames::group(const std::string& name) const {
   if (_root != "/") return groupInTable(_paths.openParentOfTarget(_root / "etc/group"), name);
   Room room;
   struct group entry {};
   struct group* found = nullptr;
-  room.ask([&](char* data, std::size_t size) { return ::getgrnam_r(name.c_str(), &entry, data, size, &found); });
-  return found == nullptr ? std::nullopt : std::optional{found->gr_gid};
+  const int error =
+      room.ask([&](char* data, std::size_t size) { return ::getgrnam_r(name.c_str(), &entry, data, size, &found); });
+  return found == nullptr ? Result<gid_t>{notFound(error, name)} : found->gr_gid;
 }
 
 }  // namespace platform

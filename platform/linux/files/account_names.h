@@ -3,10 +3,10 @@
 #include <sys/types.h>
 
 #include <filesystem>
-#include <optional>
 #include <string>
 
 #include "platform/linux/files/path_resolution.h"
+#include "platform/status.h"
 
 namespace platform {
 
@@ -17,8 +17,9 @@ class AccountNames {
   explicit AccountNames(std::filesystem::path systemRoot)
       : _root{std::move(systemRoot)}, _paths{FileTrees{.systemRoot = _root}} {}
 
-  [[nodiscard]] std::optional<uid_t> user(const std::string& name) const;
-  [[nodiscard]] std::optional<gid_t> group(const std::string& name) const;
+  // ENOENT where there is no such name; another error where the names cannot be read.
+  [[nodiscard]] Result<uid_t> user(const std::string& name) const;
+  [[nodiscard]] Result<gid_t> group(const std::string& name) const;
 
  private:
   std::filesystem::path _root;

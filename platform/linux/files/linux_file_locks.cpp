@@ -33,6 +33,11 @@ Descriptor openLockFile(const Place& place) {
   return {};
 }
 
+Status failure(const char* attempt, const std::filesystem::path& path) {
+  const int cause = errno;
+  return Status::failure(cause, std::string{attempt} + " " + path.string());
+}
+
 bool isFileAt(const Place& place, const Descriptor& file) {
   struct stat opened {};
   struct stat present {};
@@ -50,21 +55,23 @@ bool waitForLock(const Descriptor& file) {
 
 class LinuxFileLock final : public ExclusiveFileLock {
  public:
-  LinuxFileLock(Place place, Descriptor file) : _place{std::move(place)}, _file{std::move(file)} {}
+  LinuxFileLock(std::string path, Place place, Descriptor file)
+      : _path{std::move(path)}, _place{std::move(place)}, _file{std::move(file)} {}
 
   // A file that was removed meanwhile locks nobody out, so the one that now stands there is tried.
-  bool lock() override {
+  Status lock() override {
     for (int attempt = 0; attempt < attempts; ++attempt) {
-      if (!_file.isOpen() || !waitForLock(_file)) return false;
-      if (isFileAt(_place, _file)) return true;
+      if (!_file.isOpen() || !waitForLock(_file)) return failure("take the lock", _path);
+      if (isFileAt(_place, _file)) return {};
       _file = openLockFile(_place);
     }
-    return false;
+    return Status::failure(EAGAIN, "take the lock " + _path);
   }
 
   void unlock() override { ::flock(_file.number(), LOCK_UN); }
 
  private:
+  std::string _path;
   Place _place;
   Descriptor _file;
 };
@@ -73,12 +80,15 @@ class LinuxFileLocks final : public ExclusiveFileLocks {
  public:
   explicit LinuxFileLocks(std::filesystem::path directory) : _directory{std::move(directory)} {}
 
-  [[nodiscard]] std::unique_ptr<ExclusiveFileLock> lockNamed(std::string_view name) override {
-    if (!isEntryName(std::string{name}) || name.find('/') != std::string_view::npos) return nullptr;
-    Place place = PathResolver{}.openParent(_directory / name);
+  Result<std::unique_ptr<ExclusiveFileLock>> lockNamed(std::string_view name) override {
+    const std::filesystem::path path = _directory / name;
+    if (!isEntryName(std::string{name}) || name.find('/') != std::string_view::npos) {
+      return Status::failure(EINVAL, "open the lock file " + path.string());
+    }
+    Place place = PathResolver{}.openParent(path);
     Descriptor file = openLockFile(place);
-    if (!file.isOpen()) return nullptr;
-    return std::make_unique<LinuxFileLock>(std::move(place), std::move(file));
+    if (!file.isOpen()) return failure("open the lock file", path);
+    return std::make_unique<LinuxFileLock>(path.string(), std::move(place), std::move(file));
   }
 
  private:

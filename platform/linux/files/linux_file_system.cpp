@@ -5,6 +5,7 @@
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
+#include <random>
 
 #include "platform/linux/files/account_names.h"
 #include "platform/linux/files/directory_creation.h"
@@ -20,6 +21,12 @@ Status failure(const char* verb, const Path& path) {
   return Status::failure(cause, std::string{verb} + " " + path.string());
 }
 
+// For a step that says why it fails in errno.
+bool refuse(int cause) {
+  errno = cause;
+  return false;
+}
+
 bool isThere(const Place& place, struct stat& status) {
   return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
 }
@@ -32,10 +39,8 @@ Descriptor openAnything(const Place& place) {
 bool giveAway(const Descriptor& thing, uid_t user, gid_t group) {
   struct stat status {};
   if (!thing.isOpen() || ::fstat(thing.number(), &status) != 0) return false;
-  if (S_ISLNK(status.st_mode) || (!S_ISDIR(status.st_mode) && status.st_nlink > 1)) {
-    errno = S_ISLNK(status.st_mode) ? ELOOP : EMLINK;
-    return false;
-  }
+  if (S_ISLNK(status.st_mode)) return refuse(ELOOP);
+  if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return refuse(EMLINK);
   return ::fchownat(thing.number(), "", user, group, AT_EMPTY_PATH) == 0;
 }
 
@@ -43,8 +48,7 @@ bool giveAway(const Descriptor& thing, uid_t user, gid_t group) {
 bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
   struct stat status {};
   if (::fstat(file, &status) != 0) return false;
-  errno = EFBIG;
-  if (static_cast<std::uintmax_t>(status.st_size) > limit) return false;
+  if (static_cast<std::uintmax_t>(status.st_size) > limit) return refuse(EFBIG);
   // One byte more than expected shows whether the file ends where it said.
   bytes.resize(static_cast<std::size_t>(status.st_size) + 1);
   std::size_t filled = 0;
@@ -52,8 +56,7 @@ bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
     const ssize_t count = readSome(file, bytes.data() + filled, bytes.size() - filled);
     if (count < 0) return false;
     filled += static_cast<std::size_t>(count);
-    errno = EFBIG;
-    if (filled > limit) return false;
+    if (filled > limit) return refuse(EFBIG);
     if (filled < bytes.size()) break;
     bytes.resize(bytes.size() * 2);
   }
@@ -61,15 +64,32 @@ bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
   return true;
 }
 
+// As the C library chooses it: a program with more rights than its user has does not follow the environment.
+Path temporaryDirectory() {
+  const char* const chosen = ::secure_getenv("TMPDIR");
+  std::error_code unused;
+  return chosen != nullptr && std::filesystem::is_directory(chosen, unused) ? chosen : P_tmpdir;
+}
+
+std::string randomLetters() {
+  constexpr std::string_view kLetters = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789";
+  constexpr std::size_t kCount = 6;
+  std::random_device random;
+  std::uniform_int_distribution<std::size_t> place{0, kLetters.size() - 1};
+  std::string letters;
+  while (letters.size() < kCount) letters.push_back(kLetters[place(random)]);
+  return letters;
+}
+
 class LinuxFileSystem final : public FileSystem {
  public:
   explicit LinuxFileSystem(const FileTrees& trees) : _accounts{trees.systemRoot}, _paths{trees} {}
 
-  [[nodiscard]] std::optional<FileKind> kindOf(const Path& path) override {
+  Result<FileKind> kindOf(const Path& path) override {
     Place place = _paths.openParentOfTarget(path);
     if (!place.parent.isOpen() && errno == ELOOP) place = _paths.openParent(path);
     struct stat status {};
-    if (!place.parent.isOpen() || !isThere(place, status)) return {};
+    if (!place.parent.isOpen() || !isThere(place, status)) return failure("look at", path);
     if (S_ISREG(status.st_mode)) return FileKind::file;
     return S_ISDIR(status.st_mode) ? FileKind::directory : FileKind::other;
   }
@@ -120,25 +140,29 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
-    const std::optional<uid_t> user = _accounts.user(std::string{owner});
-    const std::optional<gid_t> groupNumber = _accounts.group(std::string{group});
-    if (!user || !groupNumber) {
-      return Status::failure(ENOENT, "find the account " + std::string{user ? group : owner} + " for " + path.string());
-    }
+    const Result<uid_t> user = _accounts.user(std::string{owner});
+    if (!user.isOk()) return user.status();
+    const Result<gid_t> groupNumber = _accounts.group(std::string{group});
+    if (!groupNumber.isOk()) return groupNumber.status();
     return at(path, "set the owner of", [&](const Place& place) {
       const Descriptor thing = openAnything(place);
       const Descriptor made = _made.take(path);
       if (!thing.isOpen()) return false;
-      if (!made.isOpen() || isSame(thing, made)) return giveAway(thing, *user, *groupNumber);
-      errno = ESTALE;
-      return false;
+      if (!made.isOpen() || isSame(thing, made)) return giveAway(thing, user.value(), groupNumber.value());
+      return refuse(ESTALE);
     });
   }
 
-  [[nodiscard]] std::optional<Path> temporaryName() override {
-    const std::unique_ptr<char, decltype(&std::free)> name{::tempnam(nullptr, nullptr), &std::free};
-    if (!name) return std::nullopt;
-    return Path{name.get()};
+  Result<Path> temporaryName() override {
+    constexpr int kAttempts = 1000;
+    const Path directory = temporaryDirectory();
+    for (int attempt = 0; attempt < kAttempts; ++attempt) {
+      Path name = directory / ("file" + randomLetters());
+      struct stat status {};
+      if (::lstat(name.c_str(), &status) == 0) continue;
+      return errno == ENOENT ? Result<Path>{std::move(name)} : failure("find a temporary name in", directory);
+    }
+    return Status::failure(EEXIST, "find a temporary name in " + directory.string());
   }
 
   Status rename(const Path& from, const Path& to) override {

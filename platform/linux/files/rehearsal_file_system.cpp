@@ -70,13 +70,13 @@ class RehearsalFileSystem final : public RehearsedFiles {
   RehearsalFileSystem(std::shared_ptr<FileSystem> inner, Path systemRoot)
       : _inner{std::move(inner)}, _accounts{std::move(systemRoot)} {}
 
-  [[nodiscard]] std::optional<FileKind> kindOf(const Path& path) override {
+  Result<FileKind> kindOf(const Path& path) override {
     const auto place = _overlay.placeOf(path);
-    if (!place) return std::nullopt;
+    if (!place) return failure("look at", path);
     const Path target = _overlay.followed(*place);
     const Overlay::Node* const node = _overlay.nodeAt(target);
     if (node == nullptr) return _inner->kindOf(target);
-    if (node->mode == 0) return std::nullopt;
+    if (node->mode == 0) return Status::failure(ENOENT, "look at " + path.string());
     return S_ISDIR(node->mode) ? FileKind::directory : FileKind::file;
   }
 
@@ -131,26 +131,25 @@ class RehearsalFileSystem final : public RehearsedFiles {
   }
 
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
-    const std::optional<uid_t> user = _accounts.user(std::string{owner});
-    const std::optional<gid_t> groupNumber = _accounts.group(std::string{group});
-    if (!user || !groupNumber) {
-      return Status::failure(ENOENT, "find the account " + std::string{user ? group : owner} + " for " + path.string());
-    }
+    const Result<uid_t> user = _accounts.user(std::string{owner});
+    if (!user.isOk()) return user.status();
+    const Result<gid_t> groupNumber = _accounts.group(std::string{group});
+    if (!groupNumber.isOk()) return groupNumber.status();
     const auto place = _overlay.placeOf(path);
-    if (place && isThere(*place) && isNobodyElses(*place) && mayGiveAway(*user, *groupNumber)) return {};
+    if (place && isThere(*place) && isNobodyElses(*place) && mayGiveAway(user.value(), groupNumber.value())) return {};
     return failure("set the owner of", path);
   }
 
-  [[nodiscard]] std::optional<Path> temporaryName() override {
+  Result<Path> temporaryName() override {
     const char* const chosen = ::secure_getenv("TMPDIR");
     const bool isUsable = chosen != nullptr && kindOf(chosen) == FileKind::directory;
     const Path directory = isUsable ? chosen : P_tmpdir;
     for (unsigned attempt = 0; attempt < 1'000'000; ++attempt) {
       const std::string number = std::to_string(++_temporaryNames);
       Path name = directory / ("file" + std::string(6 - std::min<std::size_t>(number.size(), 6), '0') + number);
-      if (!kindOf(name)) return name;
+      if (!kindOf(name).isOk()) return name;
     }
-    return std::nullopt;
+    return Status::failure(EEXIST, "find a temporary name in " + directory.string());
   }
 
   [[nodiscard]] std::optional<unsigned> permissionsAt(const Path& path) override {

@@ -17,7 +17,7 @@ bool isSet(const char* variable) {
 void keepTemporaryDirectoryOnDeviceVolume(const Platform& platform) {
   if (isSet("TMPDIR")) return;
   const Path directory = platform.directories->systemRoot() / "var/mobile/tmp";
-  if (!platform.files->kindOf(directory) && platform.files->createDirectories(directory, ownerOnly).isOk()) {
+  if (!platform.files->kindOf(directory).isOk() && platform.files->createDirectories(directory, ownerOnly).isOk()) {
     static_cast<void>(platform.files->setOwner(directory, "mobile", "mobile"));
   }
   ::setenv("TMPDIR", directory.c_str(), 1);

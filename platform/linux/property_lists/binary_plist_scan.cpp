@@ -55,6 +55,8 @@ class Scan {
   Scan(Bytes& file, const BinaryPlistLayout& layout)
       : _layout{layout}, _repair{file, layout}, _limits{file.size()}, _weights(layout.objectCount()) {}
 
+  // Why it ended where it failed.
+  [[nodiscard]] Cause refusal() const { return _refusal; }
   [[nodiscard]] bool hasRepaired() const { return _repair.hasRepaired(); }
 
   // Whether the file holds what the root reaches, as it would be written, and nothing else.
@@ -83,7 +85,8 @@ class Scan {
   };
 
   [[nodiscard]] bool visit(std::uint64_t index) {
-    if (index >= _weights.size() || _weights[index].state == Weight::State::open) return false;
+    if (index >= _weights.size()) return false;
+    if (_weights[index].state == Weight::State::open) return exceed();
     return _weights[index].state == Weight::State::known ? addToOpen(_weights[index]) : enter(index);
   }
 
@@ -106,9 +109,10 @@ class Scan {
   }
 
   [[nodiscard]] bool open(std::size_t index, Object container) {
-    if (_open.size() == kDeepestNesting) return false;
+    if (_open.size() == kDeepestNesting) return exceed();
     _references += referencesOf(container);
-    if (_references > _limits.nodes || !_repair.repairContainer(container)) return false;
+    if (_references > _limits.nodes) return exceed();
+    if (!_repair.repairContainer(container)) return false;
     const bool isArray = container.type == Type::array;
     Weight& weight = _weights[index];
     weight.bytes = isArray ? kArrayBytes : kDictionaryBytes + container.size * kEntryBytes;
@@ -136,8 +140,14 @@ class Scan {
     sum.bytes += child.bytes;
     sum.levels += child.levels + child.nodes;
     if (child.height >= sum.height) sum.height = static_cast<std::uint16_t>(child.height + 1);
-    return sum.nodes <= _limits.nodes && sum.bytes + _once <= _limits.bytes && sum.levels <= _limits.levels &&
-           _open.size() + child.height <= kDeepestNesting;
+    const bool isWithinLimits = sum.nodes <= _limits.nodes && sum.bytes + _once <= _limits.bytes &&
+                                sum.levels <= _limits.levels && _open.size() + child.height <= kDeepestNesting;
+    return isWithinLimits || exceed();
+  }
+
+  [[nodiscard]] bool exceed() {
+    _refusal = Cause::excessive;
+    return false;
   }
 
   const BinaryPlistLayout& _layout;
@@ -149,23 +159,24 @@ class Scan {
   std::uint64_t _once = 0;
   std::size_t _reached = 0;
   std::size_t _reachedBytes = 0;
+  Cause _refusal = Cause::malformed;
 };
 
 }  // namespace
 
 BinaryPlistFinding repairBinaryPlist(Bytes& file) {
   const auto layout = BinaryPlistLayout::of(file);
-  if (!layout) return BinaryPlistFinding::refused;
+  if (!layout) return {Cause::malformed};
   // One pass repairs a file whose objects lie apart; the next finds it sound. Where objects overlap, a repair may have
   // broken another one, and a few more passes settle it or nothing does.
   constexpr int kPasses = 4;
   for (int pass = 0; pass < kPasses; ++pass) {
     Scan scan{file, *layout};
-    if (!scan.run()) return BinaryPlistFinding::refused;
+    if (!scan.run()) return {scan.refusal()};
     if (scan.hasRepaired()) continue;
-    return pass == 0 && scan.isPlain() ? BinaryPlistFinding::plain : BinaryPlistFinding::readable;
+    return {.isPlain = pass == 0 && scan.isPlain()};
   }
-  return BinaryPlistFinding::refused;
+  return {Cause::malformed};
 }
 
 }  // namespace platform

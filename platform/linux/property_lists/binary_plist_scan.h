@@ -1,16 +1,16 @@
 #pragma once
 
-#include <cstdint>
-
 #include "platform/property_value.h"
+#include "platform/status.h"
 
 namespace platform {
 
-enum class BinaryPlistFinding : std::uint8_t {
-  refused,   // it lies about where things are, has a cycle, nests too deeply, or would unfold to more than its size
-             // allows
-  readable,  // now safe
-  plain      // as any writer could have made it: nothing was repaired, and the root reaches every byte of every object
+struct BinaryPlistFinding {
+  // none: it is now safe. malformed: it lies about where things are. excessive: it has a cycle, nests too deeply, or
+  // would unfold to more than its size allows.
+  Cause refusal = Cause::none;
+  // As any writer could have made it: nothing was repaired, and the root reaches every byte of every object.
+  bool isPlain = false;
 };
 
 // Makes a binary property list safe for libplist, which unfolds whatever is shared and recurses into whatever is

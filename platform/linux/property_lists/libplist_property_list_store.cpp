@@ -11,21 +11,22 @@ class LibplistPropertyListStore final : public PropertyListStore {
  public:
   explicit LibplistPropertyListStore(std::shared_ptr<FileSystem> files) : _files{std::move(files)} {}
 
-  [[nodiscard]] std::optional<Dictionary> readDictionary(const Path& path) override {
+  Result<Dictionary> readDictionary(const Path& path) override {
     Result<Bytes> read = _files->read(path, kLargestPropertyList);
-    if (!read.isOk()) return std::nullopt;
+    if (!read.isOk()) return read.status();
     Bytes bytes = read.take();
-    if (auto values = _known.valuesOf(bytes)) return values;
-    auto parsed = parsePropertyList(bytes);
-    if (!parsed) return std::nullopt;
-    _known.keep(std::make_shared<const Bytes>(std::move(bytes)), parsed->values, parsed->isFaithful);
-    return std::move(parsed->values);
+    if (auto values = _known.valuesOf(bytes)) return *std::move(values);
+    Result<ParsedPropertyList> list = parsePropertyList(bytes, "read " + path.string());
+    if (!list.isOk()) return list.status();
+    ParsedPropertyList parsed = list.take();
+    _known.keep(std::make_shared<const Bytes>(std::move(bytes)), parsed.values, parsed.isFaithful);
+    return std::move(parsed.values);
   }
 
-  [[nodiscard]] SerializedPropertyList serialize(const Dictionary& dictionary) override {
-    if (auto bytes = _known.bytesOf(dictionary)) return {std::move(bytes), {}};
-    SerializedPropertyList list = writePropertyList(dictionary);
-    if (list.data != nullptr) _known.keep(list.data, dictionary, true);
+  Result<std::shared_ptr<const Bytes>> serialize(const Dictionary& dictionary) override {
+    if (auto bytes = _known.bytesOf(dictionary)) return bytes;
+    Result<std::shared_ptr<const Bytes>> list = writePropertyList(dictionary);
+    if (list.isOk()) _known.keep(list.value(), dictionary, true);
     return list;
   }
 

@@ -30,7 +30,7 @@ namespace platform {
 // in memory (shared references), XML with thousands of keys made to collide or to repeat in one dictionary or with very
 // many entities in one text, files above 256 MiB (binary) or 16 MiB (XML).
 //
-// `serialize` answers an error for what such a reader would not give back: more than 256 nested containers, UIDs above
+// `serialize` fails for what such a reader would not give back: more than 256 nested containers, UIDs above
 // 32 bits, more than 8 million values or 256 MiB. Its time grows with the square of the number of values: unnoticeable
 // up to some 5,000 accounts of 20 properties, 1.5 seconds for 10,000.
 [[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<PropertyListStore> makeLibplistPropertyListStore(

@@ -140,8 +140,9 @@ class PlainNumbers {
 const char* charactersOf(const Bytes& bytes) { return reinterpret_cast<const char*>(bytes.data()); }
 
 struct Tree {
-  LibplistNode root;
-  bool isPlain = false;  // see BinaryPlistFinding
+  LibplistNode root = {};
+  bool isPlain = false;         // see BinaryPlistFinding
+  Cause refusal = Cause::none;  // why there is no root
 };
 
 LibplistNode treeOf(const Bytes& binary) {
@@ -152,31 +153,43 @@ LibplistNode treeOf(const Bytes& binary) {
 
 Tree parseBinary(Bytes& bytes) {
   const BinaryPlistFinding finding = repairBinaryPlist(bytes);
-  if (finding == BinaryPlistFinding::refused) return {};
-  return {treeOf(bytes), finding == BinaryPlistFinding::plain};
+  if (finding.refusal != Cause::none) return {.refusal = finding.refusal};
+  return {treeOf(bytes), finding.isPlain};
 }
 
 Tree parseXml(Bytes& bytes) {
-  if (bytes.size() > kLargestXmlPropertyList || !repairXmlPlist(bytes)) return {};
+  if (bytes.size() > kLargestXmlPropertyList) return {.refusal = Cause::excessive};
+  if (const Cause refusal = repairXmlPlist(bytes); refusal != Cause::none) return {.refusal = refusal};
   const PlainNumbers plainNumbers;
   plist_t root = nullptr;
   plist_from_xml(charactersOf(bytes), static_cast<std::uint32_t>(bytes.size()), &root);
   return {LibplistNode{root}};
 }
 
-// A tree whose root is a dictionary, or none.
+// A tree whose root is a dictionary, or the refusal.
 Tree parse(Bytes bytes) {
-  if (bytes.size() > kLargestPropertyList) return {};
+  if (bytes.size() > kLargestPropertyList) return {.refusal = Cause::excessive};
   const bool isBinary = std::string_view{charactersOf(bytes), bytes.size()}.starts_with("bplist");
   Tree tree = isBinary ? parseBinary(bytes) : parseXml(bytes);
-  return plist_get_node_type(tree.root.get()) == PLIST_DICT ? std::move(tree) : Tree{};
+  if (tree.refusal != Cause::none) return tree;
+  if (tree.root == nullptr) return {.refusal = Cause::malformed};
+  if (plist_get_node_type(tree.root.get()) != PLIST_DICT) return {.refusal = Cause::unsuitable};
+  return tree;
+}
+
+const char* reasonFor(Cause refusal) {
+  switch (refusal) {
+    case Cause::excessive: return "it is too large, or would take too much memory or time";
+    case Cause::unsuitable: return "its root is no dictionary";
+    default: return "it is no property list, or not a whole one";
+  }
 }
 
 }  // namespace
 
-std::optional<ParsedPropertyList> parsePropertyList(Bytes bytes) {
+Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt) {
   const Tree tree = parse(std::move(bytes));
-  if (tree.root == nullptr) return std::nullopt;
+  if (tree.refusal != Cause::none) return Status::failure(tree.refusal, std::move(attempt), reasonFor(tree.refusal));
   Conversion conversion;
   Dictionary values = conversion.dictionary(tree.root.get());
   return ParsedPropertyList{std::move(values), tree.isPlain && !conversion.hasFoundRepeatedKeys()};

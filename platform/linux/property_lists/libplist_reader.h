@@ -1,9 +1,10 @@
 #pragma once
 
 #include <cstddef>
-#include <optional>
+#include <string>
 
 #include "platform/property_value.h"
+#include "platform/status.h"
 
 namespace platform {
 
@@ -17,9 +18,10 @@ struct ParsedPropertyList {
   bool isFaithful = false;
 };
 
-// The root dictionary of a property list in either form; nothing where it is refused. The bytes are this function's
-// own: values that are merely malformed are repaired in them.
-[[nodiscard]] std::optional<ParsedPropertyList> parsePropertyList(Bytes bytes);
+// The root dictionary of a property list in either form; where it is refused, it is excessive, malformed or unsuitable
+// (see property_list_store.h), and `attempt` is what was tried. The bytes are this function's own: values that are
+// merely malformed are repaired in them.
+Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt);
 
 // Whether a binary property list that is safe for libplist holds exactly these values in their order.
 [[nodiscard]] bool readsBackAs(const Bytes& safe, const Dictionary& values);

@@ -15,6 +15,10 @@ namespace {
 constexpr std::size_t kMostValues = 8'000'000;
 constexpr std::uint64_t kLargestUid = std::numeric_limits<std::uint32_t>::max();
 
+Status failure(Cause cause, const char* reason) {
+  return Status::failure(cause, "serialize the property list", reason);
+}
+
 // Finds out, before anything is built, why a value cannot be written. Values may share their parts, so a small one may
 // unfold to more than there is memory: counting ends where the limit is reached.
 class Inspection {
@@ -27,16 +31,16 @@ class Inspection {
     }
   }
 
-  [[nodiscard]] const std::string& objection() const { return _objection; }
+  [[nodiscard]] const Status& objection() const { return _objection; }
 
  private:
   void inspect(const PropertyValue& value, std::size_t depth) {
-    if (!_objection.empty()) return;
+    if (!_objection.isOk()) return;
     add(0);
     if (const Text* const text = value.asText()) add(text->size());
     if (const Bytes* const data = value.asData()) add(data->size());
     if (const Uid* const uid = value.asUid(); uid != nullptr && uid->number > kLargestUid) {
-      _objection = "A UID is larger than 32 bits";
+      object(Cause::unsuitable, "A UID is larger than 32 bits");
     }
     if (const Dictionary* const dictionary = value.asDictionary()) inspect(*dictionary, depth + 1);
     if (const Array* const array = value.asArray(); array != nullptr && goesOn(depth + 1)) {
@@ -47,17 +51,20 @@ class Inspection {
   void add(std::size_t bytes) {
     ++_values;
     _bytes += bytes;
-    if (_values > kMostValues || _bytes > kLargestPropertyList) _objection = "The property list is too large";
+    if (_values > kMostValues || _bytes > kLargestPropertyList)
+      object(Cause::excessive, "The property list is too large");
   }
 
   bool goesOn(std::size_t depth) {
-    if (depth > kDeepestNesting) _objection = "The property list has more than 256 nested containers";
-    return _objection.empty();
+    if (depth > kDeepestNesting) object(Cause::excessive, "The property list has more than 256 nested containers");
+    return _objection.isOk();
   }
+
+  void object(Cause cause, const char* reason) { _objection = failure(cause, reason); }
 
   std::size_t _values = 0;
   std::size_t _bytes = 0;
-  std::string _objection;
+  Status _objection;
 };
 
 LibplistNode nodeOf(const PropertyValue& value);
@@ -109,23 +116,23 @@ Bytes binaryOf(plist_t tree) {
   return written == nullptr ? Bytes{} : Bytes{written, written + size};
 }
 
-SerializedPropertyList failure(std::string description) { return {nullptr, std::move(description)}; }
-
 }  // namespace
 
-SerializedPropertyList writePropertyList(const Dictionary& dictionary) {
+Result<std::shared_ptr<const Bytes>> writePropertyList(const Dictionary& dictionary) {
   Inspection inspection;
   inspection.inspect(dictionary);
-  if (!inspection.objection().empty()) return failure(inspection.objection());
+  if (!inspection.objection().isOk()) return inspection.objection();
   LibplistNode tree = nodeOf(dictionary);
   Bytes bytes = binaryOf(tree.get());
-  if (bytes.empty()) return failure("The property list could not be written");
+  if (bytes.empty()) return failure(Cause::other, "The property list could not be written");
   // Before the tree goes: a large block that is asked for when thousands of small ones have just been given back makes
   // the C library sort them all.
-  const bool isSafe = repairBinaryPlist(bytes) != BinaryPlistFinding::refused;
+  const bool isSafe = repairBinaryPlist(bytes).refusal == Cause::none;
   tree.reset();
-  if (!isSafe || !readsBackAs(bytes, dictionary)) return failure("What was written does not read back the same");
-  return {std::make_shared<const Bytes>(std::move(bytes)), {}};
+  if (!isSafe || !readsBackAs(bytes, dictionary)) {
+    return failure(Cause::other, "What was written does not read back the same");
+  }
+  return std::make_shared<const Bytes>(std::move(bytes));
 }
 
 }  // namespace platform

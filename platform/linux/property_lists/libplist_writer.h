@@ -5,6 +5,6 @@
 namespace platform {
 
 // The dictionary as a binary property list, read back and compared before it is answered.
-[[nodiscard]] SerializedPropertyList writePropertyList(const Dictionary& dictionary);
+Result<std::shared_ptr<const Bytes>> writePropertyList(const Dictionary& dictionary);
 
 }  // namespace platform

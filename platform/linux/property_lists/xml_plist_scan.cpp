@@ -24,6 +24,9 @@ class Scan {
  public:
   explicit Scan(std::span<char> file) : _file{file}, _text{file.data(), file.size()} {}
 
+  // Why it ended where it failed.
+  [[nodiscard]] Cause refusal() const { return _refusal; }
+
   [[nodiscard]] bool run() {
     while (!_isDone) {
       skipBlanks();
@@ -133,7 +136,7 @@ class Scan {
   [[nodiscard]] bool push(Open kind) {
     _open.push_back(kind);
     if (kind != Open::plist) _containers.push_back({kind == Open::dictionary});
-    return _containers.size() <= kDeepestNesting;
+    return _containers.size() <= kDeepestNesting || refuse(Cause::excessive);
   }
 
   [[nodiscard]] bool pop(Open kind) {
@@ -148,7 +151,8 @@ class Scan {
   [[nodiscard]] bool value(const Tag& tag) {
     const bool isContainer = tag.name == "dict" || tag.name == "array";
     const bool isRoot = _containers.empty();
-    if (isRoot && tag.name != "dict") return false;
+    if (isRoot && tag.name != "dict")
+      return refuse(isContainer || isScalar(tag.name) ? Cause::unsuitable : Cause::malformed);
     if (isRoot && tag.isEmpty) return keepEmptyRoot();
     if (tag.isEmpty) return isContainer || isScalar(tag.name);
     if (isContainer) return push(tag.name == "dict" ? Open::dictionary : Open::array);
@@ -217,7 +221,7 @@ class Scan {
       const std::span<char> text = _file.subspan(part.begin, part.end - part.begin);
       if (!part.isVerbatim) _movedBytes += repairXmlText(text) * text.size();
     }
-    return _movedBytes <= kMostMovedBytes;
+    return _movedBytes <= kMostMovedBytes || refuse(Cause::excessive);
   }
 
   [[nodiscard]] bool countKey(const Tag& tag) {
@@ -225,7 +229,7 @@ class Scan {
     const std::string_view key = _text.substr(_parts.front().begin, _parts.front().end - _parts.front().begin);
     const bool isPlain = _parts.size() == 1 && key.find('&') == std::string_view::npos;
     _keySteps += _containers.back().keys.add(key, isPlain);
-    return _keySteps <= kMostKeySteps;
+    return _keySteps <= kMostKeySteps || refuse(Cause::excessive);
   }
 
   // libplist takes of data no more than stands before the first comment.
@@ -234,6 +238,11 @@ class Scan {
       const std::span<char> between = _file.subspan(_parts[next - 1].end, _parts[next].begin - _parts[next - 1].end);
       if (std::string_view{between.data(), between.size()}.starts_with("<!--")) std::ranges::fill(between, ' ');
     }
+  }
+
+  [[nodiscard]] bool refuse(Cause cause) {
+    _refusal = cause;
+    return false;
   }
 
   std::span<char> _file;
@@ -245,17 +254,19 @@ class Scan {
   std::uint64_t _keySteps = 0;
   std::uint64_t _movedBytes = 0;
   bool _isDone = false;
+  Cause _refusal = Cause::malformed;
 };
 
 }  // namespace
 
-bool repairXmlPlist(Bytes& file) {
+Cause repairXmlPlist(Bytes& file) {
   const std::span<char> characters{reinterpret_cast<char*>(file.data()), file.size()};
   std::ranges::replace(characters, '\0', kNoUtf8);
   if (std::string_view{characters.data(), characters.size()}.starts_with(kByteOrderMark)) {
     std::ranges::fill(characters.first(kByteOrderMark.size()), ' ');
   }
-  return Scan{characters}.run();
+  Scan scan{characters};
+  return scan.run() ? Cause::none : scan.refusal();
 }
 
 }  // namespace platform

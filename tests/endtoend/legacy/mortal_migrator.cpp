@@ -29,9 +29,9 @@ class MortalFileSystem final : public platform::FileSystem {
   explicit MortalFileSystem(std::shared_ptr<platform::FileSystem> files)
       : _files{std::move(files)}, _log{environment("CHANGES")} {}
 
-  [[nodiscard]] std::optional<FileKind> kindOf(const Path& path) override { return _files->kindOf(path); }
+  platform::Result<FileKind> kindOf(const Path& path) override { return _files->kindOf(path); }
   Result<Bytes> read(const Path& path, std::size_t limit) override { return _files->read(path, limit); }
-  [[nodiscard]] std::optional<Path> temporaryName() override { return _files->temporaryName(); }
+  platform::Result<Path> temporaryName() override { return _files->temporaryName(); }
 
   Status create(const Path& path, std::span<const std::uint8_t> bytes) override {
     change("create", path);
@@ -79,7 +79,7 @@ std::unique_ptr<platform::DataClassMigrator> make() {
   platform::Platform services = platform::current();
   services.files = std::make_shared<MortalFileSystem>(services.files);
   platform::setCurrent(services);
-  if (services.modules->open(environment("REAL_PLUGIN"))) return nullptr;
+  if (!services.modules->open(environment("REAL_PLUGIN")).isOk()) return nullptr;
   const auto* const real = services.classes->classNamed("AccountsDataMigrator");
   return dynamic_cast<const platform::DataClassMigratorClass&>(*real).make();
 }

@@ -22,18 +22,19 @@ std::unique_ptr<icu::Calendar> prolepticCalendar(const icu::Locale& locale, UErr
   return calendar;
 }
 
-std::string localTime(std::int64_t millisecondsSince1970, std::string_view pattern) {
+std::optional<std::string> localTime(std::int64_t millisecondsSince1970, std::string_view pattern) {
   const icu::Locale locale{"en", "US", "POSIX"};
   UErrorCode error = U_ZERO_ERROR;
   auto calendar = prolepticCalendar(locale, error);
   icu::SimpleDateFormat format{unicode(pattern), locale, error};
-  if (U_FAILURE(error) != 0) return {};
+  if (U_FAILURE(error) != 0) return std::nullopt;
   format.adoptCalendar(calendar.release());
   icu::UnicodeString text;
   // A letter that stands for nothing shows only now.
   format.format(static_cast<UDate>(millisecondsSince1970), text, nullptr, error);
+  if (U_FAILURE(error) != 0) return std::nullopt;
   std::string utf8;
-  return U_SUCCESS(error) != 0 ? text.toUTF8String(utf8) : std::string{};
+  return text.toUTF8String(utf8);
 }
 
 std::string moreGeneral(const std::string& name) {
