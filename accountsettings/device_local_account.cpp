@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <array>
 
+#include "platform/characters.h"
 #include "platform/class_registry.h"
 #include "platform/platform.h"
 
@@ -40,21 +41,15 @@ std::string localized(std::string_view key) {
   return platform::current().strings->text(kTable, key).value_or(std::string{key});
 }
 
-std::string deviceClass() {
+Text deviceClass() {
   const std::optional<PropertyValue> answer = platform::current().deviceInfo->answer("DeviceClass");
   const Text* const text = answer ? answer->asText() : nullptr;
-  return text == nullptr ? std::string{kThisDevice.view()} : text->string();
-}
-
-// Device classes are ASCII; whatever else one holds stays as it is.
-char inKey(char character) {
-  if (character == ' ') return '_';
-  return character >= 'a' && character <= 'z' ? static_cast<char>(character - 'a' + 'A') : character;
+  return text == nullptr ? Text{kThisDevice} : *text;
 }
 
 std::string localizedForDeviceClass(std::string_view base) {
-  std::string suffix = deviceClass();
-  std::transform(suffix.begin(), suffix.end(), suffix.begin(), inKey);
+  std::string suffix = platform::upperCased(deviceClass());
+  std::ranges::replace(suffix, ' ', '_');
   return localized(std::string{base} + "_" + suffix);
 }
 

@@ -79,6 +79,22 @@ std::string madeSafe(std::string_view text, const ShownFor& shownFor) {
   return safe;
 }
 
+void append(std::string& text, Code code) {
+  std::array<utf8proc_uint8_t, 4> bytes{};
+  const auto size = ::utf8proc_encode_char(code, bytes.data());
+  text.append(bytes.begin(), bytes.begin() + size);
+}
+
+// Only folding takes apart a letter that has several capitals; each part of it has at most one.
+void appendUpperCased(std::string& text, Code code) {
+  std::array<Code, 4> folded{};
+  int ignored = 0;
+  const auto count = static_cast<std::size_t>(
+      ::utf8proc_decompose_char(code, folded.data(), folded.size(), UTF8PROC_CASEFOLD, &ignored));
+  if (count == 1 || ::utf8proc_isupper(code) != 0) return append(text, ::utf8proc_toupper(code));
+  for (std::size_t part = 0; part < count; ++part) append(text, ::utf8proc_toupper(folded.at(part)));
+}
+
 struct Freed {
   void operator()(utf8proc_uint8_t* bytes) const { std::free(bytes); }
 };
@@ -97,10 +113,11 @@ std::string upperCased(std::string_view text) {
   std::string upper;
   while (!text.empty()) {
     const Character next = takeFirst(text);
-    std::array<utf8proc_uint8_t, 4> bytes{};
-    const auto size =
-        next.code == kNoCharacter ? 0 : ::utf8proc_encode_char(::utf8proc_toupper(next.code), bytes.data());
-    upper += size > 0 ? std::string{bytes.begin(), bytes.begin() + size} : std::string{next.bytes};
+    if (next.code == kNoCharacter) {
+      upper += next.bytes;
+    } else {
+      appendUpperCased(upper, next.code);
+    }
   }
   return upper;
 }

@@ -32,6 +32,7 @@ namespace platform {
 //
 // Of every script, letter by letter, in no particular language; what is no well-formed UTF-8 stays as it is.
 
+// A letter whose capital is written as several ("ß") becomes those.
 [[nodiscard]] ACCOUNT_EXPORT std::string upperCased(std::string_view text);
 
 // The form in which texts are equal that differ by case alone, or by how a letter with marks is put together.

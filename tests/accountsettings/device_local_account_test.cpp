@@ -84,7 +84,8 @@ TEST_F(DeviceLocal, NamesItsTypeByTheDevicesClass) {
       {std::nullopt, "ON_MY_DEVICE_TYPE_FERROX"},
       {PropertyValue{5}, "ON_MY_DEVICE_TYPE_FERROX"},
       {PropertyValue{"Ferrox"}, "ON_MY_DEVICE_TYPE_FERROX"},
-      {PropertyValue{"Ferrox Tab 2"}, "ON_MY_DEVICE_TYPE_FERROX_TAB_2"}};
+      {PropertyValue{"Ferrox Tab 2"}, "ON_MY_DEVICE_TYPE_FERROX_TAB_2"},
+      {PropertyValue{"Ferrox für Straße"}, "ON_MY_DEVICE_TYPE_FERROX_FÜR_STRASSE"}};
   for (const auto& [answer, key] : table) {
     device.deviceInfo->answers.clear();
     if (answer) device.deviceInfo->answers.emplace("DeviceClass", *answer);

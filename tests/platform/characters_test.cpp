@@ -4,6 +4,7 @@
 
 #include <string>
 #include <string_view>
+#include <utility>
 
 namespace tests {
 namespace {
@@ -50,6 +51,18 @@ TEST(UpperCase, IsThatOfEveryScript) {
   EXPECT_EQ(platform::upperCased("0b6c-az"), "0B6C-AZ");
   EXPECT_EQ(platform::upperCased("öre ñ ÿ žβя"), "ÖRE Ñ Ÿ ŽΒЯ");
   EXPECT_EQ(platform::upperCased("日本 \U00010428"), "日本 \U00010400");
+}
+
+TEST(UpperCase, WritesALetterWithSeveralCapitalsAsThose) {
+  const std::pair<const char*, const char*> table[] = {{"straße", "STRASSE"},       {"ﬁn", "FIN"}, {"ŉ", "ʼN"},
+                                                       {"ΐ", "\u0399\u0308\u0301"}, {"և", "ԵՒ"},   {"ᾳ", "ΑΙ"}};
+  for (const auto& [text, upper] : table) EXPECT_EQ(platform::upperCased(text), upper);
+}
+
+TEST(UpperCase, LeavesCapitalsAsTheyAre) {
+  for (const char* const capitals : {"ÀŸ", "ẞ", "İ", "\u212A", "\u2126"}) {
+    EXPECT_EQ(platform::upperCased(capitals), capitals);
+  }
 }
 
 TEST(UpperCase, LeavesBytesThatAreNoCharacters) { EXPECT_EQ(platform::upperCased("a\xff\xc3z"sv), "A\xff\xc3Z"); }
