@@ -48,10 +48,36 @@ TEST(DeviceInfo, TakesAValueOfTheWrongKindForNoAnswer) {
   const RealDevice device;
   device.put(deviceInfo,
              "<key>CPUArchitecture</key><integer>6</integer><key>DeviceClass</key><array/>"
-             "<key>RegionalBehaviorGoogleMail</key><string>yes</string>");
+             "<key>RegionalBehaviorGoogleMail</key><array><true/></array>");
   EXPECT_EQ(device.services.deviceInfo->answer("CPUArchitecture"), PropertyValue{machine()});
   EXPECT_EQ(device.services.deviceInfo->answer("DeviceClass"), std::nullopt);
   EXPECT_EQ(device.services.deviceInfo->answer("RegionalBehaviorGoogleMail"), std::nullopt);
+}
+
+struct WrittenBoolean {
+  std::string element;
+  std::optional<bool> value;
+};
+
+// What a property list may hold where a boolean is asked for.
+const WrittenBoolean kWrittenBooleans[] = {{"<true/>", true},
+                                           {"<false/>", false},
+                                           {"<integer>1</integer>", true},
+                                           {"<integer>0</integer>", false},
+                                           {"<real>0.5</real>", true},
+                                           {"<string>YES</string>", true},
+                                           {"<string>1</string>", true},
+                                           {"<string>no</string>", false},
+                                           {"<data/>", std::nullopt},
+                                           {"<array><true/></array>", std::nullopt}};
+
+TEST(DeviceInfo, ReadsTheRegionalNameAsABooleanFromNumbersAndTextsToo) {
+  for (const auto& [element, value] : kWrittenBooleans) {
+    const RealDevice device;
+    device.put(deviceInfo, "<key>RegionalBehaviorGoogleMail</key>" + element);
+    const std::optional<PropertyValue> answer = device.services.deviceInfo->answer("RegionalBehaviorGoogleMail");
+    EXPECT_EQ(answer, value ? std::optional<PropertyValue>{*value} : std::nullopt) << element;
+  }
 }
 
 TEST(DeviceInfo, AnswersNoOtherQuestion) {
@@ -99,8 +125,17 @@ TEST(ProfileRestrictions, AllowDisallowOrLeaveOpenEachFeature) {
     EXPECT_EQ(restrictionOf(query, feature), Restriction::allowed) << name;
     device.put(restrictions, "<key>" + name + "</key><false/>");
     EXPECT_EQ(restrictionOf(query, feature), Restriction::notAllowed) << name;
-    device.put(restrictions, "<key>" + name + "</key><integer>1</integer>");
-    EXPECT_EQ(restrictionOf(query, feature), Restriction::notSet) << name;
+  }
+}
+
+TEST(ProfileRestrictions, AreReadAsBooleansFromNumbersAndTextsToo) {
+  for (const auto& [element, value] : kWrittenBooleans) {
+    const RealDevice device;
+    device.put(restrictions, "<key>MediaStream</key>" + element);
+    const Restriction set = value == true ? Restriction::allowed : Restriction::notAllowed;
+    EXPECT_EQ(restrictionOf(*device.services.restrictions, ManagedFeature::mediaStream),
+              value ? set : Restriction::notSet)
+        << element;
   }
 }
 

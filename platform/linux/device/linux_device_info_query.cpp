@@ -5,7 +5,7 @@
 namespace platform {
 namespace {
 
-constexpr std::string_view architectureKey = "CPUArchitecture";
+constexpr std::string_view kArchitectureKey = "CPUArchitecture";
 
 std::optional<PropertyValue> machineArchitecture() {
   utsname names{};
@@ -15,9 +15,20 @@ std::optional<PropertyValue> machineArchitecture() {
   return machine == "armv6l" ? "armv6" : machine;
 }
 
-bool isOfTheKeysKind(std::string_view key, const PropertyValue& value) {
-  if (key == architectureKey || key == "DeviceClass") return value.asText() != nullptr;
-  return key == "RegionalBehaviorGoogleMail" && value.asBoolean() != nullptr;
+std::optional<PropertyValue> textIn(const PropertyValue& value) {
+  return value.asText() == nullptr ? std::nullopt : std::optional{value};
+}
+
+std::optional<PropertyValue> booleanIn(const PropertyValue& value) {
+  const std::optional<bool> boolean = value.booleanValue();
+  return boolean ? std::optional<PropertyValue>{*boolean} : std::nullopt;
+}
+
+std::optional<PropertyValue> answerIn(const Dictionary& info, std::string_view key) {
+  const PropertyValue* const value = info.find(key);
+  if (value == nullptr) return std::nullopt;
+  if (key == "RegionalBehaviorGoogleMail") return booleanIn(*value);
+  return key == kArchitectureKey || key == "DeviceClass" ? textIn(*value) : std::nullopt;
 }
 
 class LinuxDeviceInfoQuery final : public DeviceInfoQuery {
@@ -26,9 +37,8 @@ class LinuxDeviceInfoQuery final : public DeviceInfoQuery {
 
   [[nodiscard]] std::optional<PropertyValue> answer(std::string_view key) const override {
     const Dictionary info = _configuration.ofSystem("device-info.plist").valueOr({});
-    const PropertyValue* const value = info.find(key);
-    if (value != nullptr && isOfTheKeysKind(key, *value)) return *value;
-    return key == architectureKey ? machineArchitecture() : std::nullopt;
+    std::optional<PropertyValue> answer = answerIn(info, key);
+    return !answer && key == kArchitectureKey ? machineArchitecture() : answer;
   }
 
  private:

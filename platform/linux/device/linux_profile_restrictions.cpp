@@ -19,8 +19,8 @@ std::string_view keyOf(ManagedFeature feature) {
 
 Restriction restrictionIn(const Dictionary& profiles, ManagedFeature feature) {
   const PropertyValue* const value = profiles.find(keyOf(feature));
-  const bool* const isAllowed = value == nullptr ? nullptr : value->asBoolean();
-  if (isAllowed == nullptr) return Restriction::notSet;
+  const std::optional<bool> isAllowed = value == nullptr ? std::nullopt : value->booleanValue();
+  if (!isAllowed) return Restriction::notSet;
   return *isAllowed ? Restriction::allowed : Restriction::notAllowed;
 }
 
