@@ -51,7 +51,9 @@ Accounts cloudAndHostedAccountsOf(const AccountsManager& store) {
 // --- The primary account ---
 
 void makePrimary(BasicAccount& account) {
-  account.setAccountProperty_forKey(true, platform::current().systemAccount->primaryAccountKey());
+  // A platform without a key of its own has that which the later steps read.
+  const Text key = platform::current().systemAccount->primaryAccountKey().value_or(kPrimaryAccountKey);
+  account.setAccountProperty_forKey(true, key);
   account.setEnabled_forDataclass(true, kAccountDataclassQuorvel);
   account.setEnabled_forDataclass(true, kAccountDataclassKeyValue);
 }

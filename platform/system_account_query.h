@@ -1,5 +1,7 @@
 #pragma once
 
+#include <optional>
+
 #include "platform/text.h"
 
 namespace platform {
@@ -10,7 +12,8 @@ class SystemAccountQuery {
  public:
   virtual ~SystemAccountQuery() = default;
   [[nodiscard]] virtual Text hostedServiceStatusKey() const = 0;
-  [[nodiscard]] virtual Text primaryAccountKey() const = 0;
+  // Nothing where the platform has no such key of its own.
+  [[nodiscard]] virtual std::optional<Text> primaryAccountKey() const = 0;
   [[nodiscard]] virtual Text systemAccountTypeString() const = 0;
 };
 

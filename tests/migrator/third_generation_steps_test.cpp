@@ -47,6 +47,21 @@ TEST_F(PrimaryAccount, StepTakesRemindersFromCloudAccountsWithoutAStatus) {
   EXPECT_THAT(storedDataclasses(0, "Enabled Dataclasses"), ElementsAre("Calendars"));
 }
 
+TEST_F(PrimaryAccount, IsMarkedUnderTheKeyThatThePlatformNames) {
+  device.systemAccount->primaryKey = "isPrimary";
+  load({account("VorlixAccount", "VorlixAccount", "V", {{kStatus, 2}})});
+  migrate();
+  EXPECT_EQ(value(0, "isPrimary"), PropertyValue{true});
+  EXPECT_EQ(value(0, "primaryAccount"), kAbsent);
+}
+
+TEST_F(PrimaryAccount, IsMarkedUnderTheKeyOfTheLaterStepsWhereThePlatformNamesNone) {
+  device.systemAccount->primaryKey = std::nullopt;
+  load({account("VorlixAccount", "VorlixAccount", "V", {{kStatus, 2}})});
+  migrate();
+  EXPECT_EQ(value(0, "primaryAccount"), PropertyValue{true});
+}
+
 TEST_F(PrimaryAccount, HasNoChildren) {
   const Array children{account("Nimbra", "NimbraAccount", "1"), account("CalDAV", "MobileCalDAVAccount", "2")};
   const Dictionary parent = cloud("K", {{kStatus, 2},

@@ -247,7 +247,7 @@ TEST(ExternalSources, OfATestAreWhatTheTestSays) {
 
 void expectNames(const platform::SystemAccountQuery& query) {
   EXPECT_EQ(query.hostedServiceStatusKey().view(), "hostedServiceStatus");
-  EXPECT_EQ(query.primaryAccountKey().view(), "primaryAccount");
+  EXPECT_EQ(query.primaryAccountKey(), Text{"primaryAccount"});
   EXPECT_EQ(query.systemAccountTypeString().view(), "Cirrant");
 }
 

@@ -173,7 +173,7 @@ FakeDevice::FakeDevice() {
   services.restrictions = restrictions;
   services.tetheredSync = tetheredSync;
   services.externalSources = externalSources;
-  services.systemAccount = std::make_shared<FakeSystemAccountQuery>();
+  services.systemAccount = systemAccount;
   services.modules = modules;
   services.classes = platform::makeProcessClassRegistry();
   services.strings = strings;

@@ -161,8 +161,10 @@ class FakeExternalSourcesQuery final : public platform::ExternalSourcesQuery {
 
 class FakeSystemAccountQuery final : public platform::SystemAccountQuery {
  public:
+  std::optional<Text> primaryKey = "primaryAccount";
+
   [[nodiscard]] Text hostedServiceStatusKey() const override { return "hostedServiceStatus"; }
-  [[nodiscard]] Text primaryAccountKey() const override { return "primaryAccount"; }
+  [[nodiscard]] std::optional<Text> primaryAccountKey() const override { return primaryKey; }
   [[nodiscard]] Text systemAccountTypeString() const override { return "Cirrant"; }
 };
 
@@ -214,6 +216,7 @@ class FakeDevice {
   std::shared_ptr<FakeProfileRestrictions> restrictions = std::make_shared<FakeProfileRestrictions>();
   std::shared_ptr<FakeTetheredSyncQuery> tetheredSync = std::make_shared<FakeTetheredSyncQuery>();
   std::shared_ptr<FakeExternalSourcesQuery> externalSources = std::make_shared<FakeExternalSourcesQuery>();
+  std::shared_ptr<FakeSystemAccountQuery> systemAccount = std::make_shared<FakeSystemAccountQuery>();
   std::shared_ptr<FakeModuleLoader> modules = std::make_shared<FakeModuleLoader>();
   std::shared_ptr<FakeLocalizedStrings> strings = std::make_shared<FakeLocalizedStrings>();
   std::shared_ptr<FakeUniqueIdentifiers> identifiers = std::make_shared<FakeUniqueIdentifiers>();

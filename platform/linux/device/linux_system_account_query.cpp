@@ -6,7 +6,9 @@ namespace {
 class LinuxSystemAccountQuery final : public SystemAccountQuery {
  public:
   [[nodiscard]] Text hostedServiceStatusKey() const override { return StringConstant{"hostedServiceStatus"}; }
-  [[nodiscard]] Text primaryAccountKey() const override { return StringConstant{"primaryAccount"}; }
+  [[nodiscard]] std::optional<Text> primaryAccountKey() const override {
+    return Text{StringConstant{"primaryAccount"}};
+  }
   [[nodiscard]] Text systemAccountTypeString() const override { return StringConstant{"Cirrant"}; }
 };
 
