@@ -36,7 +36,7 @@ class LinuxBaseDirectories final : public BaseDirectories {
  public:
   explicit LinuxBaseDirectories(const LinuxPlatformOptions& options)
       : _root{wholePath(options.systemRoot.value_or("/"))},
-        _home{options.home ? wholePath(*options.home) : homeUnder(_root)},
+        _home{homeFor(options, _root)},
         _sharedResources{options.sharedResources ? wholePath(*options.sharedResources) : _root / "var/mobile"},
         _resources{options.resources ? wholePath(*options.resources) : besideThisLibrary()} {}
 
@@ -47,7 +47,10 @@ class LinuxBaseDirectories final : public BaseDirectories {
   [[nodiscard]] path resources() const override { return _resources; }
 
  private:
-  static path homeUnder(const path& root) { return root == "/" ? homeOfProcess() : root / "var/mobile"; }
+  static path homeFor(const LinuxPlatformOptions& options, const path& root) {
+    if (options.home) return wholePath(*options.home);
+    return options.systemRoot ? root / "var/mobile" : homeOfProcess();
+  }
 
   path _root;
   path _home;

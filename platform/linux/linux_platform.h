@@ -11,7 +11,7 @@ namespace platform {
 // Where the device's files lie; what is not set is as on the device itself.
 struct LinuxPlatformOptions {
   std::optional<std::filesystem::path> systemRoot = std::nullopt;  // default "/"
-  // Default: the process's home directory; under another root, ROOT/var/mobile.
+  // Default: ROOT/var/mobile where a root is set, be it "/"; else the process's home directory.
   std::optional<std::filesystem::path> home = std::nullopt;
   std::optional<std::filesystem::path> sharedResources = std::nullopt;  // default ROOT/var/mobile
   std::optional<std::filesystem::path> resources = std::nullopt;        // default: those installed beside this library

@@ -33,6 +33,15 @@ TEST(BaseDirectories, UnderAnotherRootLieBelowIt) {
   EXPECT_EQ(device->mailData(), "/mnt/device/var/mobile/Library/Mail");
 }
 
+TEST(BaseDirectories, UnderTheRootItselfGivenInWordsLieAsBelowEveryOther) {
+  ::setenv("HOME", "/home/somebody", 1);
+  const auto device = directories({.systemRoot = "/"});
+  EXPECT_EQ(device->systemRoot(), "/");
+  EXPECT_EQ(device->home(), "/var/mobile");
+  EXPECT_EQ(device->sharedResources(), "/var/mobile");
+  EXPECT_EQ(device->mailData(), "/var/mobile/Library/Mail");
+}
+
 TEST(BaseDirectories, CanBeSetEachByItself) {
   const auto device = directories({.systemRoot = "/mnt", .home = "/h", .sharedResources = "/s", .resources = "/r"});
   EXPECT_EQ(device->home(), "/h");
