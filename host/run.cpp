@@ -88,8 +88,8 @@ ExitStatus run(const Options& options) {
   const Watchers watchers = watchersFor(options);
   platform::setCurrent(platformFor(options, watchers));
   if (isForSnapshots(options.snapshots)) return workOnSnapshots(options.snapshots);
+  const auto migrator = load(options);  // first, so that nothing is touched where there is none
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
-  const auto migrator = load(options);
   if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");
   const bool success = perform(*migrator, options.snapshots, watchers);
   explain(options, watchers,
