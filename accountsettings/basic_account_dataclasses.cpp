@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <array>
+#include <cmath>
 #include <unordered_set>
 
 #include "accountsettings/basic_account.h"
@@ -12,20 +13,52 @@ namespace {
 using Dataclasses = BasicAccount::Dataclasses;
 using platform::ManagedFeature;
 
-Dataclasses intersection(Dataclasses list, const Dataclasses& other) {
-  std::erase_if(list, [&other](const Text& dataclass) { return !containsText(other, dataclass); });
-  return list;
+// What both lists hold, each once however often it stands there, in the order of the first.
+Dataclasses intersection(const Dataclasses& list, const Dataclasses& other) {
+  Dataclasses common;
+  common.reserve(list.size());
+  for (const Text& dataclass : list) {
+    if (containsText(other, dataclass) && !containsText(common, dataclass)) common.push_back(dataclass);
+  }
+  return common;
 }
 
-// The elements of a stored list as a set, in the order in which they stand; what is no text is kept as it is.
+std::size_t hashOfNumber(double number) { return std::isnan(number) ? 0 : std::hash<double>{}(number); }
+
+// Equal values have one hash, so that of a dictionary does not depend on its order.
+std::size_t hashOf(const PropertyValue& value) {
+  std::size_t hash = static_cast<std::size_t>(value.kind());
+  if (const Text* const text = value.asText()) return std::hash<std::string_view>{}(text->view());
+  if (const auto integer = value.asInteger()) return integer->bits;
+  if (const double* const real = value.asReal()) return hashOfNumber(*real);
+  if (const platform::Date* const date = value.asDate()) return hashOfNumber(date->secondsSince2001);
+  if (const platform::Uid* const uid = value.asUid()) return uid->number;
+  if (const platform::Bytes* const data = value.asData()) {
+    for (const std::uint8_t byte : *data) hash = 31 * hash + byte;
+  } else if (const Array* const array = value.asArray()) {
+    for (const PropertyValue& element : *array) hash = 31 * hash + hashOf(element);
+  } else if (const Dictionary* const dictionary = value.asDictionary()) {
+    for (const auto& [key, held] : *dictionary) hash += 31 * std::hash<std::string_view>{}(key.view()) + hashOf(held);
+  }
+  return hash;
+}
+
+struct HashOfElement {
+  std::size_t operator()(const PropertyValue* element) const { return hashOf(*element); }
+};
+
+struct AreEqualElements {
+  bool operator()(const PropertyValue* left, const PropertyValue* right) const { return *left == *right; }
+};
+
+// The elements of a stored list as a set: each once, of whatever kind, in the order in which they first stand.
 Array setOfElements(const Array* stored) {
   if (stored == nullptr) return {};
-  std::unordered_set<std::string_view> seen;
+  std::unordered_set<const PropertyValue*, HashOfElement, AreEqualElements> seen;
   Array elements;
   elements.reserve(stored->size() + 1);
-  std::copy_if(stored->begin(), stored->end(), std::back_inserter(elements), [&seen](const PropertyValue& element) {
-    return element.asText() == nullptr || seen.insert(element.asText()->view()).second;
-  });
+  std::ranges::copy_if(*stored, std::back_inserter(elements),
+                       [&seen](const PropertyValue& element) { return seen.insert(&element).second; });
   return elements;
 }
 
@@ -78,7 +111,7 @@ Dataclasses grantedDataclasses(const BasicAccount& account) {
   const Dataclasses& supported = account.supportedDataclasses();
   const std::optional<PropertyValue> stored = account.accountPropertyForKey(kAccountProvisionedDataclasses);
   const Array* const list = stored ? stored->asArray() : nullptr;
-  return list == nullptr ? supported : intersection(textsIn(*list), supported);
+  return intersection(list == nullptr ? supported : textsIn(*list), supported);
 }
 
 }  // namespace

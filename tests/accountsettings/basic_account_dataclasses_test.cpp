@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <cmath>
+
 #include "accountsettings/basic_account.h"
 #include "tests/support/account_configuration.h"
 
@@ -184,12 +186,50 @@ TEST_F(RecordDataclasses, SwitchingOneCollapsesRepeatedOthers) {
 }
 
 TEST_F(RecordDataclasses, SwitchingOneKeepsWhatIsNoDataclass) {
-  const Array odd{5, "X", Array{"nested"}, 5};
+  const Array odd{5, "X", Array{"nested"}};
   const auto account = make("Exchange", {{"Enabled Dataclasses", odd}});
   account->setEnabled_forDataclass(true, kMail);
-  EXPECT_EQ(storedIn(*account), (Array{5, "X", Array{"nested"}, 5, kMail}));
+  EXPECT_EQ(storedIn(*account), (Array{5, "X", Array{"nested"}, kMail}));
   account->setEnabled_forDataclass(false, kMail);
   EXPECT_EQ(storedIn(*account), odd);
+}
+
+TEST_F(RecordDataclasses, SwitchingOneCollapsesRepeatedOthersOfEveryKind) {
+  const PropertyValue table[] = {5,
+                                 5.5,
+                                 std::nan(""),
+                                 true,
+                                 platform::Date{1},
+                                 platform::Uid{1},
+                                 platform::Bytes{1, 2},
+                                 Array{"nested", 5},
+                                 Dictionary{{"a", 1}, {"b", 2}}};
+  for (const PropertyValue& each : table) {
+    const auto account = make("Exchange", {{"Enabled Dataclasses", Array{each, kNotes, each}}});
+    account->setEnabled_forDataclass(true, kMail);
+    EXPECT_EQ(storedIn(*account), (Array{each, kNotes, kMail}));
+  }
+}
+
+TEST_F(RecordDataclasses, SwitchingOneTellsEqualValuesFromThoseOfAnotherKind) {
+  const Array alike{1, 1.0, true, "1", 0.0, -0.0, Dictionary{{"a", 1}, {"b", 2}}};
+  Array repeated = alike;
+  repeated.emplace_back(Dictionary{{"b", 2}, {"a", 1}});
+  const auto account = make("Exchange", {{"Enabled Dataclasses", repeated}});
+  account->setEnabled_forDataclass(false, kMail);
+  EXPECT_EQ(storedIn(*account), alike);
+}
+
+TEST_F(RecordDataclasses, AnUnknownOneIsProvisionedAndEnabledOnceHoweverOftenItIsListed) {
+  Dictionary types = tests::accountTypesProperties();
+  types.set("Odd", Dictionary{{"Supported Dataclasses", Array{"X", "Y", "X"}}});  // kept, since none of it is known
+  device.put("/resources/AccountTypesProperties.plist", types);
+  EXPECT_EQ(make("Odd")->supportedDataclasses(), (Dataclasses{"X", "Y", "X"}));
+  EXPECT_EQ(make("Odd")->provisionedDataclasses(), (Dataclasses{"X", "Y"}));
+  const auto account =
+      make("Odd", {{"Provisioned Dataclasses", Array{"Y", "X", "Y"}}, {"Enabled Dataclasses", Array{"X", "X", "Z"}}});
+  EXPECT_EQ(account->provisionedDataclasses(), (Dataclasses{"Y", "X"}));
+  EXPECT_EQ(account->enabledDataclasses(), Dataclasses{"X"});
 }
 
 TEST_F(RecordDataclasses, SwitchingOneOffWhereNothingIsStoredStoresAnEmptyList) {
