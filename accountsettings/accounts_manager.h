@@ -156,7 +156,7 @@ class ACCOUNT_EXPORT AccountsManager {
   void _loadAccounts(const Array& accounts);
   [[nodiscard]] static Account _accountFromElement(const PropertyValue& element);
   void _registerAccount(const Account& account);
-  void _loadChild(const PropertyValue& properties, const Account& parent, const Text& parentIdentifier);
+  void _loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
 
   // Saving. Fixing, like offering, answers whether a fixer had something to do.
   [[nodiscard]] platform::Status _writeFile() const;

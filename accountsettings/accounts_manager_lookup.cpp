@@ -134,15 +134,15 @@ std::optional<std::string> AccountsManager::displayNameForGroupOfAccountType_for
 
 void AccountsManager::_loadChildrenFromAccount(const Account& account) {
   const std::optional<Text> identifier = account->identifier();
-  if (!identifier) return;  // an account that cannot be found has no children to be found through it
-  _removeChildrenForAccountWithIdentifier(*identifier);
+  if (identifier) _removeChildrenForAccountWithIdentifier(*identifier);
   const std::optional<PropertyValue> property = account->accountPropertyForKey(kAccountChildAccounts);
   const Array* const children = property ? property->asArray() : nullptr;
   if (children == nullptr) return;
-  for (const PropertyValue& properties : *children) _loadChild(properties, account, *identifier);
+  for (const PropertyValue& properties : *children) _loadChild(properties, account, identifier);
 }
 
-void AccountsManager::_loadChild(const PropertyValue& properties, const Account& parent, const Text& parentIdentifier) {
+void AccountsManager::_loadChild(const PropertyValue& properties, const Account& parent,
+                                 const std::optional<Text>& parentIdentifier) {
   const Account child = _accountFromElement(properties);
   if (child != nullptr) child->setParentAccount(parent);
   const std::optional<Text> identifier = child == nullptr ? std::nullopt : child->identifier();
@@ -152,11 +152,16 @@ void AccountsManager::_loadChild(const PropertyValue& properties, const Account&
     return;
   }
   _childAccountsByID.set(*identifier, child);
-  _childAccountIDToParentAccountID.set(*identifier, parentIdentifier);
-  if (std::vector<Text>* const indexed = _childIdentifiersByParentID.find(parentIdentifier)) {
+  // The child of a parent that has lost its identifier is indexed like any other, but leads to no account.
+  if (!parentIdentifier) {
+    _childAccountIDToParentAccountID.remove(*identifier);
+    return;
+  }
+  _childAccountIDToParentAccountID.set(*identifier, *parentIdentifier);
+  if (std::vector<Text>* const indexed = _childIdentifiersByParentID.find(*parentIdentifier)) {
     indexed->push_back(*identifier);
   } else {
-    _childIdentifiersByParentID.set(parentIdentifier, {*identifier});
+    _childIdentifiersByParentID.set(*parentIdentifier, {*identifier});
   }
 }
 

@@ -80,6 +80,37 @@ TEST_F(LookingUpAccounts, IndexesAChildForWhichNoIdentifierCanBeMadeUnderTheOneI
   EXPECT_TRUE(store->allBasicSyncableAccounts().empty());
 }
 
+TEST_F(LookingUpAccounts, IndexesTheChildrenOfAnAccountThatHasLostItsIdentifier) {
+  const Store store = load({parent("p", {})});
+  const Account nameless = store->allBasicAccounts()[0];
+  nameless->removeAccountPropertyForKey("Identifier");
+  store->addChild_toAccount(account("c"), nameless);
+  const Accounts all = store->allBasicSyncableAccounts();
+  EXPECT_EQ(identifiersOf(all), (Lines{"(none)", "c"}));
+  EXPECT_EQ(all[1]->parentAccount(), nameless);
+  EXPECT_EQ(store->accountWithIdentifier("c"), nullptr);
+}
+
+TEST_F(LookingUpAccounts, SaysWhichChildrenItIgnoresOfAnAccountThatHasLostItsIdentifier) {
+  const Store store = load({parent("p", {})});
+  const Account nameless = store->allBasicAccounts()[0];
+  nameless->removeAccountPropertyForKey("Identifier");
+  nameless->setAccountProperty_forKey(Array{"no dictionary"}, "ChildAccounts");
+  store->_loadChildrenFromAccount(nameless);
+  EXPECT_EQ(messagesOf("-[AccountsManager _loadChildrenFromAccount:]"),
+            Lines{"Ignoring unknown child account with properties no dictionary"});
+}
+
+TEST_F(LookingUpAccounts, TakesAChildFromTheParentThatItHadWhereTheLaterOneHasNoIdentifier) {
+  const Store store = load({parent("p", {properties("c")}), parent("q", {})});
+  const Account nameless = store->allBasicAccounts()[1];
+  nameless->removeAccountPropertyForKey("Identifier");
+  store->addChild_toAccount(account("c"), nameless);
+  EXPECT_EQ(store->accountWithIdentifier("c"), nullptr);
+  store->deleteAccountWithIdentifier("p");
+  EXPECT_EQ(identifiersOf(store->allBasicSyncableAccounts()), (Lines{"(none)", "c"}));
+}
+
 TEST_F(LookingUpAccounts, TakesChildrenThatAreNoArrayForNone) {
   EXPECT_EQ(load({properties("p", {{"ChildAccounts", "text"}})})->allBasicSyncableAccounts().size(), 1U);
 }
