@@ -136,8 +136,8 @@ class ACCOUNT_EXPORT AccountsManager {
   static void accountDidChange_forDataclass(const BasicAccount& account, std::string_view dataclass);
   // Internal.
   using NotificationTable = platform::InsertionOrderedMap<std::vector<Dictionary>>;
-  [[nodiscard]] static std::vector<std::string> _notifierClassNamesForAccountType_dataclass(std::string_view type,
-                                                                                            std::string_view dataclass);
+  [[nodiscard]] static std::vector<std::string> _notifierClassNamesForAccountType_dataclass(
+      std::optional<std::string_view> type, std::string_view dataclass);
   void _addNotificationToDictionary_forChangeType_originalProperties_currentProperties(NotificationTable& table,
                                                                                        ChangeType change,
                                                                                        const Dictionary* original,

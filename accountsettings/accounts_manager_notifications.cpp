@@ -32,7 +32,7 @@ const Dictionary* notifierDescription(const PropertyValue& entry, std::string_vi
   return dataclasses != nullptr && containsText(textsIn(*dataclasses), dataclass) ? description : nullptr;
 }
 
-void openNotifierModule(const Dictionary& description, std::string_view accountType) {
+void openNotifierModule(const Dictionary& description, std::optional<std::string_view> accountType) {
   const Text* const framework = description.text("Framework");
   if (framework == nullptr) {
     fail(kFind,
@@ -46,7 +46,7 @@ void openNotifierModule(const Dictionary& description, std::string_view accountT
   }
 }
 
-std::string notifierClassName(const Dictionary& description, std::string_view accountType) {
+std::string notifierClassName(const Dictionary& description, std::optional<std::string_view> accountType) {
   const Text* const name = description.text("Class");
   if (name == nullptr || name->empty()) {
     fail(kFind,
@@ -57,22 +57,22 @@ std::string notifierClassName(const Dictionary& description, std::string_view ac
   return name->string();
 }
 
-// A class that is no module's account class counts as none.
-const AccountClassInfo& notifierClass(std::string_view method, std::string_view name) {
-  const auto* const info = dynamic_cast<const AccountClassInfo*>(platform::current().classes->classNamed(name));
-  if (info == nullptr) fail(method, "Could not find a class for class name %@", name);
-  return *info;
+// Null for a class of another kind, which answers no operation of a notifier.
+const AccountClassInfo* notifierClass(std::string_view method, std::string_view name) {
+  const platform::ClassInfo* const found = platform::current().classes->classNamed(name);
+  if (found == nullptr) fail(method, "Could not find a class for class name %@", name);
+  return dynamic_cast<const AccountClassInfo*>(found);
 }
 
 // --- Single changes ---
 
 void tellOfSingleChange(std::string_view method, const SingleChange AccountClassInfo::*operation,
                         const BasicAccount& account, std::string_view dataclass) {
-  const Text type = account.type().value_or(Text{});
+  const std::optional<Text> type = account.type();
   const Text identifier = account.identifier().value_or(Text{});
   for (const std::string& name : AccountsManager::_notifierClassNamesForAccountType_dataclass(type, dataclass)) {
-    const SingleChange& tell = notifierClass(method, name).*operation;
-    if (tell) tell(identifier, dataclass);
+    const AccountClassInfo* const notifier = notifierClass(method, name);
+    if (notifier != nullptr && notifier->*operation) (notifier->*operation)(identifier, dataclass);
   }
 }
 
@@ -121,21 +121,20 @@ const PropertyValue* currentElseOriginal(const Dictionary* current, const Dictio
   return value != nullptr || original == nullptr ? value : original->find(key);
 }
 
-Text typeOf(const Dictionary* original, const Dictionary* current) {
+const Text* typeOf(const Dictionary* original, const Dictionary* current) {
   const PropertyValue* const type = currentElseOriginal(current, original, kAccountType);
-  const Text* const text = type == nullptr ? nullptr : type->asText();
-  return text == nullptr ? Text{} : *text;
+  return type == nullptr ? nullptr : type->asText();
 }
 
 // The entry ends at the first value that is missing: one without an identifier tells only of the kind of change.
 Dictionary changeEntry(ChangeType change, const Dictionary* original, const Dictionary* current) {
   Dictionary entry{{kASChangeAccountChangeTypeKey, static_cast<std::int32_t>(change)}};
-  const PropertyValue* const identifier = currentElseOriginal(current, original, kAccountIdentifier);
-  if (identifier == nullptr) return entry;
-  entry.set(kASChangeAccountIdentifierKey, *identifier);
-  const PropertyValue* const type = currentElseOriginal(current, original, kAccountType);
-  if (type == nullptr) return entry;
-  entry.set(kASChangeAccountTypeKey, *type);
+  for (const auto& [key, property] : {std::pair{kASChangeAccountIdentifierKey, kAccountIdentifier},
+                                      std::pair{kASChangeAccountTypeKey, kAccountType}}) {
+    const PropertyValue* const value = currentElseOriginal(current, original, property);
+    if (value == nullptr) return entry;
+    entry.set(key, *value);
+  }
   const Array* const enabled = enabledIn(original);
   entry.set(kASChangeAccountOriginallyEnabledDataclassesKey, enabled == nullptr ? Array{} : *enabled);
   return entry;
@@ -143,10 +142,10 @@ Dictionary changeEntry(ChangeType change, const Dictionary* original, const Dict
 
 }  // namespace
 
-std::vector<std::string> AccountsManager::_notifierClassNamesForAccountType_dataclass(std::string_view type,
-                                                                                      std::string_view dataclass) {
+std::vector<std::string> AccountsManager::_notifierClassNamesForAccountType_dataclass(
+    std::optional<std::string_view> type, std::string_view dataclass) {
   const Dictionary* const table = BasicAccount::_accountCreationMap();
-  const Array* const entries = table == nullptr ? nullptr : table->array(type);
+  const Array* const entries = table == nullptr || !type ? nullptr : table->array(*type);
   if (entries == nullptr) {
     fail(kFind, "Malformed AccountCreators information. Could not find the information for the type %@", type);
   }
@@ -172,9 +171,12 @@ void AccountsManager::accountDidChange_forDataclass(const BasicAccount& account,
 
 void AccountsManager::_addNotificationToDictionary_forChangeType_originalProperties_currentProperties(
     NotificationTable& table, ChangeType change, const Dictionary* original, const Dictionary* current) const {
+  // Nobody listens for an account that has no type; the file is written, so that is no failure any more.
+  const Text* const type = typeOf(original, current);
+  if (type == nullptr) return;
   std::vector<std::string> names;
   for (const Text& dataclass : dataclassesConcerned(change, original, current)) {
-    for (std::string& name : _notifierClassNamesForAccountType_dataclass(typeOf(original, current), dataclass)) {
+    for (std::string& name : _notifierClassNamesForAccountType_dataclass(*type, dataclass)) {
       if (std::ranges::find(names, name) == names.end()) names.push_back(std::move(name));
     }
   }
@@ -187,9 +189,11 @@ void AccountsManager::_addNotificationToDictionary_forChangeType_originalPropert
 void AccountsManager::_sendNotificationsForChangedAccounts() {
   static constexpr std::string_view kMethod = "-[AccountsManager _sendNotificationsForChangedAccounts]";
   for (const auto& [name, changes] : _notificationTable()) {
-    const AccountClassInfo& notifier = notifierClass(kMethod, name);
-    if (!notifier.noteAccountChanges) fail(kMethod, "The notifier %@ does not answer noteAccountChanges:", name);
-    notifier.noteAccountChanges(changes);
+    const AccountClassInfo* const notifier = notifierClass(kMethod, name);
+    if (notifier == nullptr || !notifier->noteAccountChanges) {
+      fail(kMethod, "The notifier %@ does not answer noteAccountChanges:", name);
+    }
+    notifier->noteAccountChanges(changes);
   }
 }
 

@@ -117,12 +117,14 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
   [[nodiscard]] static const Dictionary* _accountCreationMap();
 
   // Full and sync accounts, made by classes of loadable modules (see account_objects.h). The full account is made once
-  // and kept; whatever hinders it throws AssertionFailure. A sync account that cannot be made is logged and null.
+  // and kept; whatever hinders it throws AssertionFailure. A sync account that cannot be made is logged and null. An
+  // absent type, which a record may come to have, is known to no configuration.
   [[nodiscard]] std::optional<std::string> _creatorClassNameForAccountType_creatorType_loader(
-      std::string_view type, std::string_view creatorType, const AccountClassInfo* loader) const;
+      std::optional<std::string_view> type, std::string_view creatorType, const AccountClassInfo* loader) const;
   [[nodiscard]] std::optional<std::string> fullAccountCreatorClassNameForAccountType_loader(
-      std::string_view type, const AccountClassInfo* loader) const;
-  [[nodiscard]] std::optional<std::string> syncAccountCreatorClassNameForAccountType(std::string_view type) const;
+      std::optional<std::string_view> type, const AccountClassInfo* loader) const;
+  [[nodiscard]] std::optional<std::string> syncAccountCreatorClassNameForAccountType(
+      std::optional<std::string_view> type) const;
   std::shared_ptr<FullAccountObject> fullAccountUsingLoader(const AccountClassInfo* loader);
   void setFullAccount(std::shared_ptr<FullAccountObject> account);
   std::shared_ptr<SyncAccountObject> _cachedSyncAccount();

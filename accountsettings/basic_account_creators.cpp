@@ -15,7 +15,7 @@ constexpr int kCredentialsNotRenewed = 3;
 
 // What is looked for: the creator of one kind for one account type.
 struct Search {
-  std::string_view type;
+  std::optional<std::string_view> type;
   std::string_view creatorType;
 };
 
@@ -25,9 +25,9 @@ template <typename... Arguments>
                 {platform::MessageArgument{arguments}...});
 }
 
-const Array& creatorEntries(std::string_view type) {
+const Array& creatorEntries(std::optional<std::string_view> type) {
   const Dictionary* const table = BasicAccount::_accountCreationMap();
-  const Array* const entries = table == nullptr ? nullptr : table->array(type);
+  const Array* const entries = table == nullptr || !type ? nullptr : table->array(*type);
   if (entries == nullptr) {
     failLookup("Malformed AccountCreators information. Could not find the information for the type %@", type);
   }
@@ -111,7 +111,7 @@ std::shared_ptr<SyncAccountObject> makeSyncAccount(const platform::ClassInfo& in
 }  // namespace
 
 std::optional<std::string> BasicAccount::_creatorClassNameForAccountType_creatorType_loader(
-    std::string_view type, std::string_view creatorType, const AccountClassInfo* loader) const {
+    std::optional<std::string_view> type, std::string_view creatorType, const AccountClassInfo* loader) const {
   const Search search{type, creatorType};
   std::optional<std::string> className;
   // Every matching entry's module is opened; the last one's class counts.
@@ -125,18 +125,19 @@ std::optional<std::string> BasicAccount::_creatorClassNameForAccountType_creator
 }
 
 std::optional<std::string> BasicAccount::fullAccountCreatorClassNameForAccountType_loader(
-    std::string_view type, const AccountClassInfo* loader) const {
+    std::optional<std::string_view> type, const AccountClassInfo* loader) const {
   return _creatorClassNameForAccountType_creatorType_loader(type, kFullAccount, loader);
 }
 
-std::optional<std::string> BasicAccount::syncAccountCreatorClassNameForAccountType(std::string_view type) const {
+std::optional<std::string> BasicAccount::syncAccountCreatorClassNameForAccountType(
+    std::optional<std::string_view> type) const {
   return _creatorClassNameForAccountType_creatorType_loader(type, kSyncAccount, nullptr);
 }
 
 std::shared_ptr<FullAccountObject> BasicAccount::fullAccountUsingLoader(const AccountClassInfo* loader) {
   static constexpr std::string_view kMethod = "-[BasicAccount fullAccountUsingLoader:]";
   if (_fullAccount != nullptr) return _fullAccount;
-  const auto className = fullAccountCreatorClassNameForAccountType_loader(type().value_or(Text{}), loader);
+  const auto className = fullAccountCreatorClassNameForAccountType_loader(type(), loader);
   const platform::ClassInfo* const info = className ? platform::current().classes->classNamed(*className) : nullptr;
   if (info == nullptr) {
     failAssertion(kMethod, "BasicAccount", "The framework/bundle where %@ is defined has not been loaded", {className});
@@ -156,7 +157,7 @@ void BasicAccount::setFullAccount(std::shared_ptr<FullAccountObject> account) { 
 std::shared_ptr<SyncAccountObject> BasicAccount::_cachedSyncAccount() {
   static constexpr const char* kMethod = "-[BasicAccount _cachedSyncAccount]";
   if (_syncAccount != nullptr) return _syncAccount;
-  const auto className = syncAccountCreatorClassNameForAccountType(type().value_or(Text{}));
+  const auto className = syncAccountCreatorClassNameForAccountType(type());
   if (!className) return nullptr;
   const platform::ClassInfo* const info = platform::current().classes->classNamed(*className);
   if (info == nullptr) {

@@ -126,6 +126,15 @@ TEST_F(Creators, FailWithoutEntriesForTheType) {
             "Malformed AccountCreators information. Could not find the information for the type Mail");
 }
 
+TEST_F(Creators, FailForAnAbsentTypeNamingItAsNothing) {
+  put({creator("FullAccount", "one.so", "F1")});
+  account->removeAccountPropertyForKey("Type");
+  const std::string message =
+      "Malformed AccountCreators information. Could not find the information for the type (null)";
+  EXPECT_EQ(fullAccountFailure().message(), message);
+  EXPECT_EQ(tests::failureOf([this] { account->_cachedSyncAccount(); }).message(), message);
+}
+
 TEST_F(Creators, FailWhereTheEntriesAreNoArray) {
   device.put("/resources/AccountCreators.plist", Dictionary{{"Mail", creator("FullAccount", "full.so", "F")}});
   EXPECT_EQ(lookupFailure().message(),

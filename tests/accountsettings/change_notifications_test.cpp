@@ -209,6 +209,18 @@ TEST_F(ChangeNotifications, TellAfterAFailedSaveOfItsChangesWithTheNext) {
   EXPECT_THAT(heard["NotesNotifier"], ElementsAre(entry(1, "a", {kNotes})));
 }
 
+TEST_F(ChangeNotifications, YieldNothingForAnAccountWhoseTypeIsNoTextAndFailNoSave) {
+  for (const std::optional<PropertyValue>& odd : {std::optional<PropertyValue>{5}, std::optional<PropertyValue>{}}) {
+    const Store store = load({exchange("a", {kNotes})});
+    const Account added = made(exchange("b", {kMail}));
+    added->_forcedSetAccountProperty_forKey(odd, "Type");
+    store->insertAccount(added);
+    save(store);
+    EXPECT_EQ(fileAccounts().size(), 2U);
+    EXPECT_THAT(whoHeard(), IsEmpty());
+  }
+}
+
 TEST_F(ChangeNotifications, YieldNothingForATypeWithoutNotifiers) {
   Dictionary creator = notifier("CalendarsNotifier", {kCalendars});
   creator.set("Type", "FullAccount");
@@ -259,11 +271,10 @@ TEST_F(ChangeEntries, EndAtTheFirstValueThatIsMissing) {
               ElementsAre(Dictionary{{"ChangeType", 0}}));
 }
 
-TEST_F(ChangeEntries, EndBeforeATypeThatIsMissing) {
-  putNotifiers("", {notifier("NotesNotifier", {kNotes})});  // only so that anybody is asked
+TEST_F(ChangeEntries, AreMadeForNobodyWhereTheAccountHasNoType) {
+  putNotifiers("", {notifier("NotesNotifier", {kNotes})});  // for a type of that name, which is not none
   const Dictionary typeless{{"Identifier", "a"}, {"Enabled Dataclasses", Array{kNotes}}};
-  EXPECT_THAT(*tableOf(ChangeType::added, nullptr, &typeless).find("NotesNotifier"),
-              ElementsAre(Dictionary{{"ChangeType", 0}, {"AccountID", "a"}}));
+  EXPECT_EQ(tableOf(ChangeType::added, nullptr, &typeless).find("NotesNotifier"), nullptr);
 }
 
 TEST_F(ChangeEntries, AreAppendedToWhatTheTableHolds) {
@@ -347,12 +358,28 @@ TEST_F(FaultsOfNotifiers, IncludeAClassThatNoModuleDefines) {
             "+[AccountsManager accountDidChange:forDataclass:]: Could not find a class for class name Nobody");
 }
 
-TEST_F(FaultsOfNotifiers, IncludeAClassThatIsNoAccountClass) {
+TEST_F(FaultsOfNotifiers, IncludeNotListeningToSavesSinceTheClassIsOfAnotherKind) {
   const platform::ClassRegistration other{std::make_shared<platform::ClassInfo>("OtherKind")};
   putNotifiers("Exchange", {notifier("OtherKind", {kMail})});
   EXPECT_EQ(failureOfSave(),
-            "-[AccountsManager _sendNotificationsForChangedAccounts]: Could not find a class for "
-            "class name OtherKind");
+            "-[AccountsManager _sendNotificationsForChangedAccounts]: The notifier OtherKind does "
+            "not answer noteAccountChanges:");
+}
+
+TEST_F(FaultsOfNotifiers, DoNotIncludeAClassOfAnotherKindWhereASingleChangeIsTold) {
+  const platform::ClassRegistration other{std::make_shared<platform::ClassInfo>("OtherKind")};
+  putNotifiers("Exchange", {notifier("OtherKind", {kMail})});
+  const Account account = made(exchange("a", {kMail}));
+  EXPECT_EQ(failureOf([&] { AccountsManager::accountWillChange_forDataclass(*account, kMail); }), "no failure");
+  EXPECT_EQ(failureOf([&] { AccountsManager::accountDidChange_forDataclass(*account, kMail); }), "no failure");
+}
+
+TEST_F(FaultsOfNotifiers, NameAnAbsentTypeAsNothing) {
+  const Account account = made(exchange("a", {kMail}));
+  account->removeAccountPropertyForKey("Type");
+  EXPECT_EQ(failureOf([&] { AccountsManager::accountWillChange_forDataclass(*account, kMail); }),
+            missing("information for the type (null)"));
+  EXPECT_EQ(failureOfSearch(""), missing("information for the type "));
 }
 
 TEST_F(FaultsOfNotifiers, IncludeNotListeningToSaves) {
