@@ -55,6 +55,9 @@ class ACCOUNT_EXPORT AccountsManager {
   void saveAllAccounts();
   // Internal: takes the state against which the next save's change notifications are computed.
   void _setOriginalAccountDictionaries();
+  // Internal: new fixers, one of each kind; the store asks its own at each load and each save.
+  using RuntimeFixers = std::vector<std::shared_ptr<RuntimeFixer>>;
+  [[nodiscard]] RuntimeFixers _createRuntimeFixers() const;
   // Internal: what follows the accounts for a run's observer; null where none wants to know.
   [[nodiscard]] StoreWatch* _runWatch() const { return _watch.get(); }
   // Internal: tells the run's observer, if there is one, what became of the accounts since it last was told.
@@ -146,8 +149,6 @@ class ACCOUNT_EXPORT AccountsManager {
 
  private:
   AccountsManager();
-  [[nodiscard]] static std::vector<std::unique_ptr<RuntimeFixer>> _createRuntimeFixers();
-
   // Loading. An element that is no dictionary is read as an empty one.
   [[nodiscard]] static std::shared_ptr<AccountsManager> _loadedFromFile(std::unique_ptr<StoreWatch> watch);
   [[nodiscard]] static std::shared_ptr<AccountsManager> _loaded(const Array* accounts,
@@ -192,7 +193,7 @@ class ACCOUNT_EXPORT AccountsManager {
   // index is made by those.
   std::vector<std::pair<Text, Dictionary>> _originalAccountsByID;
   std::uint64_t _dataVersion = 0;
-  std::vector<std::unique_ptr<RuntimeFixer>> _runtimeFixers;
+  RuntimeFixers _runtimeFixers;
   std::unique_ptr<StoreWatch> _watch;  // null unless a run is observed
 };
 

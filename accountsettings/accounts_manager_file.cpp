@@ -92,10 +92,8 @@ AccountsManager::~AccountsManager() {
   _runtimeFixers.clear();
 }
 
-std::vector<std::unique_ptr<RuntimeFixer>> AccountsManager::_createRuntimeFixers() {
-  std::vector<std::unique_ptr<RuntimeFixer>> fixers;
-  fixers.push_back(std::make_unique<ASRuntimeFixMailAccount>());
-  return fixers;
+AccountsManager::RuntimeFixers AccountsManager::_createRuntimeFixers() const {
+  return {ASRuntimeFixMailAccount::init()};
 }
 
 std::shared_ptr<AccountsManager> AccountsManager::init() { return initInsideOfMigration(); }
@@ -153,7 +151,8 @@ bool AccountsManager::_offerLoaded(const Account& account, const PropertyValue& 
     if (answer != FixAnswer::drop) _registerAccount(account);
     isFixed |= answer != FixAnswer::nothingToDo;
     if (!_watch) continue;
-    answer == FixAnswer::drop ? _watch->givenUp(element, fixer->ruleForDropping()) : _watch->loaded(element, *account);
+    answer == FixAnswer::drop ? _watch->givenUp(element, ASRuntimeFixMailAccount::ruleForDropping())
+                              : _watch->loaded(element, *account);
   }
   return isFixed;
 }
@@ -219,7 +218,7 @@ bool AccountsManager::_fixAccountsForSaving() {
       // A dropped account is no longer found, but keeps its place in the order and so in the file.
       if (answer == FixAnswer::drop) {
         _forgetIdentifierOfAccount(*account);
-        if (_watch) _watch->unrepaired(*account, fixer->ruleForDropping());
+        if (_watch) _watch->unrepaired(*account, ASRuntimeFixMailAccount::ruleForDropping());
       }
       isFixed |= answer != FixAnswer::nothingToDo;
     }

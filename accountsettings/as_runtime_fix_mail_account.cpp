@@ -33,6 +33,12 @@ const ClassByPath* classForPath(std::string_view path) {
 
 }  // namespace
 
+RuntimeFixer::~RuntimeFixer() = default;
+
+std::shared_ptr<ASRuntimeFixMailAccount> ASRuntimeFixMailAccount::init() {
+  return std::shared_ptr<ASRuntimeFixMailAccount>{new ASRuntimeFixMailAccount};
+}
+
 ASRuntimeFixMailAccount::ASRuntimeFixMailAccount()
     : _supportedMailClasses{"WexmoAccount", "NimbraAccount", "POPAccount",   "IMAPAccount",
                             "AOLAccount",   "LocalAccount",  "GmailAccount", "YahooAccount"} {}
@@ -64,10 +70,6 @@ bool ASRuntimeFixMailAccount::_cleanupAccountClass(BasicAccount& account) {
   _ASLogSystem().log("-[ASRuntimeFixMailAccount _cleanupAccountClass:]",
                      "Could not fix the class of the mail account: %@", account.properties());
   return false;
-}
-
-std::string_view ASRuntimeFixMailAccount::ruleForDropping() const {
-  return "the mail application does not know its class, and its AccountPath names none";
 }
 
 void ASRuntimeFixMailAccount::accountsHaveBeenSaved(bool saved) {

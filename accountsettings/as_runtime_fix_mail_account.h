@@ -1,6 +1,7 @@
 #pragma once
 
-#include <string>
+#include <memory>
+#include <string_view>
 #include <unordered_set>
 
 #include "accountsettings/runtime_fixer.h"
@@ -12,11 +13,15 @@ namespace accountsettings {
 // during a save have been saved, tells the mail application that its accounts changed.
 class ACCOUNT_EXPORT ASRuntimeFixMailAccount final : public RuntimeFixer {
  public:
-  ASRuntimeFixMailAccount();
+  // By which rule it answers `drop`, for people.
+  [[nodiscard]] static constexpr std::string_view ruleForDropping() {
+    return "the mail application does not know its class, and its AccountPath names none";
+  }
+
+  static std::shared_ptr<ASRuntimeFixMailAccount> init();
   ~ASRuntimeFixMailAccount() override;
 
   FixAnswer fixBasicAccountIfNeeded_loggingMessage(BasicAccount& account, std::string_view loggingMessage) override;
-  [[nodiscard]] std::string_view ruleForDropping() const override;
   void accountsHaveBeenSaved(bool saved) override;
 
   // The account types that are looked at; one set for all instances.
@@ -25,6 +30,8 @@ class ACCOUNT_EXPORT ASRuntimeFixMailAccount final : public RuntimeFixer {
   bool _cleanupAccountClass(BasicAccount& account);
 
  private:
+  ASRuntimeFixMailAccount();
+
   std::unordered_set<std::string_view> _supportedMailClasses;
   bool _shouldNotifyMobileMail = false;
 };

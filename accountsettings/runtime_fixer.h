@@ -17,8 +17,6 @@ class ACCOUNT_EXPORT RuntimeFixer {
   // Repairs the account in place where it needs it. `loggingMessage` says what the store is doing: "loading accounts"
   // or "saving accounts".
   virtual FixAnswer fixBasicAccountIfNeeded_loggingMessage(BasicAccount& account, std::string_view loggingMessage) = 0;
-  // By which rule it answers `drop`: what is wrong with such an account, for people.
-  [[nodiscard]] virtual std::string_view ruleForDropping() const = 0;
   // Called after a load (false) or a save (true, also a failed one) in which some fixer had something to do.
   virtual void accountsHaveBeenSaved(bool saved) = 0;
 };

@@ -11,6 +11,7 @@ namespace tests {
 namespace {
 
 using accountsettings::ASRuntimeFixMailAccount;
+using accountsettings::BasicAccount;
 using accountsettings::FixAnswer;
 
 class FixingMailAccounts : public AccountStore {
@@ -22,7 +23,7 @@ class FixingMailAccounts : public AccountStore {
     return dictionary;
   }
   static FixAnswer fix(const Account& account) {
-    return ASRuntimeFixMailAccount{}.fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
+    return ASRuntimeFixMailAccount::init()->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
   }
   static Account made(const Dictionary& dictionary) {
     return accountsettings::BasicAccount::initWithProperties(dictionary);
@@ -33,9 +34,40 @@ class FixingMailAccounts : public AccountStore {
 };
 
 TEST_F(FixingMailAccounts, LooksAtTheTwoTypesThatTheMailApplicationKeeps) {
-  EXPECT_EQ(ASRuntimeFixMailAccount{}.supportedAccountTypes(),
+  EXPECT_EQ(ASRuntimeFixMailAccount::init()->supportedAccountTypes(),
             (std::unordered_set<std::string_view>{"Mail", "Nimbra"}));
-  EXPECT_EQ(&ASRuntimeFixMailAccount{}.supportedAccountTypes(), &ASRuntimeFixMailAccount{}.supportedAccountTypes());
+  EXPECT_EQ(&ASRuntimeFixMailAccount::init()->supportedAccountTypes(),
+            &ASRuntimeFixMailAccount::init()->supportedAccountTypes());
+}
+
+TEST_F(FixingMailAccounts, IsTheOneFixerThatAStoreMakesAndAFreshOneEachTime) {
+  const Store store = load({});
+  const auto fixers = store->_createRuntimeFixers();
+  ASSERT_EQ(fixers.size(), 1U);
+  EXPECT_NE(std::dynamic_pointer_cast<ASRuntimeFixMailAccount>(fixers[0]), nullptr);
+  EXPECT_NE(fixers[0], store->_createRuntimeFixers()[0]);
+}
+
+// All that a fixer has to answer.
+class DroppingFixer final : public accountsettings::RuntimeFixer {
+ public:
+  FixAnswer fixBasicAccountIfNeeded_loggingMessage(BasicAccount& /*account*/, std::string_view message) override {
+    heard.emplace_back(message);
+    return FixAnswer::drop;
+  }
+  void accountsHaveBeenSaved(bool saved) override { heard.emplace_back(saved ? "saved" : "loaded"); }
+
+  std::vector<std::string> heard;
+};
+
+TEST(AFixer, AnswersTwoOperationsAndNothingElse) {
+  FakeDevice device;
+  putAccountConfiguration(device);
+  DroppingFixer dropping;
+  accountsettings::RuntimeFixer& fixer = dropping;
+  EXPECT_EQ(fixer.fixBasicAccountIfNeeded_loggingMessage(*account("a"), "loading accounts"), FixAnswer::drop);
+  fixer.accountsHaveBeenSaved(false);
+  EXPECT_EQ(dropping.heard, (std::vector<std::string>{"loading accounts", "loaded"}));
 }
 
 TEST_F(FixingMailAccounts, LeavesEveryClassAloneThatTheMailApplicationKnows) {
@@ -152,11 +184,11 @@ TEST_F(FixingMailAccounts, AnnouncesNothingOfAnAccountThatNeedsNoRepair) {
 }
 
 TEST_F(FixingMailAccounts, ForgetsARepairOnceItWasToldWhetherItWasSaved) {
-  ASRuntimeFixMailAccount fixer;
+  const auto fixer = ASRuntimeFixMailAccount::init();
   const Account account = made(mail("MailAccount", "Mail/POP-x"));
-  fixer.fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
-  fixer.accountsHaveBeenSaved(false);
-  fixer.accountsHaveBeenSaved(true);
+  fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
+  fixer->accountsHaveBeenSaved(false);
+  fixer->accountsHaveBeenSaved(true);
   EXPECT_EQ(notices(), 0);
 }
 

@@ -1,7 +1,0 @@
-#include "accountsettings/runtime_fixer.h"
-
-namespace accountsettings {
-
-RuntimeFixer::~RuntimeFixer() = default;
-
-}  // namespace accountsettings
