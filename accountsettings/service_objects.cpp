@@ -1,8 +1,0 @@
-#include "accountsettings/service_objects.h"
-
-namespace accountsettings {
-
-ServiceAccountObject::~ServiceAccountObject() = default;
-RefreshQueueObject::~RefreshQueueObject() = default;
-
-}  // namespace accountsettings
