@@ -50,9 +50,7 @@ std::shared_ptr<BasicAccount> BasicAccount::accountWithProperties(const Dictiona
 }
 
 std::shared_ptr<BasicAccount> BasicAccount::initWithProperties(const Dictionary& properties) {
-  struct Record final : BasicAccount {};
-  const auto account = std::make_shared<Record>();
-  return account->_acceptProperties(properties) ? account : nullptr;
+  return recordOf<BasicAccount>(properties);
 }
 
 std::shared_ptr<BasicAccount> BasicAccount::_initWithType_class(std::string_view type, std::string_view className) {
@@ -79,7 +77,7 @@ std::optional<std::string> BasicAccount::createNewAccountUID() {
   return platform::current().identifiers->makeUuid().optional();
 }
 
-bool BasicAccount::_acceptProperties(const Dictionary& properties) {
+bool BasicAccount::acceptProperties(const Dictionary& properties) {
   static constexpr const char* kMethod = "-[BasicAccount initWithProperties:]";
   const Text* const type = properties.text(kAccountType);
   const Text* const className = properties.text(kAccountClass);
@@ -121,19 +119,19 @@ void BasicAccount::removeAccountPropertyForKey(std::string_view key) { _properti
 
 void BasicAccount::setOriginalProperties(const Dictionary& properties) { _originalProperties = properties; }
 
-std::optional<Text> BasicAccount::_textForKey(std::string_view key) const {
+std::optional<Text> BasicAccount::textForKey(std::string_view key) const {
   const PropertyValue* const value = valueInChain(*this, key);
   const Text* const text = value == nullptr ? nullptr : value->asText();
   return text == nullptr ? std::nullopt : std::optional{*text};
 }
 
-std::optional<Text> BasicAccount::type() const { return _textForKey(kAccountType); }
-std::optional<Text> BasicAccount::identifier() const { return _textForKey(kAccountIdentifier); }
-std::optional<Text> BasicAccount::syncStoreIdentifier() const { return _textForKey(kAccountSyncIdentifier); }
-std::optional<Text> BasicAccount::accountClass() const { return _textForKey(kAccountClass); }
-std::optional<Text> BasicAccount::displayName() const { return _textForKey(kAccountDisplayName); }
-std::optional<Text> BasicAccount::typeString() const { return _textForKey(kAccountTypeString); }
-std::optional<Text> BasicAccount::shortTypeString() const { return _textForKey(kAccountShortTypeString); }
+std::optional<Text> BasicAccount::type() const { return textForKey(kAccountType); }
+std::optional<Text> BasicAccount::identifier() const { return textForKey(kAccountIdentifier); }
+std::optional<Text> BasicAccount::syncStoreIdentifier() const { return textForKey(kAccountSyncIdentifier); }
+std::optional<Text> BasicAccount::accountClass() const { return textForKey(kAccountClass); }
+std::optional<Text> BasicAccount::displayName() const { return textForKey(kAccountDisplayName); }
+std::optional<Text> BasicAccount::typeString() const { return textForKey(kAccountTypeString); }
+std::optional<Text> BasicAccount::shortTypeString() const { return textForKey(kAccountShortTypeString); }
 
 void BasicAccount::setAccountClass(std::string_view className) {
   const std::optional<Text> present = accountClass();

@@ -26,7 +26,7 @@ using platform::Text;
 // When it is made, a record has a type that the configuration knows, a class and, save where none can be made, an
 // identifier. Getters answer the record's own value or, where it has none, its parent's; a value of another kind
 // answers nothing and does not climb.
-class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable_shared_from_this<BasicAccount> {
+class ACCOUNT_EXPORT BasicAccount : public std::enable_shared_from_this<BasicAccount> {
  public:
   // Making records. `initWithProperties` answers null, after a log line for each reason, where the type is unknown or
   // the class is missing; a record without "Identifier" is given a new one (and, only then, the same "Sync Identifier"
@@ -44,7 +44,7 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
   BasicAccount(const BasicAccount&) = delete;
   BasicAccount& operator=(const BasicAccount&) = delete;
   // Lets go of parent, original properties, properties, full account and sync account, in this order.
-  ~BasicAccount() override;
+  virtual ~BasicAccount();
 
   // Properties. Setting "Class" or "Type" does nothing but in the forced form; an absent value removes the key.
   // `removeAccountPropertyForKey` has no guard. `properties` is the live dictionary.
@@ -72,7 +72,7 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
 
   // The parent, held strongly; null for a top-level account.
   [[nodiscard]] const std::shared_ptr<BasicAccount>& parentAccount() const { return _parentAccount; }
-  void setParentAccount(std::shared_ptr<BasicAccount> parent) override;
+  void setParentAccount(std::shared_ptr<BasicAccount> parent);
   [[nodiscard]] std::optional<Text> parentAccountIdentifier() const;
 
   // Data classes, in the canonical order. `enabledDataclasses` answers nothing where no list is stored; a child shows
@@ -140,11 +140,18 @@ class ACCOUNT_EXPORT BasicAccount : public FullAccountObject, public std::enable
 
  protected:
   BasicAccount();
-  // What `initWithProperties` does, for a record of whatever class; answers whether the record may be used.
-  [[nodiscard]] bool _acceptProperties(const Dictionary& properties);
-  [[nodiscard]] std::optional<Text> _textForKey(std::string_view key) const;
+  // What `initWithProperties` does, for a record of the class `Receiver`.
+  template <typename Receiver>
+  static std::shared_ptr<Receiver> recordOf(const Dictionary& properties) {
+    struct [[gnu::visibility("hidden")]] Record final : Receiver {};
+    const auto record = std::make_shared<Record>();
+    return record->acceptProperties(properties) ? record : nullptr;
+  }
 
  private:
+  // Answers whether the record may be used.
+  [[nodiscard]] bool acceptProperties(const Dictionary& properties);
+  [[nodiscard]] std::optional<Text> textForKey(std::string_view key) const;
   // The supported data classes of a type in the canonical order; an empty list for an unknown type.
   [[nodiscard]] static const Dataclasses& _orderedSupportedDataclassesForAccountType(std::string_view type);
 

@@ -10,7 +10,6 @@
 namespace accountsettings {
 namespace {
 
-constexpr StringConstant kClassName{"DeviceLocalAccount"};
 constexpr StringConstant kIdentifier{"DeviceLocalAccount"};
 constexpr StringConstant kTable{"DeviceLocalAccount"};
 constexpr StringConstant kTetheredSyncDomain{"com.vorlix.mobile.tethered_sync"};
@@ -54,8 +53,8 @@ std::string localizedForDeviceClass(std::string_view base) {
 }
 
 std::shared_ptr<const AccountClassInfo> classInfo() {
-  auto info = std::make_shared<AccountClassInfo>(std::string{kClassName.view()});
-  info->initWithProperties = &DeviceLocalAccount::initWithProperties;
+  auto info = std::make_shared<AccountClassInfo>(std::string{DeviceLocalAccount::className().view()});
+  info->initWithProperties = &DeviceLocalAccount::initWithProperties<>;
   info->accountWithBasicAccount = [](const std::shared_ptr<BasicAccount>& account) {
     return DeviceLocalAccount::accountWithBasicAccount(*account);
   };
@@ -68,10 +67,10 @@ const platform::ClassRegistration registration{classInfo()};
 
 DeviceLocalAccount::DeviceLocalAccount() = default;
 
-Dictionary DeviceLocalAccount::basicAccountProperties() {
+Dictionary DeviceLocalAccount::propertiesWithClass(StringConstant className) {
   const Text typeString{class_typeString()};
   return {{kAccountType, kOnMyDeviceAccountType},
-          {kAccountClass, kClassName},
+          {kAccountClass, className},
           {kAccountTypeString, typeString},
           {kAccountShortTypeString, typeString},
           {kAccountIdentifier, kIdentifier}};
@@ -81,18 +80,8 @@ std::string DeviceLocalAccount::class_typeString() { return localizedForDeviceCl
 
 std::string_view DeviceLocalAccount::_identifier() { return kIdentifier; }
 
-std::shared_ptr<DeviceLocalAccount> DeviceLocalAccount::accountWithProperties(const Dictionary& properties) {
-  return initWithProperties(properties);
-}
-
-std::shared_ptr<DeviceLocalAccount> DeviceLocalAccount::initWithProperties(const Dictionary& properties) {
-  struct Record final : DeviceLocalAccount {};
-  const auto account = std::make_shared<Record>();
-  return account->_acceptProperties(properties) ? account : nullptr;
-}
-
-std::shared_ptr<DeviceLocalAccount> DeviceLocalAccount::accountWithBasicAccount(const BasicAccount& account) {
-  return initWithProperties(account.properties());
+void DeviceLocalAccount::setParentAccount(std::shared_ptr<BasicAccount> parent) {
+  BasicAccount::setParentAccount(std::move(parent));
 }
 
 std::optional<Text> DeviceLocalAccount::identifier() const { return Text{kIdentifier}; }

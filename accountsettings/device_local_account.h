@@ -9,21 +9,41 @@
 namespace accountsettings {
 
 // The implicit account of all data that belongs to no online account: kept only on the device, or synced with a desktop
-// computer over a cable. Identifier, sync-store identifier and name are fixed, whatever its properties say.
-class ACCOUNT_EXPORT DeviceLocalAccount : public BasicAccount {
+// computer over a cable. Identifier, sync-store identifier and name are fixed, whatever its properties say. It is its
+// own full account.
+//
+// What is made, is made of the receiving class. A class derived from this one has a `className` of its own and names
+// itself: `Derived::accountWithProperties<Derived>(properties)`.
+class ACCOUNT_EXPORT DeviceLocalAccount : public BasicAccount, public FullAccountObject {
  public:
+  [[nodiscard]] static constexpr StringConstant className() { return "DeviceLocalAccount"; }
+
   // The properties of a new device-local account: type, class, both type strings and identifier, nothing else.
-  [[nodiscard]] static Dictionary basicAccountProperties();
+  template <typename Receiver = DeviceLocalAccount>
+  [[nodiscard]] static Dictionary basicAccountProperties() {
+    return propertiesWithClass(Receiver::className());
+  }
   // The localised name of "on this device", for the device's class.
   [[nodiscard]] static std::string class_typeString();
   [[nodiscard]] static std::string_view _identifier();
-  static std::shared_ptr<DeviceLocalAccount> accountWithProperties(const Dictionary& properties);
-  static std::shared_ptr<DeviceLocalAccount> initWithProperties(const Dictionary& properties);
-  static std::shared_ptr<DeviceLocalAccount> accountWithBasicAccount(const BasicAccount& account);
+  // Null as BasicAccount's are.
+  template <typename Receiver = DeviceLocalAccount>
+  static std::shared_ptr<Receiver> accountWithProperties(const Dictionary& properties) {
+    return initWithProperties<Receiver>(properties);
+  }
+  template <typename Receiver = DeviceLocalAccount>
+  static std::shared_ptr<Receiver> initWithProperties(const Dictionary& properties) {
+    return recordOf<Receiver>(properties);
+  }
+  template <typename Receiver = DeviceLocalAccount>
+  static std::shared_ptr<Receiver> accountWithBasicAccount(const BasicAccount& account) {
+    return initWithProperties<Receiver>(account.properties());
+  }
 
   [[nodiscard]] std::optional<Text> identifier() const override;
   [[nodiscard]] std::optional<Text> displayName() const override;
   [[nodiscard]] std::optional<Text> syncStoreIdentifier() const override;
+  void setParentAccount(std::shared_ptr<BasicAccount> parent) override;
 
   // The operating system of the desktop computer that the data class syncs with ("Drevan" or "Windows"), or "Ferrox".
   [[nodiscard]] static std::string tetheredSourceForDataClass(std::string_view dataclass);
@@ -35,6 +55,9 @@ class ACCOUNT_EXPORT DeviceLocalAccount : public BasicAccount {
 
  protected:
   DeviceLocalAccount();
+
+ private:
+  [[nodiscard]] static Dictionary propertiesWithClass(StringConstant className);
 };
 
 }  // namespace accountsettings

@@ -79,6 +79,31 @@ TEST_F(DeviceLocal, IsMadeFromPropertiesForACreatorThatNamesItsClassForTheType) 
   EXPECT_NE(std::dynamic_pointer_cast<DeviceLocalAccount>(made), nullptr);
 }
 
+// A class derived from it, as a program may have one.
+class TabletAccount : public DeviceLocalAccount {
+ public:
+  static constexpr StringConstant className() { return "TabletAccount"; }
+};
+
+TEST_F(DeviceLocal, MakesObjectsOfTheReceivingClass) {
+  const Dictionary properties = TabletAccount::basicAccountProperties<TabletAccount>();
+  EXPECT_EQ(*properties.text("Class"), Text{"TabletAccount"});
+  const std::shared_ptr<TabletAccount> account = TabletAccount::accountWithProperties<TabletAccount>(properties);
+  ASSERT_NE(account, nullptr);
+  const std::shared_ptr<TabletAccount> full = TabletAccount::accountWithBasicAccount<TabletAccount>(*account);
+  EXPECT_EQ(full->properties(), properties);
+  EXPECT_EQ(TabletAccount::accountWithProperties<TabletAccount>({{"Type", "OnMyDevice"}}), nullptr);
+}
+
+TEST_F(DeviceLocal, IsAFullAccountWhereOtherRecordsAreNone) {
+  EXPECT_FALSE((std::is_base_of_v<FullAccountObject, BasicAccount>));
+  const auto account = DeviceLocalAccount::accountWithProperties(DeviceLocalAccount::basicAccountProperties());
+  const auto parent = BasicAccount::accountWithType_class("CalDAV", "Any");
+  FullAccountObject& full = *account;
+  full.setParentAccount(parent);
+  EXPECT_EQ(account->parentAccount(), parent);
+}
+
 TEST_F(DeviceLocal, NamesItsTypeByTheDevicesClass) {
   const std::vector<std::pair<std::optional<PropertyValue>, std::string>> table{
       {std::nullopt, "ON_MY_DEVICE_TYPE_FERROX"},
