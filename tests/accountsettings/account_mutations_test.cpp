@@ -253,6 +253,14 @@ TEST_F(EditingAccounts, LeavesAParentWithoutChildrenWithoutThem) {
   EXPECT_EQ(parent->properties(), properties("p"));
 }
 
+TEST_F(EditingAccounts, LeavesChildrenThatAreNoArrayAsTheyAreWhenOneIsRemoved) {
+  for (const PropertyValue& odd : {PropertyValue{"c"}, PropertyValue{5}, PropertyValue{properties("c")}}) {
+    const Account parent = account("p", {{"ChildAccounts", odd}});
+    storeOf({parent})->removeChildWithIdentifier_fromAccount("c", parent);
+    EXPECT_EQ(parent->accountPropertyForKey("ChildAccounts"), odd);
+  }
+}
+
 TEST_F(EditingAccounts, LeavesChildrenOfAnOddKindAsTheyAreUntilOneIsAdded) {
   const Account parent = account("p", {{"ChildAccounts", "text"}});
   const Store store = storeOf({parent});

@@ -80,6 +80,16 @@ TEST_F(Configuration, IsNeededByEveryQuestionAboutATypeAndByEveryRecord) {
   }
 }
 
+TEST_F(Configuration, IsLoadedByTheOperationsThatNeedItAndNotByTheFirstUseOfTheClass) {
+  EXPECT_EQ(BasicAccount::allSupportedDataclasses().size(), 14U);
+  EXPECT_TRUE(BasicAccount::createNewAccountUID());
+  EXPECT_TRUE(BasicAccount::isMultitaskingEnabled());
+  EXPECT_EQ(BasicAccount::_orderedDataclasses({}), Dataclasses{});
+  EXPECT_EQ(BasicAccount::removeActionsIncompatibleWithSingleStoreDataclass({}), Actions{});
+  EXPECT_EQ(tests::failureOf([] { BasicAccount::init(); }).message(), "Don't use this method");
+  EXPECT_TRUE(device.propertyLists->reads.empty());
+}
+
 TEST_F(Configuration, IsTriedAgainAfterAFailure) {
   EXPECT_THROW(BasicAccount::initialize(), AssertionFailure);
   putSupported({kAccountDataclassMail});

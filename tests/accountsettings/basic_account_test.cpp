@@ -122,6 +122,13 @@ TEST_F(Record, WithoutIdentifierKeepsTheSyncIdentifierItHas) {
   EXPECT_EQ(device.identifiers->made, 1);
 }
 
+TEST_F(Record, WithoutIdentifierKeepsASyncIdentifierThatIsNoText) {
+  const auto account = make({{"Type", "CalDAV"}, {"Class", "X"}, {"Sync Identifier", 5}});
+  EXPECT_EQ(account->identifier(), Text{"00000000-0000-4000-8000-000000000001"});
+  EXPECT_EQ(account->accountPropertyForKey("Sync Identifier"), PropertyValue{5});
+  EXPECT_EQ(account->syncStoreIdentifier(), std::nullopt);
+}
+
 TEST_F(Record, WithAnIdentifierButNoSyncIdentifierKeepsLackingOne) {
   const auto account = make();
   EXPECT_EQ(account->syncStoreIdentifier(), std::nullopt);
