@@ -1,5 +1,6 @@
 #pragma once
 
+#include <algorithm>
 #include <string_view>
 #include <vector>
 
@@ -9,8 +10,17 @@
 namespace accountsettings {
 
 // The texts of an array, in their order; what is no text is left out.
-[[nodiscard]] std::vector<platform::Text> textsIn(const platform::Array& array);
+[[nodiscard]] inline std::vector<platform::Text> textsIn(const platform::Array& array) {
+  std::vector<platform::Text> texts;
+  texts.reserve(array.size());
+  for (const platform::PropertyValue& element : array) {
+    if (const platform::Text* const text = element.asText()) texts.push_back(*text);
+  }
+  return texts;
+}
 
-[[nodiscard]] bool containsText(const std::vector<platform::Text>& list, std::string_view text);
+[[nodiscard]] inline bool containsText(const std::vector<platform::Text>& list, std::string_view text) {
+  return std::find(list.begin(), list.end(), text) != list.end();
+}
 
 }  // namespace accountsettings
