@@ -26,7 +26,7 @@ std::optional<Text> textForKey(const BasicAccount& account, std::string_view key
   return value ? valueOrNothing(value->asText()) : std::nullopt;
 }
 
-std::optional<bool> truthForKey(const BasicAccount& account, std::string_view key) {
+std::optional<bool> booleanForKey(const BasicAccount& account, std::string_view key) {
   const std::optional<PropertyValue> value = account.accountPropertyForKey(key);
   return value ? value->booleanValue() : std::nullopt;
 }
@@ -47,7 +47,7 @@ bool hasClassAmong(const BasicAccount& account, std::initializer_list<std::strin
 }
 
 bool isActiveUnlessSaidOtherwise(const BasicAccount& account) {
-  return truthForKey(account, kIsActiveKey).value_or(true);
+  return booleanForKey(account, kIsActiveKey).value_or(true);
 }
 
 Array arrayOf(const BasicAccount::Dataclasses& dataclasses) { return {dataclasses.begin(), dataclasses.end()}; }

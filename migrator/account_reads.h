@@ -11,8 +11,8 @@ namespace migrator {
 
 [[nodiscard]] std::optional<accountsettings::Text> textForKey(const accountsettings::BasicAccount& account,
                                                               std::string_view key);
-// The truth of a boolean, number or text. What an absent one means is for each step to say.
-[[nodiscard]] std::optional<bool> truthForKey(const accountsettings::BasicAccount& account, std::string_view key);
+// Also of a number or a text. What an absent one means is for each step to say.
+[[nodiscard]] std::optional<bool> booleanForKey(const accountsettings::BasicAccount& account, std::string_view key);
 [[nodiscard]] std::optional<accountsettings::Array> arrayForKey(const accountsettings::BasicAccount& account,
                                                                 std::string_view key);
 [[nodiscard]] std::optional<accountsettings::Dictionary> dictionaryForKey(const accountsettings::BasicAccount& account,

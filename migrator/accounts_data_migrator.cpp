@@ -9,6 +9,7 @@
 #include "accountsettings/product_values.h"
 #include "migrator/account_stage.h"
 #include "migrator/console.h"
+#include "migrator/legacy_conversion.h"
 #include "migrator/told_removal.h"
 #include "platform/class_registry.h"
 #include "platform/platform.h"
@@ -70,12 +71,6 @@ Decision decide() {
   return decision;
 }
 
-void finishInterruptedRemoval(AccountsDataMigrator& migrator) {
-  const platform::RunStage stage{"legacy removal"};
-  writeToConsole("Detected that a removal old accounts info was in progress. Early return!.");
-  migrator._removeOldAccountsInfo();
-}
-
 std::shared_ptr<AccountsManager> loadStore() {
   const platform::RunStage stage{"load"};
   return AccountsManager::initInsideOfMigration();
@@ -99,35 +94,20 @@ bool migrate(AccountsDataMigrator& migrator, AccountsManager& store, const Decis
   return migrator._migrateNewAccountsInfo(store);
 }
 
-// Also after failed steps: the file is stamped with the current version whatever became of the run.
-void stampAndSave(AccountsManager& store) {
-  store.setDataVersion(AccountsManager::currentVersion());
-  store.saveAllAccounts();
-}
-
-// Nobody asks whether the save went through: the legacy files go after every successful run, and with them, where the
-// file could not be saved, the only copy of the accounts in them. Who cannot bear that keeps a copy of the device.
-void removeLegacyFiles(AccountsDataMigrator& migrator) {
-  const platform::RunStage stage{"legacy removal"};
-  migrator._removeOldAccountsInfo();
-}
-
-void writeReport(AccountsDataMigrator& migrator) {
-  const platform::RunStage stage{"report"};
-  migrator._saveCollatedMigrationInformation();
-}
-
-void tellMailApplication() {
-  const platform::Platform& services = platform::current();
-  std::ignore = removeAndTell(accountsettings::mailAutoFetchMarkerPath());
-  services.preferencesChanged->post(accountsettings::kMailPreferencesDomain,
-                                    accountsettings::kMailPreferencesAccountsKey);
-}
-
 void concludeSuccessfulRun(AccountsDataMigrator& migrator, const Decision& decision) {
-  if (decision.isLegacyFound()) removeLegacyFiles(migrator);
-  if (AccountsDataMigrator::_saveMigrationInformation()) writeReport(migrator);
-  tellMailApplication();
+  // Nobody asks whether the save went through: the legacy files go after every successful run, and with them, where the
+  // file could not be saved, the only copy of the accounts in them. Who cannot bear that keeps a copy of the device.
+  if (decision.isLegacyFound()) {
+    const platform::RunStage stage{"legacy removal"};
+    migrator._removeOldAccountsInfo();
+  }
+  if (AccountsDataMigrator::_saveMigrationInformation()) {
+    const platform::RunStage stage{"report"};
+    migrator._saveCollatedMigrationInformation();
+  }
+  std::ignore = removeAndTell(accountsettings::mailAutoFetchMarkerPath());
+  platform::current().preferencesChanged->post(accountsettings::kMailPreferencesDomain,
+                                               accountsettings::kMailPreferencesAccountsKey);
 }
 
 }  // namespace
@@ -135,6 +115,22 @@ void concludeSuccessfulRun(AccountsDataMigrator& migrator, const Decision& decis
 AccountsDataMigrator::~AccountsDataMigrator() { _collatedMigrationData.reset(); }
 
 std::string_view AccountsDataMigrator::dataClassName() const { return "accounts"; }
+
+// The copy aside and the report are records of a run: it adds them, and no later run reads them.
+platform::MigrationFootprint AccountsDataMigrator::footprint() const {
+  using Part = platform::MigrationFile::Part;
+  const std::string exchange = accountsettings::daAccountPath();
+  const std::string mail = accountsettings::mailAccountsPath();
+  return {.lockName = std::string{accountsettings::kMigrationLockName.view()},
+          .versionKey = std::string{accountsettings::kPlistVersionKey.view()},
+          .files = {{Part::settings, AccountsManager::fullPathToAccountSettingsPlist()},
+                    {Part::legacy, exchange},
+                    {Part::legacy, mail},
+                    {Part::other, originalCompanionOf(exchange)},
+                    {Part::other, originalCompanionOf(mail)},
+                    {Part::other, accountsettings::removalSentinelPath()},
+                    {Part::other, accountsettings::mailAutoFetchMarkerPath()}}};
+}
 
 bool AccountsDataMigrator::performMigration() {
   HeldLock lock;
@@ -154,13 +150,17 @@ bool AccountsDataMigrator::executeMigrationSteps() {
   AccountsManager::_setShouldSkipNotifications(true);
   _copyAsideAccountsPlist();
   if (_failedToRemoveOldAccountsInfo()) {
-    finishInterruptedRemoval(*this);
+    const platform::RunStage stage{"legacy removal"};
+    writeToConsole("Detected that a removal old accounts info was in progress. Early return!.");
+    _removeOldAccountsInfo();
     return true;  // and leaves notifications off for the rest of the process, as this exit always has
   }
   const Decision decision = decide();
   std::shared_ptr<AccountsManager> store = loadStore();
   const bool hasSucceeded = !decision.isAnythingToMigrate() || migrate(*this, *store, decision);
-  stampAndSave(*store);
+  // Also after failed steps: the file is stamped with the current version whatever became of the run.
+  store->setDataVersion(AccountsManager::currentVersion());
+  store->saveAllAccounts();
   store.reset();
   if (hasSucceeded) concludeSuccessfulRun(*this, decision);
   AccountsManager::_setShouldSkipNotifications(false);

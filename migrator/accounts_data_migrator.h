@@ -29,7 +29,7 @@ class AccountsDataMigrator final : public platform::DataClassMigrator {
   [[nodiscard]] std::string_view dataClassName() const override;
   // Takes the migration lock, runs the steps and gives the lock back on every path. Catches whatever is thrown.
   bool performMigration() override;
-  [[nodiscard]] platform::MigrationFootprint footprint() const override;  // migration_footprint.cpp
+  [[nodiscard]] platform::MigrationFootprint footprint() const override;
 
   // Everything below is internal: public so that each group of steps, and its tests, can call the others.
 

@@ -31,14 +31,10 @@ void keepIdentifierForSync(BasicAccount& account) {
   }
 }
 
-// Read from the account's own properties: a unique id names this very record and is never a parent's.
-std::optional<Text> ownUniqueId(const BasicAccount& account) {
-  const Text* const uniqueId = account.properties().text(kUniqueIdKey);
-  return uniqueId != nullptr ? std::optional{*uniqueId} : std::nullopt;
-}
-
 void settleIdentifier(BasicAccount& account) {
-  if (const auto uniqueId = unlessEmpty(ownUniqueId(account))) {
+  // Read from the account's own properties: a unique id names this very record and is never a parent's.
+  const Text* const uniqueId = account.properties().text(kUniqueIdKey);
+  if (uniqueId != nullptr && !uniqueId->empty()) {
     account.setAccountProperty_forKey(*uniqueId, kAccountIdentifier);
     account.removeAccountPropertyForKey(kUniqueIdKey);
   } else if (!unlessEmpty(textForKey(account, kAccountIdentifier))) {
@@ -58,29 +54,17 @@ constexpr std::array<DataclassSources, 4> kDataclassesOnDevice{{{kAccountDatacla
                                                                 {kAccountDataclassContacts, SyncDataType::contacts},
                                                                 {kAccountDataclassNotes, SyncDataType::notes}}};
 
-void reportSourcesError(std::string_view dataclass, std::string_view error) {
-  writeToConsole("[%s]Error while retreiving external sources for dataclass %@ [%@]",
-                 "-[AccountsDataMigrator(Internal) _migrateAccountsFrom7A153:]", dataclass, error);
-}
-
 // Whether the device keeps data of this class itself: it does unless an external source claims the only store.
 bool isKeptOnDevice(const DataclassSources& kind) {
   const platform::ExternalSources external = platform::current().externalSources->enabledSources(kind.sources);
   if (external.error && !external.error->empty()) {
-    reportSourcesError(kind.dataclass, *external.error);
+    writeToConsole("[%s]Error while retreiving external sources for dataclass %@ [%@]",
+                   "-[AccountsDataMigrator(Internal) _migrateAccountsFrom7A153:]", kind.dataclass, *external.error);
     return false;
   }
   if (!external.sources || external.sources->empty()) return true;
   return !AccountsDataMigrator::_tetheredDisabledInSources(*external.sources) &&
          BasicAccount::multipleStoresSupportedByDataclass(kind.dataclass);
-}
-
-BasicAccount::Dataclasses dataclassesKeptOnDevice() {
-  BasicAccount::Dataclasses kept;
-  for (const DataclassSources& kind : kDataclassesOnDevice) {
-    if (isKeptOnDevice(kind)) kept.emplace_back(kind.dataclass);
-  }
-  return kept;
 }
 
 // --- Mail and CalDAV ---
@@ -178,7 +162,11 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A153(AccountsManager& store) {
   const AccountsManager::Account onDevice =
       BasicAccount::initWithProperties(DeviceLocalAccount::basicAccountProperties());
   if (onDevice != nullptr) {  // else the device knows no such accounts, and none was loaded
-    onDevice->setEnabledForDataclasses(dataclassesKeptOnDevice());
+    BasicAccount::Dataclasses kept;
+    for (const DataclassSources& kind : kDataclassesOnDevice) {
+      if (isKeptOnDevice(kind)) kept.emplace_back(kind.dataclass);
+    }
+    onDevice->setEnabledForDataclasses(kept);
     store.replaceAccountsWithTypes_withAccounts({kOnMyDeviceAccountType}, {onDevice});
   }
   store.setDataVersion(3);

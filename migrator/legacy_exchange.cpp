@@ -24,13 +24,13 @@ constexpr std::array kSwitches{Switch{"DAAccountEnabledForCalendar", kAccountDat
                                Switch{"DAAccountEnabledForEmail", kAccountDataclassMail},
                                Switch{"DAAccountEnabledForContactsSearch", kAccountDataclassContactsSearch}};
 
-// Switches that were never set, or that hold what is no switch, are on.
-bool isOn(const std::optional<PropertyValue>& value) { return !value || value->booleanValue().value_or(true); }
-
 Array takeEnabledDataclasses(Dictionary& record) {
   Array enabled;
   for (const Switch& each : kSwitches) {
-    if (isOn(record.remove(each.legacyKey))) enabled.emplace_back(each.dataclass);
+    // Switches that were never set, or that hold what is no switch, are on.
+    const std::optional<PropertyValue> value = record.remove(each.legacyKey);
+    const bool isOn = !value || value->booleanValue().value_or(true);
+    if (isOn) enabled.emplace_back(each.dataclass);
   }
   return enabled;
 }

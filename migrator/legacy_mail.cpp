@@ -53,12 +53,6 @@ std::optional<Text> settledClass(Dictionary& record, std::string_view initialTyp
   return Text{kSMTPAccountClass};
 }
 
-void describeType(Dictionary& record, std::string_view className) {
-  record.set(kAccountTypeString, AccountsDataMigrator::_accountTypeStringForMailAccountClass(className));
-  record.set(kAccountShortTypeString, AccountsDataMigrator::_accountShortTypeStringForMailAccountClass(className));
-  record.set(kAccountType, AccountsDataMigrator::_accountTypeForMailAccountClass(className));
-}
-
 // The hosted service knows its users by the part before the "@".
 void cutHostedUsername(Dictionary& record) {
   const Text* const type = record.text(kAccountType);
@@ -127,7 +121,11 @@ std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertMailAccountDescripti
                                                                                         std::string_view initialType) {
   Dictionary record = renamed(description, kRenames);
   record.set(kAccountType, initialType);
-  if (const std::optional<Text> className = settledClass(record, initialType)) describeType(record, *className);
+  if (const std::optional<Text> className = settledClass(record, initialType)) {
+    record.set(kAccountTypeString, _accountTypeStringForMailAccountClass(*className));
+    record.set(kAccountShortTypeString, _accountShortTypeStringForMailAccountClass(*className));
+    record.set(kAccountType, _accountTypeForMailAccountClass(*className));
+  }
   cutHostedUsername(record);
   std::shared_ptr<BasicAccount> account = BasicAccount::initWithProperties(record);
   if (!account) return nullptr;

@@ -15,33 +15,20 @@ using platform::Status;
 
 constexpr std::string_view kSentinelContents = "Old Account Information Removal Sentinel";
 
-void makeSentinel(const Path& path) {
-  const platform::Bytes contents{kSentinelContents.begin(), kSentinelContents.end()};
-  std::ignore = platform::current().files->create(path, contents);
-}
-
-void reportUndeleted(const Path& path, const Status& status) {
-  writeToConsole("%s. Could not delete %@. Error = %@", "-[AccountsDataMigrator(Internal) _removeOldAccountsInfo]",
-                 path.native(), status.description());
-}
-
 // A legacy file that cannot be deleted is worth a message only when accounts were found in it.
 enum class Report { failures, nothing };
 
 void reportIfUndeleted(const Path& path, const Status& status, Report report) {
   if (status.isOk() || report == Report::nothing) return;
   tellUnremoved(path, status);
-  reportUndeleted(path, status);
+  writeToConsole("%s. Could not delete %@. Error = %@", "-[AccountsDataMigrator(Internal) _removeOldAccountsInfo]",
+                 path.native(), status.description());
 }
 
 Status deleteLegacyFile(const Path& path, Report report) {
   Status status = removeAndTell(path, platform::RunFact::Kind::sourceRemoved);
   reportIfUndeleted(path, status, report);
   return status;
-}
-
-void deleteSentinel(const Path& path) {
-  reportIfUndeleted(path, platform::current().files->remove(path), Report::failures);
 }
 
 Report failuresIf(bool found) { return found ? Report::failures : Report::nothing; }
@@ -58,14 +45,15 @@ bool AccountsDataMigrator::_failedToRemoveOldAccountsInfo() {
 
 bool AccountsDataMigrator::_removeOldAccountsInfo() {
   const Path sentinel = _absolutePathToOldAccountsInfoRemovalSentinel();
-  if (!_failedToRemoveOldAccountsInfo()) makeSentinel(sentinel);
+  const platform::Bytes contents{kSentinelContents.begin(), kSentinelContents.end()};
+  if (!_failedToRemoveOldAccountsInfo()) std::ignore = platform::current().files->create(sentinel, contents);
 
   const Status exchange = deleteLegacyFile(accountsettings::daAccountPath(), failuresIf(_foundOldDAAccountsToMigrate));
   const bool isMailFileKept = !exchange.isOk() && _foundOldDAAccountsToMigrate;
   if (!isMailFileKept) {
     std::ignore = deleteLegacyFile(accountsettings::mailAccountsPath(), failuresIf(_foundOldMailAccountsToMigrate));
   }
-  deleteSentinel(sentinel);
+  reportIfUndeleted(sentinel, platform::current().files->remove(sentinel), Report::failures);
   return exchange.isOk();  // false also where there was no Exchange file to delete
 }
 

@@ -19,14 +19,7 @@ constexpr unsigned kOpenToEverybody = 0777;
 // No minutes and no seconds: reports of one tenth of a second of one hour share a name, and the later one stays.
 constexpr std::string_view kReportTimePattern = "Y-M-d-H-M-S";
 
-// The copy lies with the shared resources, the report below the home directory.
-Path copyPath(const Path& settingsFile) {
-  return platform::current().directories->sharedResources() / "Library/Logs/CrashReporter" / settingsFile.filename();
-}
-
-Path reportDirectory() {
-  return platform::current().directories->home() / "Library/Logs/CrashReporter/AccountMigration";
-}
+constexpr std::string_view kLogs = "Library/Logs/CrashReporter";
 
 // Answers whether reports can be written there.
 bool prepareReportDirectory(const Path& directory) {
@@ -60,7 +53,7 @@ void AccountsDataMigrator::_copyAsideAccountsPlist() {
   const platform::RunStage stage{"copy aside"};
   platform::FileSystem& files = *platform::current().files;
   const Path source = AccountsManager::fullPathToAccountSettingsPlist();
-  const Path destination = copyPath(source);
+  const Path destination = platform::current().directories->sharedResources() / kLogs / source.filename();
   if (files.kindOf(destination).isOk() && !files.remove(destination).isOk()) {
     writeToConsole("Couldn't remove existing accountsettings copy at %@", destination.native());
   }
@@ -87,7 +80,7 @@ void AccountsDataMigrator::_saveCollatedMigrationInformation() {
     _collatedMigrationData->set(kSavedSettingsKey,
                                 platform::current().propertyLists->readDictionary(settingsFile).valueOr({}));
   }
-  const Path directory = reportDirectory();
+  const Path directory = platform::current().directories->home() / kLogs / "AccountMigration";
   // The directory is made also for a run that migrated nothing and so has nothing to report.
   if (prepareReportDirectory(directory) && _collatedMigrationData) writeReport(directory, *_collatedMigrationData);
 }

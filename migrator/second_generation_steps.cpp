@@ -19,11 +19,6 @@ using Accounts = AccountsManager::Accounts;
 
 // --- Notes on small devices ---
 
-bool deviceKeepsNotesToItself() {
-  const std::optional<PropertyValue> architecture = platform::current().deviceInfo->answer("CPUArchitecture");
-  return architecture == PropertyValue{"armv6"};
-}
-
 // Forced both ways: on such a device notes are no supported data class of any account.
 void keepNotesOnDeviceOnly(BasicAccount& account) {
   if (account.type() == kOnMyDeviceAccountType) {
@@ -74,14 +69,13 @@ Dictionary parentPropertiesFor(const BasicAccount& mail) {
   return parent;
 }
 
-// Here, unlike in the other steps, an account must say that it is active: a new parent offers mail only if told to.
-bool isActiveBecauseItSaysSo(const BasicAccount& account) { return truthForKey(account, kIsActiveKey).value_or(false); }
-
 void wrapInParent(AccountsManager& store, const Account& mail) {
   const Account parent = BasicAccount::initWithProperties(parentPropertiesFor(*mail));
   if (parent == nullptr) return;  // the device knows no cloud accounts, so there is nothing to move to
   for (const StringConstant key : kMovedKeys) mail->removeAccountPropertyForKey(key);
-  if (isActiveBecauseItSaysSo(*mail)) parent->setEnabled_forDataclass(true, kAccountDataclassMail);
+  // Here, unlike in the other steps, an account must say that it is active: a new parent offers mail only if told to.
+  const bool isActive = booleanForKey(*mail, kIsActiveKey).value_or(false);
+  if (isActive) parent->setEnabled_forDataclass(true, kAccountDataclassMail);
   store.replaceAccount_withAccount(mail, parent);
   mail->setParentAccount(parent);
   store.addChild_toAccount(mail, parent);
@@ -112,16 +106,10 @@ void cleanChildrenOf(BasicAccount& cloudAccount) {
   cloudAccount.setAccountProperty_forKey(std::move(cleaned), kAccountChildAccounts);
 }
 
-// Hosted mail is not among these, POP is: the hosted accounts' mail is by now their parents' to switch.
-bool isMailOfOthers(const BasicAccount& account) {
-  return hasClassAmong(account,
-                       {kIMAPAccountClass, kGmailAccountClass, kYahooAccountClass, kAOLAccountClass, kPOPAccountClass});
-}
-
 }  // namespace
 
 bool AccountsDataMigrator::_migrateAccountsFrom8A293(AccountsManager& store) {
-  if (deviceKeepsNotesToItself()) {
+  if (platform::current().deviceInfo->answer("CPUArchitecture") == PropertyValue{"armv6"}) {
     for (const Account& account : store.allBasicAccounts()) keepNotesOnDeviceOnly(*account);
   }
   store.setDataVersion(6);
@@ -141,7 +129,10 @@ bool AccountsDataMigrator::_migrateAccountsFrom8B117(AccountsManager& store) {
 bool AccountsDataMigrator::_migrateAccountsFrom8C136(AccountsManager& store) {
   for (const Account& account : store.allBasicAccounts()) {
     if (hasClassAmong(*account, {kCloudAccountClass})) cleanChildrenOf(*account);
-    if (isMailOfOthers(*account) && isActiveUnlessSaidOtherwise(*account)) {
+    // Hosted mail is not among these, POP is: the hosted accounts' mail is by now their parents' to switch.
+    const bool isMailOfOthers = hasClassAmong(
+        *account, {kIMAPAccountClass, kGmailAccountClass, kYahooAccountClass, kAOLAccountClass, kPOPAccountClass});
+    if (isMailOfOthers && isActiveUnlessSaidOtherwise(*account)) {
       account->setEnabled_forDataclass(true, kAccountDataclassMail);
     }
   }

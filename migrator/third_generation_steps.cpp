@@ -30,7 +30,7 @@ void revertToStandardStatus(BasicAccount& account) {
 
 bool isCloudAccount(const BasicAccount& account) { return hasClassAmong(account, {kCloudAccountClass}); }
 
-bool isPrimary(const BasicAccount& account) { return truthForKey(account, kPrimaryAccountKey).value_or(false); }
+bool isPrimary(const BasicAccount& account) { return booleanForKey(account, kPrimaryAccountKey).value_or(false); }
 
 Array childrenOf(const BasicAccount& account) { return arrayForKey(account, kAccountChildAccounts).value_or(Array{}); }
 
@@ -65,17 +65,12 @@ void letRemindersFollowCalendars(BasicAccount& account) {
   }
 }
 
-void takeSystemAccountName(BasicAccount& account) {
-  const Text name = platform::current().systemAccount->systemAccountTypeString();
-  if (account.displayName() == Text{"Nimbra"}) account.setDisplayName(name);
-}
-
 // Answers whether the account became the primary one.
 bool settleSeparateAccount(BasicAccount& account) {
-  takeSystemAccountName(account);
+  const Text typeString = platform::current().systemAccount->systemAccountTypeString();
+  if (account.displayName() == Text{"Nimbra"}) account.setDisplayName(typeString);
   const bool isToBePrimary = account.isEnabledForDataclass(kAccountDataclassDeviceLocator);
   if (isToBePrimary) makePrimary(account);
-  const Text typeString = platform::current().systemAccount->systemAccountTypeString();
   account.setAccountProperty_forKey(typeString, kAccountTypeString);
   account.setAccountProperty_forKey(typeString, kAccountShortTypeString);
   return isToBePrimary;

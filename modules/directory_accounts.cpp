@@ -7,9 +7,8 @@ namespace {
 
 constexpr ServiceKind kDirectory{.name = "LDAP", .securePort = 636, .plainPort = 389};
 
-const ServiceKind& kindOf(const BasicAccount&) { return kDirectory; }
-
-const platform::ClassRegistration fullAccounts{fullAccountCreator("DirectoryAccountCreator", kindOf)};
+const platform::ClassRegistration fullAccounts{fullAccountCreator(
+    "DirectoryAccountCreator", [](const BasicAccount&) -> const ServiceKind& { return kDirectory; })};
 
 }  // namespace
 }  // namespace modules

@@ -7,9 +7,8 @@ namespace {
 
 constexpr ServiceKind kExchange{.name = "Exchange", .securePort = 443, .plainPort = 80};
 
-const ServiceKind& kindOf(const BasicAccount&) { return kExchange; }
-
-const platform::ClassRegistration fullAccounts{fullAccountCreator("ExchangeAccountCreator", kindOf)};
+const platform::ClassRegistration fullAccounts{
+    fullAccountCreator("ExchangeAccountCreator", [](const BasicAccount&) -> const ServiceKind& { return kExchange; })};
 const platform::ClassRegistration syncAccounts{syncAccountCreator("ExchangeSyncAccountCreator")};
 
 }  // namespace
