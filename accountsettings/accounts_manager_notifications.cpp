@@ -121,11 +121,6 @@ const PropertyValue* currentElseOriginal(const Dictionary* current, const Dictio
   return value != nullptr || original == nullptr ? value : original->find(key);
 }
 
-const Text* typeOf(const Dictionary* original, const Dictionary* current) {
-  const PropertyValue* const type = currentElseOriginal(current, original, kAccountType);
-  return type == nullptr ? nullptr : type->asText();
-}
-
 // The entry ends at the first value that is missing: one without an identifier tells only of the kind of change.
 Dictionary changeEntry(ChangeType change, const Dictionary* original, const Dictionary* current) {
   Dictionary entry{{kASChangeAccountChangeTypeKey, static_cast<std::int32_t>(change)}};
@@ -172,7 +167,8 @@ void AccountsManager::accountDidChange_forDataclass(const BasicAccount& account,
 void AccountsManager::_addNotificationToDictionary_forChangeType_originalProperties_currentProperties(
     NotificationTable& table, ChangeType change, const Dictionary* original, const Dictionary* current) const {
   // Nobody listens for an account that has no type; the file is written, so that is no failure any more.
-  const Text* const type = typeOf(original, current);
+  const PropertyValue* const property = currentElseOriginal(current, original, kAccountType);
+  const Text* const type = property == nullptr ? nullptr : property->asText();
   if (type == nullptr) return;
   std::vector<std::string> names;
   for (const Text& dataclass : dataclassesConcerned(change, original, current)) {

@@ -24,13 +24,6 @@ constexpr std::array<ClassByPath, 8> kClassesByPath{{{"Mail/Lumo-", "WexmoAccoun
                                                      {"Mail/POP-", "POPAccount"},
                                                      {"Mail/IMAP-", "IMAPAccount"}}};
 
-const ClassByPath* classForPath(std::string_view path) {
-  for (const ClassByPath& entry : kClassesByPath) {
-    if (path.find(entry.fragment.view()) != std::string_view::npos) return &entry;
-  }
-  return nullptr;
-}
-
 }  // namespace
 
 RuntimeFixer::~RuntimeFixer() = default;
@@ -62,9 +55,10 @@ FixAnswer ASRuntimeFixMailAccount::fixBasicAccountIfNeeded_loggingMessage(BasicA
 
 bool ASRuntimeFixMailAccount::_cleanupAccountClass(BasicAccount& account) {
   const std::optional<PropertyValue> property = account.accountPropertyForKey(kMailAccountPathKey);
-  const Text* const path = property ? property->asText() : nullptr;
-  if (const ClassByPath* const found = path == nullptr ? nullptr : classForPath(*path)) {
-    account.setAccountClass(found->className);
+  const Text path = property && property->asText() != nullptr ? *property->asText() : Text{};
+  for (const ClassByPath& entry : kClassesByPath) {
+    if (path.view().find(entry.fragment.view()) == std::string_view::npos) continue;
+    account.setAccountClass(entry.className);
     return true;
   }
   _ASLogSystem().log("-[ASRuntimeFixMailAccount _cleanupAccountClass:]",

@@ -17,8 +17,6 @@ const PropertyValue* valueInChain(const BasicAccount& account, std::string_view 
   return nullptr;
 }
 
-bool isGuarded(std::string_view key) { return key == kAccountClass || key == kAccountType; }
-
 // A text that is no identifier would leave the account unreachable, so another kind counts as missing.
 void identify(Dictionary& properties) {
   if (properties.text(kAccountIdentifier) != nullptr) return;
@@ -103,7 +101,7 @@ std::optional<PropertyValue> BasicAccount::accountPropertyForKey(std::string_vie
 }
 
 void BasicAccount::setAccountProperty_forKey(std::optional<PropertyValue> value, std::string_view key) {
-  if (isGuarded(key)) return;
+  if (key == kAccountClass || key == kAccountType) return;
   _forcedSetAccountProperty_forKey(std::move(value), key);
 }
 

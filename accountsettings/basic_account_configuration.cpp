@@ -42,7 +42,7 @@ std::optional<std::vector<Text>> textsUnder(std::string_view key, const Dictiona
   return array == nullptr ? std::nullopt : std::optional{textsIn(*array)};
 }
 
-bool truthUnder(std::string_view key, const Dictionary& properties) {
+bool booleanUnder(std::string_view key, const Dictionary& properties) {
   const PropertyValue* const value = properties.find(key);
   return value != nullptr && value->booleanValue().value_or(false);
 }
@@ -66,29 +66,13 @@ AccountType accountType(const Dictionary& properties, bool keepsNotes) {
                    .enableActions = textsUnder(kPropertiesEnableDataclassActions, properties),
                    .disableActions = textsUnder(kPropertiesDisableDataclassActions, properties),
                    .deleteAccountActions = textsUnder(kPropertiesDeleteAccountActions, properties),
-                   .showsRemindersSeparately = truthUnder(kPropertiesShowRemindersSeparately, properties)};
+                   .showsRemindersSeparately = booleanUnder(kPropertiesShowRemindersSeparately, properties)};
   if (!type.supportedDataclasses) return type;
   // A type of which no data class would be left keeps its list as the file has it.
   Dataclasses known = knownDataclasses(*type.supportedDataclasses, keepsNotes);
   if (!known.empty()) type.supportedDataclasses = std::move(known);
   type.orderedSupportedDataclasses = BasicAccount::_orderedDataclasses(*type.supportedDataclasses);
   return type;
-}
-
-AccountTypes loadAccountTypes() {
-  static constexpr std::string_view kMethod = "+[BasicAccount initialize]";
-  if (!platform::current().files->kindOf(configurationFile("AccountTypesProperties")).isOk()) {
-    failAssertion(kMethod, "BasicAccount", "Could not find AccountTypesProperties.plist");
-  }
-  const platform::Result<Dictionary> file = readConfiguration("AccountTypesProperties");
-  if (!file.isOk()) failAssertion(kMethod, "BasicAccount", "Could not load the dataclasses configuration file");
-  const bool keepsNotes = BasicAccount::isMultitaskingEnabled();
-  AccountTypes types;
-  for (const auto& [type, properties] : file.value()) {
-    const Dictionary* const section = properties.asDictionary();
-    types.set(type, accountType(section == nullptr ? Dictionary{} : *section, keepsNotes));
-  }
-  return types;
 }
 
 const AccountTypes& loadedAccountTypes() {
@@ -98,16 +82,12 @@ const AccountTypes& loadedAccountTypes() {
 
 const AccountType* accountTypeNamed(std::string_view type) { return loadedAccountTypes().find(type); }
 
-const Dictionary& dataclassTable() {
+bool answerForDataclass(std::string_view dataclass, std::string_view question) {
   static std::once_flag once;
   static const Dictionary* table = nullptr;
   std::call_once(once, [] { table = new Dictionary{BasicAccount::_dataclassesProperties().value_or(Dictionary{})}; });
-  return *table;
-}
-
-bool answerForDataclass(std::string_view dataclass, std::string_view question) {
-  const Dictionary* const properties = dataclassTable().dictionary(dataclass);
-  return properties != nullptr && truthUnder(question, *properties);
+  const Dictionary* const properties = table->dictionary(dataclass);
+  return properties != nullptr && booleanUnder(question, *properties);
 }
 
 std::optional<Actions> actionsForDataclass(const std::optional<Actions>& actions, std::string_view dataclass) {
@@ -118,10 +98,22 @@ std::optional<Actions> actionsForDataclass(const std::optional<Actions>& actions
 }  // namespace
 
 void BasicAccount::initialize() {
+  static constexpr std::string_view kMethod = "+[BasicAccount initialize]";
   if (accountTypes.load(std::memory_order_acquire) != nullptr) return;
   const std::scoped_lock lock{classLock};
   if (accountTypes.load(std::memory_order_relaxed) != nullptr) return;
-  accountTypes.store(new AccountTypes{loadAccountTypes()}, std::memory_order_release);
+  if (!platform::current().files->kindOf(configurationFile("AccountTypesProperties")).isOk()) {
+    failAssertion(kMethod, "BasicAccount", "Could not find AccountTypesProperties.plist");
+  }
+  const platform::Result<Dictionary> file = readConfiguration("AccountTypesProperties");
+  if (!file.isOk()) failAssertion(kMethod, "BasicAccount", "Could not load the dataclasses configuration file");
+  const bool keepsNotes = BasicAccount::isMultitaskingEnabled();
+  auto types = std::make_unique<AccountTypes>();
+  for (const auto& [type, properties] : file.value()) {
+    const Dictionary* const section = properties.asDictionary();
+    types->set(type, accountType(section == nullptr ? Dictionary{} : *section, keepsNotes));
+  }
+  accountTypes.store(types.release(), std::memory_order_release);
 }
 
 const Dataclasses& BasicAccount::allSupportedDataclasses() {

@@ -69,15 +69,12 @@ const Text& classNameIn(const Dictionary& description, const Search& search) {
   return *name;
 }
 
-bool isASCII(std::string_view text) {
-  return std::all_of(text.begin(), text.end(), [](char byte) { return static_cast<unsigned char>(byte) < 0x80; });
-}
-
 void openModule(const std::string& path) {
   // The loader is handed an ASCII path; one that has no such form cannot be opened.
+  const bool isASCII = std::ranges::all_of(path, [](char byte) { return static_cast<unsigned char>(byte) < 0x80; });
   const platform::Status opened =
-      isASCII(path) ? platform::current().modules->open(path)
-                    : platform::Status::failure(platform::Cause::unsuitable, "open a module", "the path is not ASCII");
+      isASCII ? platform::current().modules->open(path)
+              : platform::Status::failure(platform::Cause::unsuitable, "open a module", "the path is not ASCII");
   if (!opened.isOk()) failLookup("Could not load the account creator framework %@. Error %s", path, opened.reason());
 }
 

@@ -62,19 +62,6 @@ Array setOfElements(const Array* stored) {
   return elements;
 }
 
-bool isDataclass(const PropertyValue& element, std::string_view dataclass) {
-  return element.asText() != nullptr && *element.asText() == dataclass;
-}
-
-void add(Array& set, std::string_view dataclass) {
-  const auto isThere = [dataclass](const PropertyValue& element) { return isDataclass(element, dataclass); };
-  if (std::none_of(set.begin(), set.end(), isThere)) set.emplace_back(dataclass);
-}
-
-void remove(Array& set, std::string_view dataclass) {
-  std::erase_if(set, [dataclass](const PropertyValue& element) { return isDataclass(element, dataclass); });
-}
-
 struct ManagedDataclass {
   ManagedFeature feature;
   StringConstant dataclass;
@@ -93,13 +80,12 @@ constexpr std::array kManagedFeatures{ManagedFeature::cloudDocumentSync, Managed
                                       ManagedFeature::sharedStreams, ManagedFeature::cloudBackup,
                                       ManagedFeature::cardsWhileLocked};
 
-bool isManaged(const Text& dataclass) {
-  return std::ranges::find(kManagedDataclasses, dataclass.view(), &ManagedDataclass::dataclass) !=
-         kManagedDataclasses.end();
-}
-
 // The device is asked only where its answer can matter.
 Dataclasses withoutRestricted(Dataclasses list) {
+  const auto isManaged = [](const Text& dataclass) {
+    return std::ranges::find(kManagedDataclasses, dataclass.view(), &ManagedDataclass::dataclass) !=
+           kManagedDataclasses.end();
+  };
   if (std::ranges::none_of(list, isManaged)) return list;
   const auto restricted = BasicAccount::_profileRestrictedDataclasses();
   std::erase_if(list, [&restricted](const Text& dataclass) { return restricted.contains(dataclass); });
@@ -146,12 +132,10 @@ void BasicAccount::setEnabled_forDataclass(bool enabled, std::string_view datacl
 }
 
 void BasicAccount::_forcedSetEnabled_forDataclass(bool enabled, std::string_view dataclass) {
+  const PropertyValue member{dataclass};
   Array elements = setOfElements(_properties.array(kAccountEnabledDataclasses));
-  if (enabled) {
-    add(elements, dataclass);
-  } else {
-    remove(elements, dataclass);
-  }
+  if (!enabled) std::erase(elements, member);
+  if (enabled && std::ranges::find(elements, member) == elements.end()) elements.push_back(member);
   setAccountProperty_forKey(std::move(elements), kAccountEnabledDataclasses);
 }
 

@@ -29,25 +29,14 @@ constexpr std::array<TetheredSyncKey, 6> kTetheredSyncKeys{{
     {kAccountDataclassNotes, "Notes"},
 }};
 
-std::optional<std::string_view> tetheredSyncKey(std::string_view dataclass) {
-  for (const TetheredSyncKey& entry : kTetheredSyncKeys) {
-    if (entry.dataclass == dataclass) return entry.key;
-  }
-  return std::nullopt;
-}
-
 std::string localized(std::string_view key) {
   return platform::current().strings->text(kTable, key).value_or(std::string{key});
 }
 
-Text deviceClass() {
-  const std::optional<PropertyValue> answer = platform::current().deviceInfo->answer("DeviceClass");
-  const Text* const text = answer ? answer->asText() : nullptr;
-  return text == nullptr ? Text{kThisDevice} : *text;
-}
-
 std::string localizedForDeviceClass(std::string_view base) {
-  std::string suffix = platform::upperCased(deviceClass());
+  const std::optional<PropertyValue> answer = platform::current().deviceInfo->answer("DeviceClass");
+  const Text* const deviceClass = answer ? answer->asText() : nullptr;
+  std::string suffix = platform::upperCased(deviceClass == nullptr ? Text{kThisDevice} : *deviceClass);
   std::ranges::replace(suffix, ' ', '_');
   return localized(std::string{base} + "_" + suffix);
 }
@@ -91,7 +80,9 @@ std::optional<Text> DeviceLocalAccount::syncStoreIdentifier() const { return ide
 std::string DeviceLocalAccount::tetheredSourceForDataClass(std::string_view dataclass) {
   const auto connection = platform::current().tetheredSync->connect();
   if (!connection.isOk()) return std::string{kThisDevice.view()};
-  const std::optional<PropertyValue> value = connection.value()->value(kTetheredSyncDomain, tetheredSyncKey(dataclass));
+  const auto* const row = std::ranges::find(kTetheredSyncKeys, dataclass, &TetheredSyncKey::dataclass);
+  const auto key = row == kTetheredSyncKeys.end() ? std::nullopt : std::optional<std::string_view>{row->key};
+  const std::optional<PropertyValue> value = connection.value()->value(kTetheredSyncDomain, key);
   const Dictionary* const dictionary = value ? value->asDictionary() : nullptr;
   const Text* const system = dictionary == nullptr ? nullptr : dictionary->text("SyncingOS");
   return system == nullptr ? std::string{kThisDevice.view()} : system->string();
