@@ -76,7 +76,7 @@ class ACCOUNT_EXPORT AccountsManager {
   void setDataVersion(std::uint64_t version) { _dataVersion = version; }
   // Internal: while set, saves send no notifications. Process-wide, written by the migration's thread only.
   static void _setShouldSkipNotifications(bool skip);
-  [[nodiscard]] static bool _shouldSkipNotifications();
+  [[nodiscard]] static bool shouldSkipNotifications();
   [[nodiscard]] static bool _oldDAAccountsInformationFound();
   [[nodiscard]] static bool _oldMailAccountsInformationFound();
   // Whether the file's version is older than the current one, compared without sign; a file that cannot be read or has
@@ -155,9 +155,9 @@ class ACCOUNT_EXPORT AccountsManager {
                                                                 std::unique_ptr<StoreWatch> watch);
   [[nodiscard]] bool _offerLoaded(const Account& account, const PropertyValue& element);
   void _loadAccounts(const Array& accounts);
-  [[nodiscard]] static Account _accountFromElement(const PropertyValue& element);
-  void _registerAccount(const Account& account);
-  void _loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
+  [[nodiscard]] static Account accountFromElement(const PropertyValue& element);
+  void registerAccount(const Account& account);
+  void loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
 
   // Saving. Fixing, like offering, answers whether a fixer had something to do.
   [[nodiscard]] platform::Status _writeFile() const;
@@ -166,10 +166,10 @@ class ACCOUNT_EXPORT AccountsManager {
   void _tellFixers(bool saved);
 
   // By notifier, what changed since the state was last taken.
-  [[nodiscard]] NotificationTable _notificationTable() const;
+  [[nodiscard]] NotificationTable notificationTable() const;
 
   // Takes the identifier, whichever record is registered under it, and its children out of the indexes.
-  void _forgetIdentifierOfAccount(const BasicAccount& account);
+  void forgetIdentifierOfAccount(const BasicAccount& account);
 
   // The order and the index that replacing accounts by types builds, and the accounts that have no place in it yet.
   struct Replacement {
@@ -177,10 +177,10 @@ class ACCOUNT_EXPORT AccountsManager {
     AccountsByID byID;
     Accounts toPlace;
   };
-  void _replaceInPlace(const Types& types, Replacement& replacement);
-  void _appendAccount(const Account& account, Replacement& replacement);
-  void _moveChild(const Account& child, const Replacement& replacement);
-  void _takeFromRecordedParent(const Text& child, const Account& newParent);
+  void replaceInPlace(const Types& types, Replacement& replacement);
+  void appendAccount(const Account& account, Replacement& replacement);
+  void moveChild(const Account& child, const Replacement& replacement);
+  void takeFromRecordedParent(const Text& child, const Account& newParent);
 
   AccountsByID _topLevelAccountsByID;
   Accounts _orderedTopLevelAccounts;

@@ -132,7 +132,7 @@ void AccountsManager::_loadAccounts(const Array& accounts) {
   platform::RunProgress progress{accounts.size()};
   for (const PropertyValue& properties : accounts) {
     progress.next();
-    const Account account = _accountFromElement(properties);
+    const Account account = accountFromElement(properties);
     if (account == nullptr) {
       _ASLogSystem().log("-[AccountsManager _initWithAccountsInfo:]", "ERROR: Failed to create a BasicAccount from %@",
                          properties);
@@ -148,7 +148,7 @@ bool AccountsManager::_offerLoaded(const Account& account, const PropertyValue& 
   bool isFixed = false;
   for (const auto& fixer : _runtimeFixers) {
     const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
-    if (answer != FixAnswer::drop) _registerAccount(account);
+    if (answer != FixAnswer::drop) registerAccount(account);
     isFixed |= answer != FixAnswer::nothingToDo;
     if (!_watch) continue;
     answer == FixAnswer::drop ? _watch->givenUp(element, ASRuntimeFixMailAccount::ruleForDropping())
@@ -157,7 +157,7 @@ bool AccountsManager::_offerLoaded(const Account& account, const PropertyValue& 
   return isFixed;
 }
 
-AccountsManager::Account AccountsManager::_accountFromElement(const PropertyValue& element) {
+AccountsManager::Account AccountsManager::accountFromElement(const PropertyValue& element) {
   const Dictionary* const properties = element.asDictionary();
   return BasicAccount::initWithProperties(properties == nullptr ? Dictionary{} : *properties);
 }
@@ -195,7 +195,7 @@ void AccountsManager::saveAllAccounts() {
     _ASLogSystem().log(kSave, "Failed to save accounts to filesystem.");
   }
   if (isFixed) _tellFixers(true);  // after a failed save, too
-  if (!isSaved || _shouldSkipNotifications()) return;
+  if (!isSaved || shouldSkipNotifications()) return;
   _sendNotificationsForChangedAccounts();
   _setOriginalAccountDictionaries();
 }
@@ -217,7 +217,7 @@ bool AccountsManager::_fixAccountsForSaving() {
       const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "saving accounts");
       // A dropped account is no longer found, but keeps its place in the order and so in the file.
       if (answer == FixAnswer::drop) {
-        _forgetIdentifierOfAccount(*account);
+        forgetIdentifierOfAccount(*account);
         if (_watch) _watch->unrepaired(*account, ASRuntimeFixMailAccount::ruleForDropping());
       }
       isFixed |= answer != FixAnswer::nothingToDo;

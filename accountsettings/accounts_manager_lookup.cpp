@@ -138,12 +138,12 @@ void AccountsManager::_loadChildrenFromAccount(const Account& account) {
   const std::optional<PropertyValue> property = account->accountPropertyForKey(kAccountChildAccounts);
   const Array* const children = property ? property->asArray() : nullptr;
   if (children == nullptr) return;
-  for (const PropertyValue& properties : *children) _loadChild(properties, account, identifier);
+  for (const PropertyValue& properties : *children) loadChild(properties, account, identifier);
 }
 
-void AccountsManager::_loadChild(const PropertyValue& properties, const Account& parent,
-                                 const std::optional<Text>& parentIdentifier) {
-  const Account child = _accountFromElement(properties);
+void AccountsManager::loadChild(const PropertyValue& properties, const Account& parent,
+                                const std::optional<Text>& parentIdentifier) {
+  const Account child = accountFromElement(properties);
   if (child != nullptr) child->setParentAccount(parent);
   const std::optional<Text> identifier = child == nullptr ? std::nullopt : child->identifier();
   if (!identifier) {

@@ -9,7 +9,7 @@ namespace {
 
 using platform::ExclusiveFileLock;
 
-bool shouldSkipNotifications = false;
+bool skipsNotifications = false;
 
 bool existsAt(const platform::Path& path) { return platform::current().files->kindOf(path).isOk(); }
 
@@ -48,9 +48,9 @@ void AccountsManager::waitForMigrationToFinish() { releaseMigrationLock(createAn
 
 std::uint64_t AccountsManager::currentVersion() { return 12; }
 
-void AccountsManager::_setShouldSkipNotifications(bool skip) { shouldSkipNotifications = skip; }
+void AccountsManager::_setShouldSkipNotifications(bool skip) { skipsNotifications = skip; }
 
-bool AccountsManager::_shouldSkipNotifications() { return shouldSkipNotifications; }
+bool AccountsManager::shouldSkipNotifications() { return skipsNotifications; }
 
 bool AccountsManager::_oldDAAccountsInformationFound() { return existsAt(daAccountPath()); }
 

@@ -37,13 +37,13 @@ Account foundIn(const AccountsByID& accounts, const std::optional<Text>& identif
 
 }  // namespace
 
-void AccountsManager::_registerAccount(const Account& account) {
+void AccountsManager::registerAccount(const Account& account) {
   enter(_topLevelAccountsByID, account->identifier(), account);
   _orderedTopLevelAccounts.push_back(account);
   _loadChildrenFromAccount(_orderedTopLevelAccounts.back());
 }
 
-void AccountsManager::_forgetIdentifierOfAccount(const BasicAccount& account) {
+void AccountsManager::forgetIdentifierOfAccount(const BasicAccount& account) {
   const std::optional<Text> identifier = account.identifier();
   if (!identifier) return;
   _removeChildrenForAccountWithIdentifier(*identifier);
@@ -52,7 +52,7 @@ void AccountsManager::_forgetIdentifierOfAccount(const BasicAccount& account) {
 
 void AccountsManager::insertAccount(const Account& account) {
   _ASLogSystem().log("-[AccountsManager insertAccount:]", "Inserting account: %@", account->properties());
-  if (foundIn(_topLevelAccountsByID, account->identifier()) == nullptr) _registerAccount(account);
+  if (foundIn(_topLevelAccountsByID, account->identifier()) == nullptr) registerAccount(account);
 }
 
 void AccountsManager::updateAccount(const Account& account) {
@@ -68,7 +68,7 @@ void AccountsManager::updateAccount(const Account& account) {
 
 void AccountsManager::deleteAccount(const Account& account) {
   _ASLogSystem().log("-[AccountsManager deleteAccount:]", "Deleting account: %@", account->properties());
-  _forgetIdentifierOfAccount(*account);
+  forgetIdentifierOfAccount(*account);
   if (_watch) _watch->willGo(*account, "it was deleted");
   const std::optional<Text> identifier = account->identifier();
   const auto last = std::ranges::find_if(_orderedTopLevelAccounts.rbegin(), _orderedTopLevelAccounts.rend(),
@@ -93,7 +93,7 @@ void AccountsManager::replaceAccount_withAccount(const Account& oldAccount, cons
     failAssertion("-[AccountsManager replaceAccount:withAccount:]", "AccountsManager",
                   "The account with identifier %@ is not in the store", {oldAccount->identifier()});
   }
-  _forgetIdentifierOfAccount(*oldAccount);
+  forgetIdentifierOfAccount(*oldAccount);
   if (_watch) _watch->willGo(*oldAccount, "another account was put in its place");
   // Listed, counted and saved, but found by its identifier only in a store that is loaded afresh.
   *position = newAccount;
@@ -103,15 +103,15 @@ void AccountsManager::replaceAccount_withAccount(const Account& oldAccount, cons
 void AccountsManager::replaceAccountsWithTypes_withAccounts(const Types& types, const Accounts& accounts) {
   _ASLogSystem().log("-[AccountsManager replaceAccountsWithTypes:withAccounts:]", "Replacing accounts");
   Replacement replacement{_orderedTopLevelAccounts, {}, accounts};
-  _replaceInPlace(types, replacement);
+  replaceInPlace(types, replacement);
   for (const Account& account : replacement.toPlace) {
-    account->parentAccountIdentifier() ? _moveChild(account, replacement) : _appendAccount(account, replacement);
+    account->parentAccountIdentifier() ? moveChild(account, replacement) : appendAccount(account, replacement);
   }
   _orderedTopLevelAccounts = std::move(replacement.order);
   _topLevelAccountsByID = std::move(replacement.byID);
 }
 
-void AccountsManager::_replaceInPlace(const Types& types, Replacement& replacement) {
+void AccountsManager::replaceInPlace(const Types& types, Replacement& replacement) {
   AccountsByID given;
   for (const Account& account : replacement.toPlace) enter(given, identifierProperty(*account), account);
   std::unordered_set<Account> placed;
@@ -135,19 +135,19 @@ void AccountsManager::_replaceInPlace(const Types& types, Replacement& replaceme
   std::erase_if(replacement.toPlace, [&placed](const Account& account) { return placed.contains(account); });
 }
 
-void AccountsManager::_appendAccount(const Account& account, Replacement& replacement) {
+void AccountsManager::appendAccount(const Account& account, Replacement& replacement) {
   replacement.order.push_back(account);
   enter(replacement.byID, identifierProperty(*account), account);
   _loadChildrenFromAccount(account);
 }
 
-void AccountsManager::_moveChild(const Account& child, const Replacement& replacement) {
+void AccountsManager::moveChild(const Account& child, const Replacement& replacement) {
   const Account newParent = foundIn(replacement.byID, child->parentAccountIdentifier());
-  if (const std::optional<Text> identifier = child->identifier()) _takeFromRecordedParent(*identifier, newParent);
+  if (const std::optional<Text> identifier = child->identifier()) takeFromRecordedParent(*identifier, newParent);
   if (newParent != nullptr) addChild_toAccount(child, newParent);
 }
 
-void AccountsManager::_takeFromRecordedParent(const Text& child, const Account& newParent) {
+void AccountsManager::takeFromRecordedParent(const Text& child, const Account& newParent) {
   const Text* const recorded = _childAccountIDToParentAccountID.find(child);
   if (recorded == nullptr) return;
   const bool isAlreadyThere = newParent != nullptr && newParent->identifier() == *recorded;
@@ -169,7 +169,7 @@ void AccountsManager::removeChildWithIdentifier_fromAccount(std::string_view ide
   if (const Array* const present = property ? property->asArray() : nullptr) {
     Array children = *present;
     for (const PropertyValue& properties : *present) {
-      const Account child = _accountFromElement(properties);
+      const Account child = accountFromElement(properties);
       if (child != nullptr && child->identifier() == Text{identifier}) std::erase(children, properties);
     }
     parent->setAccountProperty_forKey(std::move(children), kAccountChildAccounts);

@@ -184,7 +184,7 @@ void AccountsManager::_addNotificationToDictionary_forChangeType_originalPropert
 
 void AccountsManager::_sendNotificationsForChangedAccounts() {
   static constexpr std::string_view kMethod = "-[AccountsManager _sendNotificationsForChangedAccounts]";
-  for (const auto& [name, changes] : _notificationTable()) {
+  for (const auto& [name, changes] : notificationTable()) {
     const AccountClassInfo* const notifier = notifierClass(kMethod, name);
     if (notifier == nullptr || !notifier->noteAccountChanges) {
       fail(kMethod, "The notifier %@ does not answer noteAccountChanges:", name);
@@ -193,7 +193,7 @@ void AccountsManager::_sendNotificationsForChangedAccounts() {
   }
 }
 
-AccountsManager::NotificationTable AccountsManager::_notificationTable() const {
+AccountsManager::NotificationTable AccountsManager::notificationTable() const {
   platform::InsertionOrderedMap<Dictionary> originals;
   for (const auto& [identifier, original] : _originalAccountsByID) originals.set(identifier, original);
   NotificationTable table;

@@ -110,7 +110,7 @@ class ACCOUNT_EXPORT BasicAccount : public std::enable_shared_from_this<BasicAcc
   [[nodiscard]] static bool isMultitaskingEnabled();
   [[nodiscard]] static bool _isValidAccountType(std::string_view type);
   // The types that the configuration knows, in its order.
-  [[nodiscard]] static std::vector<Text> _accountTypes();
+  [[nodiscard]] static std::vector<Text> accountTypes();
   [[nodiscard]] static std::optional<Dictionary> _dataclassesProperties();
   [[nodiscard]] static std::optional<Dictionary> _creatorsInfo();
   // Null while the creator file cannot be read.
@@ -153,7 +153,7 @@ class ACCOUNT_EXPORT BasicAccount : public std::enable_shared_from_this<BasicAcc
   [[nodiscard]] bool acceptProperties(const Dictionary& properties);
   [[nodiscard]] std::optional<Text> textForKey(std::string_view key) const;
   // The supported data classes of a type in the canonical order; an empty list for an unknown type.
-  [[nodiscard]] static const Dataclasses& _orderedSupportedDataclassesForAccountType(std::string_view type);
+  [[nodiscard]] static const Dataclasses& orderedSupportedDataclassesForAccountType(std::string_view type);
 
   Dictionary _originalProperties;
   Dictionary _properties;

@@ -26,8 +26,8 @@ struct AccountType {
 using AccountTypes = platform::InsertionOrderedMap<AccountType>;
 
 std::mutex classLock;
-std::atomic<const AccountTypes*> accountTypes = nullptr;
-std::atomic<const Dictionary*> creators = nullptr;
+std::atomic<const AccountTypes*> typeTable = nullptr;
+std::atomic<const Dictionary*> creatorTable = nullptr;
 
 platform::Path configurationFile(std::string_view name) {
   return platform::current().directories->resources() / (std::string{name} + ".plist");
@@ -77,7 +77,7 @@ AccountType accountType(const Dictionary& properties, bool keepsNotes) {
 
 const AccountTypes& loadedAccountTypes() {
   BasicAccount::initialize();
-  return *accountTypes.load(std::memory_order_acquire);
+  return *typeTable.load(std::memory_order_acquire);
 }
 
 const AccountType* accountTypeNamed(std::string_view type) { return loadedAccountTypes().find(type); }
@@ -99,9 +99,9 @@ std::optional<Actions> actionsForDataclass(const std::optional<Actions>& actions
 
 void BasicAccount::initialize() {
   static constexpr std::string_view kMethod = "+[BasicAccount initialize]";
-  if (accountTypes.load(std::memory_order_acquire) != nullptr) return;
+  if (typeTable.load(std::memory_order_acquire) != nullptr) return;
   const std::scoped_lock lock{classLock};
-  if (accountTypes.load(std::memory_order_relaxed) != nullptr) return;
+  if (typeTable.load(std::memory_order_relaxed) != nullptr) return;
   if (!platform::current().files->kindOf(configurationFile("AccountTypesProperties")).isOk()) {
     failAssertion(kMethod, "BasicAccount", "Could not find AccountTypesProperties.plist");
   }
@@ -113,7 +113,7 @@ void BasicAccount::initialize() {
     const Dictionary* const section = properties.asDictionary();
     types->set(type, accountType(section == nullptr ? Dictionary{} : *section, keepsNotes));
   }
-  accountTypes.store(types.release(), std::memory_order_release);
+  typeTable.store(types.release(), std::memory_order_release);
 }
 
 const Dataclasses& BasicAccount::allSupportedDataclasses() {
@@ -131,7 +131,7 @@ const Dataclasses* BasicAccount::supportedDataclassesForAccountType(std::string_
   return found == nullptr || !found->supportedDataclasses ? nullptr : &*found->supportedDataclasses;
 }
 
-const Dataclasses& BasicAccount::_orderedSupportedDataclassesForAccountType(std::string_view type) {
+const Dataclasses& BasicAccount::orderedSupportedDataclassesForAccountType(std::string_view type) {
   static const auto& none = *new Dataclasses;
   const AccountType* const found = accountTypeNamed(type);
   return found == nullptr ? none : found->orderedSupportedDataclasses;
@@ -183,7 +183,7 @@ bool BasicAccount::isMultitaskingEnabled() {
   return !architecture || *architecture != PropertyValue{"armv6"};
 }
 
-std::vector<Text> BasicAccount::_accountTypes() {
+std::vector<Text> BasicAccount::accountTypes() {
   std::vector<Text> types;
   for (const auto& [type, section] : loadedAccountTypes()) types.emplace_back(type);
   return types;
@@ -201,12 +201,12 @@ std::optional<Dictionary> BasicAccount::_dataclassesProperties() {
 std::optional<Dictionary> BasicAccount::_creatorsInfo() { return readConfiguration("AccountCreators").optional(); }
 
 const Dictionary* BasicAccount::_accountCreationMap() {
-  if (const Dictionary* const kept = creators.load(std::memory_order_acquire)) return kept;
+  if (const Dictionary* const kept = creatorTable.load(std::memory_order_acquire)) return kept;
   std::optional<Dictionary> file = _creatorsInfo();
   if (!file) return nullptr;
   auto table = std::make_unique<const Dictionary>(*std::move(file));
   const Dictionary* kept = nullptr;
-  return creators.compare_exchange_strong(kept, table.get()) ? table.release() : kept;
+  return creatorTable.compare_exchange_strong(kept, table.get()) ? table.release() : kept;
 }
 
 }  // namespace accountsettings

@@ -103,7 +103,7 @@ Dataclasses grantedDataclasses(const BasicAccount& account) {
 }  // namespace
 
 const Dataclasses& BasicAccount::supportedDataclasses() const {
-  return _orderedSupportedDataclassesForAccountType(type().value_or(Text{}));
+  return orderedSupportedDataclassesForAccountType(type().value_or(Text{}));
 }
 
 Dataclasses BasicAccount::provisionedDataclasses() const {

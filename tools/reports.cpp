@@ -112,7 +112,7 @@ Outcome showAccount(Session& session, const Words& arguments, bool asJson) {
 Outcome listTypes(Session&, const Words&, bool asJson) {
   Json report{{"types", Json::array()}};
   Rows rows{{"TYPE", "DATA CLASSES"}};
-  for (const Text& type : BasicAccount::_accountTypes()) {
+  for (const Text& type : BasicAccount::accountTypes()) {
     const auto* const listed = BasicAccount::supportedDataclassesForAccountType(type);
     const auto dataclasses =
         BasicAccount::_orderedDataclasses(listed == nullptr ? BasicAccount::Dataclasses{} : *listed);

@@ -37,7 +37,7 @@ class SupportingMigrations : public AccountStore {
 TEST_F(SupportingMigrations, WritesDataVersionTwelve) { EXPECT_EQ(AccountsManager::currentVersion(), 12U); }
 
 TEST_F(SupportingMigrations, SkipsNoNotificationsToBeginWith) {
-  EXPECT_FALSE(AccountsManager::_shouldSkipNotifications());
+  EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
 }
 
 TEST_F(SupportingMigrations, SetsTheDataVersionOfAStoreAndNothingElse) {

@@ -55,7 +55,7 @@ class RunFailures : public testing::Test {
     expectCleanedUp();
   }
   void expectCleanedUp() {
-    EXPECT_FALSE(AccountsManager::_shouldSkipNotifications());
+    EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
     EXPECT_THAT(device.locks->held, IsEmpty());
     EXPECT_TRUE(device.files->exists(kLegacyMailFile));
   }
@@ -107,7 +107,7 @@ TEST_F(RunFailures, FailureAfterTheSaveFailsTheRunToo) {
   device.changePlatform(
       [](platform::Platform& services) { services.preferencesChanged = std::make_shared<ThrowingNotice>(); });
   EXPECT_FALSE(migrator.performMigration());
-  EXPECT_FALSE(AccountsManager::_shouldSkipNotifications());
+  EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
   EXPECT_THAT(device.locks->held, IsEmpty());
   EXPECT_THAT(device.savedIdentifiers(), ElementsAre("M1"));
 }

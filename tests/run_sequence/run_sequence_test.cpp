@@ -75,7 +75,7 @@ TEST_F(RunSequence, NothingToMigrateStillSavesStampsAndTellsTheMailApplication) 
   EXPECT_EQ(savedVersion(), 12);
   EXPECT_THAT(device.savedIdentifiers(), ElementsAre("A"));
   EXPECT_FALSE(device.files->exists(kAutoFetchMarker));
-  EXPECT_FALSE(AccountsManager::_shouldSkipNotifications());
+  EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
 }
 
 TEST_F(RunSequence, EmptyDeviceGetsAnEmptySettingsFile) {
@@ -136,7 +136,7 @@ TEST_F(RunSequence, VersionStepsFindTheConvertedAccountsAndTheLoadedVersion) {
   versionSteps().work = [](AccountsManager& store) {
     EXPECT_NE(store.accountWithIdentifier("M1"), nullptr);
     EXPECT_EQ(store.dataVersion(), 3U);
-    EXPECT_TRUE(AccountsManager::_shouldSkipNotifications());
+    EXPECT_TRUE(AccountsManager::shouldSkipNotifications());
   };
   EXPECT_TRUE(migrator.performMigration());
   EXPECT_EQ(versionSteps().runs, 1);
@@ -188,7 +188,7 @@ TEST_F(RunSequence, FailedVersionStepsKeepTheLegacyFilesAndStampAndSaveAllTheSam
   }
   EXPECT_FALSE(device.files->exists(kReportDirectory));
   EXPECT_THAT(device.outputs, Not(Contains(kMailNotice)));
-  EXPECT_FALSE(AccountsManager::_shouldSkipNotifications());
+  EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
 }
 
 TEST_F(RunSequence, NextRunConvertsAgainWhatAFailedOneLeftWithoutDoublingIt) {
@@ -232,7 +232,7 @@ TEST_F(RunSequence, InterruptedRemovalIsFinishedAndNothingElseDone) {
 TEST_F(RunSequence, FinishingAnInterruptedRemovalLeavesNotificationsOff) {
   device.files->put(kRemovalSentinel, "");
   EXPECT_TRUE(migrator.performMigration());
-  EXPECT_TRUE(AccountsManager::_shouldSkipNotifications());
+  EXPECT_TRUE(AccountsManager::shouldSkipNotifications());
   EXPECT_THAT(device.locks->held, IsEmpty());
 }
 
@@ -337,7 +337,7 @@ TEST_F(RunSequence, WithoutALockNoFileIsTouched) {
   }
   EXPECT_THAT(device.files->calls, IsEmpty());
   EXPECT_THAT(device.outputs, IsEmpty());
-  EXPECT_FALSE(AccountsManager::_shouldSkipNotifications());
+  EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
 }
 
 TEST_F(RunSequence, IsRunWithoutAnybodyWatching) {
