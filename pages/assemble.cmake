@@ -1,0 +1,12 @@
+# Run by a build: makes one file of the page's parts, with the two places that a document's writer fills.
+
+file(READ "${SOURCES}/page.html" page)
+file(READ "${SOURCES}/page.css" style)
+set(script "")
+foreach(part elements device fleet devices start)
+  file(READ "${SOURCES}/${part}.js" text)
+  string(APPEND script "${text}")
+endforeach()
+string(REPLACE "@STYLE@" "${style}" page "${page}")
+string(REPLACE "@SCRIPT@" "${script}" page "${page}")
+file(WRITE "${TARGET}" "${page}")
