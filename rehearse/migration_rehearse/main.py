@@ -1,10 +1,11 @@
 """The program migration-rehearse: what is asked is done, and told by the exit status."""
 
+import json
 import signal
 import sys
 import time
 
-from migration_rehearse import campaign, engines, host, options, telling
+from migration_rehearse import campaign, compare, engines, host, options, report, telling
 from migration_rehearse.listing import Listing
 from migration_rehearse.results import ResultFault, Results
 
@@ -33,7 +34,7 @@ def _interrupt(*_):
 
 
 def _command(name):
-    return {"": run, "merge": merge}[name]
+    return {"": run, "merge": merge, "report": make_report, "compare": make_comparison}[name]
 
 
 def say(what, status):
@@ -86,3 +87,47 @@ def merge(arguments, version):
         count = results.row("SELECT count(*) FROM rehearsals")[0]
     print(f"{asked.target}: {count:,} rehearsals")
     return NOTHING_LOST
+
+
+def make_report(arguments, version):
+    made = options.parser("report", version, "Makes one HTML page of the results, which needs nothing else to be shown.")
+    made.add_argument("results", metavar="FILE", help="a result file")
+    made.add_argument("--output", metavar="FILE", default="report.html", help="the page (default: report.html)")
+    made.add_argument("--release", metavar="RELEASE", default="",
+                      help="a version or the beginning of a digest (default: the release that was first used last)")
+    made.add_argument("--devices", metavar="N", type=options.positive, default=10_000,
+                      help="how many devices it names (default: %(default)s); it counts all")
+    asked = made.parse_args(arguments)
+    with Results(asked.results, read_only=True) as results:
+        release = results.chosen_release(asked.release)
+        try:
+            report.write(results, release, asked.output, asked.devices)
+        except OSError as failure:
+            return say(f"{asked.output}: {failure.strerror}", RESULTS_UNWRITABLE)
+    print(f"{asked.output}: release {release}")
+    return NOTHING_LOST
+
+
+def make_comparison(arguments, version):
+    made = options.parser("compare", version, "Tells which devices end differently under another release.",
+                          epilog="Rules: " + "; ".join(f"{name} ({words})" for name, words in compare.RULES.items())
+                          + "\n\nExit status: 0 nothing differs, or no rule of the gate is broken; 1 otherwise; 2 wrong use;\n"
+                          "4 a result file cannot be read.")
+    made.add_argument("old", metavar="OLD", help="the results of the earlier release")
+    made.add_argument("new", metavar="NEW", help="those of the later one; the same file where it has both")
+    made.add_argument("--earlier", metavar="RELEASE", default="", help="the earlier release, by version or digest")
+    made.add_argument("--later", metavar="RELEASE", default="", help="the later release (default: the last)")
+    made.add_argument("--gate", metavar="RULES", help="which differences may not pass, separated by commas")
+    made.add_argument("--json", action="store_true", help="print a JSON document")
+    asked = made.parse_args(arguments)
+    try:
+        rules = compare.rules_of(asked.gate) if asked.gate is not None else None
+    except compare.WrongRule as wrong:
+        return say(f"--gate: {wrong}", WRONG_USE)
+    with Results(asked.old, read_only=True) as old, Results(asked.new, read_only=True) as new:
+        comparison = compare.comparison_of(old, new, asked.earlier, asked.later)
+        failed = compare.broken(comparison, rules or {})
+        print(json.dumps(compare.as_json(comparison, failed), indent=2) if asked.json else compare.in_words(comparison))
+    for name, devices in failed.items():
+        say(f"gate: {devices:,} devices break {name} ({compare.RULES[name]})", LOSSES)
+    return LOSSES if failed or rules is None and comparison.different else NOTHING_LOST

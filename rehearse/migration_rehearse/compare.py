@@ -1,0 +1,204 @@
+"""Two releases over the same images: which devices end differently, by kind of difference, and whether that may pass."""
+
+import os
+from typing import NamedTuple
+
+from migration_rehearse.campaign import LOSING
+from migration_rehearse.results import ResultFault
+
+MOST_KINDS = 20  # of differences that are told in words
+NOTICEABLE = 0.1  # seconds; who takes less more is not slower, but measured beside somebody else
+RULES = {
+    "none-lost": "no device may lose anything",
+    "none-newly-lost": "no device may lose what it did not lose before",
+    "none-different": "no device may end differently",
+    "all-rehearsed": "every image must have been rehearsed",
+    "none-slower": "none-slower=FACTOR: no device may take so many times its processor time",
+}
+
+
+class WrongRule(ValueError):
+    """A rule that is none."""
+
+
+class Kind(NamedTuple):
+    """How a device ends differently. The three tuples hold codes and facts that came or went, in order."""
+
+    verdicts: tuple  # before and after; empty where they are the same
+    lost_more: tuple
+    lost_less: tuple
+    facts_more: tuple
+    facts_less: tuple
+    is_by_numbers: bool  # the same facts, but more or fewer of them
+
+    def in_words(self):
+        parts = [f"{self.verdicts[0]} → {self.verdicts[1]}"] if self.verdicts else []
+        parts += [f"{words}: {', '.join(codes)}" for words, codes in (
+            ("loses by", self.lost_more), ("no longer loses by", self.lost_less),
+            ("new", self.facts_more), ("no longer", self.facts_less)) if codes]
+        return "; ".join(parts) or ("the same facts, in other numbers" if self.is_by_numbers else "other values only")
+
+
+class Group:
+    """The devices of one kind: how many, and the smallest of them."""
+
+    def __init__(self):
+        self.devices = 0
+        self.size = None
+        self.example = ""
+
+    def add(self, size, content):
+        self.devices += 1
+        if self.size is None or (size, content) < (self.size, self.example):
+            self.size, self.example = size, content
+
+
+class Comparison:
+    """The rehearsals of `results` under `release` beside those of another file, `other`, under `earlier`."""
+
+    def __init__(self, results, release, other, earlier):
+        self.results, self.release, self.earlier = results, release, earlier
+        place = os.path.abspath(other.path).replace("%", "%25").replace("?", "%3f").replace("#", "%23")
+        results.database.execute("ATTACH ? AS old", (f"file:{place}?mode=ro",))
+        self.compared = self._number(f"SELECT count(*) {self._pairs}")
+        self.alone = [self._number("SELECT count(*) FROM old.rehearsals WHERE release = ?", earlier) - self.compared,
+                      self._number("SELECT count(*) FROM main.rehearsals WHERE release = ?", release) - self.compared]
+        self.groups = {}
+        for kind, size, content in self._differences():
+            self.groups.setdefault(kind, Group()).add(size, content)
+
+    @property
+    def _pairs(self):
+        return ("FROM main.rehearsals AS new JOIN old.rehearsals AS old USING (content)"
+                f" WHERE new.release = {self.release.id} AND old.release = {self.earlier.id}")
+
+    @property
+    def different(self):
+        return sum(group.devices for group in self.groups.values())
+
+    def ordered(self):
+        """Kinds with their groups; those in which a verdict changed first, then the largest."""
+        return sorted(self.groups.items(), key=lambda each: (not each[0].verdicts, -each[1].devices, each[0].in_words()))
+
+    def path(self, content):
+        row = self.results.row("SELECT min(path) FROM main.images WHERE content = ?", (content,))
+        return row[0] or content
+
+    def newly_lost(self):
+        return self._number(
+            f"SELECT count(*) {self._pairs} AND new.verdict IN {LOSING} AND (old.verdict NOT IN {LOSING}"
+            " OR coalesce(new.lost, 0) > coalesce(old.lost, 0))")
+
+    def losing(self):
+        return self._number(f"SELECT count(*) FROM main.rehearsals WHERE release = ? AND verdict IN {LOSING}", self.release)
+
+    def unrehearsed(self):
+        return self._number("SELECT count(*) FROM main.rehearsals WHERE release = ? AND verdict = 'unrehearsed'", self.release)
+
+    def slower(self, factor):
+        return self._number(f"SELECT count(*) {self._pairs} AND new.processor_seconds > {float(factor)} * old.processor_seconds"
+                            f" AND new.processor_seconds - old.processor_seconds > {NOTICEABLE}")
+
+    def processor_seconds(self):
+        """Of all that were compared: before and after."""
+        return self.results.row(f"SELECT total(old.processor_seconds), total(new.processor_seconds) {self._pairs}")
+
+    def _differences(self):
+        named = [self._kinds(database) for database in ("old", "main")]
+        query = (f"SELECT content, old.id, new.id, old.verdict, old.cause, new.verdict, new.cause,"
+                 f" coalesce(new.accounts, 0) {self._pairs}"
+                 " AND (old.fingerprint, old.verdict, old.cause) IS NOT (new.fingerprint, new.verdict, new.cause)")
+        for content, old, new, *verdicts, accounts in self.results.rows(query):
+            facts = [self._facts(database, names, rehearsal)
+                     for database, names, rehearsal in zip(("old", "main"), named, (old, new))]
+            losses = [self._losses(database, rehearsal) for database, rehearsal in (("old", old), ("main", new))]
+            kind = _kind(_verdict(*verdicts[:2]), _verdict(*verdicts[2:]), losses, facts)
+            yield kind, (accounts, sum(facts[1].values())), content
+
+    def _kinds(self, database):
+        return {number: " ".join(filter(None, names)) for number, *names in
+                self.results.rows(f"SELECT id, stage, action, code FROM {database}.kinds")}
+
+    def _facts(self, database, names, rehearsal):
+        return {names[kind]: count for kind, count in
+                self.results.rows(f"SELECT kind, count FROM {database}.facts WHERE rehearsal = ?", (rehearsal,))}
+
+    def _losses(self, database, rehearsal):
+        return {code for code, in self.results.rows(f"SELECT code FROM {database}.losses WHERE rehearsal = ?", (rehearsal,))}
+
+    def _number(self, query, release=None):
+        return self.results.row(query, (release.id,) if release else ())[0]
+
+
+def _verdict(verdict, cause):
+    return f"{verdict} ({cause})" if cause else verdict
+
+
+def _kind(before, after, losses, facts):
+    return Kind(
+        verdicts=(before, after) if before != after else (),
+        lost_more=tuple(sorted(losses[1] - losses[0])), lost_less=tuple(sorted(losses[0] - losses[1])),
+        facts_more=tuple(sorted(facts[1].keys() - facts[0].keys())), facts_less=tuple(sorted(facts[0].keys() - facts[1].keys())),
+        is_by_numbers=facts[0] != facts[1],
+    )
+
+
+def rules_of(text):
+    """The rules of a gate, by name, with their numbers. Raises WrongRule."""
+    rules = {}
+    for word in filter(None, text.replace(" ", ",").split(",")):
+        name, equals, number = word.partition("=")
+        if name not in RULES or bool(equals) != (name == "none-slower"):
+            raise WrongRule(f"{word} is no rule; there are {', '.join(RULES)}")
+        try:
+            rules[name] = float(number) if equals else None
+        except ValueError as failure:
+            raise WrongRule(f"{word}: {number} is no number") from failure
+    if not rules:
+        raise WrongRule(f"no rule is given; there are {', '.join(RULES)}")
+    return rules
+
+
+def broken(comparison, rules):
+    """The rules that are broken: each with how many devices break it."""
+    count = {
+        "none-lost": lambda _: comparison.losing(), "none-newly-lost": lambda _: comparison.newly_lost(),
+        "none-different": lambda _: comparison.different, "all-rehearsed": lambda _: comparison.unrehearsed(),
+        "none-slower": comparison.slower,
+    }
+    counted = {name: count[name](number) for name, number in rules.items()}
+    return {name: devices for name, devices in counted.items() if devices}
+
+
+def in_words(comparison):
+    """What differs, for people."""
+    before, after = comparison.processor_seconds()
+    lines = [f"{comparison.compared:,} devices under release {comparison.earlier} and under {comparison.release}:",
+             f"  {comparison.compared - comparison.different:>9,}  end the same"]
+    for kind, group in comparison.ordered()[:MOST_KINDS]:
+        lines += [f"  {group.devices:>9,}  {kind.in_words()}", f"             such as {comparison.path(group.example)}"]
+    rest = comparison.ordered()[MOST_KINDS:]
+    lines += [f"  {sum(group.devices for _, group in rest):>9,}  in {len(rest):,} more ways"] if rest else []
+    lines += [f"{count:,} devices are in the {which} results only." for count, which in
+              zip(comparison.alone, ("earlier", "later")) if count]
+    lines += [f"Processor time: {after / before:.2f} times that of before."] if before else []
+    return "\n".join(lines)
+
+
+def as_json(comparison, failed):
+    """The same for machines."""
+    return {
+        "schema": 1, "earlier": str(comparison.earlier), "later": str(comparison.release), "compared": comparison.compared,
+        "different": comparison.different, "onlyEarlier": comparison.alone[0], "onlyLater": comparison.alone[1],
+        "differences": [{**kind._asdict(), "devices": group.devices, "example": comparison.path(group.example)}
+                        for kind, group in comparison.ordered()],
+        "broken": failed,
+    }
+
+
+def comparison_of(old, new, earlier, later):
+    """Of two open result files, which may be the same one, under the releases that begin so. Raises ResultFault."""
+    releases = old.chosen_release(earlier), new.chosen_release(later)
+    if releases[0].digest == releases[1].digest and os.path.samefile(old.path, new.path):
+        raise ResultFault(f"{new.path}: the two releases are one; name them with --earlier and --later")
+    return Comparison(new, releases[1], old, releases[0])
