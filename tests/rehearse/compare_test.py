@@ -1,0 +1,89 @@
+"""Two releases compared: what differs, by kind with the smallest example, and what a gate lets pass."""
+
+import json
+import unittest
+
+from migration_rehearse.rehearsal import Identified, Rehearsed
+from migration_rehearse.results import Results
+from rehearse_case import RehearseTest
+
+LOADED = {("load", "loaded", ""): 1}
+
+
+def ended(verdict="kept", mark=0, codes=(), facts=LOADED, accounts=1, **more):
+    """A rehearsal; `mark` stands for all that is in its explanation."""
+    return Rehearsed(verdict, accounts=accounts, losses=dict.fromkeys(codes, 1), counts={"lost": len(codes)}, facts=facts,
+                     fingerprint=bytes([mark]) * 16, **more)
+
+
+class Compare(RehearseTest):
+    def filled(self, name, digest, **devices):
+        path = self.scratch / name
+        with Results(path) as results:
+            release = results.release("1", digest)
+            for device, rehearsed in devices.items():
+                results.add_image(Identified(f"/fleet/{device}", "directory", "", device))
+                results.add(device, release, rehearsed)
+        return path
+
+    def compared(self, old, new, *options, status=1):
+        files = self.filled("old", "d", **old), self.filled("new", "e", **new)
+        return self.command("compare", *files, *options, status=status)
+
+    def difference(self, old, new):
+        return json.loads(self.compared({"device": old}, {"device": new}, "--json"))["differences"][0]
+
+    def test_says_that_nothing_differs(self):
+        told = self.compared({"a": ended(), "b": ended("lost")}, {"a": ended(), "b": ended("lost")}, status=0)
+        self.assertRegex(told, r"^2 devices under release 1 \(d\) and under 1 \(e\):\n +2  end the same\n")
+
+    def test_tells_of_verdicts_losses_facts_numbers_and_values_apart(self):
+        more = {**LOADED, ("save", "saved", ""): 1}
+        self.assertEqual(["kept", "lost"], self.difference(ended(), ended("lost", 1, ["c"]))["verdicts"])
+        self.assertEqual(["c"], self.difference(ended("lost"), ended("lost", 2, ["c"]))["lost_more"])
+        self.assertEqual(["save saved"], self.difference(ended(mark=3), ended(mark=4, facts=more))["facts_more"])
+        self.assertTrue(self.difference(ended(mark=5), ended(mark=6, facts={("load", "loaded", ""): 2}))["is_by_numbers"])
+        self.assertIn("other values only", self.compared({"x": ended(mark=7)}, {"x": ended(mark=8)}))
+
+    def test_names_the_smallest_example_of_each_kind(self):
+        sizes = {"large": 9, "small": 2, "middle": 5}
+        told = self.compared({name: ended(accounts=size) for name, size in sizes.items()},
+                             {name: ended("lost", 1, accounts=size) for name, size in sizes.items()})
+        self.assertRegex(told, r"\n +3  kept → lost\n +such as /fleet/small\n")
+
+    def test_compares_only_what_both_have(self):
+        told = self.compared({"a": ended(), "b": ended()}, {"b": ended(), "c": ended(), "e": ended()}, status=0)
+        self.assertIn("1 devices are in the earlier results only.\n2 devices are in the later results only.", told)
+
+    def test_takes_two_releases_of_one_file(self):
+        path = self.filled("both", "d", a=ended())
+        self.command("compare", path, path, status=4)
+        self.filled("both", "e", a=ended("lost", 1))
+        self.assertIn("kept → lost", self.command("compare", path, path, "--earlier", "d", status=1))
+
+
+class Gate(Compare):
+    OLD = {"kept": ended(), "lossy": ended("lost", 1, ["c"]), "slow": ended(processor_seconds=0.2)}
+
+    def gate(self, rules, status, **new):
+        return self.compared(self.OLD, {**self.OLD, **new}, "--gate", rules, status=status)
+
+    def test_passes_what_breaks_no_rule(self):
+        self.gate("none-newly-lost,none-different,all-rehearsed,none-slower=1.5", 0)
+        self.gate("none-newly-lost", 0, kept=ended(mark=9))
+
+    def test_stops_each_thing_that_it_names(self):
+        self.assertIn("1 devices break none-lost", self.gate("none-lost", 1))
+        self.assertIn("break none-newly-lost", self.gate("none-newly-lost", 1, kept=ended("not saved", 2)))
+        self.assertIn("break none-newly-lost", self.gate("none-newly-lost", 1, lossy=ended("lost", 2, ["c", "more"])))
+        self.assertIn("break none-different", self.gate("none-different", 1, kept=ended(mark=9)))
+        self.assertIn("break all-rehearsed", self.gate("all-rehearsed", 1, kept=Rehearsed("unrehearsed", "timeout")))
+        self.assertIn("break none-slower", self.gate("none-slower=2", 1, slow=ended(processor_seconds=0.5)))
+
+    def test_says_what_is_no_rule(self):
+        for rules in ("none", "none-slower", "none-slower=fast", "none-lost=1", ""):
+            self.gate(rules, 2)
+
+
+if __name__ == "__main__":
+    unittest.main()
