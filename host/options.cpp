@@ -24,7 +24,8 @@ constexpr std::string_view kUsage =
 constexpr std::string_view kStatuses =
     "\n"
     "Exit status: 0 the migration succeeded, 1 it did not, 2 wrong use,\n"
-    "3 the plug-in could not be loaded, 5 a snapshot could not be taken or restored.\n";
+    "3 the plug-in could not be loaded, 5 a snapshot could not be taken or restored,\n"
+    "6 the accounts could not be saved.\n";
 
 constexpr std::size_t kUsualColumns = 80;
 
@@ -34,6 +35,8 @@ struct Written {
   std::optional<std::string> dryRun;
   std::optional<std::string> keep;
   std::optional<std::string> listing;
+  std::optional<std::string> ifNeeded;
+  std::optional<std::string> undo;
   bool isHelpAsked = false;
   bool isVersionAsked = false;
 };
@@ -56,8 +59,18 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--keep", "N", "keep the newest N snapshots (default: 5)", &written.keep},
       {"--list-snapshots", "", "in place of a run, list the snapshots in DIR; =json for machines",
        Form{&written.listing, {"json"}}},
-      {"--restore", "ID", "in place of a run, bring the device back to this snapshot in DIR",
+      {"--if-needed", "", "end at once where this release has run well and nothing is to be migrated",
+       Form{&written.ifNeeded, {}}},
+      {"--restore", "ID",
+       "in place of a run, bring the device back to this snapshot in DIR; an unmistakable beginning will do, or: "
+       "latest",
        &options.snapshots.restore},
+      {"--undo", "", "in place of a run, go back to before the last run that changed something",
+       Form{&written.undo, {}}},
+      {"--release", "ID", "in place of a run, keep this snapshot no longer than the others",
+       &options.snapshots.release},
+      {"--of", "ID", "with --explain, in place of a run: what the run of this snapshot did",
+       &options.snapshots.explained},
       {"--help,-h", "", "print this text", &written.isHelpAsked},
       {"--version", "", "print the version", &written.isVersionAsked},
   };
@@ -77,32 +90,44 @@ std::size_t countIn(const std::string& text) {
   throw WrongUse{"--keep needs a number of snapshots, at least 1: " + text};
 }
 
-void settleSnapshots(const Written& written, SnapshotOptions& snapshots) {
-  const bool isListing = written.listing.has_value();
-  if (!snapshots.directory) {
-    if (snapshots.restore) throw WrongUse{"--restore needs --snapshots"};
-    if (isListing) throw WrongUse{"--list-snapshots needs --snapshots"};
-    if (written.keep) throw WrongUse{"--keep needs --snapshots"};
-    return;
-  }
-  if (snapshots.restore && isListing) throw WrongUse{"--restore and --list-snapshots exclude each other"};
-  if (written.keep && (snapshots.restore || isListing)) {
-    throw WrongUse{"--keep is for a run: only a run removes snapshots"};
-  }
-  if (!snapshots.directory->has_filename()) snapshots.directory = snapshots.directory->parent_path();
-  if (written.keep) snapshots.keep = countIn(*written.keep);
-  using Listing = SnapshotOptions::Listing;
-  if (isListing) snapshots.listing = written.listing->empty() ? Listing::table : Listing::json;
+// What is asked for in place of a run, each by its option.
+std::vector<std::string> insteadOfARun(const SnapshotOptions& snapshots) {
+  std::vector<std::string> asked;
+  if (snapshots.restore) asked.emplace_back("--restore");
+  if (snapshots.isUndo) asked.emplace_back("--undo");
+  if (snapshots.release) asked.emplace_back("--release");
+  if (snapshots.listing != SnapshotOptions::Listing::none) asked.emplace_back("--list-snapshots");
+  if (snapshots.explained) asked.emplace_back("--of");
+  return asked;
 }
 
-// A rehearsal keeps nothing, and what is done in place of a run is no run to rehearse or to explain.
+void settleSnapshots(const Written& written, SnapshotOptions& snapshots) {
+  using Listing = SnapshotOptions::Listing;
+  if (written.listing) snapshots.listing = written.listing->empty() ? Listing::table : Listing::json;
+  snapshots.isIfNeeded = written.ifNeeded.has_value();
+  snapshots.isUndo = written.undo.has_value();
+  const std::vector<std::string> instead = insteadOfARun(snapshots);
+  if (!snapshots.directory) {
+    if (!instead.empty()) throw WrongUse{instead.front() + " needs --snapshots"};
+    if (written.keep) throw WrongUse{"--keep needs --snapshots"};
+    if (written.ifNeeded) throw WrongUse{"--if-needed needs --snapshots"};
+    return;
+  }
+  if (instead.size() > 1) throw WrongUse{instead[0] + " and " + instead[1] + " exclude each other"};
+  if (written.keep && !instead.empty()) throw WrongUse{"--keep is for a run: only a run removes snapshots"};
+  if (written.ifNeeded && !instead.empty()) throw WrongUse{"--if-needed is for a run, and this is none"};
+  if (!snapshots.directory->has_filename()) snapshots.directory = snapshots.directory->parent_path();
+  if (written.keep) snapshots.keep = countIn(*written.keep);
+}
+
+// What is done in place of a run is no run to rehearse or to explain, but for what a snapshot has of one.
 void settleRun(const Written& written, Options& options) {
-  const SnapshotOptions& snapshots = options.snapshots;
-  const bool isRun = !snapshots.restore && snapshots.listing == SnapshotOptions::Listing::none;
+  const bool isRun = insteadOfARun(options.snapshots).empty();
   options.isRehearsal = written.dryRun.has_value();
-  if (options.isRehearsal && snapshots.directory) throw WrongUse{"--dry-run and --snapshots exclude each other"};
+  if (options.snapshots.explained && !written.explain) throw WrongUse{"--of needs --explain"};
+  if (options.isRehearsal && !isRun) throw WrongUse{"--dry-run is for a run, and this is none"};
   if (!written.explain) return;
-  if (!isRun) throw WrongUse{"--explain is for a run, and this is none"};
+  if (!isRun && !options.snapshots.explained) throw WrongUse{"--explain is for a run, and this is none"};
   options.explain = *written.explain == "json" ? Explain::json : Explain::text;
 }
 

@@ -18,7 +18,11 @@ struct SnapshotOptions {
 
   std::optional<std::filesystem::path> directory;  // set where anything is asked of them
   std::size_t keep = 5;                            // how many stay after a run
+  bool isIfNeeded = false;                         // a run that has nothing to do is none
   std::optional<std::string> restore;              // the identifier, in place of a run
+  bool isUndo = false;                             // back to before the last run, in place of a run
+  std::optional<std::string> release;              // the identifier, in place of a run
+  std::optional<std::string> explained;            // the identifier of whose run is told, in place of a run
   Listing listing = Listing::none;                 // in place of a run
 };
 

@@ -1,6 +1,9 @@
 #include "host/rehearsal.h"
 
+#include <cerrno>
+#include <map>
 #include <memory>
+#include <optional>
 #include <utility>
 
 #include "platform/linux/files/rehearsal_file_system.h"
@@ -34,12 +37,72 @@ class RehearsalLocks final : public platform::ExclusiveFileLocks {
   std::filesystem::path _directory;
 };
 
+using platform::FileAttributes;
+using platform::Path;
+using platform::Result;
+using platform::Status;
+
+class RehearsalKeeper final : public platform::FileKeeper {
+ public:
+  RehearsalKeeper(std::shared_ptr<FileKeeper> inner, std::shared_ptr<platform::FileSystem> files)
+      : _inner{std::move(inner)}, _files{std::move(files)} {}
+
+  Result<FileAttributes> attributesOf(const Path& path) override {
+    const auto found = _changed.find(path);
+    if (found == _changed.end()) return _inner->attributesOf(path);
+    if (!found->second) return Status::failure(ENOENT, "look at " + path.string());
+    return *found->second;
+  }
+
+  Result<platform::FileCopy> read(const Path& path, std::size_t sizeLimit) override {
+    if (!_changed.contains(path)) return _inner->read(path, sizeLimit);
+    const Result<FileAttributes> attributes = attributesOf(path);
+    Result<platform::Bytes> bytes = _files->read(path, sizeLimit);
+    if (!attributes.isOk() || !bytes.isOk()) return attributes.isOk() ? bytes.status() : attributes.status();
+    return platform::FileCopy{attributes.value(), bytes.take()};
+  }
+
+  Result<std::vector<std::string>> entriesOf(const Path& directory) override { return _inner->entriesOf(directory); }
+
+  Status append(const Path& path, std::span<const std::uint8_t> /*bytes*/) override {
+    return Status::failure(EROFS, "add to " + path.string());
+  }
+
+  Status restore(const Path& path, std::span<const std::uint8_t> bytes, const FileAttributes& attributes) override {
+    Status replaced = _files->replace(path, bytes);
+    if (replaced.isOk()) _changed[path] = attributes;
+    return replaced;
+  }
+
+  Status removeFile(const Path& path) override {
+    const Status removed = _files->remove(path);
+    if (!removed.isOk() && removed.errorNumber() != ENOENT) return removed;
+    _changed[path] = std::nullopt;
+    return {};
+  }
+
+ private:
+  std::shared_ptr<FileKeeper> _inner;
+  std::shared_ptr<platform::FileSystem> _files;
+  std::map<Path, std::optional<FileAttributes>> _changed;  // nothing where nothing stands any more
+};
+
 }  // namespace
+
+std::shared_ptr<platform::ExclusiveFileLocks> makeRehearsalLocks(std::shared_ptr<platform::ExclusiveFileLocks> inner,
+                                                                 std::filesystem::path directory) {
+  return std::make_shared<RehearsalLocks>(std::move(inner), std::move(directory));
+}
+
+std::shared_ptr<platform::FileKeeper> makeRehearsalKeeper(std::shared_ptr<platform::FileKeeper> inner,
+                                                          std::shared_ptr<platform::FileSystem> files) {
+  return std::make_shared<RehearsalKeeper>(std::move(inner), std::move(files));
+}
 
 void rehearseOn(platform::Platform& platform, const std::filesystem::path& lockDirectory) {
   platform.files = platform::makeRehearsalFileSystem(platform.files, platform.directories->systemRoot());
   platform.propertyLists = platform::makeLibplistPropertyListStore(platform.files);
-  platform.locks = std::make_shared<RehearsalLocks>(std::move(platform.locks), lockDirectory);
+  platform.locks = makeRehearsalLocks(std::move(platform.locks), lockDirectory);
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();
   platform.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
   platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();

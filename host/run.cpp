@@ -15,6 +15,7 @@
 #include "host/snapshot_steps.h"
 #include "host/trace.h"
 #include "host/traced_services.h"
+#include "platform/silent_services.h"
 #include "platform/temporary_directory.h"
 
 namespace host {
@@ -41,15 +42,24 @@ Watchers watchersFor(const Options& options) {
   Watchers watchers;
   watchers.trace = openTrace(options);
   const bool isExplained = options.explain != Explain::notAsked;
-  if (isExplained || watchers.progress->isOnTerminal()) {
-    watchers.watch = std::make_shared<RunWatch>(watchers.trace, isExplained, watchers.progress);
+  const bool isKept = options.snapshots.directory.has_value();  // with the snapshot
+  if (isExplained || isKept || watchers.progress->isOnTerminal()) {
+    watchers.watch =
+        std::make_shared<RunWatch>(isExplained ? watchers.trace : nullptr, isExplained || isKept, watchers.progress);
   }
   return watchers;
+}
+
+// A device image is none of the business of the programs that run on this machine.
+void silenceNotices(platform::Platform& platform) {
+  platform.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
+  platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();
 }
 
 platform::Platform platformFor(const Options& options, const Watchers& watchers) {
   auto platform = platform::makeLinuxPlatform(options.device);
   if (options.isRehearsal) rehearseOn(platform, options.device.lockDirectory);
+  if (platform.directories->systemRoot().lexically_normal() != "/") silenceNotices(platform);
   if (watchers.trace) traceServices(platform, watchers.trace);
   putConsoleInFrontOf(watchers.progress, platform);
   platform.observer = watchers.watch;
@@ -62,18 +72,6 @@ std::unique_ptr<platform::DataClassMigrator> load(const Options& options) {
   return std::get<std::unique_ptr<platform::DataClassMigrator>>(std::move(loaded));
 }
 
-bool perform(platform::DataClassMigrator& migrator, const SnapshotOptions& options, const Watchers& watchers) {
-  const auto undo = beginUndoableRun(options, migrator);
-  const bool success = migrator.performMigration();
-  watchers.progress->clear();
-  if (undo) undo->end(success, options.keep);
-  if (watchers.trace) {
-    watchers.trace->result(migrator.dataClassName(), success);
-    if (!watchers.trace->complete()) say("the trace is incomplete: not every event could be written");
-  }
-  return success;
-}
-
 void explain(const Options& options, const Watchers& watchers, const Outcome& outcome) {
   if (options.explain == Explain::notAsked) return;
   const Explanation& explanation = watchers.watch->explanation();
@@ -82,19 +80,66 @@ void explain(const Options& options, const Watchers& watchers, const Outcome& ou
   if (!commandline::print(text)) say("the explanation could not be written to standard output");
 }
 
+bool isSaved(const Explanation& explanation) {
+  const platform::RunFact* const save = explanation.lastSave();
+  return save == nullptr || save->kind != platform::RunFact::Kind::saveFailed;
+}
+
+snapshots::RunEnd endOf(const Explanation& explanation, const Outcome& outcome) {
+  snapshots::RunEnd end{.isMigrated = outcome.success,
+                        .isSaved = isSaved(explanation),
+                        .onlyInSnapshot = {},
+                        .explanation = textOf(explanation, outcome),
+                        .explanationAsJson = jsonDocumentOf(explanation, outcome)};
+  for (const std::string& file : explanation.lostFiles()) end.onlyInSnapshot.push_back("the accounts of " + file);
+  return end;
+}
+
+ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Watchers& watchers) {
+  const auto session = beginRunWithSnapshots(options, migrator);
+  const bool success = migrator.performMigration();
+  watchers.progress->clear();
+  const Outcome outcome{.dataClass = migrator.dataClassName(), .success = success, .isRehearsal = options.isRehearsal};
+  auto ended = snapshots::Ended::asItIs;
+  if (session) ended = session->end(endOf(watchers.watch->explanation(), outcome), options.snapshots.keep);
+  if (watchers.trace) {
+    watchers.trace->result(migrator.dataClassName(), success);
+    if (!watchers.trace->complete()) say("the trace is incomplete: not every event could be written");
+  }
+  explain(options, watchers, outcome);
+  if (ended == snapshots::Ended::rolledBack) {
+    say("the accounts could not be saved; the device is as it was before the run");
+    return ExitStatus::notSaved;
+  }
+  return success ? ExitStatus::migrated : ExitStatus::notMigrated;
+}
+
+// A plug-in that cannot be loaded is the run's to tell.
+bool isNeeded(const Options& options) {
+  platform::setCurrent(platform::makeLinuxPlatform(options.device));
+  const auto loaded = loadMigrator(platform::current(), options.plugin ? *options.plugin : installedPlugin());
+  const auto* const migrator = std::get_if<std::unique_ptr<platform::DataClassMigrator>>(&loaded);
+  return migrator == nullptr || isRunNeeded(options.snapshots, **migrator);
+}
+
 }  // namespace
 
 ExitStatus run(const Options& options) {
+  if (options.snapshots.isIfNeeded && !isNeeded(options)) return ExitStatus::migrated;
   const Watchers watchers = watchersFor(options);
   platform::setCurrent(platformFor(options, watchers));
-  if (isForSnapshots(options.snapshots)) return workOnSnapshots(options.snapshots);
+  if (isToBePrinted(options.snapshots)) {
+    printFromSnapshots(options.snapshots, options.explain);
+    return ExitStatus::migrated;
+  }
   const auto migrator = load(options);  // first, so that nothing is touched where there is none
+  if (isToBeChanged(options.snapshots)) {
+    changeBySnapshots(options.snapshots, *migrator);
+    return ExitStatus::migrated;
+  }
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");
-  const bool success = perform(*migrator, options.snapshots, watchers);
-  explain(options, watchers,
-          {.dataClass = migrator->dataClassName(), .success = success, .isRehearsal = options.isRehearsal});
-  return success ? ExitStatus::migrated : ExitStatus::notMigrated;
+  return perform(*migrator, options, watchers);
 }
 
 }  // namespace host

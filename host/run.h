@@ -6,7 +6,14 @@
 
 namespace host {
 
-enum class ExitStatus : std::uint8_t { migrated = 0, notMigrated = 1, wrongUse = 2, noPlugin = 3, noSnapshot = 5 };
+enum class ExitStatus : std::uint8_t {
+  migrated = 0,
+  notMigrated = 1,
+  wrongUse = 2,
+  noPlugin = 3,
+  noSnapshot = 5,
+  notSaved = 6
+};
 
 // What the command line asks for: a run (makes the platform, loads the plug-in, calls it once and reports), or
 // something to be done with the snapshots in its place. Throws commandline::Ending where it ends before the plug-in is

@@ -4,60 +4,95 @@
 #include <utility>
 
 #include "commandline/text.h"
+#include "host/rehearsal.h"
 #include "host/say.h"
 #include "host/snapshots/listing.h"
+#include "host/snapshots/problem.h"
 #include "platform/linux/files/linux_file_keeper.h"
+#include "platform/linux/files/linux_file_locks.h"
 
 namespace host {
 namespace {
 
 using Listing = SnapshotOptions::Listing;
 using snapshots::Missing;
+using snapshots::Problem;
+using snapshots::SnapshotSession;
 
-snapshots::UndoPlace placeFor(const SnapshotOptions& options) {
+snapshots::Storage storage() {
+  return {platform::current().files, platform::makeFileKeeper(*platform::current().directories)};
+}
+
+snapshots::SessionPlace placeFor(const SnapshotOptions& options, platform::MigrationFootprint footprint) {
   return {.services = platform::current(),
-          .keeper = platform::makeFileKeeper(*platform::current().directories),
+          .keeper = storage().keeper,
+          .locks = platform::makeFileLocks(*options.directory),
           .directory = *options.directory,
+          .footprint = std::move(footprint),
           .release = HOST_VERSION,
           .warn = [](const std::string& line) { say(line); }};
 }
 
-void list(const SnapshotOptions& options) {
-  const snapshots::Storage storage{platform::current().files,
-                                   platform::makeFileKeeper(*platform::current().directories)};
-  const std::string text = options.listing == Listing::json
-                               ? listingAsJson(storage, *options.directory)
-                               : commandline::printableLines(listingForPeople(storage, *options.directory));
-  static_cast<void>(commandline::print(text));
+std::unique_ptr<SnapshotSession> rehearse(snapshots::SessionPlace place) {
+  place.locks = makeRehearsalLocks(std::move(place.locks), place.directory);
+  place.keeper = makeRehearsalKeeper(std::move(place.keeper), place.services.files);
+  SnapshotSession{std::move(place), Missing::isAccepted}.rehearse();
+  return nullptr;
 }
 
-void restore(const SnapshotOptions& options) {
-  snapshots::Undo undo{placeFor(options), Missing::isRefused};
-  const std::string before = undo.restore(*options.restore);
-  std::printf("restored snapshot %s; the state before it is snapshot %s\n", options.restore->c_str(), before.c_str());
+void printExplanation(const SnapshotOptions& options, Explain explain) {
+  static_cast<void>(requireOwnDirectory(storage(), *options.directory, Missing::isRefused));
+  const snapshots::SnapshotStore store{storage(), *options.directory};
+  const std::string id = store.identifierMeantBy(*options.explained);
+  const auto text =
+      store.record(id, explain == Explain::json ? snapshots::kExplanationAsJson : snapshots::kExplanation);
+  if (!text) throw Problem{Problem::Kind::wrongUse, "snapshot " + id + " has no explanation"};
+  static_cast<void>(commandline::print(explain == Explain::json ? *text : commandline::printableLines(*text)));
 }
 
 }  // namespace
 
-std::unique_ptr<snapshots::Undo> beginUndoableRun(const SnapshotOptions& options,
-                                                  const platform::DataClassMigrator& migrator) {
-  if (!options.directory) return nullptr;
-  auto undo = std::make_unique<snapshots::Undo>(placeFor(options), Missing::isMade);
+std::unique_ptr<SnapshotSession> beginRunWithSnapshots(const Options& options,
+                                                       const platform::DataClassMigrator& migrator) {
+  if (!options.snapshots.directory) return nullptr;
+  snapshots::SessionPlace place = placeFor(options.snapshots, migrator.footprint());
+  if (options.isRehearsal) return rehearse(std::move(place));
+  auto session = std::make_unique<SnapshotSession>(std::move(place), Missing::isMade);
   platform::Platform watched = platform::current();
-  watched.files = undo->begin(migrator.footprint());
+  watched.files = session->begin();
   platform::setCurrent(std::move(watched));
-  return undo;
+  return session;
 }
 
-bool isForSnapshots(const SnapshotOptions& options) { return options.restore || options.listing != Listing::none; }
+bool isRunNeeded(const SnapshotOptions& options, const platform::DataClassMigrator& migrator) {
+  return snapshots::isRunNeeded(storage(), *options.directory, platform::current(), migrator.footprint(), HOST_VERSION);
+}
 
-ExitStatus workOnSnapshots(const SnapshotOptions& options) {
-  if (options.restore) {
-    restore(options);
+bool isToBePrinted(const SnapshotOptions& options) { return options.explained || options.listing != Listing::none; }
+
+void printFromSnapshots(const SnapshotOptions& options, Explain explain) {
+  if (options.explained) {
+    printExplanation(options, explain);
   } else {
-    list(options);
+    const std::string text = options.listing == Listing::json
+                                 ? listingAsJson(storage(), *options.directory)
+                                 : commandline::printableLines(listingForPeople(storage(), *options.directory));
+    static_cast<void>(commandline::print(text));
   }
-  return ExitStatus::migrated;
+}
+
+bool isToBeChanged(const SnapshotOptions& options) { return options.restore || options.isUndo || options.release; }
+
+void changeBySnapshots(const SnapshotOptions& options, const platform::DataClassMigrator& migrator) {
+  SnapshotSession session{placeFor(options, migrator.footprint()), Missing::isRefused};
+  const std::string id = session.identifierMeantBy(options.release ? options.release : options.restore);
+  if (options.release) {
+    session.release(id);
+    std::printf("snapshot %s is kept no longer than the others\n", id.c_str());
+  } else {
+    const std::string before = session.restore(id);
+    std::printf("restored snapshot %s; the state before it is snapshot %s\n", id.c_str(), before.c_str());
+  }
 }
 
 }  // namespace host

@@ -1,21 +1,29 @@
 #pragma once
 
+#include <filesystem>
 #include <memory>
 
-#include "host/run.h"
-#include "host/snapshots/undo.h"
+#include "host/options.h"
+#include "host/snapshots/snapshot_session.h"
 
 namespace host {
 
 // What the process's platform and the command line make of the snapshots. All throw snapshots::Problem.
 
-// Takes the snapshot that a run goes back to, and lets the plug-in change the device's files only with that noted. Null
-// where no snapshots are asked for.
-[[nodiscard]] std::unique_ptr<snapshots::Undo> beginUndoableRun(const SnapshotOptions& options,
-                                                                const platform::DataClassMigrator& migrator);
+// Begins a run, or its rehearsal: takes the snapshot that the run goes back to, and lets the plug-in change the
+// device's files only with that noted. Null where no snapshots are asked for.
+[[nodiscard]] std::unique_ptr<snapshots::SnapshotSession> beginRunWithSnapshots(
+    const Options& options, const platform::DataClassMigrator& migrator);
 
-// Whether a list or a restore is asked for in place of a run.
-[[nodiscard]] bool isForSnapshots(const SnapshotOptions& options);
-[[nodiscard]] ExitStatus workOnSnapshots(const SnapshotOptions& options);
+// Whether a run has anything to do; see docs/SNAPSHOTS.md.
+[[nodiscard]] bool isRunNeeded(const SnapshotOptions& options, const platform::DataClassMigrator& migrator);
+
+// Whether something is to be printed in place of a run, and that.
+[[nodiscard]] bool isToBePrinted(const SnapshotOptions& options);
+void printFromSnapshots(const SnapshotOptions& options, Explain explain);
+
+// Whether a snapshot is to be restored or released in place of a run, and that.
+[[nodiscard]] bool isToBeChanged(const SnapshotOptions& options);
+void changeBySnapshots(const SnapshotOptions& options, const platform::DataClassMigrator& migrator);
 
 }  // namespace host

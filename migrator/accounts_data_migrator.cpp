@@ -123,13 +123,14 @@ platform::MigrationFootprint AccountsDataMigrator::footprint() const {
   const std::string mail = accountsettings::mailAccountsPath();
   return {.lockName = std::string{accountsettings::kMigrationLockName.view()},
           .versionKey = std::string{accountsettings::kPlistVersionKey.view()},
+          .currentVersion = static_cast<std::int64_t>(AccountsManager::currentVersion()),
           .files = {{Part::settings, AccountsManager::fullPathToAccountSettingsPlist()},
                     {Part::legacy, exchange},
                     {Part::legacy, mail},
                     {Part::other, originalCompanionOf(exchange)},
                     {Part::other, originalCompanionOf(mail)},
-                    {Part::other, accountsettings::removalSentinelPath()},
-                    {Part::other, accountsettings::mailAutoFetchMarkerPath()}}};
+                    {Part::sentinel, accountsettings::removalSentinelPath()},
+                    {Part::marker, accountsettings::mailAutoFetchMarkerPath()}}};
 }
 
 bool AccountsDataMigrator::performMigration() {

@@ -18,6 +18,8 @@ struct MigrationFile {
   enum class Part : std::uint8_t {
     settings,  // what a run leaves behind
     legacy,    // what it converts and then deletes: the only copy of what is in it until the settings are saved
+    sentinel,  // stands while legacy files are deleted: a later run that finds it has work to do
+    marker,    // stands there or not; its bytes mean nothing
     other,
   };
   Part part = Part::other;
@@ -26,8 +28,9 @@ struct MigrationFile {
 
 // What a host has to know about runs to keep copies of what they change. Records that a run only adds are not in it.
 struct MigrationFootprint {
-  std::string lockName;    // of the ExclusiveFileLock that performMigration takes
-  std::string versionKey;  // under which the settings, a property list, tell their data version
+  std::string lockName;             // of the ExclusiveFileLock that performMigration takes
+  std::string versionKey;           // under which the settings, a property list, tell their data version
+  std::int64_t currentVersion = 0;  // the data version that a run leaves behind
   std::vector<MigrationFile> files;
 };
 

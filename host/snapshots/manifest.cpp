@@ -1,25 +1,26 @@
 #include "host/snapshots/manifest.h"
 
+#include <algorithm>
 #include <array>
 #include <nlohmann/json.hpp>
+#include <stdexcept>
 
-#include "host/snapshots/checksum.h"
 #include "host/snapshots/problem.h"
 
 namespace host::snapshots {
 namespace {
 
 using Json = nlohmann::ordered_json;
-using Part = platform::MigrationFile::Part;
 
 constexpr int kFormat = 1;
-constexpr std::array<const char*, 3> kParts{"settings", "legacy", "other"};
+constexpr std::array<const char*, 5> kParts{"settings", "legacy", "sentinel", "marker", "other"};
+constexpr std::uint32_t kOrdinaryPermissions = 0777;
+constexpr const char* kFile = "file";
+constexpr const char* kKeptByAnEarlierRelease = "an earlier release of the host kept it";
 
 Part partNamed(const std::string& name) {
-  for (const Part part : {Part::settings, Part::legacy}) {
-    if (name == nameOf(part)) return part;
-  }
-  return Part::other;
+  const auto* const found = std::ranges::find(kParts, name);
+  return found == kParts.end() ? Part::other : static_cast<Part>(found - kParts.begin());
 }
 
 template <typename Value>
@@ -48,12 +49,15 @@ std::uint32_t fromOctal(const std::string& digits) {
 }
 
 Json jsonOf(const KeptFile& file) {
-  Json json{{"path", file.path.native()}, {"part", nameOf(file.part)}, {"state", file.isPresent() ? "file" : kAbsent}};
+  Json json{
+      {"path", file.path.native()}, {"part", nameOf(file.part)}, {"state", file.hasCopy() ? kFile : file.contents}};
   if (!file.isPresent()) return json;
   const platform::FileAttributes& attributes = file.attributes;
-  json["copy"] = file.copy;
-  json["size"] = attributes.size;
-  json["sha256"] = file.contents;
+  if (file.hasCopy()) {
+    json["copy"] = file.copy;
+    json["size"] = attributes.size;
+    json["sha256"] = file.contents;
+  }
   json["owner"] = attributes.owner;
   json["group"] = attributes.group;
   json["mode"] = octal(attributes.permissions);
@@ -61,22 +65,31 @@ Json jsonOf(const KeptFile& file) {
   return json;
 }
 
+bool isPlainName(const std::string& name) {
+  return !name.empty() &&
+         std::ranges::all_of(name, [](char character) { return character >= '0' && character <= '9'; });
+}
+
+void readCopy(const Json& json, KeptFile& file) {
+  file.copy = json.at("copy");
+  if (!isPlainName(file.copy)) throw std::invalid_argument{"a copy outside of the snapshot"};
+  file.contents = json.at("sha256");
+  file.attributes.size = json.at("size");
+}
+
 KeptFile fileFrom(const Json& json) {
   KeptFile file{.path = json.at("path").get<std::string>(),
                 .part = partNamed(json.at("part")),
-                .contents = kAbsent,
+                .contents = json.at("state"),
                 .attributes = {},
                 .copy = {}};
-  if (json.at("state") == kAbsent) return file;
-  file.copy = json.at("copy");
-  file.contents = json.at("sha256");
-  file.attributes = {.kind = platform::FileKind::file,
-                     .size = json.at("size"),
-                     .owner = json.at("owner"),
-                     .group = json.at("group"),
-                     .permissions = fromOctal(json.at("mode")),
-                     .modifiedSeconds = json.at("modified").at(0),
-                     .modifiedNanoseconds = json.at("modified").at(1)};
+  if (file.contents == kFile) readCopy(json, file);
+  if (!file.isPresent()) return file;
+  file.attributes.owner = json.at("owner");
+  file.attributes.group = json.at("group");
+  file.attributes.permissions = fromOctal(json.at("mode")) & kOrdinaryPermissions;
+  file.attributes.modifiedSeconds = json.at("modified").at(0);
+  file.attributes.modifiedNanoseconds = json.at("modified").at(1);
   return file;
 }
 
@@ -94,7 +107,8 @@ Json jsonOf(const Manifest& manifest) {
           {"versionKey", manifest.versionKey},
           {"dataVersion", orNull(manifest.dataVersion)},
           {"outcome", orNull(manifest.outcome)},
-          {"kept", manifest.isKept},
+          {"kept", manifest.isKept()},
+          {"keptFor", manifest.keptFor},
           {"files", std::move(files)}};
 }
 
@@ -108,8 +122,9 @@ Manifest manifestFromJson(const Json& json) {
                     .versionKey = json.at("versionKey"),
                     .dataVersion = optionalAt<std::int64_t>(json, "dataVersion"),
                     .outcome = optionalAt<std::string>(json, "outcome"),
-                    .isKept = json.at("kept"),
+                    .keptFor = json.value("keptFor", std::vector<std::string>{}),
                     .files = {}};
+  if (json.at("kept") && !manifest.isKept()) manifest.keptFor.emplace_back(kKeptByAnEarlierRelease);
   for (const Json& file : json.at("files")) manifest.files.push_back(fileFrom(file));
   return manifest;
 }
@@ -135,6 +150,8 @@ std::optional<Manifest> manifestFrom(std::string_view text) {
     if (json.at("sha256") != checksum(manifest.dump()) || manifest.at("format") != kFormat) return std::nullopt;
     return manifestFromJson(manifest);
   } catch (const Json::exception&) {
+    return std::nullopt;
+  } catch (const std::invalid_argument&) {
     return std::nullopt;
   }
 }

@@ -6,7 +6,7 @@
 #include <string_view>
 #include <vector>
 
-#include "host/snapshots/kept_file.h"
+#include "host/snapshots/file_state.h"
 
 namespace host::snapshots {
 
@@ -29,8 +29,10 @@ struct Manifest {
   std::string versionKey;
   std::optional<std::int64_t> dataVersion;
   std::optional<std::string> outcome;  // nothing until what it was taken for has ended
-  bool isKept = false;                 // beyond the count
+  std::vector<std::string> keptFor;    // why it is kept beyond the count, a line each; empty where it is not
   std::vector<KeptFile> files;
+
+  [[nodiscard]] bool isKept() const { return !keptFor.empty(); }
 
   static constexpr const char* kRun = "run";
   static constexpr const char* kRestore = "restore";
@@ -39,10 +41,11 @@ struct Manifest {
 // The manifest as a file: one JSON object with a checksum of itself. Throws a Problem where a path is no UTF-8.
 [[nodiscard]] std::string textOf(const Manifest& manifest);
 
-// Reads it back; nothing where a single byte of it is wrong, or where it has another format.
+// Reads it back; nothing where a single byte of it is wrong, where it has another format, or where it names a copy that
+// is not in the snapshot's own directory.
 [[nodiscard]] std::optional<Manifest> manifestFrom(std::string_view text);
 
 // The name of a part of the footprint, as manifests and listings have it.
-[[nodiscard]] std::string nameOf(platform::MigrationFile::Part part);
+[[nodiscard]] std::string nameOf(Part part);
 
 }  // namespace host::snapshots

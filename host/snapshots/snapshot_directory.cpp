@@ -2,9 +2,13 @@
 
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
+#include <set>
 
 #include "host/snapshots/problem.h"
+#include "host/snapshots/release_stamp.h"
+#include "host/snapshots/run_journal.h"
 
 namespace host::snapshots {
 namespace {
@@ -15,6 +19,15 @@ using platform::FileKind;
 constexpr unsigned kOwnerAlone = 0700;
 constexpr unsigned kWritableByOthers = 0022;
 constexpr unsigned kSticky = 01000;
+
+constexpr const char* kOwnMark = "format";
+constexpr std::string_view kOwnMarkText = "migration-host snapshots 1\n";
+constexpr const char* kLock = "lock";
+constexpr const char* kFormerJournal = "last";  // which earlier releases left
+constexpr std::string_view kBeingReplaced = ".new-";
+constexpr std::size_t kNoiseDigits = 16;
+constexpr std::size_t kNumberDigits = 6;
+constexpr std::string_view kTime = "ddddddddTddddddZ";
 
 [[noreturn]] void refuse(const Path& directory, const std::string& reason) {
   throw Problem{Problem::Kind::wrongUse, directory.string() + " cannot hold snapshots: " + reason};
@@ -52,18 +65,81 @@ void requireOwn(const Path& directory, const FileAttributes& attributes) {
   if (isWritableByOthers(attributes)) refuse(directory, "others may write it");
 }
 
+bool isDigit(char character) { return character >= '0' && character <= '9'; }
+
+bool isHexadecimal(char character) { return isDigit(character) || (character >= 'a' && character <= 'f'); }
+
+bool isTime(std::string_view text) {
+  return std::ranges::equal(
+      text, kTime, [](char character, char meant) { return meant == 'd' ? isDigit(character) : character == meant; });
+}
+
+// Nothing where no such file can be read; a part of it where its maker died.
+std::optional<std::string> ownMarkIn(const Storage& storage, const Path& directory) {
+  const platform::Result<platform::Bytes> read = storage.files->read(directory / kOwnMark, kOwnMarkText.size());
+  if (!read.isOk()) return std::nullopt;
+  return std::string{read.value().begin(), read.value().end()};
+}
+
+bool isOwnName(const std::string& name) {
+  static const std::set<std::string> kNames{kOwnMark, kLock, RunJournal::kName, kFormerJournal, kStampName};
+  return kNames.contains(name) || isIdentifier(name) || isPassing(name);
+}
+
+// A name alone is no proof: every host made the lock first, and it is empty.
+bool isOfAnEarlierHost(const Storage& storage, const Path& directory) {
+  const platform::Result<FileAttributes> lock = storage.keeper->attributesOf(directory / kLock);
+  return lock.isOk() && lock.value().kind == FileKind::file && lock.value().size == 0;
+}
+
+void requireSnapshotsOrNothing(const Storage& storage, const Path& directory) {
+  const std::optional<std::string> mark = ownMarkIn(storage, directory);
+  if (mark == kOwnMarkText) return;
+  const std::vector<std::string> names = required(storage.keeper->entriesOf(directory));
+  const auto foreign = std::ranges::find_if_not(names, &isOwnName);
+  if (foreign != names.end()) refuse(directory, "it holds something else: " + *foreign);
+  if (mark ? !kOwnMarkText.starts_with(*mark) : std::ranges::find(names, kOwnMark) != names.end()) {
+    refuse(directory, std::string{"it holds something else: "} + kOwnMark);
+  }
+  const bool isOfADeadMaker = std::ranges::all_of(names, [](const std::string& name) { return name == kOwnMark; });
+  if (!isOfADeadMaker && !isOfAnEarlierHost(storage, directory)) {
+    refuse(directory, "it holds something else: " + names.front());
+  }
+}
+
 }  // namespace
 
-void requireOwnDirectory(const Storage& storage, const Path& directory, Missing missing) {
+bool isIdentifier(const std::string& name) {
+  const auto dash = static_cast<std::size_t>(std::ranges::find_if_not(name, &isDigit) - name.begin());
+  return dash >= kNumberDigits && dash < name.size() && name[dash] == '-' &&
+         isTime(std::string_view{name}.substr(dash + 1));
+}
+
+bool isPassing(const std::string& name) {
+  if (name == kBeingMade || name == kBeingRemoved) return true;
+  return name.starts_with(kBeingReplaced) && name.size() == kBeingReplaced.size() + kNoiseDigits &&
+         std::all_of(name.end() - kNoiseDigits, name.end(), &isHexadecimal);
+}
+
+void markAsOwn(const Storage& storage, const Path& directory) {
+  if (ownMarkIn(storage, directory) == kOwnMarkText) return;
+  require(storage.files->replace(directory / kOwnMark,
+                                 {reinterpret_cast<const std::uint8_t*>(kOwnMarkText.data()), kOwnMarkText.size()}));
+}
+
+bool requireOwnDirectory(const Storage& storage, const Path& directory, Missing missing) {
   platform::Result<FileAttributes> attributes = storage.keeper->attributesOf(directory);
   if (attributes.status().errorNumber() == ELOOP) requireSafeWay(storage, directory);  // says which link it was
   if (attributes.status().errorNumber() == ENOENT) {
     if (missing == Missing::isRefused) refuse(directory, "it does not exist");
+    if (missing == Missing::isAccepted) return false;
     require(storage.files->createDirectories(directory, kOwnerAlone));
     attributes = storage.keeper->attributesOf(directory);
   }
   requireOwn(directory, required(std::move(attributes)));
   requireSafe(storage, directory);
+  requireSnapshotsOrNothing(storage, directory);
+  return true;
 }
 
 }  // namespace host::snapshots

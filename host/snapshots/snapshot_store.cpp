@@ -6,18 +6,17 @@
 #include <charconv>
 #include <ctime>
 
-#include "host/snapshots/checksum.h"
 #include "host/snapshots/problem.h"
+#include "host/snapshots/snapshot_directory.h"
 
 namespace host::snapshots {
 namespace {
 
-constexpr const char* kBeingMade = ".new";
-constexpr const char* kBeingRemoved = ".old";
 constexpr const char* kManifest = "manifest";
 constexpr unsigned kOwnerAlone = 0700;
 constexpr std::size_t kLargestManifest = std::size_t{1} << 24U;
-constexpr std::size_t kLargestCopy = std::size_t{1} << 30U;
+constexpr std::size_t kLargestCopy = std::size_t{256} << 20U;
+constexpr const char* kLatest = "latest";
 constexpr std::size_t kDigits = 6;
 
 std::string timeNow() {
@@ -28,18 +27,26 @@ std::string timeNow() {
   return {text.data(), std::strftime(text.data(), text.size(), "%Y-%m-%dT%H:%M:%SZ", &parts)};
 }
 
-// NNNNNN-TIME, the number with more digits once it has to have them; 0 where it is no identifier.
 std::uint64_t numberOf(const std::string& id) {
   std::uint64_t number = 0;
-  const char* const end = id.data() + id.size();
-  const auto [stop, error] = std::from_chars(id.data(), end, number);
-  const bool isIdentifier = error == std::errc{} && stop != end && *stop == '-' && id.find('/') == std::string::npos;
-  return isIdentifier && static_cast<std::size_t>(stop - id.data()) >= kDigits ? number : 0;
+  std::from_chars(id.data(), id.data() + id.size(), number);
+  return number;
 }
+
+std::span<const std::uint8_t> bytesOf(std::string_view text) {
+  return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
+}
+
+[[noreturn]] void refuse(const std::string& text) { throw Problem{Problem::Kind::wrongUse, text}; }
 
 [[noreturn]] void fail(const std::string& text) { throw Problem{Problem::Kind::failed, text}; }
 
 }  // namespace
+
+void requireKeepable(const Path& path, Part part, const FileState& state) {
+  if (state.contents != kUnkept || !holdsAccounts(part)) return;
+  fail(path.string() + " may hold accounts, and no copy of it can be kept: " + state.whyUnkept);
+}
 
 void SnapshotStore::removeIfThere(const Path& path) const {
   const platform::Status removed = _storage.files->remove(path);
@@ -48,21 +55,31 @@ void SnapshotStore::removeIfThere(const Path& path) const {
 
 void SnapshotStore::sweep() const {
   for (const std::string& name : required(_storage.keeper->entriesOf(_directory))) {
-    if (name.starts_with('.')) removeIfThere(_directory / name);
+    if (isPassing(name)) removeIfThere(_directory / name);
   }
 }
 
 std::vector<std::string> SnapshotStore::identifiers() const {
   std::vector<std::string> found = required(_storage.keeper->entriesOf(_directory));
-  std::erase_if(found, [](const std::string& name) { return numberOf(name) == 0; });
+  std::erase_if(found, [](const std::string& name) { return !isIdentifier(name); });
   std::ranges::sort(found, {}, [](const std::string& name) { return numberOf(name); });
   return found;
+}
+
+std::string SnapshotStore::identifierMeantBy(const std::string& text) const {
+  const std::vector<std::string> known = identifiers();
+  if (text == kLatest && !known.empty()) return known.back();
+  std::vector<std::string> meant = known;
+  std::erase_if(meant, [&text](const std::string& id) { return !id.starts_with(text); });
+  if (meant.empty()) refuse("there is no snapshot " + text + " in " + _directory.string());
+  if (meant.size() > 1) refuse("more than one snapshot begins with " + text + ": " + meant[0] + " and " + meant[1]);
+  return meant.front();
 }
 
 Manifest SnapshotStore::manifest(const std::string& id) const {
   const std::vector<std::string> known = identifiers();
   if (std::ranges::find(known, id) == known.end()) {
-    throw Problem{Problem::Kind::wrongUse, "there is no snapshot " + id + " in " + _directory.string()};
+    refuse("there is no snapshot " + id + " in " + _directory.string());
   }
   const platform::Bytes bytes = required(_storage.files->read(_directory / id / kManifest, kLargestManifest));
   std::optional<Manifest> manifest = manifestFrom({reinterpret_cast<const char*>(bytes.data()), bytes.size()});
@@ -86,34 +103,36 @@ std::string SnapshotStore::nextIdentifier(std::string time) const {
   return number + '-' + time;
 }
 
-void SnapshotStore::keepCopy(KeptFile& file, std::size_t number) const {
-  const Look look = lookAt(_storage, file.path);
-  if (look.contents == kNoFile) fail(file.path.string() + " is no regular file, and no copy of it can be kept");
-  file.contents = look.contents;
-  file.attributes = look.attributes;
-  if (!file.isPresent()) return;
+void SnapshotStore::keepCopy(KeptFile& file, std::size_t number,
+                             const std::function<void(const std::string&)>& warn) const {
+  const FileState state = stateAt(_storage, file.path, file.part);
+  file.contents = state.contents;
+  file.attributes = state.attributes;
+  requireKeepable(file.path, file.part, state);
+  if (state.contents == kUnkept) warn(file.path.string() + " has no copy: " + state.whyUnkept);
+  if (!file.hasCopy()) return;
   file.copy = std::to_string(number);
   const Path copy = _directory / kBeingMade / file.copy;
-  require(_storage.files->create(copy, look.bytes));
-  if (lookAt(_storage, copy).contents != file.contents) fail("the copy of " + file.path.string() + " is not like it");
+  require(_storage.files->create(copy, state.bytes));
+  if (checksum(required(_storage.files->read(copy, kLargestCopy))) != file.contents) {
+    fail("the copy of " + file.path.string() + " is not like it");
+  }
 }
 
-void SnapshotStore::build(Manifest& manifest) const {
+void SnapshotStore::build(Manifest& manifest, const std::function<void(const std::string&)>& warn) const {
   const Path place = _directory / kBeingMade;
   require(_storage.files->createDirectories(place, kOwnerAlone));
   std::size_t number = 0;
-  for (KeptFile& file : manifest.files) keepCopy(file, ++number);
-  const std::string text = textOf(manifest);
-  require(
-      _storage.files->replace(place / kManifest, {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()}));
+  for (KeptFile& file : manifest.files) keepCopy(file, ++number, warn);
+  require(_storage.files->replace(place / kManifest, bytesOf(textOf(manifest))));
   require(_storage.files->rename(place, _directory / manifest.id));
 }
 
-Manifest SnapshotStore::take(Manifest description) const {
+Manifest SnapshotStore::take(Manifest description, const std::function<void(const std::string&)>& warn) const {
   description.taken = timeNow();
   description.id = nextIdentifier(description.taken);
   try {
-    build(description);
+    build(description, warn);
   } catch (const Problem&) {
     static_cast<void>(_storage.files->remove(_directory / kBeingMade));
     throw;
@@ -121,10 +140,17 @@ Manifest SnapshotStore::take(Manifest description) const {
   return description;
 }
 
-void SnapshotStore::rewrite(const Manifest& manifest) const {
-  const std::string text = textOf(manifest);
-  require(_storage.files->replace(_directory / manifest.id / kManifest,
-                                  {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()}));
+void SnapshotStore::rewrite(const Manifest& manifest) const { keepRecord(manifest.id, kManifest, textOf(manifest)); }
+
+void SnapshotStore::keepRecord(const std::string& id, const std::string& name, std::string_view text) const {
+  require(_storage.files->replace(_directory / id / name, bytesOf(text)));
+}
+
+std::optional<std::string> SnapshotStore::record(const std::string& id, const std::string& name) const {
+  const platform::Result<platform::Bytes> read = _storage.files->read(_directory / id / name, kLargestCopy);
+  if (read.status().errorNumber() == ENOENT) return std::nullopt;
+  require(read.status());
+  return std::string{read.value().begin(), read.value().end()};
 }
 
 platform::Bytes SnapshotStore::copyOf(const Manifest& manifest, const KeptFile& file) const {
@@ -135,25 +161,39 @@ platform::Bytes SnapshotStore::copyOf(const Manifest& manifest, const KeptFile& 
   return bytes;
 }
 
-bool SnapshotStore::hasCopyOf(const Manifest& manifest, const KeptFile& file) const {
-  try {
-    static_cast<void>(copyOf(manifest, file));
-    return true;
-  } catch (const Problem&) {
-    return false;
+std::vector<Path> SnapshotStore::damageOf(const Manifest& manifest) const {
+  std::vector<Path> damaged;
+  for (const KeptFile& file : manifest.files) {
+    try {
+      if (file.hasCopy()) static_cast<void>(copyOf(manifest, file));
+    } catch (const Problem&) {
+      damaged.push_back(file.path);
+    }
   }
+  return damaged;
+}
+
+void SnapshotStore::remove(const std::string& id) const {
+  require(_storage.files->rename(_directory / id, _directory / kBeingRemoved));
+  removeIfThere(_directory / kBeingRemoved);
+}
+
+std::vector<std::string> SnapshotStore::kept() const {
+  std::vector<std::string> found = identifiers();
+  std::erase_if(found, [this](const std::string& id) {
+    const std::optional<Manifest> known = undamagedManifest(id);
+    return !known || !known->isKept();
+  });
+  return found;
 }
 
 void SnapshotStore::prune(std::size_t count) const {
   std::vector<std::string> prunable = identifiers();
   std::erase_if(prunable, [this](const std::string& id) {
     const std::optional<Manifest> known = undamagedManifest(id);
-    return !known || known->isKept;
+    return !known || known->isKept();
   });
-  for (std::size_t excess = prunable.size(); excess > count; --excess) {
-    require(_storage.files->rename(_directory / prunable[prunable.size() - excess], _directory / kBeingRemoved));
-    removeIfThere(_directory / kBeingRemoved);
-  }
+  for (std::size_t excess = prunable.size(); excess > count; --excess) remove(prunable[prunable.size() - excess]);
 }
 
 }  // namespace host::snapshots

@@ -2,7 +2,6 @@
 
 #include <cerrno>
 
-#include "host/snapshots/checksum.h"
 #include "host/snapshots/problem.h"
 
 namespace host::snapshots {
@@ -13,15 +12,21 @@ WatchedFiles::WatchedFiles(Storage storage, const Manifest& snapshot, RunJournal
     : _storage{std::move(storage)}, _journal{std::move(journal)} {
   for (const KeptFile& file : snapshot.files) {
     _known[file.path].insert(file.contents);
-    if (file.part == platform::MigrationFile::Part::settings) _settings.insert(file.path);
+    _parts[file.path] = file.part;
   }
+}
+
+// What the run makes beside the files of the snapshot becomes the settings.
+std::string WatchedFiles::contentsAt(const Path& path) const {
+  const auto found = _parts.find(path);
+  return stateAt(_storage, path, found == _parts.end() ? Part::settings : found->second).contents;
 }
 
 // What cannot be looked at is not known to be as it was left.
 void WatchedFiles::noteWhereEdited(const Path& path) {
   if (_edited.contains(path)) return;
   try {
-    if (_known[path].contains(lookAt(_storage, path).contents)) return;
+    if (_known[path].contains(contentsAt(path))) return;
   } catch (const Problem&) {
   }
   _journal.noteEdit(path);
@@ -47,11 +52,6 @@ Status WatchedFiles::noted(const Path& path, const Contents& contents, const Cha
   return change();
 }
 
-Status WatchedFiles::settled(const Path& path, Status outcome) {
-  if (outcome.isOk() && _settings.contains(path)) _isSaving = false;
-  return outcome;
-}
-
 platform::Result<platform::FileKind> WatchedFiles::kindOf(const Path& path) { return _storage.files->kindOf(path); }
 
 platform::Result<platform::Bytes> WatchedFiles::read(const Path& path, std::size_t sizeLimit) {
@@ -61,21 +61,18 @@ platform::Result<platform::Bytes> WatchedFiles::read(const Path& path, std::size
 // A file that is made at a path of which nothing is known yet stood there in no form before.
 Status WatchedFiles::create(const Path& path, std::span<const std::uint8_t> bytes) {
   _known.try_emplace(path, std::set<std::string>{kAbsent});
-  return settled(path,
-                 noted(
-                     path, [&] { return checksum(bytes); }, [&] { return _storage.files->create(path, bytes); }, true));
+  return noted(
+      path, [&] { return checksum(bytes); }, [&] { return _storage.files->create(path, bytes); }, true);
 }
 
 Status WatchedFiles::replace(const Path& path, std::span<const std::uint8_t> bytes) {
-  return settled(path,
-                 noted(
-                     path, [&] { return checksum(bytes); }, [&] { return _storage.files->replace(path, bytes); }));
+  return noted(
+      path, [&] { return checksum(bytes); }, [&] { return _storage.files->replace(path, bytes); });
 }
 
 Status WatchedFiles::copy(const Path& from, const Path& to) {
-  return settled(
-      to, noted(
-              to, [&] { return lookAt(_storage, from).contents; }, [&] { return _storage.files->copy(from, to); }));
+  return noted(
+      to, [&] { return contentsAt(from); }, [&] { return _storage.files->copy(from, to); });
 }
 
 Status WatchedFiles::remove(const Path& path) {
@@ -91,15 +88,11 @@ Status WatchedFiles::setOwner(const Path& path, std::string_view owner, std::str
   return _storage.files->setOwner(path, owner, group);
 }
 
-platform::Result<Path> WatchedFiles::temporaryName() {
-  _isSaving = true;
-  return _storage.files->temporaryName();
-}
+platform::Result<Path> WatchedFiles::temporaryName() { return _storage.files->temporaryName(); }
 
 Status WatchedFiles::rename(const Path& from, const Path& to) {
-  return settled(
-      to, noted(
-              to, [&] { return lookAt(_storage, from).contents; }, [&] { return _storage.files->rename(from, to); }));
+  return noted(
+      to, [&] { return contentsAt(from); }, [&] { return _storage.files->rename(from, to); });
 }
 
 }  // namespace host::snapshots

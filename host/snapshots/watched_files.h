@@ -6,7 +6,7 @@
 #include <string>
 
 #include "host/snapshots/manifest.h"
-#include "host/snapshots/run_mark.h"
+#include "host/snapshots/run_journal.h"
 
 namespace host::snapshots {
 
@@ -16,10 +16,6 @@ namespace host::snapshots {
 class WatchedFiles final : public platform::FileSystem {
  public:
   WatchedFiles(Storage storage, const Manifest& snapshot, RunJournal journal);
-
-  // Whether the last attempt to save came to nothing: whoever saves asks for a temporary name first and ends by
-  // replacing the settings.
-  [[nodiscard]] bool hasLastSaveFailed() const { return _isSaving; }
 
   platform::Result<platform::FileKind> kindOf(const Path& path) override;
   platform::Result<platform::Bytes> read(const Path& path, std::size_t sizeLimit) override;
@@ -38,14 +34,13 @@ class WatchedFiles final : public platform::FileSystem {
   platform::Status noted(const Path& path, const Contents& contents, const Change& change, bool isMadeNew = false);
   void note(const Path& path, const std::string& contents, bool isMadeNew);
   void noteWhereEdited(const Path& path);
-  platform::Status settled(const Path& path, platform::Status outcome);
+  [[nodiscard]] std::string contentsAt(const Path& path) const;
 
   Storage _storage;
   RunJournal _journal;
   std::map<Path, std::set<std::string>> _known;  // what may stand at a watched path unless somebody else was there
+  std::map<Path, Part> _parts;
   std::set<Path> _edited;
-  std::set<Path> _settings;
-  bool _isSaving = false;
 };
 
 }  // namespace host::snapshots

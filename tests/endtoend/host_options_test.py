@@ -53,9 +53,8 @@ class WrongUse(DeviceTest):
         self.assert_wrong("--dry-run takes no value (see --help)", "--dry-run=yes")
         self.assert_wrong("--dry-run is given twice (see --help)", "--dry-run", "--dry-run")
 
-    def test_a_rehearsal_that_is_to_keep_snapshots(self):
-        self.assert_wrong("--dry-run and --snapshots exclude each other (see --help)",
-                          "--dry-run", "--snapshots", self.scratch)
+    def test_a_run_only_if_needed_without_snapshots(self):
+        self.assert_wrong("--if-needed needs --snapshots (see --help)", "--if-needed")
 
     def test_an_explanation_of_no_run(self):
         for instead in ("--list-snapshots", "--restore=x"):

@@ -37,13 +37,24 @@ class SnapshotsTest(DeviceTest):
     def migrate(self, device, *more, **options):
         return device.migrate(self.host, "--snapshots", self.snapshots, *more, **options)
 
+    def work(self, device, *more):
+        return self.run_host("--root", device.root, "--snapshots", self.snapshots, *more)
+
+    def edit(self, device, identifier):
+        """Makes a change that the next run finds something to do about."""
+        contents = device.read_plist(SETTINGS)
+        contents["Accounts"].append({"Type": "LDAP", "Class": "L", "Identifier": identifier})
+        device.write_plist(SETTINGS, {**contents, "Version": 11})
+
     def restore(self, device, identifier, *more):
         return self.run_host("--root", device.root, "--snapshots", self.snapshots, "--restore", identifier, *more)
 
     def list(self):
         run = self.run_host("--list-snapshots=json", "--snapshots", self.snapshots)
         self.assertEqual((0, []), (run.status, run.errors))
-        return json.loads("\n".join(run.output))
+        listing = json.loads("\n".join(run.output))
+        self.assertEqual(1, listing["schema"])
+        return listing["snapshots"]
 
     def identifiers(self):
         return [each["id"] for each in self.list()]

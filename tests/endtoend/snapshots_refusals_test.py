@@ -35,6 +35,9 @@ class WrongUse(SnapshotsTest):
                 run = self.run_host(*snapshots, *instead, option)
                 self.assertEqual((2, [], 1), (run.status, run.output, len(run.errors)))
 
+    def test_what_was_explained_without_asking_for_an_explanation(self):
+        self.assert_wrong("--of needs --explain", "--snapshots", self.snapshots, "--of", "latest")
+
     def test_a_number_of_snapshots_that_is_none(self):
         for text in BAD_NUMBERS:
             message = f"--keep needs a number of snapshots, at least 1: {text}"
@@ -158,11 +161,12 @@ class Snapshots(SnapshotsTest):
             manifest.write_bytes(damage)
             run = self.restore(device, identifier)
             self.assert_not_restored(5, f"the manifest of snapshot {identifier} is damaged", device, run)
-            self.assertEqual([{"id": identifier, "state": "damaged"}], self.list())
+            self.assertEqual([{"id": identifier, "state": "damaged", "damage": []}], self.list())
 
     def test_a_damaged_snapshot_hinders_no_run(self):
         device, identifier = self.migrated()
         (self.snapshots / identifier / "manifest").write_text("{}")
+        self.edit(device, "new")
         self.assertEqual(0, self.migrate(device, "--keep=1").status)
         self.assertEqual(2, len(self.list()))
 
@@ -171,7 +175,8 @@ class Snapshots(SnapshotsTest):
         device.path(LEGACY_MAIL).unlink()
         device.write(LEGACY_MAIL + "/precious", "kept")
         run = self.migrate(device)
-        message = f"{device.path(LEGACY_MAIL)} is no regular file, and no copy of it can be kept"
+        place = device.path(LEGACY_MAIL)
+        message = f"{place} may hold accounts, and no copy of it can be kept: {place} is no regular file"
         self.assertEqual((5, [f"migration-host: {message}"]), (run.status, run.errors))
         self.assertEqual([], run.console())
         self.assertEqual([], self.list())

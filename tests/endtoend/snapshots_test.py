@@ -1,5 +1,6 @@
 """Snapshots as an integrator uses them: what is kept, how many, and what a restore brings back."""
 
+import os
 import unittest
 
 from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY
@@ -40,17 +41,19 @@ class Keeping(SnapshotsTest):
 
     def test_only_the_newest_are_kept_by_count(self):
         device = self.old_device()
-        for _ in range(7):
+        for number in range(7):
+            self.edit(device, f"new {number}")
             self.assertEqual(0, self.migrate(device).status)
         self.assertEqual(["000003", "000004", "000005", "000006", "000007"], [each[:6] for each in self.identifiers()])
+        self.edit(device, "the last")
         self.migrate(device, "--keep", "2")
         self.assertEqual(["000007", "000008"], [each[:6] for each in self.identifiers()])
 
     def test_the_list_is_a_table_for_people(self):
         self.migrate(self.old_device())
         run = self.run_host("--list-snapshots", "--snapshots", self.snapshots)
-        self.assertEqual(["Snapshot", "Taken", "Version", "State", "Files"], run.output[0].split())
-        self.assertRegex(run.output[1], r"^000001-\S+Z  \d{4}-\S+Z +3 +migrated +com\.vorlix\.accountsettings\.plist ")
+        self.assertEqual(["Snapshot", "Taken", "Before", "Version", "State", "Files"], run.output[0].split())
+        self.assertRegex(run.output[1], r"^000001-\S+Z  \d{4}-\S+Z  run +3 +migrated +com\.vorlix\.accountsettings\.plist ")
 
     def test_an_empty_directory_lists_nothing(self):
         self.snapshots.mkdir(mode=0o700)
@@ -110,37 +113,31 @@ class FailedSaves(SnapshotsTest):
     host = HOST
 
     def failed_run(self):
-        """A run whose settings have no owner to go to, and which deletes the legacy files all the same."""
+        """A run whose settings have no owner to go to, and whose plug-in deletes the legacy files all the same."""
         device = self.old_device()
         device.write("etc/group", "wheel:*:0:root\n")
-        return device, self.migrate(device)
+        before = self.undoable(device)
+        return device, before, self.migrate(device)
 
-    def test_the_host_says_which_files_went_and_how_they_come_back(self):
-        device, run = self.failed_run()
-        (identifier,) = self.identifiers()
-        self.assertEqual(0, run.status)
-        said = [line for line in run.errors if line.startswith("migration-host: ")]
-        self.assertIn("THE SETTINGS WERE NOT SAVED", said[0])
-        self.assertEqual([f"migration-host:   {device.path(path)}" for path in (LEGACY_EXCHANGE, LEGACY_MAIL)], said[1:3])
-        command = said[3].split("migration-host --restore ")[1]
-        self.assertEqual(0, self.run_host("--restore", *command.split()).status)
-        self.assertTrue(device.path(LEGACY_MAIL).exists())
-        self.assertIn(identifier, command)
-
-    def test_that_snapshot_is_kept_beyond_the_count(self):
-        device, _ = self.failed_run()
-        for _ in range(3):
-            self.migrate(device, "--keep", "1")
-        self.assertEqual([("000001", True), ("000004", False)], [(each["id"][:6], each["kept"]) for each in self.list()])
-
-    def test_a_failed_save_without_legacy_files_is_nothing_to_shout_about(self):
-        device = self.old_device()
-        device.write("etc/group", "wheel:*:0:root\n")
-        for path in (LEGACY_EXCHANGE, LEGACY_MAIL):
-            device.path(path).unlink()
-        run = self.migrate(device)
+    def test_are_rolled_back_whole(self):
+        device, before, run = self.failed_run()
+        self.assertEqual(6, run.status)
         self.assertIn("Failed to save accounts to filesystem.", run.messages())
-        self.assertEqual([], [line for line in run.errors if "NOT SAVED" in line])
+        said = "migration-host: the accounts could not be saved; the device is as it was before the run"
+        self.assertEqual(said, run.errors[-1])
+        self.assertEqual(before, self.undoable(device))
+
+    def test_leave_no_snapshot_since_nothing_is_changed(self):
+        self.failed_run()
+        self.assertEqual([], self.list())
+        self.assertFalse((self.snapshots / "running").exists())
+
+    def test_are_made_good_by_the_next_run(self):
+        device, _, _ = self.failed_run()
+        device.set_mobile(os.getuid(), os.getgid())
+        self.assertEqual(0, self.migrate(device).status)
+        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+        self.assertFalse(device.path(LEGACY_MAIL).exists())
 
 
 if __name__ == "__main__":

@@ -2,13 +2,10 @@
 
 #include <gtest/gtest.h>
 
-#include "host/snapshots/checksum.h"
 #include "tests/support/fake_file_keeper.h"
 
 namespace host::snapshots {
 namespace {
-
-using Part = platform::MigrationFile::Part;
 
 constexpr const char* kSettings = "/device/settings";
 constexpr const char* kMail = "/device/mail";
@@ -85,20 +82,6 @@ TEST_F(WatchedRun, DoesNotTakeItsOwnChangesForThoseOfOthers) {
 TEST_F(WatchedRun, LeavesOtherFilesUnnoted) {
   ASSERT_TRUE(watched.replace("/device/report", bytes("text")).isOk());
   EXPECT_TRUE(journal.read()->left.empty());
-}
-
-TEST_F(WatchedRun, KnowsWhetherTheLastSaveFailed) {
-  EXPECT_FALSE(watched.hasLastSaveFailed());
-  ASSERT_TRUE(save("new"));
-  EXPECT_FALSE(watched.hasLastSaveFailed());
-  files->failing = {"rename"};
-  EXPECT_FALSE(save("newer"));
-  EXPECT_TRUE(watched.hasLastSaveFailed());
-}
-
-TEST_F(WatchedRun, KnowsOfASaveThatDidNotEvenBeginToWrite) {
-  static_cast<void>(watched.temporaryName());
-  EXPECT_TRUE(watched.hasLastSaveFailed());
 }
 
 }  // namespace

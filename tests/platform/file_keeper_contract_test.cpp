@@ -1,9 +1,14 @@
 // What every keeper of files does, the device's and the tests' own.
 
+#include <fcntl.h>
 #include <gtest/gtest.h>
+#include <sys/stat.h>
 #include <unistd.h>
 
+#include <atomic>
 #include <cerrno>
+#include <cstdio>
+#include <thread>
 
 #include "platform/linux/files/linux_file_keeper.h"
 #include "platform/linux/linux_platform.h"
@@ -78,6 +83,24 @@ TYPED_TEST(FileKeeperContract, TellsWhatStandsAtAPath) {
   EXPECT_EQ(this->keeper.attributesOf(this->at("nothing")).status().errorNumber(), ENOENT);
 }
 
+TYPED_TEST(FileKeeperContract, ReadsAttributesAndBytesTogether) {
+  this->put("file", "text");
+  const auto file = this->keeper.read(this->at("file"), 4);
+  ASSERT_TRUE(file.isOk());
+  EXPECT_EQ(file.value().bytes, bytes("text"));
+  EXPECT_EQ(file.value().attributes, this->keeper.attributesOf(this->at("file")).value());
+  EXPECT_EQ(this->keeper.read(this->at("file"), 3).status().errorNumber(), EFBIG);
+  EXPECT_EQ(this->keeper.read(this->at("nothing"), 4).status().errorNumber(), ENOENT);
+  EXPECT_EQ(this->keeper.read(this->subject.base, 4).value().attributes.kind, FileKind::directory);
+}
+
+TYPED_TEST(FileKeeperContract, GivesNoSpecialModeBits) {
+  FileAttributes special = this->attributes;
+  special.permissions = 06755;
+  ASSERT_TRUE(this->keeper.restore(this->at("file"), bytes("text"), special).isOk());
+  EXPECT_EQ(this->keeper.attributesOf(this->at("file")).value().permissions, 0755U);
+}
+
 TYPED_TEST(FileKeeperContract, RestoresAFileWithAllThatItWas) {
   this->put("file", "something else");
   ASSERT_TRUE(this->keeper.restore(this->at("file"), bytes("text"), this->attributes).isOk());
@@ -137,6 +160,36 @@ TEST(LinuxFileKeeper, FollowsNoLinkAtAPathItself) {
   EXPECT_TRUE(keeper->restore(scratch / "link", bytes("new"), kOurs).isOk());
   EXPECT_EQ(scratch.contents("target"), "precious");
   EXPECT_EQ(scratch.contents("link"), "new");
+}
+
+TEST(LinuxFileKeeper, ReadsNoSecondNameThatSomebodyMayHavePlanted) {
+  const ScratchDirectory scratch;
+  scratch.put("file", "text");
+  std::filesystem::create_hard_link(scratch / "file", scratch / "second");
+  ASSERT_EQ(::chmod(scratch.path().c_str(), 0777), 0);
+  const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
+  EXPECT_EQ(keeper->read(scratch / "second", 4).status().errorNumber(), EMLINK);
+}
+
+TEST(LinuxFileKeeper, ReadsAttributesAndBytesOfOneFileWhateverTakesItsPlace) {
+  const ScratchDirectory scratch;
+  scratch.put("file", "short");
+  scratch.put("other", "something longer");
+  std::atomic<bool> isOver = false;
+  std::thread exchanger{[&] {
+    while (!isOver) {
+      ::renameat2(AT_FDCWD, (scratch / "file").c_str(), AT_FDCWD, (scratch / "other").c_str(), RENAME_EXCHANGE);
+    }
+  }};
+  const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
+  int torn = 0;
+  for (int round = 0; round < 2000; ++round) {
+    const auto file = keeper->read(scratch / "file", 100);
+    torn += file.isOk() && file.value().attributes.size == file.value().bytes.size() ? 0 : 1;
+  }
+  isOver = true;
+  exchanger.join();
+  EXPECT_EQ(torn, 0);
 }
 
 TEST(LinuxFileKeeper, PutsAwayWhatADeadRestoreLeft) {

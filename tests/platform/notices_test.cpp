@@ -11,6 +11,7 @@
 #include <chrono>
 #include <cstdlib>
 #include <cstring>
+#include <filesystem>
 #include <thread>
 
 #include "platform/linux/linux_platform.h"
@@ -113,6 +114,17 @@ TEST(Notices, AreLostWithoutABus) {
   EXPECT_NO_THROW(device.cloudTabs->post(true));
   EXPECT_NO_THROW(device.preferencesChanged->post("domain", "key"));
   EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+}
+
+TEST(Notices, StartNoProgramInPlaceOfABus) {
+  const ScratchDirectory scratch;
+  const std::string started = (scratch / "started").string();
+  for (const char* const before : {"", "unix:path=/nonexistent/bus;"}) {
+    const std::string address = std::string{before} + "unixexec:path=/usr/bin/touch,argv1=" + started;
+    ::setenv("DBUS_SYSTEM_BUS_ADDRESS", address.c_str(), 1);
+    platform::makeLinuxPlatform().cloudTabs->post(true);
+    EXPECT_FALSE(std::filesystem::exists(started)) << address;
+  }
 }
 
 TEST(Notices, AreLostOnABusThatDoesNotAnswer) {

@@ -12,11 +12,13 @@
 #include <stdexcept>
 
 #include "host/snapshots/problem.h"
-#include "host/snapshots/undo.h"
+#include "host/snapshots/snapshot_session.h"
 #include "migrator/accounts_data_migrator.h"
 #include "platform/linux/files/linux_file_keeper.h"
+#include "platform/linux/files/linux_file_locks.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
+#include "platform/run_fact.h"
 #include "tests/support/fake_platform.h"
 #include "tests/support/mishap_file_keeper.h"
 
@@ -25,9 +27,10 @@ namespace {
 
 using host::snapshots::Missing;
 using host::snapshots::Problem;
-using host::snapshots::Undo;
+using host::snapshots::SnapshotSession;
 
 constexpr int kRefused = 5;
+constexpr int kRolledBack = 6;
 constexpr int kDied = 99;
 constexpr std::size_t kCount = 3;
 constexpr const char* kCopyAside = "var/mobile/Library/Logs/CrashReporter/com.vorlix.accountsettings.plist";
@@ -36,7 +39,7 @@ constexpr const char* kSettings = "var/mobile/Library/Preferences/com.vorlix.acc
 // What the child is, and what it tells of itself.
 struct Child {
   std::shared_ptr<MishapFileSystem> files;
-  host::snapshots::UndoPlace place;
+  host::snapshots::SessionPlace place;
   std::array<int, 2> operations{};  // ahead of the plug-in, and all
 };
 
@@ -63,38 +66,66 @@ Child childOn(const std::filesystem::path& root, const Mishap& mishap) {
       .files = files,
       .place = {.services = services,
                 .keeper = std::make_shared<MishapFileKeeper>(platform::makeFileKeeper(*services.directories), files),
+                .locks = platform::makeFileLocks(root / "snapshots"),
                 .directory = root / "snapshots",
+                .footprint = {},
                 .release = "1",
                 .warn = [](const std::string&) {}}};
 }
 
-bool migrate(Child& child) {
+// Remembers how the last save ended.
+class SaveWatch final : public platform::RunObserver {
+ public:
+  void stageBegan(std::string_view /*stage*/) override {}
+  void stageEnded(std::string_view /*stage*/) override {}
+  [[nodiscard]] bool wantsFacts() const override { return true; }
+  void told(const platform::RunFact& fact) override {
+    if (fact.kind == platform::RunFact::Kind::saved) isSaved = true;
+    if (fact.kind == platform::RunFact::Kind::saveFailed) isSaved = false;
+  }
+  void progressed(std::size_t /*done*/, std::size_t /*total*/) override {}
+
+  bool isSaved = true;
+};
+
+int migrate(Child& child) {
+  const auto watch = std::make_shared<SaveWatch>();
+  child.place.services.observer = watch;
   platform::setCurrent(child.place.services);
-  Undo undo{child.place, Missing::isMade};
   migrator::AccountsDataMigrator migrator;
+  child.place.footprint = migrator.footprint();
+  SnapshotSession session{child.place, Missing::isMade};
   platform::Platform watched = child.place.services;
-  watched.files = undo.begin(migrator.footprint());
+  watched.files = session.begin();
   platform::setCurrent(watched);
   child.operations[0] = child.files->operations();
-  const bool migrated = migrator.performMigration();
-  undo.end(migrated, kCount);
-  return migrated;
+  const bool isMigrated = migrator.performMigration();
+  const host::snapshots::RunEnd end{.isMigrated = isMigrated,
+                                    .isSaved = watch->isSaved,
+                                    .onlyInSnapshot = {},
+                                    .explanation = "what it did",
+                                    .explanationAsJson = "{}"};
+  const auto ended = session.end(end, kCount);
+  if (ended == host::snapshots::Ended::rolledBack) return kRolledBack;
+  return isMigrated ? 0 : 1;
 }
 
-bool restore(Child& child) {
-  Undo undo{child.place, Missing::isRefused};
+int restore(Child& child) {
+  platform::setCurrent(child.place.services);
+  child.place.footprint = migrator::AccountsDataMigrator{}.footprint();
+  SnapshotSession session{child.place, Missing::isRefused};
   std::vector<std::string> names;
   for (const auto& entry : std::filesystem::directory_iterator{child.place.directory}) {
     if (entry.path().filename().string().starts_with("0")) names.push_back(entry.path().filename());
   }
-  return !undo.restore(*std::min_element(names.begin(), names.end())).empty();
+  return session.restore(*std::min_element(names.begin(), names.end())).empty() ? 1 : 0;
 }
 
-[[noreturn]] void beChild(const std::filesystem::path& root, const Mishap& mishap, bool (*task)(Child&), int out) {
+[[noreturn]] void beChild(const std::filesystem::path& root, const Mishap& mishap, int (*task)(Child&), int out) {
   Child child = childOn(root, mishap);
   int status = kRefused;
   try {
-    status = task(child) ? 0 : 1;
+    status = task(child);
   } catch (const Problem&) {
     status = kRefused;
   }
@@ -104,7 +135,7 @@ bool restore(Child& child) {
   ::_exit(status);
 }
 
-UndoOutcome inChild(const std::filesystem::path& root, const Mishap& mishap, bool (*task)(Child&)) {
+UndoOutcome inChild(const std::filesystem::path& root, const Mishap& mishap, int (*task)(Child&)) {
   std::array<int, 2> pipe{};
   if (::pipe(pipe.data()) != 0) throw std::runtime_error{"no pipe"};
   const pid_t child = ::fork();
@@ -118,8 +149,9 @@ UndoOutcome inChild(const std::filesystem::path& root, const Mishap& mishap, boo
   ::close(pipe[0]);
   const int code = WIFEXITED(status) ? WEXITSTATUS(status) : -1;
   return {.died = code == kDied,
-          .crashed = code != 0 && code != 1 && code != kRefused && code != kDied,
+          .crashed = code != 0 && code != 1 && code != kRefused && code != kRolledBack && code != kDied,
           .refused = code == kRefused,
+          .rolledBack = code == kRolledBack,
           .succeeded = code == 0,
           .operations = operations[1],
           .operationsAhead = operations[0]};

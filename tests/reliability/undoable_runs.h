@@ -14,6 +14,7 @@ struct UndoOutcome {
   bool died = false;        // of the mishap
   bool crashed = false;     // of anything else
   bool refused = false;     // with a Problem
+  bool rolledBack = false;  // since it could not save
   bool succeeded = false;   // a run: performMigration answered true
   int operations = 0;       // file operations that were begun, of the host and of the plug-in; unless it died
   int operationsAhead = 0;  // of these, before the plug-in was called

@@ -26,6 +26,13 @@ platform::Result<FileAttributes> FakeFileKeeper::attributesOf(const Path& path) 
   return attributes;
 }
 
+platform::Result<platform::FileCopy> FakeFileKeeper::read(const Path& path, std::size_t sizeLimit) {
+  const platform::Result<FileAttributes> attributes = attributesOf(path);
+  if (!attributes.isOk()) return attributes.status();
+  if (attributes.value().size > sizeLimit) return Status::failure(EFBIG, "read " + path.string());
+  return platform::FileCopy{attributes.value(), _files.nodes.at(path).bytes};
+}
+
 platform::Result<std::vector<std::string>> FakeFileKeeper::entriesOf(const Path& directory) {
   const auto node = _files.nodes.find(directory);
   if (node == _files.nodes.end()) return Status::failure(ENOENT, "list " + directory.string());
@@ -56,7 +63,7 @@ Status FakeFileKeeper::restore(const Path& path, std::span<const std::uint8_t> b
     return Status::failure(EISDIR, "restore " + path.string());
   if (!_files.nodes.contains(path.parent_path())) return Status::failure(ENOENT, "restore " + path.string());
   _files.put(path, platform::Bytes{bytes.begin(), bytes.end()});
-  _files.nodes[path].permissions = attributes.permissions;
+  _files.nodes[path].permissions = attributes.permissions & 0777U;
   _restored[path] = attributes;
   return {};
 }

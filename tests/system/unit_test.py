@@ -53,6 +53,27 @@ class InstalledUnit(DeviceTest):
             linked = self.unit.parent / link / self.unit.name
             self.assertEqual(self.unit, linked.resolve())
 
+    def test_runs_once_in_three_starts_whatever_marks_updates(self):
+        self.assertEqual([], [line for line in self.unit.read_text().splitlines() if line.startswith("Condition")])
+        _, *options = self.settings("ExecStart")[0].split()
+        device = self.example("first-generation")
+        snapshots = self.scratch / "snapshots"
+        places = {"/var/mobile": device.path("var/mobile"), "/var/lib/account-settings/snapshots": snapshots}
+        runs = [device.migrate(HOST, *(places.get(each, each) for each in options)) for _ in range(3)]
+        self.assertEqual([0, 0, 0], [each.status for each in runs])
+        self.assertEqual([True, False, False], ["result" in str(each.events) for each in runs])
+        self.assertEqual(1, len(list(snapshots.glob("0*"))))
+
+    def test_keeps_passwords_out_of_core_files_and_the_environment_out_of_the_host(self):
+        self.assertEqual(["0"], self.settings("LimitCORE"))
+        unset = " ".join(self.settings("UnsetEnvironment")).split()
+        self.assertLessEqual({"TMPDIR", "LD_PRELOAD", "LD_LIBRARY_PATH", "LD_AUDIT", "DBUS_SYSTEM_BUS_ADDRESS"}, set(unset))
+
+    def test_is_bounded_in_what_it_takes(self):
+        self.assertEqual(["90s"], self.settings("TimeoutStartSec"))
+        for name in ("MemoryMax", "TasksMax"):
+            self.assertEqual(1, len(self.settings(name)), name)
+
     def test_is_accepted_by_systemd(self):
         self.assertEqual([], run("systemd-analyze", "verify", "--man=no", self.unit))
 

@@ -77,6 +77,27 @@ ssize_t readSome(int descriptor, void* buffer, std::size_t size) {
   return static_cast<ssize_t>(filled);
 }
 
+bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
+  struct stat status {};
+  if (::fstat(file, &status) != 0) return false;
+  errno = EFBIG;
+  if (static_cast<std::uintmax_t>(status.st_size) > limit) return false;
+  // One byte more than expected shows whether the file ends where it said.
+  bytes.resize(static_cast<std::size_t>(status.st_size) + 1);
+  std::size_t filled = 0;
+  while (true) {
+    const ssize_t count = readSome(file, bytes.data() + filled, bytes.size() - filled);
+    if (count < 0) return false;
+    filled += static_cast<std::size_t>(count);
+    errno = EFBIG;
+    if (filled > limit) return false;
+    if (filled < bytes.size()) break;
+    bytes.resize(bytes.size() * 2);
+  }
+  bytes.resize(filled);
+  return true;
+}
+
 bool sync(const Descriptor& file) {
   return retried([&] { return ::fsync(file.number()); }) == 0 || errno == EINVAL;
 }

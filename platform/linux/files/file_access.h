@@ -7,6 +7,7 @@
 #include <string>
 
 #include "platform/linux/files/descriptor.h"
+#include "platform/property_value.h"
 
 namespace platform {
 
@@ -45,6 +46,9 @@ auto retried(const Call& call) {
 [[nodiscard]] bool writeAll(int descriptor, const void* bytes, std::size_t size);
 // Fills the buffer as far as the file goes. Answers the number of bytes, -1 on failure.
 [[nodiscard]] ssize_t readSome(int descriptor, void* buffer, std::size_t size);
+
+// Reads a whole file of at most `limit` bytes; errno EFBIG where there are more.
+[[nodiscard]] bool readUpTo(int file, std::size_t limit, Bytes& bytes);
 
 // Brings a file, or the entries of a directory, to stable storage. File systems that have nothing to sync are no
 // failure.

@@ -14,6 +14,7 @@ namespace platform {
 namespace {
 
 constexpr mode_t kAllPermissions = 07777;
+constexpr mode_t kOrdinaryPermissions = 0777;
 
 FileKind kindOf(mode_t mode) {
   if (S_ISREG(mode)) return FileKind::file;
@@ -28,6 +29,18 @@ FileAttributes attributesFrom(const struct stat& status) {
           .permissions = status.st_mode & kAllPermissions,
           .modifiedSeconds = status.st_mtim.tv_sec,
           .modifiedNanoseconds = status.st_mtim.tv_nsec};
+}
+
+// What is no regular file is looked at only.
+bool readFile(const Place& place, std::size_t sizeLimit, FileCopy& copy) {
+  struct stat status {};
+  if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return false;
+  copy.attributes = attributesFrom(status);
+  if (copy.attributes.kind != FileKind::file) return true;
+  const Descriptor file = openOwnFile(place);
+  if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return false;
+  copy.attributes = attributesFrom(status);
+  return readUpTo(file.number(), sizeLimit, copy.bytes);
 }
 
 bool appendToFile(const Place& place, std::span<const std::uint8_t> bytes) {
@@ -50,7 +63,7 @@ bool makeAsBefore(int file, const FileAttributes& attributes) {
   if (::fstat(file, &made) != 0) return false;
   const bool isOwned = made.st_uid == attributes.owner && made.st_gid == attributes.group;
   if (!isOwned && ::fchown(file, attributes.owner, attributes.group) != 0) return false;
-  if (::fchmod(file, attributes.permissions & kAllPermissions) != 0) return false;
+  if (::fchmod(file, attributes.permissions & kOrdinaryPermissions) != 0) return false;
   const std::array<timespec, 2> times{
       timespec{.tv_sec = 0, .tv_nsec = UTIME_OMIT},
       timespec{.tv_sec = attributes.modifiedSeconds, .tv_nsec = attributes.modifiedNanoseconds}};
@@ -116,6 +129,13 @@ class LinuxFileKeeper final : public FileKeeper {
     });
     if (!outcome.isOk()) return outcome;
     return attributesFrom(status);
+  }
+
+  Result<FileCopy> read(const Path& path, std::size_t sizeLimit) override {
+    FileCopy copy;
+    Status outcome = at(path, "read", [&](const Place& place) { return readFile(place, sizeLimit, copy); });
+    if (!outcome.isOk()) return outcome;
+    return copy;
   }
 
   Result<std::vector<std::string>> entriesOf(const Path& directory) override {

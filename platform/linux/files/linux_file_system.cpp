@@ -44,26 +44,6 @@ bool giveAway(const Descriptor& thing, uid_t user, gid_t group) {
   return ::fchownat(thing.number(), "", user, group, AT_EMPTY_PATH) == 0;
 }
 
-// At most limit bytes; errno EFBIG where there are more.
-bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
-  struct stat status {};
-  if (::fstat(file, &status) != 0) return false;
-  if (static_cast<std::uintmax_t>(status.st_size) > limit) return refuse(EFBIG);
-  // One byte more than expected shows whether the file ends where it said.
-  bytes.resize(static_cast<std::size_t>(status.st_size) + 1);
-  std::size_t filled = 0;
-  while (true) {
-    const ssize_t count = readSome(file, bytes.data() + filled, bytes.size() - filled);
-    if (count < 0) return false;
-    filled += static_cast<std::size_t>(count);
-    if (filled > limit) return refuse(EFBIG);
-    if (filled < bytes.size()) break;
-    bytes.resize(bytes.size() * 2);
-  }
-  bytes.resize(filled);
-  return true;
-}
-
 // As the C library chooses it: a program with more rights than its user has does not follow the environment.
 Path temporaryDirectory() {
   const char* const chosen = ::secure_getenv("TMPDIR");

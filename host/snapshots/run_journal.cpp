@@ -1,4 +1,4 @@
-#include "host/snapshots/run_mark.h"
+#include "host/snapshots/run_journal.h"
 
 #include <cerrno>
 #include <nlohmann/json.hpp>
@@ -52,9 +52,6 @@ RunMark markFrom(const std::string& text) {
 
 }  // namespace
 
-RunJournal::RunJournal(Storage storage, const Path& directory)
-    : _storage{std::move(storage)}, _mark{directory / "running"}, _last{directory / "last"} {}
-
 void RunJournal::begin(const std::string& snapshot, const std::optional<std::string>& restores) const {
   Json head{{"snapshot", snapshot}};
   if (restores) head["restores"] = *restores;
@@ -83,6 +80,6 @@ std::optional<RunMark> RunJournal::read() const {
   }
 }
 
-void RunJournal::clear() const { require(_storage.files->rename(_mark, _last)); }
+void RunJournal::clear() const { require(_storage.files->remove(_mark)); }
 
 }  // namespace host::snapshots

@@ -5,7 +5,7 @@
 #include <set>
 #include <string>
 
-#include "host/snapshots/kept_file.h"
+#include "host/snapshots/file_state.h"
 
 namespace host::snapshots {
 
@@ -22,7 +22,9 @@ struct RunMark {
 // tells of. Every call throws a Problem where it fails, with the file as it was.
 class RunJournal {
  public:
-  RunJournal(Storage storage, const Path& directory);
+  RunJournal(Storage storage, const Path& directory) : _storage{std::move(storage)}, _mark{directory / kName} {}
+
+  static constexpr const char* kName = "running";
 
   void begin(const std::string& snapshot, const std::optional<std::string>& restores) const;
   void noteChange(const Path& path, const std::string& contents, bool isMadeNew) const;
@@ -31,7 +33,7 @@ class RunJournal {
   // The mark that is set; nothing where none is. A last line that was cut off tells of nothing that happened.
   [[nodiscard]] std::optional<RunMark> read() const;
 
-  // Takes the mark away; what it told stays beside it, for whoever wants to know.
+  // Takes the mark away.
   void clear() const;
 
  private:
@@ -39,7 +41,6 @@ class RunJournal {
 
   Storage _storage;
   Path _mark;
-  Path _last;
 };
 
 }  // namespace host::snapshots
