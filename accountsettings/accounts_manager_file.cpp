@@ -6,9 +6,9 @@
 #include "accountsettings/log_handle.h"
 #include "accountsettings/product_values.h"
 #include "accountsettings/store_watch.h"
-#include "platform/description.h"
 #include "platform/platform.h"
 #include "platform/run_stage.h"
+#include "records/description.h"
 
 namespace accountsettings {
 namespace {
@@ -30,7 +30,7 @@ void logCalculated(const BasicAccount& account, const Dictionary& merged) {
   if (!_ASLogSystem().hasReaders()) return;
   const std::function<std::string()> dataclasses = [&account]() -> std::string {
     const std::optional<BasicAccount::Dataclasses> enabled = account.enabledDataclasses();
-    return enabled ? platform::description(Array(enabled->begin(), enabled->end())) : "(null)";
+    return enabled ? records::description(Array(enabled->begin(), enabled->end())) : "(null)";
   };
   _ASLogSystem().log(kSave, "Calculated Properties - Type: %@, Properties: %@, Dataclasses: %@", account.type(), merged,
                      dataclasses);

@@ -14,7 +14,7 @@ using SingleChange = std::function<void(std::string_view identifier, std::string
 
 template <typename... Arguments>
 [[noreturn]] void fail(std::string_view method, std::string_view format, const Arguments&... arguments) {
-  failAssertion(method, "AccountsManager", format, {platform::MessageArgument{arguments}...});
+  failAssertion(method, "AccountsManager", format, {records::MessageArgument{arguments}...});
 }
 
 // --- Finding notifiers ---

@@ -11,8 +11,8 @@ AssertionFailure::AssertionFailure(std::string method, std::string file, std::st
 AssertionFailure::~AssertionFailure() = default;
 
 void failAssertion(std::string_view method, std::string_view file, std::string_view format,
-                   std::initializer_list<platform::MessageArgument> arguments) {
-  throw AssertionFailure{std::string{method}, std::string{file}, platform::message(format, arguments)};
+                   std::initializer_list<records::MessageArgument> arguments) {
+  throw AssertionFailure{std::string{method}, std::string{file}, records::message(format, arguments)};
 }
 
 }  // namespace accountsettings

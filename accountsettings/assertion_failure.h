@@ -5,7 +5,7 @@
 #include <string_view>
 
 #include "platform/export.h"
-#include "platform/message.h"
+#include "records/message.h"
 
 namespace accountsettings {
 
@@ -31,6 +31,6 @@ class ACCOUNT_EXPORT AssertionFailure : public std::logic_error {
 // Throws the failure of `method` in `file` ("BasicAccount" or "AccountsManager"), its message formatted with the
 // arguments.
 [[noreturn]] ACCOUNT_EXPORT void failAssertion(std::string_view method, std::string_view file, std::string_view format,
-                                               std::initializer_list<platform::MessageArgument> arguments = {});
+                                               std::initializer_list<records::MessageArgument> arguments = {});
 
 }  // namespace accountsettings

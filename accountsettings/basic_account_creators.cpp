@@ -22,7 +22,7 @@ struct Search {
 template <typename... Arguments>
 [[noreturn]] void failLookup(std::string_view format, const Arguments&... arguments) {
   failAssertion("-[BasicAccount _creatorClassNameForAccountType:creatorType:loader:]", "BasicAccount", format,
-                {platform::MessageArgument{arguments}...});
+                {records::MessageArgument{arguments}...});
 }
 
 const Array& creatorEntries(std::optional<std::string_view> type) {

@@ -11,9 +11,9 @@ constexpr std::string_view kCategory = "log";
 }  // namespace
 
 void LogHandle::write(const LogSite& site, std::string_view format,
-                      std::initializer_list<platform::MessageArgument> arguments) const {
+                      std::initializer_list<records::MessageArgument> arguments) const {
   const std::function<std::string()> text = [&] {
-    return platform::message("%s (%d) \"%s\"", {site.method, site.place.line(), platform::message(format, arguments)});
+    return records::message("%s (%d) \"%s\"", {site.method, site.place.line(), records::message(format, arguments)});
   };
   _log->write({kSubsystem, kCategory, site.method, site.place.line(), text});
 }

@@ -7,8 +7,8 @@
 #include <string_view>
 
 #include "platform/export.h"
-#include "platform/message.h"
 #include "platform/system_log.h"
+#include "records/message.h"
 
 namespace accountsettings {
 
@@ -34,12 +34,12 @@ class ACCOUNT_EXPORT LogHandle {
   // `format` with %@, %s, %d and %ld replaced by the arguments, which must outlive the call only.
   template <typename... Arguments>
   void log(const LogSite& site, std::string_view format, const Arguments&... arguments) const {
-    if (hasReaders()) write(site, format, {platform::MessageArgument{arguments}...});
+    if (hasReaders()) write(site, format, {records::MessageArgument{arguments}...});
   }
 
  private:
   void write(const LogSite& site, std::string_view format,
-             std::initializer_list<platform::MessageArgument> arguments) const;
+             std::initializer_list<records::MessageArgument> arguments) const;
 
   std::shared_ptr<platform::SystemLog> _log;
 };

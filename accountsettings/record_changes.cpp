@@ -10,9 +10,9 @@
 namespace accountsettings {
 namespace {
 
-using platform::RecordChange;
-using platform::RecordName;
-using platform::RunFact;
+using records::RecordChange;
+using records::RecordName;
+using records::RunFact;
 
 std::string textUnder(const Dictionary& properties, std::string_view key) {
   const Text* const text = properties.text(key);

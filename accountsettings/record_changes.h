@@ -6,7 +6,7 @@
 
 #include "accountsettings/basic_account.h"
 #include "platform/export.h"
-#include "platform/run_fact.h"
+#include "records/fact.h"
 
 namespace accountsettings {
 
@@ -19,17 +19,17 @@ using StoreState = std::vector<RecordState>;
 
 // What became of one record, and of which account of the store it tells; no account for a child.
 struct Difference {
-  platform::RunFact fact;
+  records::RunFact fact;
   const BasicAccount* account = nullptr;
   bool isReplacement = false;  // another object in the place of the one with its identifier; perhaps nothing else
 };
 
-[[nodiscard]] ACCOUNT_EXPORT platform::RecordName nameOf(const Dictionary& properties, std::string_view parent = {});
+[[nodiscard]] ACCOUNT_EXPORT records::RecordName nameOf(const Dictionary& properties, std::string_view parent = {});
 
 // The keys that differ, in the order of `after`, then those that went. Children that can be told apart are records of
 // their own, so "ChildAccounts" is a key like others only where it holds something else.
-[[nodiscard]] ACCOUNT_EXPORT std::vector<platform::RecordChange> changesOf(const Dictionary& before,
-                                                                           const Dictionary& after);
+[[nodiscard]] ACCOUNT_EXPORT std::vector<records::RecordChange> changesOf(const Dictionary& before,
+                                                                          const Dictionary& after);
 
 // What became of the accounts and their children: first what is there afterwards, in its order, then what went. A
 // top-level account is itself as long as it is the same object, whatever its identifier; a child is the one with its

@@ -5,14 +5,14 @@
 #include <utility>
 
 #include "accountsettings/vocabulary.h"
-#include "platform/description.h"
 #include "platform/run_stage.h"
+#include "records/description.h"
 
 namespace accountsettings {
 namespace {
 
-using platform::RunFact;
-using Kind = platform::RunFact::Kind;
+using records::RunFact;
+using Kind = records::RunFact::Kind;
 
 std::atomic<std::size_t>& stateCount() {
   static std::atomic<std::size_t> count;
@@ -40,7 +40,7 @@ std::string faultOf(const PropertyValue& element) {
   if (type == nullptr) return "it has no type";
   const Text* const name = type->asText();
   if (name == nullptr || !BasicAccount::_isValidAccountType(*name)) {
-    return "its type is unknown: " + platform::description(*type);
+    return "its type is unknown: " + records::description(*type);
   }
   return "it has no class";
 }
@@ -48,7 +48,7 @@ std::string faultOf(const PropertyValue& element) {
 }  // namespace
 
 std::unique_ptr<StoreWatch> StoreWatch::ofRun() {
-  auto observer = platform::observerOfFacts();
+  auto observer = records::factObserver();
   return observer == nullptr ? nullptr : std::unique_ptr<StoreWatch>{new StoreWatch{std::move(observer)}};
 }
 

@@ -9,8 +9,8 @@
 
 #include "accountsettings/record_changes.h"
 #include "platform/export.h"
-#include "platform/run_observer.h"
 #include "platform/status.h"
+#include "records/fact_observer.h"
 
 namespace accountsettings {
 
@@ -53,27 +53,27 @@ class ACCOUNT_EXPORT StoreWatch {
  private:
   struct Departure {
     std::string rule;
-    std::vector<platform::RecordName> into;
+    std::vector<records::RecordName> into;
   };
   struct Origin {
     std::string place;
     Dictionary description;
   };
 
-  explicit StoreWatch(std::shared_ptr<platform::RunObserver> observer) : _observer{std::move(observer)} {}
+  explicit StoreWatch(std::shared_ptr<records::FactObserver> observer) : _observer{std::move(observer)} {}
   template <typename Action>
   void attempt(const Action& action) noexcept;
   void tell(const Difference& difference);
-  void tellGone(platform::RunFact fact, const BasicAccount* account);
+  void tellGone(records::RunFact fact, const BasicAccount* account);
   void tellConverted(const Difference& difference, const Origin& origin);
   [[nodiscard]] bool wasToldAtLastSave(std::size_t place) const;
 
-  std::shared_ptr<platform::RunObserver> _observer;  // null once something went wrong
+  std::shared_ptr<records::FactObserver> _observer;  // null once something went wrong
   StoreState _known;
   std::unordered_map<const BasicAccount*, Departure> _departures;
   std::unordered_map<const BasicAccount*, Origin> _origins;
-  std::vector<platform::RunFact> _atLastSave;
-  std::vector<platform::RunFact> _atThisSave;
+  std::vector<records::RunFact> _atLastSave;
+  std::vector<records::RunFact> _atThisSave;
 };
 
 }  // namespace accountsettings

@@ -8,8 +8,8 @@
 #include "bench/memory_device.h"
 #include "bench/unchanging_files.h"
 #include "migrator/accounts_data_migrator.h"
-#include "platform/description.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
+#include "records/description.h"
 
 namespace bench {
 namespace {
@@ -58,7 +58,7 @@ Action compareIdentical(const Population& population) {
 
 Action describe(const Population& population) {
   return [accounts = accountsOf(population)] {
-    for (const PropertyValue& each : accounts) use(platform::description(each));
+    for (const PropertyValue& each : accounts) use(records::description(each));
   };
 }
 

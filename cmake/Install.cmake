@@ -43,7 +43,7 @@ endforeach()
 install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md
   DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT library)
 
-foreach(folder accountsettings platform)
+foreach(folder accountsettings records platform)
   file(GLOB headers CONFIGURE_DEPENDS "${CMAKE_SOURCE_DIR}/${folder}/*.h")
   install(FILES ${headers} DESTINATION "${headers_dir}/${folder}" COMPONENT development)
 endforeach()

@@ -10,9 +10,9 @@
 #include "fuzz/require.h"
 #include "migrator/accounts_data_migrator.h"
 #include "platform/characters.h"
-#include "platform/description.h"
-#include "platform/message.h"
 #include "platform/text.h"
+#include "records/description.h"
+#include "records/message.h"
 #include "tools/key_value.h"
 #include "tools/options.h"
 
@@ -73,11 +73,11 @@ std::string unquoted(std::string_view quoted) {
 }
 
 void checkDescription(const Text& text) {
-  const std::string described = platform::description(platform::Dictionary{{"k", text}});
+  const std::string described = records::description(platform::Dictionary{{"k", text}});
   require(described.starts_with("{k = ") && described.ends_with("}"), "no dictionary");
   require(unquoted(std::string_view{described}.substr(5, described.size() - 6)) == text.view(),
           "the description does not give the text back");
-  const std::string hidden = platform::description(platform::Dictionary{{"my Pass-Word", text}});
+  const std::string hidden = records::description(platform::Dictionary{{"my Pass-Word", text}});
   require(hidden == "{\"my Pass-Word\" = <hidden>}", "a credential is shown");
 }
 
@@ -123,8 +123,8 @@ void checkKeyValue(const std::string& argument) {
 }
 
 void checkMessage(const std::string& format, const std::string& text) {
-  const std::array<platform::MessageArgument, 1> arguments{text};
-  const std::string message = platform::message(format, arguments);
+  const std::array<records::MessageArgument, 1> arguments{text};
+  const std::string message = records::message(format, arguments);
   // Only the first placeholder is replaced, and what replaces it is not looked at again.
   std::size_t first = std::string::npos;
   std::size_t length = 0;

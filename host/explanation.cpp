@@ -4,7 +4,7 @@
 
 namespace host {
 
-using platform::RunFact;
+using records::RunFact;
 
 namespace {
 
@@ -12,8 +12,8 @@ constexpr std::string_view kOutside = "end of the run";  // where nothing but th
 
 }  // namespace
 
-void Explanation::began(std::string_view stage) {
-  _open.emplace_back(stage);
+void Explanation::began(std::string_view stage, std::string_view words) {
+  _open.push_back({std::string{stage}, std::string{words}});
   _isNewStage = true;
 }
 
@@ -23,15 +23,17 @@ void Explanation::ended() {
 }
 
 void Explanation::add(const RunFact& fact) {
-  if (_isNewStage) _stages.push_back({std::string{stage()}, std::string{outerStage()}, {}});
+  if (_isNewStage)
+    _stages.push_back(
+        {std::string{stage()}, _open.empty() ? std::string{} : _open.back().words, std::string{outerStage()}, {}});
   _isNewStage = false;
   _stages.back().facts.push_back(fact);
 }
 
-std::string_view Explanation::stage() const { return _open.empty() ? kOutside : std::string_view{_open.back()}; }
+std::string_view Explanation::stage() const { return _open.empty() ? kOutside : std::string_view{_open.back().name}; }
 
 std::string_view Explanation::outerStage() const {
-  return _open.size() < 2 ? std::string_view{} : _open[_open.size() - 2];
+  return _open.size() < 2 ? std::string_view{} : _open[_open.size() - 2].name;
 }
 
 template <typename Action>

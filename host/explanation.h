@@ -5,7 +5,7 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/run_fact.h"
+#include "records/fact.h"
 
 namespace host {
 
@@ -14,13 +14,14 @@ class Explanation {
  public:
   struct Stage {
     std::string name;
+    std::string words;   // what it does, for people; may be empty
     std::string within;  // the stage that it is a part of; may be empty
-    std::vector<platform::RunFact> facts;
+    std::vector<records::RunFact> facts;
   };
 
-  void began(std::string_view stage);
+  void began(std::string_view stage, std::string_view words = {});
   void ended();
-  void add(const platform::RunFact& fact);
+  void add(const records::RunFact& fact);
   // From here on something is missing.
   void loseTrack() { _isComplete = false; }
 
@@ -30,18 +31,22 @@ class Explanation {
   [[nodiscard]] std::string_view stage() const;
   [[nodiscard]] std::string_view outerStage() const;
   // How the last attempt to save ended; null where there was none.
-  [[nodiscard]] const platform::RunFact* lastSave() const;
+  [[nodiscard]] const records::RunFact* lastSave() const;
   // The removed files whose accounts are on the device no longer, since they could not be converted or no save of them
   // went through.
   [[nodiscard]] std::vector<std::string> lostFiles() const;
-  [[nodiscard]] std::size_t count(platform::RunFact::Kind kind) const;
+  [[nodiscard]] std::size_t count(records::RunFact::Kind kind) const;
 
  private:
   template <typename Action>
   void forEachFact(const Action& action) const;
 
   std::vector<Stage> _stages;
-  std::vector<std::string> _open;  // the stages that began and did not end, the innermost last
+  struct Open {
+    std::string name;
+    std::string words;
+  };
+  std::vector<Open> _open;  // the stages that began and did not end, the innermost last
   bool _isNewStage = true;
   bool _isComplete = true;
 };

@@ -7,10 +7,11 @@ namespace host {
 namespace {
 
 using Json = nlohmann::ordered_json;
-using platform::RunFact;
+using records::RunFact;
 
 Json jsonOfStage(const Explanation::Stage& stage) {
   Json json{{"stage", stage.name}};
+  if (!stage.words.empty()) json["words"] = stage.words;
   if (!stage.within.empty()) json["within"] = stage.within;
   Json steps = Json::array();
   for (const RunFact& fact : stage.facts) steps.push_back(jsonOf(fact));

@@ -2,22 +2,22 @@
 
 #include "host/explanation_output.h"
 #include "host/fact_json.h"
-#include "platform/description.h"
+#include "records/description.h"
 
 namespace host {
 namespace {
 
 using platform::Array;
 using platform::PropertyValue;
-using platform::RecordChange;
-using platform::RecordName;
-using platform::RunFact;
+using records::RecordChange;
+using records::RecordName;
+using records::RunFact;
 using Kind = RunFact::Kind;
 
 constexpr std::size_t kLongestValue = 80;
 constexpr std::size_t kMostChangedAccounts = 40;  // of one stage
 
-std::string quoted(const std::string& text) { return platform::description(PropertyValue{text}); }
+std::string quoted(const std::string& text) { return records::description(PropertyValue{text}); }
 
 // Cut between two characters.
 std::string shortened(std::string text) {
@@ -54,7 +54,7 @@ bool contains(const Array& array, const PropertyValue& value) { return std::rang
 std::string membership(const Array& of, const Array& notOf, std::string_view mark) {
   std::string text;
   for (const PropertyValue& element : of) {
-    if (!contains(notOf, element)) text += " " + std::string{mark} + platform::description(element);
+    if (!contains(notOf, element)) text += " " + std::string{mark} + records::description(element);
   }
   return text;
 }
@@ -63,13 +63,13 @@ std::string membership(const Array& of, const Array& notOf, std::string_view mar
 std::string listChange(const RecordChange& change) {
   const Array* const before = change.from ? change.from->asArray() : nullptr;
   const Array* const after = change.to ? change.to->asArray() : nullptr;
-  if (before == nullptr || after == nullptr || platform::namesCredential(change.key)) return {};
+  if (before == nullptr || after == nullptr || records::namesCredential(change.key)) return {};
   const std::string members = membership(*after, *before, "+") + membership(*before, *after, "-");
   return members.empty() && before->size() == after->size() ? " in another order" : members;
 }
 
 std::string shownValue(const RecordChange& change, const std::optional<PropertyValue>& value) {
-  return value ? shortened(platform::descriptionUnder(keyForShowing(change), *value)) : "nothing";
+  return value ? shortened(records::descriptionUnder(keyForShowing(change), *value)) : "nothing";
 }
 
 std::string shown(const RecordChange& change) {
@@ -145,7 +145,8 @@ std::string shown(const RunFact& fact) {
 
 std::string titleOf(const Explanation::Stage& stage) {
   const bool isPartOfStep = stage.name == "save" && !stage.within.empty();
-  return "\n" + stage.name + (isPartOfStep ? ", within " + stage.within : "") + "\n";
+  const std::string words = stage.words.empty() ? "" : " " + stage.words;
+  return "\n" + stage.name + words + (isPartOfStep ? ", within " + stage.within : "") + "\n";
 }
 
 // The stage's facts under its name; empty where none of them is worth a line.

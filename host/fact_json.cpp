@@ -4,16 +4,16 @@
 #include <cmath>
 #include <nlohmann/json.hpp>
 
-#include "platform/description.h"
+#include "records/description.h"
 
 namespace host {
 namespace {
 
 using Json = nlohmann::ordered_json;
 using platform::PropertyValue;
-using platform::RecordChange;
-using platform::RecordName;
-using platform::RunFact;
+using records::RecordChange;
+using records::RecordName;
+using records::RunFact;
 
 // In the order of the kinds.
 constexpr std::array<std::string_view, 15> kActions{
@@ -28,7 +28,7 @@ Json jsonOfShown(const PropertyValue& value) {
   if (const auto* const text = value.asText()) return text->string();
   if (const auto integer = value.asInteger()) return jsonOfInteger(*integer);
   if (const auto* const real = value.asReal()) {
-    return std::isfinite(*real) ? Json(*real) : Json(platform::description(value));
+    return std::isfinite(*real) ? Json(*real) : Json(records::description(value));
   }
   if (const auto* const boolean = value.asBoolean()) return *boolean;
   if (const auto* const array = value.asArray()) {
@@ -53,8 +53,8 @@ Json jsonOfChange(const RecordChange& change) {
   Json json{{"key", change.key}};
   if (!change.oldKey.empty()) json["renamedFrom"] = change.oldKey;
   const std::string_view key = keyForShowing(change);
-  if (change.from) json["from"] = jsonOfShown(platform::presentable(key, *change.from));
-  if (change.to) json["to"] = jsonOfShown(platform::presentable(key, *change.to));
+  if (change.from) json["from"] = jsonOfShown(records::presentable(key, *change.from));
+  if (change.to) json["to"] = jsonOfShown(records::presentable(key, *change.to));
   return json;
 }
 
@@ -74,7 +74,7 @@ bool countsRecords(RunFact::Kind kind) {
 std::string_view actionOf(RunFact::Kind kind) { return kActions.at(static_cast<std::size_t>(kind)); }
 
 std::string_view keyForShowing(const RecordChange& change) {
-  return platform::namesCredential(change.oldKey) ? change.oldKey : change.key;
+  return records::namesCredential(change.oldKey) ? change.oldKey : change.key;
 }
 
 Json jsonOf(const RunFact& fact) {

@@ -23,7 +23,7 @@ namespace {
 
 using commandline::Ending;
 
-// What watches a run from outside. The watch is null where nobody asks for anything that it could tell.
+// What watches a run from outside; the trace is null where none is asked for.
 struct Watchers {
   std::shared_ptr<Trace> trace;
   std::shared_ptr<ProgressLine> progress = std::make_shared<ProgressLine>(STDERR_FILENO);
@@ -41,12 +41,8 @@ std::shared_ptr<Trace> openTrace(const Options& options) {
 Watchers watchersFor(const Options& options) {
   Watchers watchers;
   watchers.trace = openTrace(options);
-  const bool isExplained = options.explain != Explain::notAsked;
-  const bool isKept = options.snapshots.directory.has_value();  // with the snapshot
-  if (isExplained || isKept || watchers.progress->isOnTerminal()) {
-    watchers.watch =
-        std::make_shared<RunWatch>(isExplained ? watchers.trace : nullptr, isExplained || isKept, watchers.progress);
-  }
+  const auto factsTo = options.explain == Explain::notAsked ? nullptr : watchers.trace;
+  watchers.watch = std::make_shared<RunWatch>(factsTo, watchers.progress);
   return watchers;
 }
 

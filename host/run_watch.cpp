@@ -31,9 +31,9 @@ void RunWatch::attempt(const Action& action) noexcept {
   }
 }
 
-void RunWatch::stageBegan(std::string_view stage) {
+void RunWatch::stageBegan(std::string_view stage, std::string_view words) {
   attempt([&] {
-    _explanation.began(stage);
+    _explanation.began(stage, words);
     _progress->show(stage);
   });
 }
@@ -42,7 +42,7 @@ void RunWatch::stageEnded(std::string_view /*stage*/) {
   attempt([&] { _explanation.ended(); });
 }
 
-void RunWatch::told(const platform::RunFact& fact) {
+void RunWatch::told(const records::RunFact& fact) {
   attempt([&] {
     if (_trace) _trace->step(_explanation.stage(), _explanation.outerStage(), fact);
     _explanation.add(fact);

@@ -7,21 +7,21 @@
 #include "host/progress_line.h"
 #include "host/trace.h"
 #include "platform/platform.h"
+#include "records/fact_observer.h"
 
 namespace host {
 
 // The run's observer: keeps what is to be explained, traces each fact as it is told, and shows progress. Nothing that
 // goes wrong here reaches the run.
-class RunWatch final : public platform::RunObserver {
+class RunWatch final : public records::FactObserver {
  public:
-  // Facts are kept, and traced where `trace` is not null, only where the run is to be explained.
-  RunWatch(std::shared_ptr<Trace> trace, bool isExplained, std::shared_ptr<ProgressLine> progress)
-      : _trace{std::move(trace)}, _isExplained{isExplained}, _progress{std::move(progress)} {}
+  // Facts are traced, too, where `trace` is not null.
+  RunWatch(std::shared_ptr<Trace> trace, std::shared_ptr<ProgressLine> progress)
+      : _trace{std::move(trace)}, _progress{std::move(progress)} {}
 
-  void stageBegan(std::string_view stage) override;
+  void stageBegan(std::string_view stage, std::string_view words) override;
   void stageEnded(std::string_view stage) override;
-  [[nodiscard]] bool wantsFacts() const override { return _isExplained; }
-  void told(const platform::RunFact& fact) override;
+  void told(const records::RunFact& fact) override;
   void progressed(std::size_t done, std::size_t total) override;
 
   [[nodiscard]] const Explanation& explanation() const { return _explanation; }
@@ -31,7 +31,6 @@ class RunWatch final : public platform::RunObserver {
   void attempt(const Action& action) noexcept;
 
   std::shared_ptr<Trace> _trace;
-  bool _isExplained;
   std::shared_ptr<ProgressLine> _progress;
   Explanation _explanation;
 };

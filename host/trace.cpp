@@ -63,7 +63,7 @@ void Trace::cloudTabs(bool enabled) noexcept {
   append([&] { return Event{{"event", "cloud-tabs"}, {"enabled", enabled}}; });
 }
 
-void Trace::step(std::string_view stage, std::string_view outerStage, const platform::RunFact& fact) noexcept {
+void Trace::step(std::string_view stage, std::string_view outerStage, const records::RunFact& fact) noexcept {
   append([&] {
     Event event{{"event", "step"}, {"stage", stage}};
     if (!outerStage.empty()) event["within"] = outerStage;

@@ -8,8 +8,8 @@
 #include <utility>
 
 #include "platform/linux/files/descriptor.h"
-#include "platform/run_fact.h"
 #include "platform/status.h"
+#include "records/fact.h"
 
 namespace host {
 
@@ -31,7 +31,7 @@ class Trace {
   void preferencesChanged(std::string_view domain, std::string_view key) noexcept;
   void cloudTabs(bool enabled) noexcept;
   // What the run did in a stage; `outerStage`, of which that is a part, may be empty.
-  void step(std::string_view stage, std::string_view outerStage, const platform::RunFact& fact) noexcept;
+  void step(std::string_view stage, std::string_view outerStage, const records::RunFact& fact) noexcept;
   void result(std::string_view dataClass, bool success) noexcept;
 
   // Whether every event so far was written.

@@ -4,7 +4,7 @@
 #include "migrator/account_reads.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/stored_names.h"
-#include "platform/message.h"
+#include "records/message.h"
 
 // Nothing is folded, trimmed or normalised anywhere here: an account that differs in the case of one letter belongs to
 // somebody else.
@@ -62,7 +62,7 @@ std::vector<std::string> AccountsDataMigrator::_expectedCalDAVPrincipalURLsForAc
   std::vector<std::string> paths;
   const auto appendPaths = [&](StringConstant pathTemplate) {
     for (const std::string& username : _expectedCalDAVUsernamesForAccount(umbrella)) {
-      paths.push_back(platform::message(pathTemplate, {_urlSafeUsername(username)}));
+      paths.push_back(records::message(pathTemplate, {_urlSafeUsername(username)}));
     }
   };
   if (hasClassAmong(umbrella, {kGmailAccountClass})) appendPaths(kGooglePrincipalPath);

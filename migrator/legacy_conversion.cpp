@@ -7,7 +7,7 @@
 #include "migrator/console.h"
 #include "migrator/told_removal.h"
 #include "platform/platform.h"
-#include "platform/run_stage.h"
+#include "records/fact_observer.h"
 
 namespace migrator {
 
@@ -37,10 +37,10 @@ std::string placeOf(const LegacySource& source, std::size_t index) {
 }
 
 void tellRefused(const LegacySource& source, const std::string& place) {
-  platform::tellFact([&] {
-    return platform::RunFact{.kind = platform::RunFact::Kind::failed,
-                             .reason = place + " has no class, so no account of this file is converted",
-                             .path = source.path};
+  records::tellFact([&] {
+    return records::RunFact{.kind = records::RunFact::Kind::failed,
+                            .reason = place + " has no class, so no account of this file is converted",
+                            .path = source.path};
   });
 }
 

@@ -26,7 +26,7 @@ void reportIfUndeleted(const Path& path, const Status& status, Report report) {
 }
 
 Status deleteLegacyFile(const Path& path, Report report) {
-  Status status = removeAndTell(path, platform::RunFact::Kind::sourceRemoved);
+  Status status = removeAndTell(path, records::RunFact::Kind::sourceRemoved);
   reportIfUndeleted(path, status, report);
   return status;
 }

@@ -3,9 +3,9 @@
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/console.h"
 #include "migrator/stored_names.h"
-#include "platform/message.h"
 #include "platform/platform.h"
 #include "platform/run_stage.h"
+#include "records/message.h"
 
 namespace migrator {
 namespace {
@@ -42,7 +42,7 @@ bool prepareReportDirectory(const Path& directory) {
 void writeReport(const Path& directory, const Dictionary& report) {
   const platform::Platform& services = platform::current();
   const std::string time = services.clock->currentLocalTime(kReportTimePattern).valueOr({});
-  const std::string name = platform::message("AccountMigrationInformation-%@.txt", {time});
+  const std::string name = records::message("AccountMigrationInformation-%@.txt", {time});
   const auto serialized = services.propertyLists->serialize(report);
   if (serialized.isOk()) std::ignore = services.files->replace(directory / name, *serialized.value());
 }

@@ -6,8 +6,8 @@
 #include "migrator/account_reads.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/stored_names.h"
-#include "platform/message.h"
 #include "platform/platform.h"
+#include "records/message.h"
 
 namespace migrator {
 namespace {
@@ -43,7 +43,7 @@ std::optional<PropertyValue> usernameWithDomain(const BasicAccount& mail) {
   if (!username) return std::nullopt;
   if (username->view().find('@') != std::string_view::npos) return *username;
   const StringConstant domain = hasClassAmong(mail, {kWexmoAccountClass}) ? kWexmoMailDomain : kNimbraMailDomain;
-  return platform::message("%@@%@", {*username, domain});
+  return records::message("%@@%@", {*username, domain});
 }
 
 Dictionary parentPropertiesFor(const BasicAccount& mail) {

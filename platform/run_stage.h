@@ -6,16 +6,15 @@
 #include <utility>
 
 #include "platform/platform.h"
-#include "platform/run_fact.h"
 
 namespace platform {
 
 // One stage of a run: tells the run's observer, where there is one, that it began and, on every way out, that it ended.
-// `name` must outlive the object. What an observer throws at the end of a stage is dropped.
+// `name` must outlive the object; `words` need not. What an observer throws at the end of a stage is dropped.
 class RunStage {
  public:
-  explicit RunStage(std::string_view name) : _observer{current().observer}, _name{name} {
-    if (_observer) _observer->stageBegan(_name);
+  explicit RunStage(std::string_view name, std::string_view words = {}) : _observer{current().observer}, _name{name} {
+    if (_observer) _observer->stageBegan(_name, words);
   }
   RunStage(const RunStage&) = delete;
   RunStage& operator=(const RunStage&) = delete;
@@ -31,22 +30,6 @@ class RunStage {
   std::shared_ptr<RunObserver> _observer;
   std::string_view _name;
 };
-
-// The observer that wants facts; null where none does, and nothing need be computed.
-[[nodiscard]] inline std::shared_ptr<RunObserver> observerOfFacts() {
-  std::shared_ptr<RunObserver> observer = current().observer;
-  return observer && observer->wantsFacts() ? observer : nullptr;
-}
-
-// Tells the fact that `makeFact` makes, if anybody wants it. Whatever goes wrong with that is no failure of the run.
-template <typename MakeFact>
-void tellFact(const MakeFact& makeFact) noexcept {
-  try {
-    if (const auto observer = observerOfFacts()) observer->told(makeFact());
-  } catch (...) {
-    return;
-  }
-}
 
 // Counts the records that a stage is done with.
 class RunProgress {

@@ -4,7 +4,7 @@
 #include <nlohmann/json.hpp>
 
 #include "accountsettings/device_local_account.h"
-#include "platform/description.h"
+#include "records/description.h"
 
 namespace tools {
 namespace {
@@ -74,13 +74,13 @@ Json jsonOf(const PropertyValue& value) {
     case Kind::data:
     case Kind::uid: break;
   }
-  return platform::description(value);
+  return records::description(value);
 }
 
 Json jsonOf(const Dictionary& properties) {
   auto members = Json::object();
   for (const auto& [key, value] : properties) {
-    members[key.string()] = platform::namesCredential(key) ? Json(kHidden) : jsonOf(value);
+    members[key.string()] = records::namesCredential(key) ? Json(kHidden) : jsonOf(value);
   }
   return members;
 }
@@ -103,9 +103,9 @@ Json jsonOf(const BasicAccount& account) {
 }
 
 std::string lineOf(const PropertyValue& value, std::string_view key) {
-  if (platform::namesCredential(key)) return kHidden;
+  if (records::namesCredential(key)) return kHidden;
   const auto* const text = value.asText();
-  return text == nullptr ? platform::description(value) : text->string();
+  return text == nullptr ? records::description(value) : text->string();
 }
 
 }  // namespace tools

@@ -1,7 +1,7 @@
 #include <cstdint>
 #include <optional>
 
-#include "platform/description.h"
+#include "records/description.h"
 #include "tools/findings.h"
 
 namespace tools {
@@ -46,7 +46,7 @@ Findings findingsOfVersion(const Dictionary& file) {
     return oneFinding("version-absent", kVersionPlace, "there is no data version", kTakesForCurrent);
   }
   const auto number = version->integerValue();
-  const auto shown = platform::description(*version);
+  const auto shown = records::description(*version);
   if (!number) {
     return oneFinding("version-odd", kVersionPlace, "the data version is no number: " + shown, kTakesForCurrent);
   }

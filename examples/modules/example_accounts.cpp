@@ -9,7 +9,7 @@
 #include <vector>
 
 #include "accountsettings/basic_account.h"
-#include "platform/description.h"
+#include "records/description.h"
 
 namespace {
 
@@ -74,7 +74,7 @@ std::shared_ptr<const AccountClassInfo> notifier() {
     say(std::string{identifier} + " changed for " + std::string{dataclass});
   };
   info->noteAccountChanges = [](const std::vector<Dictionary>& changes) {
-    for (const Dictionary& change : changes) say(platform::description(change));
+    for (const Dictionary& change : changes) say(records::description(change));
   };
   return info;
 }

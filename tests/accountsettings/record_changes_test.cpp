@@ -12,7 +12,7 @@ namespace {
 using accountsettings::Difference;
 using accountsettings::RecordState;
 using accountsettings::StoreState;
-using platform::RunFact;
+using records::RunFact;
 using Lines = std::vector<std::string>;
 
 class RecordChanges : public AccountStore {
@@ -167,7 +167,7 @@ void apply(const RunFact& fact, const StoreState& after, std::map<std::string, D
       }
     }
   }
-  for (const platform::RecordChange& change : fact.changes) {
+  for (const records::RecordChange& change : fact.changes) {
     Dictionary& record = records[fact.subject.identifier];
     record.remove(change.oldKey);
     change.to ? record.set(change.key, *change.to) : static_cast<void>(record.remove(change.key));

@@ -10,8 +10,8 @@ namespace {
 
 using host::Explanation;
 using host::RunWatch;
-using platform::RecordChange;
-using platform::RunFact;
+using records::RecordChange;
+using records::RunFact;
 using Kind = RunFact::Kind;
 using Lines = std::vector<std::string>;
 
@@ -114,12 +114,6 @@ TEST(TheText, HidesCredentialsWhereverTheyStand) {
     EXPECT_FALSE(contains(host::textOf(explanation, outcome), secret)) << change.key;
     EXPECT_FALSE(contains(host::jsonDocumentOf(explanation, outcome), secret)) << change.key;
   }
-}
-
-TEST(AWatch, WantsFactsOnlyForAnExplanation) {
-  const auto progress = std::make_shared<host::ProgressLine>(-1);
-  EXPECT_FALSE((RunWatch{nullptr, false, progress}.wantsFacts()));
-  EXPECT_TRUE((RunWatch{nullptr, true, progress}.wantsFacts()));
 }
 
 }  // namespace

@@ -18,7 +18,7 @@ class Stages final : public platform::RunObserver {
   std::vector<std::string> steps;
   std::vector<std::uint64_t> versions;  // of the store, after each step
 
-  void stageBegan(std::string_view stage) override {
+  void stageBegan(std::string_view stage, std::string_view) override {
     if (!isSave(stage)) steps.emplace_back(stage);
   }
   void stageEnded(std::string_view stage) override {

@@ -5,16 +5,16 @@
 #include <utility>
 #include <vector>
 
-#include "platform/description.h"
+#include "records/description.h"
 #include "tests/support/property_list_files.h"
 
 using platform::Array;
 using platform::Bytes;
 using platform::Date;
-using platform::description;
 using platform::Dictionary;
 using platform::PropertyValue;
 using platform::Uid;
+using records::description;
 using tests::BinaryFile;
 using tests::fileWith;
 using tests::PropertyListFiles;

@@ -9,14 +9,14 @@
 #include <string>
 #include <vector>
 
-#include "platform/description.h"
+#include "records/description.h"
 #include "tests/support/property_list_files.h"
 #include "tests/support/property_value_generator.h"
 #include "tests/support/scratch_directory.h"
 
 namespace platform {
 void showValue(const Dictionary& dictionary, std::ostream& stream);
-void showValue(const Dictionary& dictionary, std::ostream& stream) { stream << description(dictionary); }
+void showValue(const Dictionary& dictionary, std::ostream& stream) { stream << records::description(dictionary); }
 }  // namespace platform
 
 using platform::Bytes;

@@ -30,7 +30,7 @@ class ThrowingNotice final : public platform::PreferencesChangedNotice {
 
 class ThrowingObserver final : public platform::RunObserver {
  public:
-  void stageBegan(std::string_view) override {}
+  void stageBegan(std::string_view, std::string_view) override {}
   void stageEnded(std::string_view) override { throw std::runtime_error{"observer"}; }
 };
 

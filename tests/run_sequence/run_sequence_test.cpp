@@ -35,7 +35,7 @@ Dictionary legacyMail(std::string_view identifier) {
 class StageWatch final : public platform::RunObserver {
  public:
   StageWatch(std::string_view stage, std::function<void()> work) : _stage{stage}, _work{std::move(work)} {}
-  void stageBegan(std::string_view stage) override {
+  void stageBegan(std::string_view stage, std::string_view) override {
     if (stage == _stage) _work();
   }
   void stageEnded(std::string_view) override {}

@@ -2,23 +2,23 @@
 
 #include <array>
 
-#include "platform/description.h"
+#include "records/description.h"
 
 namespace tests {
 namespace {
 
-using platform::RecordChange;
-using platform::RunFact;
+using records::RecordChange;
+using records::RunFact;
 
 constexpr std::array kNames{"loaded", "added",  "converted", "changed",    "moved",   "folded",  "dropped",  "repeated",
                             "kept",   "failed", "saved",     "saveFailed", "removed", "removed", "unremoved"};
 
 std::string shown(const RecordChange& change) {
-  const std::string to = change.to ? platform::description(*change.to) : "";
+  const std::string to = change.to ? records::description(*change.to) : "";
   if (!change.oldKey.empty()) return change.oldKey + " now " + change.key + " " + to;
   if (!change.from) return "+" + change.key + " " + to;
   if (!change.to) return "-" + change.key;
-  return change.key + " " + platform::description(*change.from) + " -> " + to;
+  return change.key + " " + records::description(*change.from) + " -> " + to;
 }
 
 }  // namespace
@@ -27,7 +27,7 @@ std::string lineOf(const RunFact& fact) {
   std::string line = kNames.at(static_cast<std::size_t>(fact.kind));
   if (!fact.subject.identifier.empty()) line += " " + fact.subject.identifier;
   if (!fact.subject.parent.empty()) line += " in " + fact.subject.parent;
-  for (const platform::RecordName& other : fact.others) line += " into " + other.identifier;
+  for (const records::RecordName& other : fact.others) line += " into " + other.identifier;
   std::string_view separator = ": ";
   for (const RecordChange& change : fact.changes) {
     line += separator;

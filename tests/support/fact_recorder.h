@@ -4,22 +4,20 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/run_fact.h"
-#include "platform/run_observer.h"
+#include "records/fact.h"
+#include "records/fact_observer.h"
 
 namespace tests {
 
 // An observer that keeps every fact, and the stage in which it was told.
-class FactRecorder final : public platform::RunObserver {
+class FactRecorder final : public records::FactObserver {
  public:
-  bool isWanted = true;
-  std::vector<platform::RunFact> facts;
+  std::vector<records::RunFact> facts;
   std::vector<std::string> stages;  // of each fact; empty outside of any
 
-  void stageBegan(std::string_view stage) override { _open.emplace_back(stage); }
+  void stageBegan(std::string_view stage, std::string_view) override { _open.emplace_back(stage); }
   void stageEnded(std::string_view) override { _open.pop_back(); }
-  [[nodiscard]] bool wantsFacts() const override { return isWanted; }
-  void told(const platform::RunFact& fact) override;
+  void told(const records::RunFact& fact) override;
 
   // Each fact in one line, "changed a: Port 1 -> 2, -Host", without those of loading and saving.
   [[nodiscard]] std::vector<std::string> lines() const;
@@ -28,6 +26,6 @@ class FactRecorder final : public platform::RunObserver {
   std::vector<std::string> _open;
 };
 
-[[nodiscard]] std::string lineOf(const platform::RunFact& fact);
+[[nodiscard]] std::string lineOf(const records::RunFact& fact);
 
 }  // namespace tests

@@ -21,7 +21,9 @@ inline const Path kAutoFetchMarker = "/var/mobile/Library/Mail/AutoFetchEnabled"
 class RecordingObserver final : public platform::RunObserver {
  public:
   explicit RecordingObserver(Outputs& outputs) : _outputs{outputs} {}
-  void stageBegan(std::string_view stage) override { _outputs.push_back("began " + std::string{stage}); }
+  void stageBegan(std::string_view stage, std::string_view) override {
+    _outputs.push_back("began " + std::string{stage});
+  }
   void stageEnded(std::string_view stage) override { _outputs.push_back("ended " + std::string{stage}); }
 
  private:

@@ -2,13 +2,13 @@
 
 #include <ostream>
 
-#include "platform/description.h"
 #include "platform/property_value.h"
+#include "records/description.h"
 
 // How values read in a failed expectation.
 namespace platform {
 
-inline void PrintTo(const PropertyValue& value, std::ostream* stream) { *stream << description(value); }
-inline void PrintTo(const Dictionary& dictionary, std::ostream* stream) { *stream << description(dictionary); }
+inline void PrintTo(const PropertyValue& value, std::ostream* stream) { *stream << records::description(value); }
+inline void PrintTo(const Dictionary& dictionary, std::ostream* stream) { *stream << records::description(dictionary); }
 
 }  // namespace platform

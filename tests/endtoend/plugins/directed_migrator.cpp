@@ -35,7 +35,7 @@ void workSlowly() {
   const auto observer = platform::current().observer;
   if (!observer) return;
   for (const std::string_view stage : {"quick", "slow"}) {
-    observer->stageBegan(stage);
+    observer->stageBegan(stage, {});
     if (stage == "slow") std::this_thread::sleep_for(std::chrono::milliseconds{1100});
     observer->progressed(256, 1000);
     observer->stageEnded(stage);

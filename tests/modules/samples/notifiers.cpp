@@ -1,7 +1,7 @@
 // Notifiers: one with every operation, one that hears of saves only, and one that misses what it must have.
 
 #include "accountsettings/account_objects.h"
-#include "platform/description.h"
+#include "records/description.h"
 #include "tests/modules/sample_journal.h"
 
 namespace {
@@ -16,7 +16,7 @@ void noteSingle(const std::string& what, std::string_view identifier, std::strin
 auto notifierNamed(const std::string& name) {
   auto info = std::make_shared<AccountClassInfo>(name);
   info->noteAccountChanges = [name](const std::vector<Dictionary>& changes) {
-    for (const Dictionary& change : changes) samples::journal().push_back(name + " " + platform::description(change));
+    for (const Dictionary& change : changes) samples::journal().push_back(name + " " + records::description(change));
   };
   return info;
 }

@@ -5,7 +5,10 @@
 #include "platform/export.h"
 #include "platform/property_value.h"
 
-namespace platform {
+namespace records {
+
+using platform::Dictionary;
+using platform::PropertyValue;
 
 // The textual description of a value for people: logs, console lines, traces, reports. One line, keys in their order:
 //
@@ -28,4 +31,4 @@ namespace platform {
 // description.cpp).
 [[nodiscard]] ACCOUNT_EXPORT bool namesCredential(std::string_view key);
 
-}  // namespace platform
+}  // namespace records

@@ -1,4 +1,4 @@
-#include "platform/message.h"
+#include "records/message.h"
 
 #include <gtest/gtest.h>
 
@@ -8,10 +8,10 @@
 
 using platform::Array;
 using platform::Dictionary;
-using platform::message;
 using platform::PropertyValue;
 using platform::StringConstant;
 using platform::Text;
+using records::message;
 
 namespace {
 
@@ -51,7 +51,7 @@ TEST(Messages, ShowWhatIsAbsentAsNull) {
 TEST(Messages, RenderAnObjectOnlyWhenRead) {
   int rendered = 0;
   const std::function<std::string()> render = [&rendered] { return "object " + std::to_string(++rendered); };
-  const platform::MessageArgument argument{render};
+  const records::MessageArgument argument{render};
   EXPECT_EQ(rendered, 0);
   EXPECT_EQ(message("%@", {argument}), "object 1");
 }

@@ -1,4 +1,4 @@
-#include "platform/description.h"
+#include "records/description.h"
 
 #include <algorithm>
 #include <array>
@@ -6,7 +6,11 @@
 #include <charconv>
 #include <cmath>
 
-namespace platform {
+namespace records {
+
+using platform::Array;
+using platform::Date;
+
 namespace {
 
 // Words in names of keys that carry credentials, in lower case and without blanks, hyphens and underscores.
@@ -168,4 +172,4 @@ std::string description(const Dictionary& dictionary) {
   return writer.take();
 }
 
-}  // namespace platform
+}  // namespace records

@@ -1,4 +1,4 @@
-#include "platform/description.h"
+#include "records/description.h"
 
 #include <gtest/gtest.h>
 
@@ -11,12 +11,12 @@
 using platform::Array;
 using platform::Bytes;
 using platform::Date;
-using platform::description;
-using platform::descriptionUnder;
 using platform::Dictionary;
-using platform::namesCredential;
 using platform::PropertyValue;
 using platform::Uid;
+using records::description;
+using records::descriptionUnder;
+using records::namesCredential;
 
 namespace {
 
@@ -71,8 +71,8 @@ TEST(Descriptions, LeavesOfAValueWhatMayBeShown) {
   const Dictionary value{{"Token", "secret"}, {"Blob", Bytes{1, 2}}, {"Ports", Array{1, Dictionary{{"Cookie", 2}}}}};
   const Dictionary shown{
       {"Token", "<hidden>"}, {"Blob", "<data: 2 bytes>"}, {"Ports", Array{1, Dictionary{{"Cookie", "<hidden>"}}}}};
-  EXPECT_EQ(platform::presentable("Settings", value), PropertyValue{shown});
-  EXPECT_EQ(platform::presentable("Secrets", value), PropertyValue{"<hidden>"});
+  EXPECT_EQ(records::presentable("Settings", value), PropertyValue{shown});
+  EXPECT_EQ(records::presentable("Secrets", value), PropertyValue{"<hidden>"});
 }
 
 }  // namespace

@@ -13,7 +13,12 @@
 #include "platform/property_value.h"
 #include "platform/text.h"
 
-namespace platform {
+namespace records {
+
+using platform::Dictionary;
+using platform::PropertyValue;
+using platform::StringConstant;
+using platform::Text;
 
 // One argument of a message. It refers to what it was made from and renders it only when the message is read, so a
 // message that nobody reads costs nothing. Absent objects read as "(null)"; values and dictionaries read as their
@@ -51,4 +56,4 @@ class ACCOUNT_EXPORT MessageArgument {
   return message(format, std::span{arguments.begin(), arguments.size()});
 }
 
-}  // namespace platform
+}  // namespace records

@@ -1,10 +1,10 @@
-#include "platform/message.h"
+#include "records/message.h"
 
 #include <array>
 
-#include "platform/description.h"
+#include "records/description.h"
 
-namespace platform {
+namespace records {
 namespace {
 
 std::string render(std::monostate) { return "(null)"; }
@@ -47,4 +47,4 @@ std::string message(std::string_view format, std::span<const MessageArgument> ar
   return text;
 }
 
-}  // namespace platform
+}  // namespace records

@@ -7,7 +7,9 @@
 
 #include "platform/property_value.h"
 
-namespace platform {
+namespace records {
+
+using platform::PropertyValue;
 
 // A record as people and files know it. Whatever a record does not have is empty.
 struct RecordName {
@@ -21,7 +23,7 @@ struct RecordName {
 
 // One key of a record that has another value, or stands there no longer (no `to`), or is new (no `from`). Where the
 // value is that of a key which went at the same time, `oldKey` is that key, and it is not told of separately. The
-// values are whole and may be credentials: whoever shows them goes by platform/description.h.
+// values are whole and may be credentials: whoever shows them goes by records/description.h.
 struct RecordChange {
   std::string key;
   std::string oldKey{};
@@ -63,4 +65,4 @@ struct RunFact {
   friend bool operator==(const RunFact&, const RunFact&) = default;
 };
 
-}  // namespace platform
+}  // namespace records

@@ -1,0 +1,33 @@
+#pragma once
+
+#include <memory>
+
+#include "platform/platform.h"
+#include "platform/run_observer.h"
+#include "records/fact.h"
+
+namespace records {
+
+// An observer of a run that is also told what each stage did. Facts are computed for such an observer only.
+class FactObserver : public platform::RunObserver {
+ public:
+  // One fact of the stage that began last and has not ended, in the order in which they are found out.
+  virtual void told(const RunFact& fact) = 0;
+};
+
+// The observer that wants facts; null where none does, and nothing need be computed.
+[[nodiscard]] inline std::shared_ptr<FactObserver> factObserver() {
+  return std::dynamic_pointer_cast<FactObserver>(platform::current().observer);
+}
+
+// Tells the fact that `makeFact` makes, if anybody wants it. Whatever goes wrong with that is no failure of the run.
+template <typename MakeFact>
+void tellFact(const MakeFact& makeFact) noexcept {
+  try {
+    if (const auto observer = factObserver()) observer->told(makeFact());
+  } catch (...) {
+    return;
+  }
+}
+
+}  // namespace records
