@@ -13,24 +13,64 @@ using platform::Date;
 
 namespace {
 
-// Words in names of keys that carry credentials, in lower case and without blanks, hyphens and underscores.
-constexpr std::array<std::string_view, 11> kCredentialWords{"password", "passwd",  "passphrase",   "passcode",
-                                                            "token",    "secret",  "cookie",       "credential",
-                                                            "key",      "pincode", "authorization"};
+// Wherever they stand in the name of a key, in lower case and without blanks, hyphens and underscores.
+constexpr auto kCredentialWords =
+    std::to_array<std::string_view>({"password", "passwd", "passphrase", "passcode", "pincode", "token", "secret",
+                                     "cookie", "oauth", "bearer", "authorization", "key", "credential", "sessionid"});
+
+// Short ones, which are found in harmless words, too: one of the words that a name consists of. "Compass" is none of
+// them, "IMAPPass", "user_pw" and "PIN" each have one.
+constexpr std::array<std::string_view, 6> kShortCredentialWords{"pass", "pin", "pw", "pwd", "otp", "session"};
+// A word that goes on without a new one being begun: "sessionid", "otpauth"; but "sessions" are a number of them.
+constexpr std::array<std::string_view, 2> kCredentialBeginnings{"otp", "session"};
+constexpr std::array<std::string_view, 2> kCredentialEndings{"pw", "pwd"};
+constexpr std::string_view kNumberOfSessions = "sessions";
 
 // Harmless settings that are called keys by an old custom of calendars. What else is called a key is taken for one.
 constexpr std::array<std::string_view, 3> kPlainKeys{"loginkey", "caldavserverkey", "caldavprincipalpathkey"};
 
 constexpr std::string_view kHidden = "<hidden>";
 
+bool isUpper(char character) { return std::isupper(static_cast<unsigned char>(character)) != 0; }
+bool isLower(char character) { return std::islower(static_cast<unsigned char>(character)) != 0; }
+bool isAlphabetic(char character) { return std::isalpha(static_cast<unsigned char>(character)) != 0; }
+char lower(char character) { return static_cast<char>(std::tolower(static_cast<unsigned char>(character))); }
+
 std::string foldedKey(std::string_view key) {
   std::string folded;
   folded.reserve(key.size());
   for (const char character : key) {
-    if (character == ' ' || character == '-' || character == '_') continue;
-    folded.push_back(static_cast<char>(std::tolower(static_cast<unsigned char>(character))));
+    if (character != ' ' && character != '-' && character != '_') folded.push_back(lower(character));
   }
   return folded;
+}
+
+// Whether a new word begins at the place: "userPass", "IMAPPass", "user_pass".
+bool beginsWord(std::string_view key, std::size_t place) {
+  if (!isAlphabetic(key[place])) return false;
+  if (place == 0 || !isAlphabetic(key[place - 1])) return true;
+  if (!isUpper(key[place])) return false;
+  return isLower(key[place - 1]) || (place + 1 < key.size() && isLower(key[place + 1]));
+}
+
+bool isShortCredentialWord(std::string_view word) {
+  const auto begins = [word](std::string_view beginning) { return word.starts_with(beginning); };
+  const auto ends = [word](std::string_view ending) { return word.ends_with(ending); };
+  if (word == kNumberOfSessions) return false;
+  return std::ranges::find(kShortCredentialWords, word) != kShortCredentialWords.end() ||
+         std::ranges::any_of(kCredentialBeginnings, begins) || std::ranges::any_of(kCredentialEndings, ends);
+}
+
+bool hasShortCredentialWord(std::string_view key) {
+  for (std::size_t place = 0; place < key.size(); ++place) {
+    if (!beginsWord(key, place)) continue;
+    std::string word{lower(key[place])};
+    for (std::size_t next = place + 1; next < key.size() && isAlphabetic(key[next]) && !beginsWord(key, next); ++next) {
+      word.push_back(lower(key[next]));
+    }
+    if (isShortCredentialWord(word)) return true;
+  }
+  return false;
 }
 
 bool isPlainWord(std::string_view text) {
@@ -74,7 +114,7 @@ class Writer {
 
   void writeText(std::string_view text) {
     append("\"");
-    for (const char character : text) writeCharacter(character);
+    for (const char character : withoutUserParts(text)) writeCharacter(character);
     append("\"");
   }
   void writeCharacter(char character) {
@@ -137,11 +177,26 @@ PropertyValue presentableDictionary(const Dictionary& dictionary) {
 
 }  // namespace
 
+std::string withoutUserParts(std::string_view text) {
+  static constexpr std::string_view kScheme = "://";
+  static constexpr std::string_view kAfterHost = "/?#\\\"'<> \t\r\n";
+  std::string shown;
+  for (std::size_t scheme = text.find(kScheme); scheme != std::string_view::npos; scheme = text.find(kScheme)) {
+    shown += text.substr(0, scheme + kScheme.size());
+    text.remove_prefix(scheme + kScheme.size());
+    const std::size_t at = text.substr(0, text.find_first_of(kAfterHost)).rfind('@');
+    if (at == std::string_view::npos) continue;
+    shown += kHidden;
+    text.remove_prefix(at);
+  }
+  return shown.append(text);
+}
+
 bool namesCredential(std::string_view key) {
   const std::string folded = foldedKey(key);
   if (std::ranges::find(kPlainKeys, folded) != kPlainKeys.end()) return false;
-  return std::ranges::any_of(kCredentialWords,
-                             [&folded](std::string_view word) { return folded.find(word) != std::string::npos; });
+  const auto isPart = [&folded](std::string_view word) { return folded.find(word) != std::string::npos; };
+  return std::ranges::any_of(kCredentialWords, isPart) || hasShortCredentialWord(key);
 }
 
 std::string description(const PropertyValue& value) {
@@ -162,6 +217,7 @@ PropertyValue presentable(std::string_view key, const PropertyValue& value) {
     case PropertyValue::Kind::data:
     case PropertyValue::Kind::date:
     case PropertyValue::Kind::uid: return description(value);
+    case PropertyValue::Kind::string: return withoutUserParts(*value.asText());
     default: return value;
   }
 }

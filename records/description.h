@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 #include "platform/export.h"
 #include "platform/property_value.h"
@@ -15,8 +16,9 @@ using platform::PropertyValue;
 //   {Identifier = "4F1C…"; "Enabled Dataclasses" = ("com.vorlix.Dataclass.Mail"); Port = 993; IsActive = true}
 //
 // Credentials are never shown, only that they are there: whatever stands under a key that names one (see
-// `namesCredential`) appears as <hidden>, and data as its size, <data: 20 bytes>. This is the one place where values
-// become text; whatever else prints them prints what `presentable` leaves of them.
+// `namesCredential`) appears as <hidden>, as does the user part of a URL wherever one stands in a text, and data as its
+// size, <data: 20 bytes>. This is the one place where values become text; whatever else prints them prints what
+// `presentable` leaves of them.
 [[nodiscard]] ACCOUNT_EXPORT std::string description(const PropertyValue& value);
 [[nodiscard]] ACCOUNT_EXPORT std::string description(const Dictionary& dictionary);
 
@@ -26,9 +28,14 @@ using platform::PropertyValue;
 // the text that `description` shows of them, so that texts, numbers, booleans, arrays and dictionaries are left.
 [[nodiscard]] ACCOUNT_EXPORT PropertyValue presentable(std::string_view key, const PropertyValue& value);
 
-// Whether a key's value is a credential: the key contains, in any letter case, one of the words that name passwords,
-// tokens, secrets, cookies, keys, and the like (the list, and what is called a key and is none, stands in
-// description.cpp).
+// Whether a key's value is a credential. Either the key contains, in any letter case and whatever blanks, hyphens and
+// underscores stand in between, one of the words that name passwords, tokens, secrets, cookies, keys and the like; or
+// one of the words that it consists of ("IMAPPass" of two, "user_pw" of two) is a short name for one: pass, pin, pw,
+// pwd, and whatever begins with otp or session. The lists, and what is called a key and is none, stand in
+// description.cpp.
 [[nodiscard]] ACCOUNT_EXPORT bool namesCredential(std::string_view key);
+
+// The text with the user part of every URL in it hidden: "https://<hidden>@host/path".
+[[nodiscard]] ACCOUNT_EXPORT std::string withoutUserParts(std::string_view text);
 
 }  // namespace records

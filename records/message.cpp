@@ -8,10 +8,10 @@ namespace records {
 namespace {
 
 std::string render(std::monostate) { return "(null)"; }
-std::string render(std::string_view text) { return std::string{text}; }
+std::string render(std::string_view text) { return withoutUserParts(text); }
 // At the top of a message a text is shown bare; inside a container it is quoted.
 std::string render(const PropertyValue* value) {
-  return value->asText() != nullptr ? value->asText()->string() : description(*value);
+  return value->asText() != nullptr ? render(value->asText()->view()) : description(*value);
 }
 std::string render(const Dictionary* dictionary) { return description(*dictionary); }
 std::string render(std::int64_t number) { return std::to_string(number); }

@@ -60,7 +60,7 @@ ChildrenByParent childrenByParent(const AccountsManager& accounts) {
 Json jsonOf(const PropertyValue& value) {
   using Kind = PropertyValue::Kind;
   switch (value.kind()) {
-    case Kind::string: return value.asText()->string();
+    case Kind::string: return records::withoutUserParts(*value.asText());
     case Kind::boolean: return *value.asBoolean();
     case Kind::integer:
     case Kind::real: return numberOf(value);
@@ -105,7 +105,7 @@ Json jsonOf(const BasicAccount& account) {
 std::string lineOf(const PropertyValue& value, std::string_view key) {
   if (records::namesCredential(key)) return kHidden;
   const auto* const text = value.asText();
-  return text == nullptr ? records::description(value) : text->string();
+  return text == nullptr ? records::description(value) : records::withoutUserParts(*text);
 }
 
 }  // namespace tools
