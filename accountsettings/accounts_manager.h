@@ -18,7 +18,7 @@
 
 namespace accountsettings {
 
-class StoreWatch;
+class ChangeTracker;
 
 // The change that a change entry tells of.
 enum class ChangeType : std::int32_t { added = 0, present = 1, removed = 2 };
@@ -59,7 +59,7 @@ class ACCOUNT_EXPORT AccountsManager {
   using RuntimeFixers = std::vector<std::shared_ptr<RuntimeFixer>>;
   [[nodiscard]] RuntimeFixers _createRuntimeFixers() const;
   // Internal: what follows the accounts for a run's observer; null where none wants to know.
-  [[nodiscard]] StoreWatch* _runWatch() const { return _watch.get(); }
+  [[nodiscard]] ChangeTracker* _changeTracker() const { return _tracker.get(); }
   // Internal: tells the run's observer, if there is one, what became of the accounts since it last was told.
   void _tellChanges() const;
 
@@ -150,9 +150,9 @@ class ACCOUNT_EXPORT AccountsManager {
  private:
   AccountsManager();
   // Loading. An element that is no dictionary is read as an empty one.
-  [[nodiscard]] static std::shared_ptr<AccountsManager> _loadedFromFile(std::unique_ptr<StoreWatch> watch);
+  [[nodiscard]] static std::shared_ptr<AccountsManager> _loadedFromFile(std::unique_ptr<ChangeTracker> tracker);
   [[nodiscard]] static std::shared_ptr<AccountsManager> _loaded(const Array* accounts,
-                                                                std::unique_ptr<StoreWatch> watch);
+                                                                std::unique_ptr<ChangeTracker> tracker);
   [[nodiscard]] bool _offerLoaded(const Account& account, const PropertyValue& element);
   void _loadAccounts(const Array& accounts);
   [[nodiscard]] static Account accountFromElement(const PropertyValue& element);
@@ -194,7 +194,7 @@ class ACCOUNT_EXPORT AccountsManager {
   std::vector<std::pair<Text, Dictionary>> _originalAccountsByID;
   std::uint64_t _dataVersion = 0;
   RuntimeFixers _runtimeFixers;
-  std::unique_ptr<StoreWatch> _watch;  // null unless a run is observed
+  std::unique_ptr<ChangeTracker> _tracker;  // null unless a run is observed
 };
 
 // Paths of the account settings file and of the two legacy files.

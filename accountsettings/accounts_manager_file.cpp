@@ -3,9 +3,9 @@
 
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/as_runtime_fix_mail_account.h"
+#include "accountsettings/change_tracker.h"
 #include "accountsettings/log_handle.h"
 #include "accountsettings/product_values.h"
-#include "accountsettings/store_watch.h"
 #include "platform/platform.h"
 #include "platform/run_stage.h"
 #include "records/description.h"
@@ -99,15 +99,16 @@ AccountsManager::RuntimeFixers AccountsManager::_createRuntimeFixers() const {
 std::shared_ptr<AccountsManager> AccountsManager::init() { return initInsideOfMigration(); }
 
 std::shared_ptr<AccountsManager> AccountsManager::initInsideOfMigration() {
-  return _loadedFromFile(StoreWatch::ofRun());
+  return _loadedFromFile(ChangeTracker::ofRun());
 }
 
-std::shared_ptr<AccountsManager> AccountsManager::_loadedFromFile(std::unique_ptr<StoreWatch> watch) {
-  const Dictionary file =
-      platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist()).valueOr({});
-  std::shared_ptr<AccountsManager> store = _loaded(file.array(kPlistAccountsKey), std::move(watch));
+std::shared_ptr<AccountsManager> AccountsManager::_loadedFromFile(std::unique_ptr<ChangeTracker> tracker) {
+  const auto read = platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist());
+  const Dictionary file = read.valueOr({});
+  std::shared_ptr<AccountsManager> store = _loaded(file.array(kPlistAccountsKey), std::move(tracker));
   store->setDataVersion(versionIn(file));
-  if (store->_watch) store->_watch->loadedAll(store->_orderedTopLevelAccounts, store->_dataVersion);
+  if (store->_tracker) store->_tracker->readFile(read.status());
+  if (store->_tracker) store->_tracker->loadedAll(store->_orderedTopLevelAccounts, store->_dataVersion);
   return store;
 }
 
@@ -119,9 +120,10 @@ std::shared_ptr<AccountsManager> AccountsManager::_initWithAccountsInfo(const Ar
   return _loaded(accounts, nullptr);
 }
 
-std::shared_ptr<AccountsManager> AccountsManager::_loaded(const Array* accounts, std::unique_ptr<StoreWatch> watch) {
+std::shared_ptr<AccountsManager> AccountsManager::_loaded(const Array* accounts,
+                                                          std::unique_ptr<ChangeTracker> tracker) {
   std::shared_ptr<AccountsManager> store{new AccountsManager};
-  store->_watch = std::move(watch);
+  store->_tracker = std::move(tracker);
   if (accounts != nullptr) store->_loadAccounts(*accounts);
   store->_setOriginalAccountDictionaries();
   return store;
@@ -136,7 +138,7 @@ void AccountsManager::_loadAccounts(const Array& accounts) {
     if (account == nullptr) {
       _ASLogSystem().log("-[AccountsManager _initWithAccountsInfo:]", "ERROR: Failed to create a BasicAccount from %@",
                          properties);
-      if (_watch) _watch->leftOut(properties);
+      if (_tracker) _tracker->leftOut(properties);
       continue;
     }
     isFixed |= _offerLoaded(account, properties);
@@ -150,9 +152,9 @@ bool AccountsManager::_offerLoaded(const Account& account, const PropertyValue& 
     const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
     if (answer != FixAnswer::drop) registerAccount(account);
     isFixed |= answer != FixAnswer::nothingToDo;
-    if (!_watch) continue;
-    answer == FixAnswer::drop ? _watch->givenUp(element, ASRuntimeFixMailAccount::ruleForDropping())
-                              : _watch->loaded(element, *account);
+    if (!_tracker) continue;
+    answer == FixAnswer::drop ? _tracker->givenUp(element, ASRuntimeFixMailAccount::kFaultOfDropped)
+                              : _tracker->loaded(element, *account);
   }
   return isFixed;
 }
@@ -180,7 +182,7 @@ void AccountsManager::_setOriginalAccountDictionaries() {
 }
 
 void AccountsManager::_tellChanges() const {
-  if (_watch) _watch->look(_orderedTopLevelAccounts);
+  if (_tracker) _tracker->look(_orderedTopLevelAccounts);
 }
 
 void AccountsManager::saveAllAccounts() {
@@ -203,10 +205,10 @@ void AccountsManager::saveAllAccounts() {
 Status AccountsManager::_writeFile() const {
   _tellChanges();
   Array records = _mergedRecords();
-  if (_watch) _watch->written(_orderedTopLevelAccounts, records);
+  if (_tracker) _tracker->written(_orderedTopLevelAccounts, records);
   const Dictionary root{{kPlistAccountsKey, std::move(records)}, {kPlistVersionKey, currentVersion()}};
   Status status = replaceSettingsFile(serialized(root));
-  if (_watch) _watch->savedAll(count(), currentVersion(), fullPathToAccountSettingsPlist(), status);
+  if (_tracker) _tracker->savedAll(count(), currentVersion(), fullPathToAccountSettingsPlist(), status);
   return status;
 }
 
@@ -218,7 +220,7 @@ bool AccountsManager::_fixAccountsForSaving() {
       // A dropped account is no longer found, but keeps its place in the order and so in the file.
       if (answer == FixAnswer::drop) {
         forgetIdentifierOfAccount(*account);
-        if (_watch) _watch->unrepaired(*account, ASRuntimeFixMailAccount::ruleForDropping());
+        if (_tracker) _tracker->unrepaired(*account, ASRuntimeFixMailAccount::kFaultOfDropped);
       }
       isFixed |= answer != FixAnswer::nothingToDo;
     }

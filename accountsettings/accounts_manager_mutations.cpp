@@ -4,9 +4,9 @@
 
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/assertion_failure.h"
+#include "accountsettings/change_tracker.h"
 #include "accountsettings/dataclass_lists.h"
 #include "accountsettings/log_handle.h"
-#include "accountsettings/store_watch.h"
 
 namespace accountsettings {
 namespace {
@@ -69,7 +69,7 @@ void AccountsManager::updateAccount(const Account& account) {
 void AccountsManager::deleteAccount(const Account& account) {
   _ASLogSystem().log("-[AccountsManager deleteAccount:]", "Deleting account: %@", account->properties());
   forgetIdentifierOfAccount(*account);
-  if (_watch) _watch->willGo(*account, "it was deleted");
+  if (_tracker) _tracker->willGo(*account, records::LossCode::deleted);
   const std::optional<Text> identifier = account->identifier();
   const auto last = std::ranges::find_if(_orderedTopLevelAccounts.rbegin(), _orderedTopLevelAccounts.rend(),
                                          [&](const Account& present) { return hasIdentifier(*present, identifier); });
@@ -94,7 +94,7 @@ void AccountsManager::replaceAccount_withAccount(const Account& oldAccount, cons
                   "The account with identifier %@ is not in the store", {oldAccount->identifier()});
   }
   forgetIdentifierOfAccount(*oldAccount);
-  if (_watch) _watch->willGo(*oldAccount, "another account was put in its place");
+  if (_tracker) _tracker->willGo(*oldAccount, records::LossCode::replaced);
   // Listed, counted and saved, but found by its identifier only in a store that is loaded afresh.
   *position = newAccount;
   _loadChildrenFromAccount(*position);
@@ -127,7 +127,7 @@ void AccountsManager::replaceInPlace(const Types& types, Replacement& replacemen
       enter(replacement.byID, identifier, present);
     } else {
       if (identifier) _removeChildrenForAccountWithIdentifier(*identifier);
-      if (_watch) _watch->willGo(*present, "the accounts of its type were replaced, and it is none of the new ones");
+      if (_tracker) _tracker->willGo(*present, records::LossCode::replacedWithType);
       present = nullptr;
     }
   }

@@ -5,6 +5,7 @@
 #include <unordered_set>
 
 #include "accountsettings/runtime_fixer.h"
+#include "records/loss.h"
 
 namespace accountsettings {
 
@@ -13,10 +14,8 @@ namespace accountsettings {
 // during a save have been saved, tells the mail application that its accounts changed.
 class ACCOUNT_EXPORT ASRuntimeFixMailAccount final : public RuntimeFixer {
  public:
-  // By which rule it answers `drop`, for people.
-  [[nodiscard]] static constexpr std::string_view ruleForDropping() {
-    return "the mail application does not know its class, and its AccountPath names none";
-  }
+  // What is wrong with an account for which it answers `drop`.
+  static constexpr records::LossCode kFaultOfDropped = records::LossCode::droppedUnknownClass;
 
   static std::shared_ptr<ASRuntimeFixMailAccount> init();
   ~ASRuntimeFixMailAccount() override;

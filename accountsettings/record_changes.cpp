@@ -10,9 +10,10 @@
 namespace accountsettings {
 namespace {
 
-using records::RecordChange;
-using records::RecordName;
-using records::RunFact;
+using records::Change;
+using records::Fact;
+using records::LossCode;
+using records::Name;
 
 std::string textUnder(const Dictionary& properties, std::string_view key) {
   const Text* const text = properties.text(key);
@@ -38,17 +39,17 @@ bool isTellingText(const PropertyValue& value) {
 }
 
 // The key that went and whose text now stands under the changed one; taken out of those that went.
-std::string takeOldKey(const PropertyValue& value, std::vector<RecordChange>& gone) {
+std::string takeOldKey(const PropertyValue& value, std::vector<Change>& gone) {
   if (!isTellingText(value)) return {};
-  const auto found = std::ranges::find_if(gone, [&value](const RecordChange& each) { return each.from == value; });
+  const auto found = std::ranges::find_if(gone, [&value](const Change& each) { return each.from == value; });
   if (found == gone.end()) return {};
   std::string key = std::move(found->key);
   gone.erase(found);
   return key;
 }
 
-std::vector<RecordChange> goneKeys(const Dictionary& before, const Dictionary& after) {
-  std::vector<RecordChange> gone;
+std::vector<Change> goneKeys(const Dictionary& before, const Dictionary& after) {
+  std::vector<Change> gone;
   for (const auto& [key, value] : before) {
     if (!after.contains(key) && isToldByKey(key, before, after)) gone.push_back({key.string(), {}, value, {}});
   }
@@ -85,7 +86,7 @@ Entries entriesOf(const StoreState& state) {
   return entries;
 }
 
-RecordName nameIn(const Entries& entries, std::size_t place) {
+Name nameIn(const Entries& entries, std::size_t place) {
   const Entry& entry = entries[place];
   const std::string parent =
       entry.parent == kNone ? std::string{} : textUnder(*entries[entry.parent].properties, kAccountIdentifier);
@@ -183,28 +184,33 @@ class Comparison {
       former == kNone ? tellNew(place) : tellKept(former, place);
     }
     for (std::size_t place = 0; place < _before.size(); ++place) {
-      if (_matching.wentAway(place)) tell(RunFact::Kind::dropped, nameIn(_before, place), _before[place]);
+      if (_matching.wentAway(place)) tellGone(place);
     }
     return std::move(_differences);
   }
 
  private:
-  Difference& tell(RunFact::Kind kind, RecordName subject, const Entry& entry) {
-    return _differences.emplace_back(
-        Difference{.fact = {.kind = kind, .subject = std::move(subject)}, .account = entry.account});
+  Difference& tell(Fact fact, const Entry& entry) {
+    return _differences.emplace_back(Difference{.fact = std::move(fact), .account = entry.account});
   }
   void tellNew(std::size_t place) {
     const Entry& entry = _after[place];
     const bool isSecond = entry.account != nullptr && !_known.insert(entry.account).second;
-    tell(isSecond ? RunFact::Kind::repeated : RunFact::Kind::added, nameIn(_after, place), entry);
+    Name name = nameIn(_after, place);
+    isSecond ? tell(records::Repeated{std::move(name)}, entry) : tell(records::Added{std::move(name)}, entry);
+  }
+  void tellGone(std::size_t place) {
+    const bool isChild = _before[place].account == nullptr;
+    tell(records::Lost{.code = isChild ? LossCode::removedFromParent : LossCode::removed,
+                       .account = nameIn(_before, place)},
+         _before[place]);
   }
   void tellKept(std::size_t former, std::size_t place) {
     if (isMoved(former, place)) tellMoved(place);
     auto changes = changesOf(*_before[former].properties, *_after[place].properties);
     const bool isReplacement = _after[place].account != nullptr && _after[place].account != _before[former].account;
     if (changes.empty() && !isReplacement) return;
-    Difference& told = tell(RunFact::Kind::changed, nameIn(_after, place), _after[place]);
-    told.fact.changes = std::move(changes);
+    Difference& told = tell(records::Changed{nameIn(_after, place), std::move(changes)}, _after[place]);
     told.isReplacement = isReplacement;
   }
   [[nodiscard]] bool isMoved(std::size_t former, std::size_t place) const {
@@ -214,8 +220,9 @@ class Comparison {
     return _matching.formerOf(after) != before;
   }
   void tellMoved(std::size_t place) {
-    Difference& told = tell(RunFact::Kind::moved, nameIn(_after, place), _after[place]);
-    if (_after[place].parent != kNone) told.fact.others.push_back(nameIn(_after, _after[place].parent));
+    const std::size_t parent = _after[place].parent;
+    const auto into = parent == kNone ? std::nullopt : std::optional{nameIn(_after, parent)};
+    tell(records::Moved{nameIn(_after, place), into}, _after[place]);
   }
 
   Entries _before;
@@ -231,17 +238,17 @@ bool isUnchanged(const RecordState& before, const RecordState& after) {
 
 }  // namespace
 
-RecordName nameOf(const Dictionary& properties, std::string_view parent) {
+Name nameOf(const Dictionary& properties, std::string_view parent) {
   std::string name = textUnder(properties, kAccountDisplayName);
   if (name.empty()) name = textUnder(properties, kAccountUsername);
   return {textUnder(properties, kAccountType), std::move(name), textUnder(properties, kAccountIdentifier),
           std::string{parent}};
 }
 
-std::vector<RecordChange> changesOf(const Dictionary& before, const Dictionary& after) {
+std::vector<Change> changesOf(const Dictionary& before, const Dictionary& after) {
   if (before.isIdenticalTo(after)) return {};
-  std::vector<RecordChange> changes;
-  std::vector<RecordChange> gone = goneKeys(before, after);
+  std::vector<Change> changes;
+  std::vector<Change> gone = goneKeys(before, after);
   for (const auto& [key, value] : after) {
     const PropertyValue* const former = before.find(key);
     if ((former != nullptr && *former == value) || !isToldByKey(key, before, after)) continue;

@@ -112,7 +112,7 @@ void checkTrace(const std::string& first, const std::string& second, bool flag) 
     trace->log("s", second, [&] { return first; });
     trace->preferencesChanged(first, second);
     trace->cloudTabs(flag);
-    trace->result(second, flag);
+    trace->result(second, flag, {});
     require(trace->complete(), "an incomplete trace");
   }
   const auto lines = linesOf(path);

@@ -1,11 +1,6 @@
 #include "host/explanation.h"
 
-#include <set>
-
 namespace host {
-
-using records::RunFact;
-
 namespace {
 
 constexpr std::string_view kOutside = "end of the run";  // where nothing but the last word is left
@@ -22,10 +17,11 @@ void Explanation::ended() {
   _isNewStage = true;
 }
 
-void Explanation::add(const RunFact& fact) {
-  if (_isNewStage)
-    _stages.push_back(
-        {std::string{stage()}, _open.empty() ? std::string{} : _open.back().words, std::string{outerStage()}, {}});
+void Explanation::add(const records::Fact& fact) {
+  if (_isNewStage) {
+    const std::string words = _open.empty() ? std::string{} : _open.back().words;
+    _stages.push_back({std::string{stage()}, words, std::string{outerStage()}, {}});
+  }
   _isNewStage = false;
   _stages.back().facts.push_back(fact);
 }
@@ -34,40 +30,6 @@ std::string_view Explanation::stage() const { return _open.empty() ? kOutside : 
 
 std::string_view Explanation::outerStage() const {
   return _open.size() < 2 ? std::string_view{} : _open[_open.size() - 2].name;
-}
-
-template <typename Action>
-void Explanation::forEachFact(const Action& action) const {
-  for (const Stage& stage : _stages) {
-    for (const RunFact& fact : stage.facts) action(fact);
-  }
-}
-
-const RunFact* Explanation::lastSave() const {
-  const RunFact* last = nullptr;
-  forEachFact([&last](const RunFact& fact) {
-    if (fact.kind == RunFact::Kind::saved || fact.kind == RunFact::Kind::saveFailed) last = &fact;
-  });
-  return last;
-}
-
-std::vector<std::string> Explanation::lostFiles() const {
-  // One save that went through, and what was converted before it is in the settings file.
-  const bool isUnsaved = count(RunFact::Kind::saved) == 0 && count(RunFact::Kind::saveFailed) > 0;
-  std::set<std::string> unconverted;
-  std::vector<std::string> lost;
-  forEachFact([&](const RunFact& fact) {
-    if (fact.kind == RunFact::Kind::failed) unconverted.insert(fact.path);
-    if (fact.kind != RunFact::Kind::sourceRemoved) return;
-    if (isUnsaved || unconverted.contains(fact.path)) lost.push_back(fact.path);
-  });
-  return lost;
-}
-
-std::size_t Explanation::count(RunFact::Kind kind) const {
-  std::size_t count = 0;
-  forEachFact([&](const RunFact& fact) { count += fact.kind == kind ? 1U : 0U; });
-  return count;
 }
 
 }  // namespace host

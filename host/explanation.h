@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <string>
 #include <string_view>
+#include <variant>
 #include <vector>
 
 #include "records/fact.h"
@@ -14,14 +15,14 @@ class Explanation {
  public:
   struct Stage {
     std::string name;
-    std::string words;   // what it does, for people; may be empty
+    std::string words;   // what it does, where the name says too little for people; may be empty
     std::string within;  // the stage that it is a part of; may be empty
-    std::vector<records::RunFact> facts;
+    std::vector<records::Fact> facts;
   };
 
   void began(std::string_view stage, std::string_view words = {});
   void ended();
-  void add(const records::RunFact& fact);
+  void add(const records::Fact& fact);
   // From here on something is missing.
   void loseTrack() { _isComplete = false; }
 
@@ -30,25 +31,55 @@ class Explanation {
   // The present stage ("end of the run" outside of any), and the one that it is a part of, which may be empty.
   [[nodiscard]] std::string_view stage() const;
   [[nodiscard]] std::string_view outerStage() const;
-  // How the last attempt to save ended; null where there was none.
-  [[nodiscard]] const records::RunFact* lastSave() const;
-  // The removed files whose accounts are on the device no longer, since they could not be converted or no save of them
-  // went through.
-  [[nodiscard]] std::vector<std::string> lostFiles() const;
-  [[nodiscard]] std::size_t count(records::RunFact::Kind kind) const;
+
+  // Calls `action` with every fact, in order.
+  template <typename Action>
+  void forEachFact(const Action& action) const {
+    for (const Stage& each : _stages) {
+      for (const records::Fact& fact : each.facts) action(fact);
+    }
+  }
+  template <typename Kind>
+  [[nodiscard]] std::size_t count() const {
+    std::size_t count = 0;
+    forEachFact([&count](const records::Fact& fact) { count += std::holds_alternative<Kind>(fact) ? 1U : 0U; });
+    return count;
+  }
 
  private:
-  template <typename Action>
-  void forEachFact(const Action& action) const;
-
-  std::vector<Stage> _stages;
   struct Open {
     std::string name;
     std::string words;
   };
+
+  std::vector<Stage> _stages;
   std::vector<Open> _open;  // the stages that began and did not end, the innermost last
   bool _isNewStage = true;
   bool _isComplete = true;
 };
+
+struct Verdict;
+
+// The run that is explained, as far as the host knows it.
+struct ExplainedRun {
+  std::string_view dataClass;
+  bool success = false;
+  bool isRehearsal = false;
+  std::string_view version{};  // of the host
+  std::string root{};
+  std::string time{};  // of its start, as in 2026-03-07T10:15:00Z
+};
+
+// For people: by stage and account, what changed in short, and nothing of what did not. Values are cut and long lists
+// of accounts that merely changed are counted; nothing that went is left out, neither an account nor a member of a
+// list. No character of it does anything to a terminal.
+[[nodiscard]] std::string textOf(const Explanation& explanation, const Verdict& verdict, const ExplainedRun& run);
+
+// Mail "June" (4F1C…): it has no type [dropped-no-type]
+[[nodiscard]] std::string textOf(const records::Lost& lost);
+
+// For machines: one JSON document, as docs/EXPLAIN.md describes it.
+[[nodiscard]] std::string jsonDocumentOf(const Explanation& explanation, const Verdict& verdict,
+                                         const ExplainedRun& run);
 
 }  // namespace host

@@ -1,34 +1,37 @@
 #include <algorithm>
 
-#include "host/explanation_output.h"
+#include "commandline/text.h"
+#include "host/explanation.h"
 #include "host/fact_json.h"
+#include "host/verdict.h"
 #include "records/description.h"
 
 namespace host {
 namespace {
 
+using namespace records;  // the facts
 using platform::Array;
-using platform::PropertyValue;
-using records::RecordChange;
-using records::RecordName;
-using records::RunFact;
-using Kind = RunFact::Kind;
 
-constexpr std::size_t kLongestValue = 80;
-constexpr std::size_t kMostChangedAccounts = 40;  // of one stage
+constexpr std::size_t kMaxValueLength = 80;
+constexpr std::size_t kMaxChangedAccounts = 40;  // of one stage
 
-std::string quoted(const std::string& text) { return records::description(PropertyValue{text}); }
+// Every line of the explanation is made here.
+std::string lineOf(std::size_t indentation, const std::string& text) {
+  return std::string(indentation, ' ') + commandline::printable(text) + "\n";
+}
+
+std::string quoted(const std::string& text) { return description(PropertyValue{text}); }
 
 // Cut between two characters.
 std::string shortened(std::string text) {
-  if (text.size() <= kLongestValue) return text;
-  std::size_t end = kLongestValue;
+  if (text.size() <= kMaxValueLength) return text;
+  std::size_t end = kMaxValueLength;
   while (end > 0 && (static_cast<unsigned char>(text[end]) & 0xC0U) == 0x80U) --end;
   return text.substr(0, end) + "…";
 }
 
 // Mail "June" (4F1C…), in 0B6C…
-std::string shown(const RecordName& name) {
+std::string shown(const Name& name) {
   std::string text = name.type.empty() ? "account" : name.type;
   if (!name.name.empty()) text += " " + shortened(quoted(name.name));
   if (!name.identifier.empty()) text += " (" + shortened(name.identifier) + ")";
@@ -36,14 +39,14 @@ std::string shown(const RecordName& name) {
   return text;
 }
 
-std::string shownWithoutParent(RecordName name) {
+std::string shownWithoutParent(Name name) {
   name.parent.clear();
   return shown(name);
 }
 
-std::string shownAll(const std::vector<RecordName>& names) {
+std::string shownAll(const std::vector<Name>& names) {
   std::string text;
-  for (const RecordName& name : names) text += (text.empty() ? "" : " and ") + shown(name);
+  for (const Name& name : names) text += (text.empty() ? "" : " and ") + shown(name);
   return text;
 }
 
@@ -54,25 +57,34 @@ bool contains(const Array& array, const PropertyValue& value) { return std::rang
 std::string membership(const Array& of, const Array& notOf, std::string_view mark) {
   std::string text;
   for (const PropertyValue& element : of) {
-    if (!contains(notOf, element)) text += " " + std::string{mark} + records::description(element);
+    if (!contains(notOf, element)) text += " " + std::string{mark} + description(element);
   }
   return text;
 }
 
 // What a list gained and lost; empty where that does not tell the change.
-std::string listChange(const RecordChange& change) {
+std::string listChange(const Change& change) {
   const Array* const before = change.from ? change.from->asArray() : nullptr;
   const Array* const after = change.to ? change.to->asArray() : nullptr;
-  if (before == nullptr || after == nullptr || records::namesCredential(change.key)) return {};
+  if (before == nullptr || after == nullptr || namesCredential(change.key)) return {};
   const std::string members = membership(*after, *before, "+") + membership(*before, *after, "-");
   return members.empty() && before->size() == after->size() ? " in another order" : members;
 }
 
-std::string shownValue(const RecordChange& change, const std::optional<PropertyValue>& value) {
-  return value ? shortened(records::descriptionUnder(keyForShowing(change), *value)) : "nothing";
+// A list of names, such as data classes, is never cut: what is left out of it is what people look for.
+bool isListOfTexts(const PropertyValue& value) {
+  const Array* const array = value.asArray();
+  return array != nullptr &&
+         std::ranges::all_of(*array, [](const PropertyValue& each) { return each.asText() != nullptr; });
 }
 
-std::string shown(const RecordChange& change) {
+std::string shownValue(const Change& change, const std::optional<PropertyValue>& value) {
+  if (!value) return "nothing";
+  std::string text = descriptionUnder(keyForShowing(change), *value);
+  return isListOfTexts(*value) ? text : shortened(std::move(text));
+}
+
+std::string shown(const Change& change) {
   if (!change.oldKey.empty()) {
     const std::string former = change.from ? ", in place of " + shownValue(change, change.from) : "";
     return "~ " + change.oldKey + " is now " + change.key + ": " + shownValue(change, change.to) + former;
@@ -83,130 +95,176 @@ std::string shown(const RecordChange& change) {
   return "~ " + change.key + ": " + shownValue(change, change.from) + " -> " + shownValue(change, change.to);
 }
 
-bool isRenamed(const RecordChange& change) { return !change.oldKey.empty(); }
-bool isAdded(const RecordChange& change) { return change.oldKey.empty() && !change.from; }
-bool isRemoved(const RecordChange& change) { return change.oldKey.empty() && !change.to; }
+bool isRenamed(const Change& change) { return !change.oldKey.empty(); }
+bool isAdded(const Change& change) { return change.oldKey.empty() && !change.from; }
+bool isRemoved(const Change& change) { return change.oldKey.empty() && !change.to; }
 
 // One line of those changes that are alike, by their keys alone.
-std::string keysOf(const RunFact& fact, std::string_view title, bool (*isMeant)(const RecordChange&)) {
+std::string keysOf(const std::vector<Change>& changes, std::string_view title, bool (*isMeant)(const Change&)) {
   std::string text;
-  for (const RecordChange& change : fact.changes) {
+  for (const Change& change : changes) {
     if (!isMeant(change)) continue;
-    text += (text.empty() ? "    " + std::string{title} + ": " : ", ") +
+    text += (text.empty() ? std::string{title} + ": " : ", ") +
             (change.oldKey.empty() ? change.key : change.oldKey + " to " + change.key);
   }
-  return text.empty() ? text : text + "\n";
+  return text.empty() ? text : lineOf(4, text);
 }
 
 // How a description became a record: the values are mostly the same, so the keys tell it.
-std::string conversionOf(const RunFact& fact) {
-  std::string text = keysOf(fact, "renamed", &isRenamed);
-  for (const RecordChange& change : fact.changes) {
-    if (!isRenamed(change) && !isAdded(change) && !isRemoved(change)) text += "    " + shown(change) + "\n";
+std::string conversionOf(const std::vector<Change>& changes) {
+  std::string text = keysOf(changes, "renamed", &isRenamed);
+  for (const Change& change : changes) {
+    if (!isRenamed(change) && !isAdded(change) && !isRemoved(change)) text += lineOf(4, shown(change));
   }
-  return text + keysOf(fact, "added", &isAdded) + keysOf(fact, "removed", &isRemoved);
+  return text + keysOf(changes, "added", &isAdded) + keysOf(changes, "removed", &isRemoved);
 }
 
-std::string changesOf(const RunFact& fact) {
+std::string changesOf(const std::vector<Change>& changes) {
   std::string text;
-  for (const RecordChange& change : fact.changes) text += "    " + shown(change) + "\n";
+  for (const Change& change : changes) text += lineOf(4, shown(change));
   return text;
 }
 
 // --- Facts ---
 
-std::string because(const RunFact& fact) { return fact.reason.empty() ? "\n" : ": " + fact.reason + "\n"; }
+std::string line(std::string_view kind, const std::string& rest) { return lineOf(2, std::string{kind} + ": " + rest); }
 
-std::string destinationOf(const RunFact& fact) {
-  return fact.others.empty() ? " out of its parent" : " into " + shownAll(fact.others);
+std::string fromOf(const Converted& converted) {
+  return " from " + converted.from + (converted.isReplacement ? ", in place of the account with this identifier" : "");
 }
 
-std::string shown(const RunFact& fact) {
-  const std::string subject = shown(fact.subject);
-  switch (fact.kind) {
-    case Kind::loaded: return "";
-    case Kind::added: return "  added: " + subject + "\n";
-    case Kind::converted: return "  converted: " + subject + " from " + fact.reason + "\n" + conversionOf(fact);
-    case Kind::changed: return "  " + subject + "\n" + changesOf(fact);
-    case Kind::moved: return "  moved: " + shownWithoutParent(fact.subject) + destinationOf(fact) + "\n";
-    case Kind::folded: return "  folded: " + subject + destinationOf(fact) + because(fact);
-    case Kind::dropped: return "  dropped: " + subject + because(fact);
-    case Kind::repeated: return "  repeated: " + subject + " stands there once more\n";
-    case Kind::unrepaired: return "  kept as it is: " + subject + because(fact);
-    case Kind::failed: return "  not converted: " + fact.reason + "\n";
-    case Kind::saved: return "";
-    case Kind::saveFailed: return "  NOT SAVED: " + fact.reason + "\n";
-    case Kind::fileRemoved:
-    case Kind::sourceRemoved: return "  removed: " + fact.path + "\n";
-    case Kind::fileUnremoved: return "  not removed: " + fact.path + because(fact);
-  }
-  return "";
+// What is told of by the result or by another fact has no line of its own.
+std::string shown(const Fact& fact) {
+  return std::visit(
+      Visitor{[](const Loaded&) { return std::string{}; }, [](const CopiedAside&) { return std::string{}; },
+              [](const Added& it) { return line("added", shown(it.account)); },
+              [](const Converted& it) {
+                return line("converted", shown(it.account) + fromOf(it)) + conversionOf(it.changes);
+              },
+              [](const Changed& it) { return lineOf(2, shown(it.account)) + changesOf(it.changes); },
+              [](const Moved& it) {
+                return line("moved", shownWithoutParent(it.account) +
+                                         (it.into ? " into " + shown(*it.into) : " out of its parent"));
+              },
+              [](const Folded& it) {
+                return line("folded", shown(it.account) + " into " + shownAll(it.into) + ": " + it.reason);
+              },
+              [](const Lost& it) { return line("lost", textOf(it)); },
+              [](const Repeated& it) { return line("repeated", shown(it.account) + " stands there once more"); },
+              [](const Unrepaired& it) { return line("kept as it is", shown(it.account) + ": " + it.reason); },
+              [](const Saved&) { return std::string{}; },
+              [](const SaveFailed& it) { return line("NOT SAVED", it.cause); },
+              [](const FileRemoved& it) { return line("removed", it.file); },
+              [](const FileNotRemoved& it) { return line("not removed", it.file + ": " + it.cause); }},
+      fact);
 }
 
+// version 4 to 5: Gmail and Yahoo accounts get their own type (_migrateAccountsFrom7A242:)
 std::string titleOf(const Explanation::Stage& stage) {
   const bool isPartOfStep = stage.name == "save" && !stage.within.empty();
-  const std::string words = stage.words.empty() ? "" : " " + stage.words;
-  return "\n" + stage.name + words + (isPartOfStep ? ", within " + stage.within : "") + "\n";
+  const std::string title = stage.words.empty() ? stage.name : stage.words + " (" + stage.name + ")";
+  return "\n" + lineOf(0, title + (isPartOfStep ? ", within " + stage.within : ""));
 }
 
 // The stage's facts under its name; empty where none of them is worth a line.
 std::string shown(const Explanation::Stage& stage) {
   std::string text;
   std::size_t changed = 0;
-  for (const RunFact& fact : stage.facts) {
-    if (fact.kind == Kind::changed && ++changed > kMostChangedAccounts) continue;
+  for (const Fact& fact : stage.facts) {
+    if (std::holds_alternative<Changed>(fact) && ++changed > kMaxChangedAccounts) continue;
     text += shown(fact);
   }
-  if (changed > kMostChangedAccounts) {
-    text += "  and " + std::to_string(changed - kMostChangedAccounts) + " more accounts with other values\n";
+  if (changed > kMaxChangedAccounts) {
+    text += lineOf(2, "and " + std::to_string(changed - kMaxChangedAccounts) + " more accounts with other values");
   }
   return text.empty() ? text : titleOf(stage) + text;
 }
 
 // --- The whole ---
 
-std::string heading(const Outcome& outcome) {
-  return outcome.isRehearsal ? "What a run would do (this was a rehearsal: nothing on the device was changed)\n"
-                             : "What the run did\n";
+std::string heading(const ExplainedRun& run) {
+  return run.isRehearsal ? "What a run would do (this was a rehearsal: nothing on the device was changed)\n"
+                         : "What the run did\n";
 }
 
-std::string tally(const Explanation& explanation) {
+std::string tally(const Counts& counts) {
   std::string text;
-  for (const Kind kind : {Kind::added, Kind::converted, Kind::moved, Kind::folded, Kind::dropped}) {
-    const std::size_t count = explanation.count(kind);
-    if (count > 0) text += ", " + std::to_string(count) + " " + std::string{actionOf(kind)};
+  const auto put = [&text](std::size_t count, std::string_view what) {
+    if (count > 0) text += (text.empty() ? "" : ", ") + std::to_string(count) + " " + std::string{what};
+  };
+  put(counts.kept, "kept");
+  put(counts.changed, "changed");
+  put(counts.added, "added");
+  put(counts.converted, "converted");
+  put(counts.moved, "moved");
+  put(counts.folded, "folded");
+  put(counts.dropped, "dropped");
+  put(counts.lost, "lost");
+  return text.empty() ? "none" : text;
+}
+
+// How the settings file was and is.
+std::string stateOf(const Explanation& explanation) {
+  std::string was;
+  std::string is;
+  explanation.forEachFact([&](const Fact& fact) {
+    if (const auto* const loaded = std::get_if<Loaded>(&fact); loaded != nullptr && loaded->accounts > 0) {
+      was = std::to_string(loaded->version);
+    }
+    if (const auto* const saved = std::get_if<Saved>(&fact)) {
+      is = std::to_string(saved->accounts) + " accounts of data version " + std::to_string(saved->version);
+    }
+  });
+  if (is.empty()) return is;
+  return "; " + is + (was.empty() ? "" : ", stored before as version " + was);
+}
+
+std::string ending(const Verdict& verdict) {
+  switch (verdict.kind) {
+    case Verdict::Kind::kept: return "; everything was kept";
+    case Verdict::Kind::lost: return "; ACCOUNTS WERE LOST";
+    case Verdict::Kind::notSaved: return "; THE ACCOUNTS WERE NOT SAVED";
   }
-  return text;
+  return {};
 }
 
-std::string savedAs(const RunFact& save) {
-  if (save.kind == Kind::saveFailed) return "; THE ACCOUNTS WERE NOT SAVED";
-  return "; " + std::to_string(save.count) + " accounts of data version " + std::to_string(save.version);
+std::string whereOf(const Lost& lost) {
+  return lost.where.empty() ? "its data is nowhere else on the device" : "its data is still in " + lost.where;
 }
 
-std::string result(const Explanation& explanation, const Outcome& outcome) {
-  const RunFact* const save = explanation.lastSave();
-  return "\nresult: " + std::string{outcome.success ? "success" : "failure"} + (save == nullptr ? "" : savedAs(*save)) +
-         tally(explanation) + "\n";
-}
-
-std::string warnings(const Explanation& explanation) {
+std::string warnings(const Explanation& explanation, const Verdict& verdict) {
   std::string text;
-  for (const std::string& file : explanation.lostFiles()) {
-    text += "\nWARNING: the accounts of " + file + " are lost: the file was removed although they were not saved.\n";
+  if (verdict.kind == Verdict::Kind::notSaved)
+    text += lineOf(0, "WARNING: the accounts were not saved: " + verdict.cause);
+  for (const Lost& lost : verdict.lost) text += lineOf(0, "WARNING: lost: " + textOf(lost) + "; " + whereOf(lost));
+  if (!explanation.isComplete()) {
+    text += lineOf(0, "WARNING: memory ran out while the run was watched; something is missing here.");
   }
-  if (!explanation.isComplete())
-    text += "\nWARNING: memory ran out while the run was watched; something is missing here.\n";
-  return text;
+  return text.empty() ? text : "\n" + text;
+}
+
+std::string aboutRun(const ExplainedRun& run) {
+  return lineOf(0, "run: migration-host " + std::string{run.version} + " on " + run.root + " at " + run.time);
 }
 
 }  // namespace
 
-std::string textOf(const Explanation& explanation, const Outcome& outcome) {
+std::string textOf(const Lost& lost) {
+  const LossMeaning& meaning = meaningOf(lost.code);
+  const std::string subject = lost.account == Name{} && !lost.file.empty() ? lost.file : shown(lost.account);
+  return subject + ": " + std::string{meaning.text} + (lost.detail.empty() ? "" : ": " + lost.detail) + " [" +
+         std::string{meaning.name} + "]";
+}
+
+std::string textOf(const Explanation& explanation, const Verdict& verdict, const ExplainedRun& run) {
   std::string stages;
   for (const Explanation::Stage& stage : explanation.stages()) stages += shown(stage);
   if (stages.empty()) stages = "\nNo account was changed.\n";
-  return heading(outcome) + stages + result(explanation, outcome) + warnings(explanation);
+  return heading(run) + stages + "\n" +
+         lineOf(0, "result: " + std::string{run.success ? "success" : "failure"} + ending(verdict) +
+                       stateOf(explanation)) +
+         lineOf(0, "accounts: " + tally(countsOf(explanation, verdict))) + aboutRun(run) +
+         warnings(explanation, verdict);
 }
 
 }  // namespace host

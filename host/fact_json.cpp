@@ -1,6 +1,5 @@
 #include "host/fact_json.h"
 
-#include <array>
 #include <cmath>
 #include <nlohmann/json.hpp>
 
@@ -10,15 +9,7 @@ namespace host {
 namespace {
 
 using Json = nlohmann::ordered_json;
-using platform::PropertyValue;
-using records::RecordChange;
-using records::RecordName;
-using records::RunFact;
-
-// In the order of the kinds.
-constexpr std::array<std::string_view, 15> kActions{
-    "loaded", "added",  "converted", "changed",     "moved",        "folded",         "dropped",         "repeated",
-    "kept",   "failed", "saved",     "save-failed", "file-removed", "source-removed", "file-not-removed"};
+using namespace records;  // the facts
 
 Json jsonOfInteger(PropertyValue::Integer integer) {
   return integer.isAboveInt64 ? Json(integer.bits) : Json(static_cast<std::int64_t>(integer.bits));
@@ -43,52 +34,125 @@ Json jsonOfShown(const PropertyValue& value) {
   return members;
 }
 
-Json jsonOfName(const RecordName& name) {
+Json jsonOfName(const Name& name) {
   Json json{{"type", name.type}, {"name", name.name}, {"identifier", name.identifier}};
   if (!name.parent.empty()) json["parent"] = name.parent;
   return json;
 }
 
-Json jsonOfChange(const RecordChange& change) {
-  Json json{{"key", change.key}};
-  if (!change.oldKey.empty()) json["renamedFrom"] = change.oldKey;
-  const std::string_view key = keyForShowing(change);
-  if (change.from) json["from"] = jsonOfShown(records::presentable(key, *change.from));
-  if (change.to) json["to"] = jsonOfShown(records::presentable(key, *change.to));
-  return json;
-}
-
-template <typename Element>
-Json jsonOfEach(const std::vector<Element>& elements, Json (*jsonOfOne)(const Element&)) {
+Json jsonOfNames(const std::vector<Name>& names) {
   Json json = Json::array();
-  for (const Element& element : elements) json.push_back(jsonOfOne(element));
+  for (const Name& name : names) json.push_back(jsonOfName(name));
   return json;
 }
 
-bool countsRecords(RunFact::Kind kind) {
-  return kind == RunFact::Kind::loaded || kind == RunFact::Kind::saved || kind == RunFact::Kind::saveFailed;
+Json jsonOfChanges(const std::vector<Change>& changes) {
+  Json all = Json::array();
+  for (const Change& change : changes) {
+    Json json{{"key", change.key}};
+    if (!change.oldKey.empty()) json["renamedFrom"] = change.oldKey;
+    const std::string_view key = keyForShowing(change);
+    if (change.from) json["from"] = jsonOfShown(presentable(key, *change.from));
+    if (change.to) json["to"] = jsonOfShown(presentable(key, *change.to));
+    all.push_back(std::move(json));
+  }
+  return all;
+}
+
+void addUnlessEmpty(const char* member, const std::string& text, Json& json) {
+  if (!text.empty()) json[member] = text;
+}
+
+Json membersOf(const Lost& lost) {
+  const LossMeaning& meaning = meaningOf(lost.code);
+  Json json{{"code", meaning.name}, {"reason", meaning.text}};
+  addUnlessEmpty("detail", lost.detail, json);
+  if (lost.account != Name{}) json["account"] = jsonOfName(lost.account);
+  addUnlessEmpty("file", lost.file, json);
+  addUnlessEmpty("where", lost.where, json);
+  return json;
+}
+
+Json ofAccount(const Name& account, Json members = Json::object()) {
+  Json json{{"account", jsonOfName(account)}};
+  json.update(members);
+  return json;
+}
+
+Json ofConversion(const Converted& converted) {
+  return ofAccount(converted.account, {{"from", converted.from},
+                                       {"file", converted.file},
+                                       {"replaces", converted.isReplacement},
+                                       {"changes", jsonOfChanges(converted.changes)}});
+}
+
+Json ofMove(const Moved& moved) {
+  return ofAccount(moved.account, moved.into ? Json{{"into", jsonOfNames({*moved.into})}} : Json::object());
+}
+
+Json membersOf(const Fact& fact) {
+  return std::visit(
+      Visitor{[](const Loaded& it) {
+                return Json{{"accounts", it.accounts}, {"version", it.version}};
+              },
+              [](const CopiedAside& it) {
+                return Json{{"file", it.file}};
+              },
+              [](const Added& it) { return ofAccount(it.account); },
+              [](const Converted& it) { return ofConversion(it); },
+              [](const Changed& it) {
+                return ofAccount(it.account, {{"changes", jsonOfChanges(it.changes)}});
+              },
+              [](const Moved& it) { return ofMove(it); },
+              [](const Folded& it) {
+                return ofAccount(it.account, {{"into", jsonOfNames(it.into)}, {"reason", it.reason}});
+              },
+              [](const Lost& it) { return membersOf(it); }, [](const Repeated& it) { return ofAccount(it.account); },
+              [](const Unrepaired& it) {
+                return ofAccount(it.account, {{"reason", it.reason}});
+              },
+              [](const Saved& it) {
+                return Json{{"file", it.file}, {"accounts", it.accounts}, {"version", it.version}};
+              },
+              [](const SaveFailed& it) {
+                return Json{{"file", it.file}, {"cause", it.cause}, {"accounts", it.accounts}, {"version", it.version}};
+              },
+              [](const FileRemoved& it) {
+                return Json{{"file", it.file}};
+              },
+              [](const FileNotRemoved& it) {
+                return Json{{"file", it.file}, {"cause", it.cause}};
+              }},
+      fact);
+}
+
+// An account that is lost, with its own members beside the code.
+Json jsonOfLoss(const Lost& lost) {
+  Json json = membersOf(lost);
+  json.erase("account");
+  if (lost.account == Name{}) return json;
+  json.update(jsonOfName(lost.account));
+  return json;
 }
 
 }  // namespace
 
-std::string_view actionOf(RunFact::Kind kind) { return kActions.at(static_cast<std::size_t>(kind)); }
-
-std::string_view keyForShowing(const RecordChange& change) {
-  return records::namesCredential(change.oldKey) ? change.oldKey : change.key;
+std::string_view keyForShowing(const Change& change) {
+  return namesCredential(change.oldKey) ? change.oldKey : change.key;
 }
 
-Json jsonOf(const RunFact& fact) {
-  Json json{{"action", actionOf(fact.kind)}};
-  if (fact.subject != RecordName{}) json["account"] = jsonOfName(fact.subject);
-  if (!fact.changes.empty()) json["changes"] = jsonOfEach(fact.changes, &jsonOfChange);
-  if (!fact.others.empty()) json["into"] = jsonOfEach(fact.others, &jsonOfName);
-  if (!fact.reason.empty()) json["reason"] = fact.reason;
-  if (!fact.path.empty()) json["file"] = fact.path;
-  if (countsRecords(fact.kind)) {
-    json["accounts"] = fact.count;
-    json["version"] = fact.version;
-  }
+nlohmann::ordered_json jsonOf(const Fact& fact) {
+  Json json{{"fact", nameOf(fact)}};
+  json.update(membersOf(fact));
   return json;
+}
+
+void addVerdict(const Verdict& verdict, nlohmann::ordered_json& result) {
+  result["verdict"] = nameOf(verdict.kind);
+  if (verdict.kind == Verdict::Kind::notSaved) result["cause"] = verdict.cause;
+  if (verdict.lost.empty()) return;
+  result["lost"] = Json::array();
+  for (const Lost& lost : verdict.lost) result["lost"].push_back(jsonOfLoss(lost));
 }
 
 }  // namespace host

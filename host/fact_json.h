@@ -3,18 +3,19 @@
 #include <nlohmann/json_fwd.hpp>
 #include <string_view>
 
+#include "host/verdict.h"
 #include "records/fact.h"
 
 namespace host {
 
-// The name of a kind of fact, as machines and people read it: "added", "save-failed".
-[[nodiscard]] std::string_view actionOf(records::RunFact::Kind kind);
-
 // One fact as a JSON object; its members are listed in docs/EXPLAIN.md. Credentials are hidden.
-[[nodiscard]] nlohmann::ordered_json jsonOf(const records::RunFact& fact);
+[[nodiscard]] nlohmann::ordered_json jsonOf(const records::Fact& fact);
 
-// The key and the value that decide whether a changed value may be shown: those of the key that it had before, where
-// that one names a credential.
-[[nodiscard]] std::string_view keyForShowing(const records::RecordChange& change);
+// Puts the verdict's members into the result that the explanation and the trace have in common.
+void addVerdict(const Verdict& verdict, nlohmann::ordered_json& result);
+
+// The key that decides whether a changed value may be shown: the one that it had before, where that one names a
+// credential.
+[[nodiscard]] std::string_view keyForShowing(const records::Change& change);
 
 }  // namespace host

@@ -25,7 +25,7 @@ constexpr std::string_view kStatuses =
     "\n"
     "Exit status: 0 the migration succeeded, 1 it did not, 2 wrong use,\n"
     "3 the plug-in could not be loaded, 5 a snapshot could not be taken or restored,\n"
-    "6 the accounts could not be saved.\n";
+    "6 the accounts were not saved, 7 with --strict: some accounts were lost.\n";
 
 constexpr std::size_t kUsualColumns = 80;
 
@@ -54,6 +54,7 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--explain", "", "print what the run did to which account; =json for machines",
        Form{&written.explain, {"text", "json"}}},
       {"--dry-run", "", "rehearse the run: the device stays as it is", Form{&written.dryRun, {}}},
+      {"--strict", "", "exit with 7 where accounts were lost", &options.isStrict},
       {"--snapshots", "DIR", "before the run, keep copies in DIR of the files that it may change",
        &options.snapshots.directory},
       {"--keep", "N", "keep the newest N snapshots (default: 5)", &written.keep},
@@ -80,6 +81,21 @@ std::string help(const std::vector<commandline::Option>& options) {
   auto page = commandline::pageOn(STDOUT_FILENO);
   page.columns = page.columns.value_or(kUsualColumns);
   return std::string{kUsage} + commandline::helpOf(options, page) + std::string{kStatuses};
+}
+
+// The options as they were given; those that the trace tells of otherwise are left out.
+std::vector<std::string> givenIn(std::span<const char* const> arguments) {
+  std::vector<std::string> given;
+  for (const std::string_view word : arguments) {
+    if (word.starts_with("--") || given.empty()) {
+      given.emplace_back(word);
+    } else {
+      given.back() += "=" + std::string{word};
+    }
+  }
+  std::erase_if(
+      given, [](const std::string& option) { return option.starts_with("--root=") || option.starts_with("--trace="); });
+  return given;
 }
 
 std::size_t countIn(const std::string& text) {
@@ -126,6 +142,7 @@ void settleRun(const Written& written, Options& options) {
   options.isRehearsal = written.dryRun.has_value();
   if (options.snapshots.explained && !written.explain) throw WrongUse{"--of needs --explain"};
   if (options.isRehearsal && !isRun) throw WrongUse{"--dry-run is for a run, and this is none"};
+  if (options.isStrict && !isRun) throw WrongUse{"--strict is for a run, and this is none"};
   if (!written.explain) return;
   if (!isRun && !options.snapshots.explained) throw WrongUse{"--explain is for a run, and this is none"};
   options.explain = *written.explain == "json" ? Explain::json : Explain::text;
@@ -141,6 +158,7 @@ std::variant<Options, Answer> parseArguments(std::span<const char* const> argume
   if (written.isHelpAsked) return Answer{help(declared)};
   if (written.isVersionAsked) return Answer{"migration-host " HOST_VERSION "\n"};
   if (!words.empty()) throw WrongUse{"unexpected argument: " + words.front()};
+  options.given = givenIn(arguments);
   settleSnapshots(written, options.snapshots);
   settleRun(written, options);
   std::error_code ignored;

@@ -7,6 +7,7 @@
 #include <span>
 #include <string>
 #include <variant>
+#include <vector>
 
 #include "platform/linux/linux_platform.h"
 
@@ -36,7 +37,9 @@ struct Options {
   std::optional<std::filesystem::path> trace;
   Explain explain = Explain::notAsked;
   bool isRehearsal = false;
+  bool isStrict = false;  // accounts that are lost have an exit status of their own
   SnapshotOptions snapshots;
+  std::vector<std::string> given{};  // the options as they were given, each as --name or --name=VALUE
 };
 
 // What is to be printed on standard output instead of a run.

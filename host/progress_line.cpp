@@ -2,6 +2,9 @@
 
 #include <unistd.h>
 
+#include <string>
+#include <utility>
+
 namespace host {
 namespace {
 
@@ -15,6 +18,20 @@ constexpr std::string_view kWipe = "\r\x1b[K";
 void put(int descriptor, std::string_view text) {
   if (::write(descriptor, text.data(), text.size()) < 0) return;
 }
+
+class WipingConsoleLog final : public platform::ConsoleLog {
+ public:
+  WipingConsoleLog(std::shared_ptr<platform::ConsoleLog> inner, std::shared_ptr<ProgressLine> progress)
+      : _inner{std::move(inner)}, _progress{std::move(progress)} {}
+  void write(std::string_view message) override {
+    _progress->clear();
+    _inner->write(message);
+  }
+
+ private:
+  std::shared_ptr<platform::ConsoleLog> _inner;
+  std::shared_ptr<ProgressLine> _progress;
+};
 
 }  // namespace
 
@@ -37,6 +54,11 @@ void ProgressLine::clear() noexcept {
   if (!_isShown) return;
   _isShown = false;
   put(_descriptor, kWipe);
+}
+
+void putConsoleInFrontOf(const std::shared_ptr<ProgressLine>& progress, platform::Platform& platform) {
+  if (!progress->isOnTerminal()) return;
+  platform.console = std::make_shared<WipingConsoleLog>(std::move(platform.console), progress);
 }
 
 }  // namespace host

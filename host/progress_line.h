@@ -1,8 +1,10 @@
 #pragma once
 
 #include <chrono>
-#include <string>
+#include <memory>
 #include <string_view>
+
+#include "platform/platform.h"
 
 namespace host {
 
@@ -26,5 +28,8 @@ class ProgressLine {
   bool _isShown = false;
   Time _next;  // when to show something again
 };
+
+// Keeps the progress line out of the way of the console's messages.
+void putConsoleInFrontOf(const std::shared_ptr<ProgressLine>& progress, platform::Platform& platform);
 
 }  // namespace host

@@ -2,19 +2,21 @@
 
 #include <unistd.h>
 
+#include <array>
+#include <ctime>
 #include <memory>
 #include <utility>
 
 #include "commandline/ending.h"
-#include "commandline/text.h"
-#include "host/explanation_output.h"
+#include "commandline/program.h"
+#include "host/explanation.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
-#include "host/run_watch.h"
+#include "host/run_recorder.h"
 #include "host/say.h"
 #include "host/snapshot_steps.h"
 #include "host/trace.h"
-#include "host/traced_services.h"
+#include "host/verdict.h"
 #include "platform/silent_services.h"
 #include "platform/temporary_directory.h"
 
@@ -23,12 +25,21 @@ namespace {
 
 using commandline::Ending;
 
-// What watches a run from outside; the trace is null where none is asked for.
-struct Watchers {
+// What looks on at a run from outside; the trace is null where none is asked for.
+struct Onlookers {
   std::shared_ptr<Trace> trace;
-  std::shared_ptr<ProgressLine> progress = std::make_shared<ProgressLine>(STDERR_FILENO);
-  std::shared_ptr<RunWatch> watch;
+  std::shared_ptr<ProgressLine> progress;
+  std::shared_ptr<RunRecorder> recorder;
 };
+
+// The present time, as in 2026-03-07T10:15:00Z.
+std::string now() {
+  const std::time_t seconds = std::time(nullptr);
+  std::tm utc{};
+  gmtime_r(&seconds, &utc);
+  std::array<char, 32> text{};
+  return {text.data(), std::strftime(text.data(), text.size(), "%Y-%m-%dT%H:%M:%SZ", &utc)};
+}
 
 // The trace that is asked for; null where none is.
 std::shared_ptr<Trace> openTrace(const Options& options) {
@@ -38,12 +49,12 @@ std::shared_ptr<Trace> openTrace(const Options& options) {
   throw Ending{ExitStatus::wrongUse, opened.status().description()};
 }
 
-Watchers watchersFor(const Options& options) {
-  Watchers watchers;
-  watchers.trace = openTrace(options);
-  const auto factsTo = options.explain == Explain::notAsked ? nullptr : watchers.trace;
-  watchers.watch = std::make_shared<RunWatch>(factsTo, watchers.progress);
-  return watchers;
+Onlookers onlookersFor(const Options& options) {
+  Onlookers onlookers{
+      .trace = openTrace(options), .progress = std::make_shared<ProgressLine>(STDERR_FILENO), .recorder = {}};
+  const bool isExplained = options.explain != Explain::notAsked;
+  onlookers.recorder = std::make_shared<RunRecorder>(isExplained ? onlookers.trace : nullptr, onlookers.progress);
+  return onlookers;
 }
 
 // A device image is none of the business of the programs that run on this machine.
@@ -52,13 +63,13 @@ void silenceNotices(platform::Platform& platform) {
   platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();
 }
 
-platform::Platform platformFor(const Options& options, const Watchers& watchers) {
+platform::Platform platformFor(const Options& options, const Onlookers& onlookers) {
   auto platform = platform::makeLinuxPlatform(options.device);
   if (options.isRehearsal) rehearseOn(platform, options.device.lockDirectory);
   if (platform.directories->systemRoot().lexically_normal() != "/") silenceNotices(platform);
-  if (watchers.trace) traceServices(platform, watchers.trace);
-  putConsoleInFrontOf(watchers.progress, platform);
-  platform.observer = watchers.watch;
+  if (onlookers.trace) traceServices(platform, onlookers.trace);
+  putConsoleInFrontOf(onlookers.progress, platform);
+  platform.observer = onlookers.recorder;
   return platform;
 }
 
@@ -68,46 +79,80 @@ std::unique_ptr<platform::DataClassMigrator> load(const Options& options) {
   return std::get<std::unique_ptr<platform::DataClassMigrator>>(std::move(loaded));
 }
 
-void explain(const Options& options, const Watchers& watchers, const Outcome& outcome) {
-  if (options.explain == Explain::notAsked) return;
-  const Explanation& explanation = watchers.watch->explanation();
-  const std::string text = options.explain == Explain::json ? jsonDocumentOf(explanation, outcome)
-                                                            : commandline::printableLines(textOf(explanation, outcome));
-  if (!commandline::print(text)) say("the explanation could not be written to standard output");
+// What is said of a run after it.
+struct Account {
+  const Explanation& explanation;
+  Verdict verdict;
+  ExplainedRun run;
+
+  [[nodiscard]] std::string asText() const { return textOf(explanation, verdict, run); }
+  [[nodiscard]] std::string asJson() const { return jsonDocumentOf(explanation, verdict, run); }
+};
+
+// What the state of the settings file itself tells the snapshots, they know.
+bool isToldBySnapshots(const records::Lost& lost) {
+  return lost.code == records::LossCode::unreadableSettingsFile || lost.code == records::LossCode::newerSettingsFile;
 }
 
-bool isSaved(const Explanation& explanation) {
-  const platform::RunFact* const save = explanation.lastSave();
-  return save == nullptr || save->kind != platform::RunFact::Kind::saveFailed;
-}
-
-snapshots::RunEnd endOf(const Explanation& explanation, const Outcome& outcome) {
-  snapshots::RunEnd end{.isMigrated = outcome.success,
-                        .isSaved = isSaved(explanation),
+snapshots::RunEnd endOf(const Account& account) {
+  snapshots::RunEnd end{.isMigrated = account.run.success,
+                        .isSaved = account.verdict.kind != Verdict::Kind::notSaved,
                         .onlyInSnapshot = {},
-                        .explanation = textOf(explanation, outcome),
-                        .explanationAsJson = jsonDocumentOf(explanation, outcome)};
-  for (const std::string& file : explanation.lostFiles()) end.onlyInSnapshot.push_back("the accounts of " + file);
+                        .explanation = account.asText(),
+                        .explanationAsJson = account.asJson()};
+  for (const records::Lost& lost : account.verdict.lost) {
+    if (!isToldBySnapshots(lost)) end.onlyInSnapshot.push_back(textOf(lost));
+  }
   return end;
 }
 
-ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Watchers& watchers) {
+// Ends the session of the snapshots, where there is one; what is rolled back is lost no longer.
+void endSession(snapshots::SnapshotSession* session, std::size_t keep, Account& account) {
+  if (session == nullptr) return;
+  if (session->end(endOf(account), keep) != snapshots::Ended::rolledBack) return;
+  say("the accounts could not be saved; the device is as it was before the run");
+  account.verdict.lost.clear();
+}
+
+void explain(Explain how, const Account& account) {
+  if (how == Explain::notAsked) return;
+  if (!commandline::print(how == Explain::json ? account.asJson() : account.asText())) {
+    say("the explanation could not be written to standard output");
+  }
+}
+
+ExitStatus statusOf(const Account& account, bool isStrict) {
+  if (!account.run.success) return ExitStatus::notMigrated;
+  switch (account.verdict.kind) {
+    case Verdict::Kind::kept: return ExitStatus::migrated;
+    case Verdict::Kind::lost: return isStrict ? ExitStatus::accountsLost : ExitStatus::migrated;
+    case Verdict::Kind::notSaved: return ExitStatus::notSaved;
+  }
+  return ExitStatus::notMigrated;
+}
+
+ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Onlookers& onlookers) {
+  ExplainedRun run{.dataClass = migrator.dataClassName(),
+                   .isRehearsal = options.isRehearsal,
+                   .version = HOST_VERSION,
+                   .root = platform::current().directories->systemRoot(),
+                   .time = now()};
+  if (onlookers.trace) onlookers.trace->start(run.version, run.root, options.given, run.time);
+  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   const auto session = beginRunWithSnapshots(options, migrator);
-  const bool success = migrator.performMigration();
-  watchers.progress->clear();
-  const Outcome outcome{.dataClass = migrator.dataClassName(), .success = success, .isRehearsal = options.isRehearsal};
-  auto ended = snapshots::Ended::asItIs;
-  if (session) ended = session->end(endOf(watchers.watch->explanation(), outcome), options.snapshots.keep);
-  if (watchers.trace) {
-    watchers.trace->result(migrator.dataClassName(), success);
-    if (!watchers.trace->complete()) say("the trace is incomplete: not every event could be written");
+  run.success = migrator.performMigration();
+  onlookers.progress->clear();
+
+  const Explanation& explanation = onlookers.recorder->explanation();
+  if (!explanation.isComplete()) say("memory ran out while the run was watched: what is said of it may be incomplete");
+  Account account{explanation, verdictOf(explanation, session ? session->runSnapshot().string() : ""), run};
+  endSession(session.get(), options.snapshots.keep, account);
+  if (onlookers.trace) {
+    onlookers.trace->result(run.dataClass, run.success, account.verdict);
+    if (!onlookers.trace->complete()) say("the trace is incomplete: not every event could be written");
   }
-  explain(options, watchers, outcome);
-  if (ended == snapshots::Ended::rolledBack) {
-    say("the accounts could not be saved; the device is as it was before the run");
-    return ExitStatus::notSaved;
-  }
-  return success ? ExitStatus::migrated : ExitStatus::notMigrated;
+  explain(options.explain, account);
+  return statusOf(account, options.isStrict);
 }
 
 // A plug-in that cannot be loaded is the run's to tell.
@@ -122,8 +167,8 @@ bool isNeeded(const Options& options) {
 
 ExitStatus run(const Options& options) {
   if (options.snapshots.isIfNeeded && !isNeeded(options)) return ExitStatus::migrated;
-  const Watchers watchers = watchersFor(options);
-  platform::setCurrent(platformFor(options, watchers));
+  const Onlookers onlookers = onlookersFor(options);
+  platform::setCurrent(platformFor(options, onlookers));
   if (isToBePrinted(options.snapshots)) {
     printFromSnapshots(options.snapshots, options.explain);
     return ExitStatus::migrated;
@@ -133,9 +178,8 @@ ExitStatus run(const Options& options) {
     changeBySnapshots(options.snapshots, *migrator);
     return ExitStatus::migrated;
   }
-  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");
-  return perform(*migrator, options, watchers);
+  return perform(*migrator, options, onlookers);
 }
 
 }  // namespace host

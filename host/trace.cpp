@@ -25,6 +25,59 @@ bool writeLine(int descriptor, const std::string& line) {
   return false;
 }
 
+template <typename Service>
+class Traced : public Service {
+ public:
+  Traced(std::shared_ptr<Service> inner, std::shared_ptr<Trace> trace)
+      : _inner{std::move(inner)}, _trace{std::move(trace)} {}
+
+ protected:
+  std::shared_ptr<Service> _inner;
+  std::shared_ptr<Trace> _trace;
+};
+
+class TracedSystemLog final : public Traced<platform::SystemLog> {
+ public:
+  using Traced::Traced;
+  [[nodiscard]] bool hasReaders() const override { return true; }
+  void write(const platform::LogRecord& record) override {
+    _trace->log(record.subsystem, record.category, record.text);
+    if (_inner->hasReaders()) _inner->write(record);
+  }
+};
+
+class TracedConsoleLog final : public Traced<platform::ConsoleLog> {
+ public:
+  using Traced::Traced;
+  void write(std::string_view message) override {
+    _trace->console(message);
+    _inner->write(message);
+  }
+};
+
+class TracedPreferencesChangedNotice final : public Traced<platform::PreferencesChangedNotice> {
+ public:
+  using Traced::Traced;
+  void post(std::string_view domain, std::string_view key) override {
+    _trace->preferencesChanged(domain, key);
+    _inner->post(domain, key);
+  }
+};
+
+class TracedCloudTabsNotice final : public Traced<platform::CloudTabsNotice> {
+ public:
+  using Traced::Traced;
+  void post(bool enabled) override {
+    _trace->cloudTabs(enabled);
+    _inner->post(enabled);
+  }
+};
+
+template <typename Tracing, typename Service>
+void wrap(std::shared_ptr<Service>& service, const std::shared_ptr<Trace>& trace) {
+  service = std::make_shared<Tracing>(std::move(service), trace);
+}
+
 }  // namespace
 
 platform::Result<std::shared_ptr<Trace>> Trace::open(const std::filesystem::path& path) {
@@ -42,6 +95,14 @@ void Trace::append(const MakeEvent& makeEvent) noexcept {
   } catch (...) {
     _complete = false;
   }
+}
+
+void Trace::start(std::string_view version, const std::string& root, const std::vector<std::string>& options,
+                  const std::string& time) noexcept {
+  append([&] {
+    return Event{{"event", "start"}, {"schema", 1},        {"version", version},
+                 {"root", root},     {"options", options}, {"time", time}};
+  });
 }
 
 void Trace::console(std::string_view message) noexcept {
@@ -63,17 +124,28 @@ void Trace::cloudTabs(bool enabled) noexcept {
   append([&] { return Event{{"event", "cloud-tabs"}, {"enabled", enabled}}; });
 }
 
-void Trace::step(std::string_view stage, std::string_view outerStage, const records::RunFact& fact) noexcept {
+void Trace::fact(std::string_view stage, std::string_view outerStage, const records::Fact& fact) noexcept {
   append([&] {
-    Event event{{"event", "step"}, {"stage", stage}};
+    Event event{{"event", "fact"}, {"stage", stage}};
     if (!outerStage.empty()) event["within"] = outerStage;
     event.update(jsonOf(fact));
     return event;
   });
 }
 
-void Trace::result(std::string_view dataClass, bool success) noexcept {
-  append([&] { return Event{{"event", "result"}, {"dataClass", dataClass}, {"success", success}}; });
+void Trace::result(std::string_view dataClass, bool success, const Verdict& verdict) noexcept {
+  append([&] {
+    Event event{{"event", "result"}, {"dataClass", dataClass}, {"success", success}};
+    addVerdict(verdict, event);
+    return event;
+  });
+}
+
+void traceServices(platform::Platform& platform, const std::shared_ptr<Trace>& trace) {
+  wrap<TracedSystemLog>(platform.systemLog, trace);
+  wrap<TracedConsoleLog>(platform.console, trace);
+  wrap<TracedPreferencesChangedNotice>(platform.preferencesChanged, trace);
+  wrap<TracedCloudTabsNotice>(platform.cloudTabs, trace);
 }
 
 }  // namespace host

@@ -6,8 +6,11 @@
 #include <string>
 #include <string_view>
 #include <utility>
+#include <vector>
 
+#include "host/verdict.h"
 #include "platform/linux/files/descriptor.h"
+#include "platform/platform.h"
 #include "platform/status.h"
 #include "records/fact.h"
 
@@ -26,13 +29,17 @@ class Trace {
   Trace& operator=(const Trace&) = delete;
   ~Trace() = default;
 
+  // What is about to be run: the host's version, the system's root, the options in force, and the time, as in
+  // 2026-03-07T10:15:00Z.
+  void start(std::string_view version, const std::string& root, const std::vector<std::string>& options,
+             const std::string& time) noexcept;
   void console(std::string_view message) noexcept;
   void log(std::string_view subsystem, std::string_view category, const std::function<std::string()>& message) noexcept;
   void preferencesChanged(std::string_view domain, std::string_view key) noexcept;
   void cloudTabs(bool enabled) noexcept;
   // What the run did in a stage; `outerStage`, of which that is a part, may be empty.
-  void step(std::string_view stage, std::string_view outerStage, const records::RunFact& fact) noexcept;
-  void result(std::string_view dataClass, bool success) noexcept;
+  void fact(std::string_view stage, std::string_view outerStage, const records::Fact& fact) noexcept;
+  void result(std::string_view dataClass, bool success, const Verdict& verdict) noexcept;
 
   // Whether every event so far was written.
   [[nodiscard]] bool complete() const { return _complete; }
@@ -45,5 +52,8 @@ class Trace {
   platform::Descriptor _file;
   bool _complete = true;
 };
+
+// Puts the trace in front of the platform's two logs and two notices: each event is traced, then passed on.
+void traceServices(platform::Platform& platform, const std::shared_ptr<Trace>& trace);
 
 }  // namespace host

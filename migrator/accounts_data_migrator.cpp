@@ -7,10 +7,8 @@
 
 #include "accountsettings/file_paths.h"
 #include "accountsettings/product_values.h"
-#include "migrator/account_stage.h"
-#include "migrator/console.h"
 #include "migrator/legacy_conversion.h"
-#include "migrator/told_removal.h"
+#include "migrator/telling.h"
 #include "platform/class_registry.h"
 #include "platform/platform.h"
 #include "platform/run_stage.h"

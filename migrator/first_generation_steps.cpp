@@ -2,13 +2,13 @@
 #include <array>
 #include <unordered_map>
 
+#include "accountsettings/change_tracker.h"
 #include "accountsettings/device_local_account.h"
-#include "accountsettings/store_watch.h"
 #include "accountsettings/vocabulary.h"
 #include "migrator/account_reads.h"
 #include "migrator/accounts_data_migrator.h"
-#include "migrator/console.h"
 #include "migrator/stored_names.h"
+#include "migrator/telling.h"
 #include "platform/platform.h"
 
 namespace migrator {
@@ -130,12 +130,13 @@ class CalDAVAccounts {
 };
 
 // Every partner is folded in, not just the first; one with two umbrellas is listed for each.
-void foldPartnersInto(BasicAccount& umbrella, const CalDAVAccounts& candidates, Accounts& folded, StoreWatch* watch) {
+void foldPartnersInto(BasicAccount& umbrella, const CalDAVAccounts& candidates, Accounts& folded,
+                      ChangeTracker* tracker) {
   if (!hasClassAmong(umbrella, {kGmailAccountClass, kYahooAccountClass})) return;
   for (const AccountsManager::Account& partner : candidates.partnersOf(umbrella)) {
     umbrella.setEnabled_forDataclass(true, kAccountDataclassCalendars);
     folded.push_back(partner);
-    if (watch != nullptr) watch->willBeFolded(*partner, umbrella, "the same user's calendars at the same service");
+    if (tracker != nullptr) tracker->willBeFolded(*partner, umbrella, "the same user's calendars at the same service");
   }
 }
 
@@ -197,7 +198,7 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A242(AccountsManager& store) {
   for (const AccountsManager::Account& account : store.allBasicAccounts()) {
     enableMailAndNotes(*account);
     giveOwnTypeToGmailAndYahoo(*account);
-    foldPartnersInto(*account, candidates, folded, store._runWatch());
+    foldPartnersInto(*account, candidates, folded, store._changeTracker());
   }
   for (const AccountsManager::Account& account : folded) store.deleteAccount(account);
   store.setDataVersion(5);

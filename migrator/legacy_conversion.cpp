@@ -3,9 +3,8 @@
 #include <tuple>
 #include <utility>
 
-#include "accountsettings/store_watch.h"
-#include "migrator/console.h"
-#include "migrator/told_removal.h"
+#include "accountsettings/change_tracker.h"
+#include "migrator/telling.h"
 #include "platform/platform.h"
 #include "records/fact_observer.h"
 
@@ -16,6 +15,8 @@ using accountsettings::BasicAccount;
 using platform::Array;
 using platform::Dictionary;
 using platform::PropertyValue;
+using records::LossCode;
+using records::Lost;
 
 Dictionary renamed(const Dictionary& description, std::span<const Rename> renames) {
   Dictionary record = description;
@@ -26,33 +27,52 @@ Dictionary renamed(const Dictionary& description, std::span<const Rename> rename
 }
 
 Dictionary readLegacyFile(const std::string& path) {
-  return platform::current().propertyLists->readDictionary(path).valueOr({});
+  auto read = platform::current().propertyLists->readDictionary(path);
+  if (!read.isOk()) {
+    records::tellFact(
+        [&] { return Lost{.code = LossCode::unreadableLegacyFile, .detail = read.status().reason(), .file = path}; });
+  }
+  return std::move(read).valueOr({});
 }
 
 namespace {
 
 // Where a description stands: MailAccounts[2] of /a/file.
-std::string placeOf(const LegacySource& source, std::size_t index) {
-  return std::string{source.key} + "[" + std::to_string(index) + "] of " + source.path;
+std::string placeOf(const std::string& path, std::string_view key, std::size_t index) {
+  return std::string{key} + "[" + std::to_string(index) + "] of " + path;
 }
 
-void tellRefused(const LegacySource& source, const std::string& place) {
-  records::tellFact([&] {
-    return records::RunFact{.kind = records::RunFact::Kind::failed,
-                            .reason = place + " has no class, so no account of this file is converted",
-                            .path = source.path};
-  });
+records::Name nameOf(const PropertyValue& description, std::span<const Rename> renames) {
+  const Dictionary* const properties = description.asDictionary();
+  return properties == nullptr ? records::Name{} : accountsettings::nameOf(renamed(*properties, renames));
+}
+
+// One description that is refused keeps the whole file from being converted.
+void tellRefused(const LegacySource& source, std::size_t refused) {
+  for (const std::string_view key : {source.key, source.otherKey}) {
+    const Array* const descriptions = key.empty() ? nullptr : source.contents.array(key);
+    for (std::size_t index = 0; descriptions != nullptr && index < descriptions->size(); ++index) {
+      const bool isRefused = key == source.key && index == refused;
+      records::tellFact([&] {
+        return Lost{.code = isRefused ? LossCode::refusedDescription : LossCode::refusedFile,
+                    .account = nameOf((*descriptions)[index], source.renames),
+                    .detail = placeOf(source.path, key, index),
+                    .file = source.path};
+      });
+    }
+  }
 }
 
 }  // namespace
 
 void noteOrigins(AccountsManager& store, const LegacySource& source, const AccountsManager::Accounts& accounts) {
-  accountsettings::StoreWatch* const watch = store._runWatch();
+  accountsettings::ChangeTracker* const tracker = store._changeTracker();
   const Array* const descriptions = source.contents.array(source.key);
-  if (watch == nullptr || descriptions == nullptr) return;
+  if (tracker == nullptr || descriptions == nullptr) return;
   for (std::size_t index = 0; index < accounts.size(); ++index) {
     const Dictionary* const description = (*descriptions)[index].asDictionary();
-    watch->comesFrom(*accounts[index], description == nullptr ? Dictionary{} : *description, placeOf(source, index));
+    tracker->comesFrom(*accounts[index], description == nullptr ? Dictionary{} : *description,
+                       placeOf(source.path, source.key, index), source.path);
   }
 }
 
@@ -67,7 +87,7 @@ std::optional<AccountsManager::Accounts> convertedAccounts(const LegacySource& s
     std::shared_ptr<BasicAccount> account = convert(description == nullptr ? Dictionary{} : *description);
     if (!account) {
       writeToConsole(failureFormat, method, element);
-      tellRefused(source, placeOf(source, accounts.size()));
+      tellRefused(source, accounts.size());
       return std::nullopt;
     }
     accounts.push_back(std::move(account));

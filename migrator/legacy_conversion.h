@@ -32,6 +32,8 @@ struct LegacySource {
   const std::string& path;
   const platform::Dictionary& contents;
   std::string_view key;
+  std::span<const Rename> renames;
+  std::string_view otherKey{};  // of the file's other array, where there is one
 };
 
 // The accounts that the legacy file describes in the array, in order: all of them, or nothing where the

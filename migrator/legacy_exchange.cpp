@@ -60,7 +60,7 @@ bool AccountsDataMigrator::_migrateDAAccounts(AccountsManager& store) {
   if (_saveMigrationInformation() && _collatedMigrationData) {
     _collatedMigrationData->set(kOldExchangeAccountsKey, legacyFile);
   }
-  const LegacySource source{path, legacyFile, "DAAccountsKey"};
+  const LegacySource source{path, legacyFile, "DAAccountsKey", kRenames};
   const auto accounts = convertedAccounts(source, _convertExchangeAccountDescription,
                                           "-[AccountsDataMigrator(Internal) _migrateDAAccounts:]",
                                           "%s. Could not convert the description for the Exchange account %@");

@@ -143,8 +143,8 @@ bool AccountsDataMigrator::_migrateMailAccounts(AccountsManager& store) {
   if (_saveMigrationInformation() && _collatedMigrationData)
     _collatedMigrationData->set(kOldMailAccountsKey, legacyFile);
 
-  const LegacySource delivery{path, legacyFile, "DeliveryAccounts"};
-  const LegacySource incoming{path, legacyFile, "MailAccounts"};
+  const LegacySource delivery{path, legacyFile, "DeliveryAccounts", kRenames, "MailAccounts"};
+  const LegacySource incoming{path, legacyFile, "MailAccounts", kRenames, "DeliveryAccounts"};
   const std::optional<ConvertedMail> accounts = convertedMail(delivery, incoming);
   if (accounts) {
     noteOrigins(store, delivery, accounts->delivery);

@@ -3,8 +3,7 @@
 
 #include "accountsettings/file_paths.h"
 #include "migrator/accounts_data_migrator.h"
-#include "migrator/console.h"
-#include "migrator/told_removal.h"
+#include "migrator/telling.h"
 #include "platform/platform.h"
 
 namespace migrator {
@@ -20,13 +19,13 @@ enum class Report { failures, nothing };
 
 void reportIfUndeleted(const Path& path, const Status& status, Report report) {
   if (status.isOk() || report == Report::nothing) return;
-  tellUnremoved(path, status);
+  tellNotRemoved(path, status);
   writeToConsole("%s. Could not delete %@. Error = %@", "-[AccountsDataMigrator(Internal) _removeOldAccountsInfo]",
                  path.native(), status.description());
 }
 
 Status deleteLegacyFile(const Path& path, Report report) {
-  Status status = removeAndTell(path, records::RunFact::Kind::sourceRemoved);
+  Status status = removeAndTell(path, Removal::ofSource);
   reportIfUndeleted(path, status, report);
   return status;
 }

@@ -1,10 +1,11 @@
 #include <tuple>
 
 #include "migrator/accounts_data_migrator.h"
-#include "migrator/console.h"
 #include "migrator/stored_names.h"
+#include "migrator/telling.h"
 #include "platform/platform.h"
 #include "platform/run_stage.h"
+#include "records/fact_observer.h"
 #include "records/message.h"
 
 namespace migrator {
@@ -58,7 +59,9 @@ void AccountsDataMigrator::_copyAsideAccountsPlist() {
     writeToConsole("Couldn't remove existing accountsettings copy at %@", destination.native());
   }
   const platform::Status copied = files.copy(source, destination);
-  if (!copied.isOk()) writeToConsole("Error trying to save an accountsettings plist copy: %@", copied.description());
+  if (!copied.isOk())
+    return writeToConsole("Error trying to save an accountsettings plist copy: %@", copied.description());
+  records::tellFact([&] { return records::CopiedAside{destination.string()}; });
 }
 
 bool AccountsDataMigrator::_saveMigrationInformation() {

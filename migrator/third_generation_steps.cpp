@@ -3,8 +3,8 @@
 #include "accountsettings/vocabulary.h"
 #include "migrator/account_reads.h"
 #include "migrator/accounts_data_migrator.h"
-#include "migrator/console.h"
 #include "migrator/stored_names.h"
+#include "migrator/telling.h"
 #include "platform/platform.h"
 
 namespace migrator {

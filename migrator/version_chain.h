@@ -4,7 +4,10 @@
 #include <cstddef>
 #include <cstdint>
 #include <span>
+#include <string>
 #include <string_view>
+
+#include "migrator/telling.h"
 
 namespace migrator {
 
@@ -13,9 +16,22 @@ namespace migrator {
 template <typename Migrator, typename Store>
 struct VersionStep {
   std::uint64_t storedVersion;
-  std::string_view name;  // as which the run's observer is told of it
+  std::string_view name;   // as which the run's observer is told of it
+  std::string_view words;  // what it does, for people
   bool (Migrator::*run)(Store& store);
 };
+
+// Runs one step as a stage, told to people as "version 4 to 5: …". The settings are stamped as current also after one
+// that fails, so that is told as a loss.
+template <typename Migrator, typename Store>
+[[nodiscard]] bool runAsStage(Migrator& migrator, const VersionStep<Migrator, Store>& step, Store& store) {
+  const std::string words = "version " + std::to_string(step.storedVersion) + " to " +
+                            std::to_string(step.storedVersion + 1) + ": " + std::string{step.words};
+  const AccountStage stage{step.name, store, words};
+  const bool hasSucceeded = (migrator.*step.run)(store);
+  if (!hasSucceeded) tellFailedStep(step.name, words);
+  return hasSucceeded;
+}
 
 // Enters the chain at the step of the stored version and runs that step and every following one with `runStep`, until
 // one answers false; answers what the last step run answered. A version without a step runs nothing and answers false.

@@ -1,7 +1,6 @@
 #include <array>
 
 #include "accountsettings/vocabulary.h"
-#include "migrator/account_stage.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/stored_names.h"
 #include "migrator/version_chain.h"
@@ -13,18 +12,30 @@ namespace {
 using Step = VersionStep<AccountsDataMigrator, AccountsManager>;
 
 constexpr std::array<Step, 12> kSteps{{
-    {0, "_migrateAccountsFrom7A149:", &AccountsDataMigrator::_migrateAccountsFrom7A149},
-    {1, "_migrateAccountsFrom7A150:", &AccountsDataMigrator::_migrateAccountsFrom7A150},
-    {2, "_migrateAccountsFrom7A153:", &AccountsDataMigrator::_migrateAccountsFrom7A153},
-    {3, "_migrateAccountsFrom7A241:", &AccountsDataMigrator::_migrateAccountsFrom7A241},
-    {4, "_migrateAccountsFrom7A242:", &AccountsDataMigrator::_migrateAccountsFrom7A242},
-    {5, "_migrateAccountsFrom8A293:", &AccountsDataMigrator::_migrateAccountsFrom8A293},
-    {6, "_migrateAccountsFrom8B117:", &AccountsDataMigrator::_migrateAccountsFrom8B117},
-    {7, "_migrateAccountsFrom8C136:", &AccountsDataMigrator::_migrateAccountsFrom8C136},
-    {8, "_migrateAccountsFrom8F191:", &AccountsDataMigrator::_migrateAccountsFrom8F191},
-    {9, "_migrateAccountsFrom9A182:", &AccountsDataMigrator::_migrateAccountsFrom9A182},
-    {10, "_migrateAccountsFrom9A334:", &AccountsDataMigrator::_migrateAccountsFrom9A334},
-    {11, "_migrateAccountsFrom9B176:", &AccountsDataMigrator::_migrateAccountsFrom9B176},
+    {0, "_migrateAccountsFrom7A149:", "nothing changes but the version",
+     &AccountsDataMigrator::_migrateAccountsFrom7A149},
+    {1, "_migrateAccountsFrom7A150:", "each account keeps the identifier it was synced by, and gets one of its own",
+     &AccountsDataMigrator::_migrateAccountsFrom7A150},
+    {2, "_migrateAccountsFrom7A153:", "the on-device account is made anew, with the data that the device keeps itself",
+     &AccountsDataMigrator::_migrateAccountsFrom7A153},
+    {3, "_migrateAccountsFrom7A241:", "hosted accounts no longer sync notes",
+     &AccountsDataMigrator::_migrateAccountsFrom7A241},
+    {4, "_migrateAccountsFrom7A242:", "Gmail and Yahoo accounts get their own type, and their calendars",
+     &AccountsDataMigrator::_migrateAccountsFrom7A242},
+    {5, "_migrateAccountsFrom8A293:", "small devices keep notes to themselves",
+     &AccountsDataMigrator::_migrateAccountsFrom8A293},
+    {6, "_migrateAccountsFrom8B117:", "hosted mail accounts get an account above them",
+     &AccountsDataMigrator::_migrateAccountsFrom8B117},
+    {7, "_migrateAccountsFrom8C136:", "children of a cloud account lose their name, and active mail is switched on",
+     &AccountsDataMigrator::_migrateAccountsFrom8C136},
+    {8, "_migrateAccountsFrom8F191:", "nothing changes but the version",
+     &AccountsDataMigrator::_migrateAccountsFrom8F191},
+    {9, "_migrateAccountsFrom9A182:", "one account becomes the primary one, and reminders follow calendars",
+     &AccountsDataMigrator::_migrateAccountsFrom9A182},
+    {10, "_migrateAccountsFrom9A334:", "documents stay with the primary account, and children's data is provisioned",
+     &AccountsDataMigrator::_migrateAccountsFrom9A334},
+    {11, "_migrateAccountsFrom9B176:", "passes follow documents in the primary account, and cloud tabs bookmarks",
+     &AccountsDataMigrator::_migrateAccountsFrom9B176},
 }};
 
 // The same reading as the store's: whatever gives no integer is version 0.
@@ -50,10 +61,8 @@ bool AccountsDataMigrator::_migrateNewAccountsInfo(AccountsManager& store) {
   }
   // Compared without sign: a negative stored version counts as newer than every release and is left alone.
   if (storedVersion >= AccountsManager::currentVersion()) return true;
-  return runVersionSteps(std::span{kSteps}, storedVersion, [&](const Step& step) {
-    const AccountStage stage{step.name, store};
-    return (this->*step.run)(store);
-  });
+  return runVersionSteps(std::span{kSteps}, storedVersion,
+                         [&](const Step& step) { return runAsStage(*this, step, store); });
 }
 
 bool AccountsDataMigrator::_newAccountsInformationPresent() {

@@ -1,28 +1,20 @@
 // One device: what a run did, or would do, to each account.
 
-const ACTIONS = {
-  "loaded": "read", "added": "added", "converted": "converted", "changed": "changed", "moved": "moved",
-  "folded": "folded", "dropped": "dropped", "repeated": "repeated", "kept": "kept as it is", "failed": "not converted",
+const FACTS = {
+  "loaded": "read", "copied-aside": "copied aside", "added": "added", "converted": "converted", "changed": "changed",
+  "moved": "moved", "folded": "folded", "lost": "lost", "repeated": "repeated", "kept": "kept as it is",
   "saved": "saved", "save-failed": "not saved", "file-removed": "removed", "source-removed": "removed",
   "file-not-removed": "not removed",
 };
-const GOING = new Set(["dropped", "folded", "failed", "save-failed"]);
-const SIGNS = { "added": "+", "converted": "+", "changed": "~", "moved": "→", "folded": "⤵", "dropped": "×",
+const GOING = new Set(["lost", "folded", "save-failed"]);
+const SIGNS = { "added": "+", "converted": "+", "changed": "~", "moved": "→", "folded": "⤵", "lost": "×",
   "repeated": "=", "kept": "!" };
 
 const nameOf = (account) => account.name || account.identifier || "(without a name)";
 const calledOf = (account) => `${account.type || "no type"} “${nameOf(account)}”`;
 const shownValue = (value) => (typeof value === "string" ? `“${value}”` : JSON.stringify(value));
 
-function verdictOf(explanation) {
-  const result = explanation.result;
-  if (result.verdict) return result.verdict;
-  const facts = explanation.stages.flatMap((stage) => stage.steps);
-  const save = facts.filter((fact) => /^save/.test(fact.action)).at(-1);
-  if (!result.success) return "failed";
-  if (save && save.action === "save-failed") return "not saved";
-  return result.lost.length || facts.some((fact) => fact.action === "dropped") ? "lost" : "kept";
-}
+const verdictOf = ({ result }) => (result.success ? result.verdict : "failed");
 
 // The page of one device; `console` is what the run said there, where it is known.
 function deviceView(explanation, console = [], level = 2) {
@@ -46,8 +38,7 @@ function sentenceOf(verdict, isRehearsal) {
 function countTiles(explanation) {
   const result = explanation.result;
   const counts = Object.entries(result.counts || {}).filter(([, count]) => count);
-  const stored = result.storedVersion ?? explanation.stages.flatMap((stage) => stage.steps)
-    .find((fact) => fact.action === "loaded")?.version;
+  const stored = result.storedVersion;
   return tiles([
     ...(stored === undefined ? [] : [[stored, "stored data version"]]),
     ...(typeof result.accounts === "number" ? [[result.accounts, "accounts afterwards"]] : []),
@@ -61,25 +52,24 @@ function lossesOf(explanation, level) {
   const lost = explanation.result.lost || [];
   if (!lost.length) return null;
   return element("div", {}, heading(level, "What is lost"), element("ul", { class: "plain" }, lost.map((each) =>
-    element("li", {}, typeof each === "string" ? element("code", {}, each) : [
-      element("strong", { class: "gone" }, calledOf(each)), " ", element("code", {}, each.code || ""),
-      each.reason ? ` ${each.reason}` : "", each.where ? [element("br"), "its data are still in ", whereOf(each.where)] : "",
-    ]))));
+    element("li", {}, element("strong", { class: "gone" }, lostOf(each)), " ", element("code", {}, each.code),
+      ` ${each.reason}`, each.detail ? `: ${each.detail}` : "",
+      each.where ? [element("br"), "its data are still in ", element("code", {}, each.where)] : ""))));
 }
 
-const whereOf = (where) => element("code", {}, [where].flat().map(
-  (place) => (typeof place === "string" ? place : JSON.stringify(place))).join(", "));
+// An account, or a file of them.
+const lostOf = (loss) => ("type" in loss ? calledOf(loss) : loss.file || "The settings file");
 
 // Which stage touched which account, as a picture that is also a table.
 function pathsOf(explanation, level) {
-  const stages = explanation.stages.filter((stage) => stage.steps.some((fact) => fact.account));
+  const stages = explanation.stages.filter((stage) => stage.facts.some((fact) => fact.account));
   const accounts = new Map();
   for (const stage of stages) {
-    for (const fact of stage.steps.filter((each) => each.account)) {
+    for (const fact of stage.facts.filter((each) => each.account)) {
       const key = fact.account.identifier || calledOf(fact.account);
       if (!accounts.has(key)) accounts.set(key, { name: fact.account, touched: new Map() });
       const touched = accounts.get(key).touched;
-      touched.set(stage, [...(touched.get(stage) || []), fact.action]);
+      touched.set(stage, [...(touched.get(stage) || []), fact.fact]);
     }
   }
   if (!accounts.size) return element("p", {}, "No account was changed.");
@@ -92,18 +82,18 @@ const MOST_PATHS = 500;
 
 function pathTable(accounts, stages) {
   return element("div", { class: "scroll" }, element("table", { class: "path" },
-    element("caption", {}, "+ came, ~ changed, → moved, ⤵ folded into another, × dropped"),
+    element("caption", {}, "+ came, ~ changed, → moved, ⤵ folded into another, × lost"),
     element("thead", {}, element("tr", {}, element("th", { scope: "col" }, "Account"),
       stages.map((stage) => element("th", { scope: "col" }, titleOf(stage))))),
     element("tbody", {}, accounts.map(({ name, touched }) => element("tr", {},
       element("th", { scope: "row" }, calledOf(name)), stages.map((stage) => pathCell(touched.get(stage))))))));
 }
 
-function pathCell(actions) {
-  if (!actions) return element("td", {}, "");
-  const words = actions.map((action) => ACTIONS[action] || action).join(", ");
-  return element("td", { class: actions.some((action) => GOING.has(action)) ? "gone" : null, title: words },
-    element("span", { "aria-hidden": true }, actions.map((action) => SIGNS[action] || "·").join("")),
+function pathCell(kinds) {
+  if (!kinds) return element("td", {}, "");
+  const words = kinds.map((kind) => FACTS[kind] || kind).join(", ");
+  return element("td", { class: kinds.some((kind) => GOING.has(kind)) ? "gone" : null, title: words },
+    element("span", { "aria-hidden": true }, kinds.map((kind) => SIGNS[kind] || "·").join("")),
     element("span", { class: "skip" }, words));
 }
 
@@ -113,19 +103,20 @@ function stagesOf(explanation, level) {
   const stages = explanation.stages.map((stage) => element("details", {},
     element("summary", {}, element("strong", {}, titleOf(stage)),
       titleOf(stage) === stage.stage ? "" : element("span", { class: "faint" }, ` ${stage.stage}`),
-      element("span", { class: "faint" }, ` ${counted(stage.steps.length, "fact")}`)),
-    element("ul", { class: "plain" }, stage.steps.map(factOf))));
+      element("span", { class: "faint" }, ` ${counted(stage.facts.length, "fact")}`)),
+    element("ul", { class: "plain" }, stage.facts.map(factOf))));
   return element("div", {}, heading(level, "Step by step"), stages);
 }
 
 function factOf(fact) {
   return element("li", {},
-    element("span", { class: GOING.has(fact.action) ? "gone" : "faint" }, `${ACTIONS[fact.action] || fact.action} `),
+    element("span", { class: GOING.has(fact.fact) ? "gone" : "faint" }, `${FACTS[fact.fact] || fact.fact} `),
     fact.account ? element("strong", {}, calledOf(fact.account)) : "",
     typeof fact.accounts === "number" ? `${counted(fact.accounts, "account")} of data version ${fact.version}` : "",
     [fact.into || []].flat().map((other) => ` into ${calledOf(other)}`),
     fact.file ? [" ", element("code", {}, fact.file)] : "",
-    fact.reason ? `: ${fact.reason}` : "",
+    fact.from ? ` from ${fact.from}` : "",
+    fact.reason || fact.cause ? `: ${fact.reason || fact.cause}` : "", fact.detail ? `: ${fact.detail}` : "",
     fact.code ? [" ", element("code", { class: "faint" }, fact.code)] : "",
     fact.changes ? element("ul", { class: "plain" }, fact.changes.map(changeOf)) : "");
 }

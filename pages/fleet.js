@@ -68,7 +68,7 @@ const filterButton = (words, click, about) => element("button",
 
 function stepSection(fleet) {
   const rows = fleet.steps.map(({ stage, action, code, devices, accounts }) => [
-    element("code", {}, stage), ACTIONS[action] || action, code ? element("code", {}, code) : "", number(devices),
+    element("code", {}, stage), FACTS[action] || action, code ? element("code", {}, code) : "", number(devices),
     number(accounts)]);
   return section("steps", "What each step touched",
     table("Facts of all runs, by stage", ["Stage", "What", "Reason", "Devices", "Times"], rows));

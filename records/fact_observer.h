@@ -12,7 +12,9 @@ namespace records {
 class FactObserver : public platform::RunObserver {
  public:
   // One fact of the stage that began last and has not ended, in the order in which they are found out.
-  virtual void told(const RunFact& fact) = 0;
+  virtual void told(const Fact& fact) = 0;
+  // Facts are missing from here on, since memory ran out while they were gathered.
+  virtual void lostTrack() noexcept = 0;
 };
 
 // The observer that wants facts; null where none does, and nothing need be computed.
@@ -23,10 +25,12 @@ class FactObserver : public platform::RunObserver {
 // Tells the fact that `makeFact` makes, if anybody wants it. Whatever goes wrong with that is no failure of the run.
 template <typename MakeFact>
 void tellFact(const MakeFact& makeFact) noexcept {
+  std::shared_ptr<FactObserver> observer;
   try {
-    if (const auto observer = factObserver()) observer->told(makeFact());
+    observer = factObserver();
+    if (observer) observer->told(makeFact());
   } catch (...) {
-    return;
+    if (observer) observer->lostTrack();
   }
 }
 

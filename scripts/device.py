@@ -50,6 +50,10 @@ class Run(NamedTuple):
     def console(self):
         return [each["message"] for each in self.told("console")]
 
+    def result(self):
+        """The last event's members, which tell how the run ended."""
+        return {key: value for key, value in self.events[-1].items() if key != "event"}
+
 
 def quoted(line):
     return line[line.index('"') + 1 : line.rindex('"')]
@@ -115,6 +119,9 @@ class Device:
         )
 
 
+run_checks = []  # what looks at every run of a program, such as a test's schemas
+
+
 def run_host(host, *arguments, environment=None, prepare=None, timeout=60, trace=None):
     ended = subprocess.run(
         [str(host), *map(str, arguments)],
@@ -125,7 +132,10 @@ def run_host(host, *arguments, environment=None, prepare=None, timeout=60, trace
         timeout=timeout,
         check=False,
     )
-    return Run(ended.returncode, lines(ended.stdout), lines(ended.stderr), read_trace(trace))
+    run = Run(ended.returncode, lines(ended.stdout), lines(ended.stderr), read_trace(trace))
+    for check in run_checks:
+        check(run)
+    return run
 
 
 def plain_environment():

@@ -54,6 +54,9 @@ class SnapshotSession {
   // for the snapshot. Fails where a run would.
   void rehearse();
 
+  // Where the snapshot of the run that was begun lies.
+  [[nodiscard]] Path runSnapshot() const { return _place.directory / _run.id; }
+
   // Ends the run that was begun. One that could not save is rolled back; of one that changed nothing no snapshot stays;
   // any other keeps its explanation, and, where accounts are nowhere else, is kept until it is released. Sets the stamp
   // and removes all but the newest snapshots. What fails here is said; it changes nothing about the run.

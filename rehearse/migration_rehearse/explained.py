@@ -11,7 +11,7 @@ from migration_rehearse.footprint import UUID
 NEW_UUID = re.compile(UUID.pattern.decode())
 TEMPORARY_NAME = re.compile(r"(/var/mobile/tmp/file)[A-Za-z0-9]{6}\b")
 COUNTED = ("kept", "changed", "added", "converted", "folded", "dropped", "lost")
-OF_THE_MOMENT = ("time", "root")  # members of a result that say when and where, and nothing of the device
+OF_THE_MOMENT = ("time", "root")  # members that say when and where, and nothing of the device
 
 
 class Explained(NamedTuple):
@@ -42,49 +42,14 @@ def lasting(text, root, identifiers):
 def explained(document):
     """Reads an explanation that `lasting` has gone over. Raises ValueError, KeyError or TypeError where it is none."""
     result = document["result"]
-    facts = [(stage, fact) for stage in document["stages"] for fact in stage["steps"]]
-    document["result"] = {key: value for key, value in result.items() if key not in OF_THE_MOMENT}
-    losses = _losses(result, facts)
+    facts = [(stage["stage"], fact) for stage in document["stages"] for fact in stage["facts"]]
+    counts = result.get("counts", {})
     return Explained(
-        verdict=result.get("verdict") or _verdict(result, facts, losses),
-        document=document,
-        stored_version=result.get("storedVersion", _loaded_version(facts)),
-        accounts=result.get("accounts") if isinstance(result.get("accounts"), int) else None,
-        counts=_counts(result, facts, losses),
-        losses=losses,
-        facts=Counter((stage["stage"], fact["action"], fact.get("code", "")) for stage, fact in facts),
+        verdict=result["verdict"] if result["success"] else "failed",
+        document={member: value for member, value in document.items() if member not in OF_THE_MOMENT},
+        stored_version=result.get("storedVersion"),
+        accounts=result.get("accounts"),
+        counts={name: counts.get(name) for name in COUNTED},
+        losses=Counter(one["code"] for one in result.get("lost", [])),
+        facts=Counter((stage, fact["fact"], fact.get("code", "")) for stage, fact in facts),
     )
-
-
-def _verdict(result, facts, losses):
-    saves = [fact["action"] for _, fact in facts if fact["action"] in ("saved", "save-failed")]
-    if not result["success"]:
-        return "failed"
-    if saves[-1:] == ["save-failed"]:
-        return "not saved"
-    return "lost" if losses else "kept"
-
-
-def _losses(result, facts):
-    """Each account that went by its code; a file that went with its accounts counts as one."""
-    lost = [one.get("code", "unknown") if isinstance(one, dict) else "file-lost" for one in result.get("lost", [])]
-    if "verdict" not in result:
-        lost += [fact.get("code", "dropped") for _, fact in facts if fact["action"] == "dropped"]
-    return Counter(lost)
-
-
-def _loaded_version(facts):
-    for stage, fact in facts:
-        if stage["stage"] == "load" and fact["action"] == "loaded":
-            return fact["version"]
-    return None
-
-
-def _counts(result, facts, losses):
-    told = result.get("counts")
-    if isinstance(told, dict):
-        return {name: told.get(name) for name in COUNTED}
-    actions = Counter(fact["action"] for _, fact in facts)
-    changed = {fact["account"].get("identifier") for _, fact in facts if fact["action"] == "changed"}
-    counts = {name: actions[name] for name in ("added", "converted", "folded", "dropped")}
-    return {**dict.fromkeys(COUNTED), **counts, "changed": len(changed), "lost": sum(losses.values())}

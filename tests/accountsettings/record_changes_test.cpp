@@ -12,7 +12,6 @@ namespace {
 using accountsettings::Difference;
 using accountsettings::RecordState;
 using accountsettings::StoreState;
-using records::RunFact;
 using Lines = std::vector<std::string>;
 
 class RecordChanges : public AccountStore {
@@ -73,7 +72,8 @@ TEST_F(RecordChanges, TakeNoTwoEqualNumbersForARenamedKey) {
 
 TEST_F(RecordChanges, TellOfAccountsThatCameAndWent) {
   const Account stays = account("s");
-  EXPECT_EQ(between(stateOf({account("a"), stays}), stateOf({stays, account("b")})), (Lines{"added b", "dropped a"}));
+  EXPECT_EQ(between(stateOf({account("a"), stays}), stateOf({stays, account("b")})),
+            (Lines{"added b", "lost a (removed)"}));
 }
 
 TEST_F(RecordChanges, KnowAnAccountWhoseIdentifierChanged) {
@@ -87,7 +87,8 @@ TEST_F(RecordChanges, TellOfChildrenLikeOfAccounts) {
   const Account one = parent("p", {properties("c", {{"Port", 1}}), properties("d")});
   const StoreState before = stateOf({one});
   one->setAccountProperty_forKey(Array{properties("c", {{"Port", 2}}), properties("e")}, "ChildAccounts");
-  EXPECT_EQ(between(before, stateOf({one})), (Lines{"changed c in p: Port 1 -> 2", "added e in p", "dropped d in p"}));
+  EXPECT_EQ(between(before, stateOf({one})),
+            (Lines{"changed c in p: Port 1 -> 2", "added e in p", "lost d in p (removed-from-parent)"}));
 }
 
 TEST_F(RecordChanges, TellOfAnAccountThatWentUnderAnotherAndTookItsChildrenAlong) {
@@ -99,7 +100,7 @@ TEST_F(RecordChanges, TellOfAnAccountThatWentUnderAnotherAndTookItsChildrenAlong
 
 TEST_F(RecordChanges, TellOfAChildThatBecameAnAccount) {
   EXPECT_EQ(between(stateOf({parent("p", {properties("c")})}), stateOf({account("c")})),
-            (Lines{"moved c", "changed c", "dropped p"}));
+            (Lines{"moved c", "changed c", "lost p (removed)"}));
 }
 
 TEST_F(RecordChanges, TellOfAnAccountThatIsListedAgain) {
@@ -158,17 +159,18 @@ class RandomEdits {
   int _names = 0;
 };
 
-void apply(const RunFact& fact, const StoreState& after, std::map<std::string, Dictionary>& records) {
-  if (fact.kind == RunFact::Kind::dropped) records.erase(fact.subject.identifier);
-  if (fact.kind == RunFact::Kind::added) {
+void apply(const records::Fact& fact, const StoreState& after, std::map<std::string, Dictionary>& records) {
+  if (const auto* const lost = std::get_if<records::Lost>(&fact)) records.erase(lost->account.identifier);
+  if (const auto* const added = std::get_if<records::Added>(&fact)) {
     for (const RecordState& each : after) {
-      if (each.properties.text("Identifier")->string() == fact.subject.identifier) {
-        records[fact.subject.identifier] = each.properties;
-      }
+      const std::string identifier = each.properties.text("Identifier")->string();
+      if (identifier == added->account.identifier) records[identifier] = each.properties;
     }
   }
-  for (const records::RecordChange& change : fact.changes) {
-    Dictionary& record = records[fact.subject.identifier];
+  const auto* const changed = std::get_if<records::Changed>(&fact);
+  if (changed == nullptr) return;
+  for (const records::Change& change : changed->changes) {
+    Dictionary& record = records[changed->account.identifier];
     record.remove(change.oldKey);
     change.to ? record.set(change.key, *change.to) : static_cast<void>(record.remove(change.key));
   }

@@ -7,6 +7,7 @@ import tempfile
 import unittest
 from pathlib import Path
 
+import schemas  # noqa: F401, holds every run against the schemas
 from device import SETTINGS, Device, run_host
 
 HOST = Path(os.environ["MIGRATION_HOST"])

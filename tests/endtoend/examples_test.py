@@ -18,7 +18,7 @@ class Examples(DeviceTest):
         before = device.entries()
         run = device.migrate(HOST)
         self.assertEqual(0, run.status, run.errors)
-        self.assertEqual({"event": "result", "dataClass": "accounts", "success": True}, run.events[-1])
+        self.assertEqual({"dataClass": "accounts", "success": True, "verdict": "kept"}, run.result())
         self.assertEqual(
             [{"event": "preferences-changed", "domain": "com.vorlix.mobilemail", "key": "MailAccounts"}] * notices,
             run.told("preferences-changed"),

@@ -1,4 +1,4 @@
-"""The explanation of a run: for people, for machines, and as steps of the trace."""
+"""The explanation of a run: for people, for machines, and as facts in the trace."""
 
 import json
 import os
@@ -6,7 +6,7 @@ import pty
 import subprocess
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL
+from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS_COPY
 from device_case import HOST, PLUGINS, DeviceTest
 
 MOVED_BY = "_migrateAccountsFrom8B117:"
@@ -22,10 +22,10 @@ class ExplainTest(DeviceTest):
         run = self.run_host("--root", device.root, "--explain=json", *options)
         return json.loads("\n".join(run.output))
 
-    def steps(self, device, action):
-        """The explained run's steps of this kind, each with the stage in which it was taken."""
-        return [{"in": stage["stage"], **step} for stage in self.document(device)["stages"]
-                for step in stage["steps"] if step["action"] == action]
+    def facts(self, device, kind):
+        """The explained run's facts of this kind, each with the stage in which it was told."""
+        return [{"in": stage["stage"], **fact} for stage in self.document(device)["stages"]
+                for fact in stage["facts"] if fact["fact"] == kind]
 
     def text(self, device, *options):
         return self.run_host("--root", device.root, "--explain", *options).output
@@ -34,65 +34,87 @@ class ExplainTest(DeviceTest):
 class Machines(ExplainTest):
     def test_are_told_of_every_stage_in_order(self):
         document = self.document(self.example("first-generation"))
-        self.assertEqual((1, False, True), (document["schema"], document["rehearsal"], document["complete"]))
+        self.assertEqual((2, False, True), (document["schema"], document["rehearsal"], document["complete"]))
         stages = [stage["stage"] for stage in document["stages"] if stage["stage"] != "save"]
-        self.assertEqual("load", stages[0])
-        self.assertEqual(sorted(stages[1:]), stages[1:])
-        self.assertEqual({"dataClass": "accounts", "success": True, "saved": True, "accounts": 10, "version": 12,
-                          "lost": []}, document["result"])
+        self.assertEqual(["copy aside", "load"], stages[:2])
+        self.assertEqual(sorted(stages[2:]), stages[2:])
+        counts = {"kept": 0, "changed": 7, "added": 3, "converted": 0, "moved": 2, "folded": 1, "dropped": 0, "lost": 0}
+        self.assertEqual({"dataClass": "accounts", "success": True, "verdict": "kept", "storedVersion": 1,
+                          "accounts": 10, "version": 12, "counts": counts}, document["result"])
+
+    def test_are_told_which_host_did_it_where_and_when(self):
+        device = self.example("current")
+        document = self.document(device)
+        self.assertEqual((self.run_host("--version").output[0], str(device.root)),
+                         (f"migration-host {document['host']}", document["root"]))
+        self.assertRegex(document["time"], r"^\d{4}-\d\d-\d\dT\d\d:\d\d:\d\dZ$")
+
+    def test_are_told_a_step_in_words(self):
+        stages = {stage["stage"]: stage.get("words") for stage in self.document(self.example("first-generation"))["stages"]}
+        self.assertEqual("version 4 to 5: Gmail and Yahoo accounts get their own type, and their calendars",
+                         stages["_migrateAccountsFrom7A242:"])
+        self.assertIsNone(stages["load"])
 
     def test_are_told_from_what_an_account_was_converted(self):
         device = self.example("legacy-files")
-        converted = {step["account"]["name"]: step for step in self.steps(device, "converted")}
+        converted = {fact["account"]["name"]: fact for fact in self.facts(device, "converted")}
         boatyard = converted["Tern Boatyard"]
         self.assertEqual("mail conversion", boatyard["in"])
-        self.assertEqual(f"MailAccounts[0] of {device.path(LEGACY_MAIL)}", boatyard["reason"])
+        self.assertEqual(f"MailAccounts[0] of {device.path(LEGACY_MAIL)}", boatyard["from"])
         self.assertIn({"key": "Class", "renamedFrom": "AccountType", "to": "IMAPAccount"}, boatyard["changes"])
         self.assertEqual("exchange conversion", converted["Coastguard"]["in"])
 
     def test_are_told_of_keys_that_changed(self):
-        changed = self.steps(self.example("first-generation"), "changed")
-        gmail = [step for step in changed if step["in"] == "_migrateAccountsFrom7A242:"
-                 and step["account"]["name"] == "June at Gmail"]
+        changed = self.facts(self.example("first-generation"), "changed")
+        gmail = [fact for fact in changed if fact["in"] == "_migrateAccountsFrom7A242:"
+                 and fact["account"]["name"] == "June at Gmail"]
         self.assertIn({"key": "Type", "from": "Mail", "to": "Gmail"}, gmail[0]["changes"])
 
     def test_are_told_of_moves_and_folds(self):
         device = self.example("first-generation")
         document = json.dumps(self.document(device))
         again = self.example("first-generation")
-        moved = self.steps(again, "moved")
+        moved = self.facts(again, "moved")
         self.assertEqual({("Wexmo", "Wexmo"), ("Nimbra", "Nimbra")},
-                         {(step["account"]["name"], step["into"][0]["name"]) for step in moved})
-        self.assertEqual({MOVED_BY}, {step["in"] for step in moved})
-        self.assertIn('"action": "folded", "account": {"type": "CalDAV", "name": "June\'s Google Calendar"', document)
+                         {(fact["account"]["name"], fact["into"][0]["name"]) for fact in moved})
+        self.assertEqual({MOVED_BY}, {fact["in"] for fact in moved})
+        self.assertIn('"fact": "folded", "account": {"type": "CalDAV", "name": "June\'s Google Calendar"', document)
 
-    def test_are_told_by_which_rule_an_account_was_dropped(self):
-        device = self.device(Version=12, Accounts=[account("a", "Unheard of"), account("b", "Mail"), 7])
+    def test_are_told_of_each_lost_account_by_a_code_and_where_its_data_still_are(self):
+        device = self.device(Version=12, Accounts=[account("a", "Unheard of"), account("b", "Mail", DisplayName="B"), 7])
+        document = self.document(device)
+        copy = str(device.path(SETTINGS_COPY))
+        nameless = {"name": "", "where": copy}
         self.assertEqual(
-            ["its type is unknown: \"Unheard of\"",
-             "the mail application does not know its class, and its AccountPath names none",
-             "it is no account record"],
-            [step["reason"] for step in self.steps(device, "dropped")])
+            [{"code": "dropped-unknown-type", "reason": "its type is unknown", "detail": '"Unheard of"',
+              "type": "Unheard of", "identifier": "a", **nameless},
+             {"code": "dropped-unknown-class", "reason": "its class is unknown and no directory tells a better one",
+              "type": "Mail", "identifier": "b", "name": "B", "where": copy},
+             {"code": "dropped-no-record", "reason": "it is no account record", "where": copy}],
+            document["result"]["lost"])
+        self.assertEqual(("lost", 3, 3), (document["result"]["verdict"], document["result"]["counts"]["dropped"],
+                                          document["result"]["counts"]["lost"]))
 
     def test_are_told_of_the_repair_while_saving(self):
-        changed = self.steps(self.example("legacy-files"), "changed")
-        repaired = [step["changes"] for step in changed if step["in"] == "save"]
+        changed = self.facts(self.example("legacy-files"), "changed")
+        repaired = [fact["changes"] for fact in changed if fact["in"] == "save"]
         self.assertEqual([[{"key": "Class", "from": "MailAccount", "to": "POPAccount"}]], repaired)
 
     def test_are_told_of_files_that_went(self):
         device = self.example("legacy-files")
-        removed = [step["file"] for step in self.steps(device, "source-removed")]
+        removed = [fact["file"] for fact in self.facts(device, "source-removed")]
         self.assertEqual([str(device.path(LEGACY_EXCHANGE)), str(device.path(LEGACY_MAIL))], removed)
 
 
 class People(ExplainTest):
     def test_read_that_nothing_happened_in_a_few_lines(self):
         self.assertEqual(["What the run did", "", "No account was changed.", "",
-                          "result: success; 5 accounts of data version 12"], self.text(self.example("current")))
+                          "result: success; everything was kept; 5 accounts of data version 12, stored before as version 12",
+                          "accounts: 5 kept"], self.text(self.example("current"))[:-1])
 
     def test_read_what_became_of_an_account_under_the_stage(self):
         lines = self.text(self.example("first-generation"))
-        at = lines.index("_migrateAccountsFrom7A241:")
+        at = lines.index("version 3 to 4: hosted accounts no longer sync notes (_migrateAccountsFrom7A241:)")
         self.assertEqual(['  Nimbra "Wexmo" (F4A2B3C5-D6E7-4F80-9A1B-2C3D4E5F6707)',
                           '    ~ Enabled Dataclasses: -"com.vorlix.Dataclass.Notes"'], lines[at + 1:at + 3])
 
@@ -104,24 +126,24 @@ class People(ExplainTest):
 
     def test_read_of_every_account_that_was_dropped(self):
         device = self.device(Version=12, Accounts=[account(f"a{n}", "Unheard of") for n in range(100)])
-        dropped = [line for line in self.text(device) if line.startswith("  dropped: ")]
-        self.assertEqual(100, len(dropped))
+        lost = [line for line in self.text(device) if line.startswith("  lost: ")]
+        self.assertEqual(100, len(lost))
 
     def test_are_warned_when_legacy_files_went_although_the_save_failed(self):
         device = self.example("legacy-files")
         device.write("etc/passwd", "root:*:0:0::/var/root:/bin/sh\n")
         lines = self.text(device)
         self.assertTrue(any(line.startswith("  NOT SAVED: Could not find the account mobile") for line in lines))
-        self.assertIn(f"WARNING: the accounts of {device.path(LEGACY_MAIL)} are lost: the file was removed although"
-                      " they were not saved.", lines)
+        lost = [line for line in lines if line.startswith("WARNING: lost: ") and "[not-saved]" in line]
+        self.assertTrue(any('"Tern Boatyard"' in line and line.endswith("its data is nowhere else on the device") for line in lost))
         self.assertTrue(any("THE ACCOUNTS WERE NOT SAVED" in line for line in lines))
 
     def test_are_warned_when_a_file_went_of_which_nothing_was_converted(self):
         device = self.device()
         device.write_plist(LEGACY_MAIL, {"MailAccounts": [{"uniqueId": "no class"}]})
         lines = self.text(device)
-        self.assertIn(f"  not converted: MailAccounts[0] of {device.path(LEGACY_MAIL)} has no class, so no account of"
-                      " this file is converted", lines)
+        self.assertIn(f"  lost: account (no class): its description in the legacy file has no class: MailAccounts[0] of"
+                      f" {device.path(LEGACY_MAIL)} [refused-description]", lines)
         self.assertTrue(any(line.startswith("WARNING: ") for line in lines))
 
 
@@ -148,20 +170,20 @@ class Secrets(ExplainTest):
             self.assertIn("<hidden>", "\n".join(run.output))
 
 
-class Steps(ExplainTest):
+class Facts(ExplainTest):
     def test_stand_in_the_trace_as_in_the_explanation(self):
         device, trace = self.example("legacy-files"), self.scratch / "trace"
         document = self.document(device, "--trace", trace)
         events = [json.loads(line) for line in trace.read_text().splitlines()]
-        explained = [{"stage": stage["stage"], **({"within": stage["within"]} if "within" in stage else {}), **step}
-                     for stage in document["stages"] for step in stage["steps"]]
-        steps = [event for event in events if event["event"] == "step"]
-        self.assertEqual([{"event": "step", **step} for step in explained], steps)
+        explained = [{"stage": stage["stage"], **({"within": stage["within"]} if "within" in stage else {}), **fact}
+                     for stage in document["stages"] for fact in stage["facts"]]
+        facts = [event for event in events if event["event"] == "fact"]
+        self.assertEqual([{"event": "fact", **fact} for fact in explained], facts)
         self.assertEqual("result", events[-1]["event"])
 
     def test_stand_there_only_where_an_explanation_is_asked_for(self):
         run = self.example("first-generation").migrate(HOST)
-        self.assertEqual(([], []), (run.output, run.told("step")))
+        self.assertEqual(([], []), (run.output, run.told("fact")))
 
 
 class Progress(ExplainTest):

@@ -1,5 +1,6 @@
 """The trace: one JSON object a line, in the order in which things happened, whatever stands in them."""
 
+import calendar
 import json
 import os
 import stat
@@ -7,7 +8,7 @@ import threading
 import time
 import unittest
 
-from device_case import DeviceTest
+from device_case import PLUGINS, DeviceTest
 
 INCOMPLETE = "migration-host: the trace is incomplete: not every event could be written"
 TOLD = [
@@ -22,7 +23,7 @@ TOLD = [
     {"event": "cloud-tabs", "enabled": True},
     {"event": "cloud-tabs", "enabled": False},
     {"event": "console", "message": 'no UTF-8: \ufffd\ufffd\n"quoted"'},
-    {"event": "result", "dataClass": "directed", "success": True},
+    {"event": "result", "dataClass": "directed", "success": True, "verdict": "kept"},
 ]
 
 
@@ -38,12 +39,24 @@ class TraceTest(DeviceTest):
         run = self.run_directed("tell", "--trace", self.trace)
         self.assertEqual(0, run.status)
         self.assertEqual("", self.lines()[-1])
-        self.assertEqual(TOLD, [json.loads(line) for line in self.lines()[:-1]])
+        self.assertEqual(TOLD, [json.loads(line) for line in self.lines()[1:-1]])
+
+    def test_begins_with_what_is_run(self):
+        before = time.time()
+        self.run_directed("succeed", "--trace", self.trace, "--strict", "--explain=json", "--keep", "2", "--snapshots", self.scratch / "s")
+        start = json.loads(self.lines()[0])
+        given = ["--plugin=" + str(PLUGINS / "directed_migrator.so"), "--strict", "--explain=json", "--keep=2",
+                 f"--snapshots={self.scratch / 's'}"]
+        when = calendar.timegm(time.strptime(start.pop("time"), "%Y-%m-%dT%H:%M:%SZ"))
+        self.assertTrue(int(before) <= when <= time.time())
+        version = self.run_host("--version").output[0].split()[-1]
+        self.assertEqual({"event": "start", "schema": 1, "version": version, "root": str(self.scratch / "device"),
+                          "options": given}, start)
 
     def test_keeps_the_order_of_an_events_members(self):
         self.run_directed("tell", "--trace", self.trace)
-        self.assertEqual('{"event":"result","dataClass":"directed","success":true}', self.lines()[-2])
-        self.assertTrue(self.lines()[1].startswith('{"event":"log","subsystem":"com.example.test","category":"log",'))
+        self.assertEqual('{"event":"result","dataClass":"directed","success":true,"verdict":"kept"}', self.lines()[-2])
+        self.assertTrue(self.lines()[2].startswith('{"event":"log","subsystem":"com.example.test","category":"log",'))
 
     def test_passes_the_events_on(self):
         errors = self.run_directed("tell", "--trace", self.trace).errors
@@ -51,7 +64,9 @@ class TraceTest(DeviceTest):
 
     def test_tells_of_a_failed_run(self):
         self.assertEqual(1, self.run_directed("fail", "--trace", self.trace).status)
-        self.assertEqual(['{"event":"result","dataClass":"directed","success":false}', ""], self.lines())
+        self.assertEqual(
+            ['{"event":"result","dataClass":"directed","success":false,"verdict":"kept"}', ""], self.lines()[1:]
+        )
 
     def test_is_readable_by_its_owner_only(self):
         self.run_directed("succeed", "--trace", self.trace)
@@ -60,7 +75,7 @@ class TraceTest(DeviceTest):
     def test_is_appended_to(self):
         self.trace.write_text("earlier\n")
         self.run_directed("succeed", "--trace", self.trace)
-        self.assertEqual(["earlier", '{"event":"result","dataClass":"directed","success":true}', ""], self.lines())
+        self.assertEqual(["earlier", "start", "result"], [line.split('"')[3] if '"' in line else line for line in self.lines()[:-1]])
 
     def test_refuses_a_symbolic_link(self):
         self.trace.symlink_to(self.scratch / "target")

@@ -2,33 +2,27 @@
 
 #include <gtest/gtest.h>
 
-#include "host/explanation_output.h"
-#include "host/run_watch.h"
+#include "host/verdict.h"
+#include "platform/text.h"
 
 namespace tests {
 namespace {
 
+using namespace records;  // the facts
 using host::Explanation;
-using host::RunWatch;
-using records::RecordChange;
-using records::RunFact;
-using Kind = RunFact::Kind;
-using Lines = std::vector<std::string>;
+using host::Verdict;
 
-RunFact dropped(std::string_view identifier) {
-  return {
-      .kind = Kind::dropped, .subject = {.type = "Mail", .identifier = std::string{identifier}}, .reason = "a rule"};
+Fact dropped(std::string_view identifier) {
+  return Lost{.code = LossCode::droppedNoType, .account = {.type = "Mail", .identifier = std::string{identifier}}};
 }
 
-RunFact changed(RecordChange change) {
-  return {.kind = Kind::changed, .subject = {.type = "Mail", .identifier = "a"}, .changes = {std::move(change)}};
-}
+Fact changed(Change change) { return Changed{{.type = "Mail", .identifier = "a"}, {std::move(change)}}; }
 
-std::string textOf(const RunFact& fact) {
+std::string textOf(const Fact& fact, const Verdict& verdict = {}) {
   Explanation explanation;
   explanation.began("stage");
   explanation.add(fact);
-  return host::textOf(explanation, {.dataClass = "accounts", .success = true});
+  return host::textOf(explanation, verdict, {.dataClass = "accounts", .success = true});
 }
 
 bool contains(const std::string& text, std::string_view part) { return text.find(part) != std::string::npos; }
@@ -56,24 +50,6 @@ TEST(AnExplanation, LeavesOutStagesThatDidNothing) {
   EXPECT_TRUE(explanation.stages().empty());
 }
 
-TEST(AnExplanation, CountsFilesAsLostOnlyWhereNoSaveWentThrough) {
-  Explanation explanation;
-  explanation.add({.kind = Kind::saveFailed});
-  explanation.add({.kind = Kind::sourceRemoved, .path = "/mail"});
-  EXPECT_EQ(explanation.lostFiles(), Lines{"/mail"});
-  explanation.add({.kind = Kind::saved});
-  EXPECT_EQ(explanation.lostFiles(), Lines{});
-}
-
-TEST(AnExplanation, CountsAFileAsLostThatCouldNotBeConverted) {
-  Explanation explanation;
-  explanation.add({.kind = Kind::failed, .path = "/mail"});
-  explanation.add({.kind = Kind::saved});
-  explanation.add({.kind = Kind::sourceRemoved, .path = "/exchange"});
-  explanation.add({.kind = Kind::sourceRemoved, .path = "/mail"});
-  EXPECT_EQ(explanation.lostFiles(), Lines{"/mail"});
-}
-
 TEST(TheText, ShowsHowAKeyChanged) {
   EXPECT_TRUE(contains(textOf(changed({.key = "Port", .from = 1, .to = 2})), "    ~ Port: 1 -> 2\n"));
   EXPECT_TRUE(contains(textOf(changed({.key = "Port", .to = 2})), "    + Port: 2\n"));
@@ -96,10 +72,38 @@ TEST(TheText, CutsALongValueBetweenTwoCharacters) {
   EXPECT_TRUE(platform::isWellFormedText(text));
 }
 
+TEST(TheText, NeverCutsAListOfNames) {
+  platform::Array names;
+  for (const char* const name : {"Mail", "Contacts", "Calendars", "Reminders", "Bookmarks"}) {
+    names.emplace_back("com.vorlix.Dataclass." + std::string{name});
+  }
+  EXPECT_TRUE(contains(textOf(changed({.key = "Enabled Dataclasses", .to = names})), "Dataclass.Bookmarks\")\n"));
+}
+
+TEST(TheText, TellsAStepInWordsWithItsNameBeside) {
+  Explanation explanation;
+  explanation.began("_step:", "version 4 to 5: accounts get their own type");
+  explanation.add(dropped("a"));
+  EXPECT_TRUE(contains(host::textOf(explanation, {}, {}), "\nversion 4 to 5: accounts get their own type (_step:)\n"));
+}
+
+TEST(TheText, GivesTheCodeOfALossBesideItsText) {
+  EXPECT_TRUE(contains(textOf(dropped("a")), "  lost: Mail (a): it has no type [dropped-no-type]\n"));
+}
+
+TEST(TheText, EndsWithTheVerdictAndEachLoss) {
+  const Verdict lost{.kind = Verdict::Kind::lost, .lost = {{.code = LossCode::droppedNoType, .where = "/copy"}}};
+  EXPECT_TRUE(contains(textOf(dropped("a"), lost), "result: success; ACCOUNTS WERE LOST\n"));
+  EXPECT_TRUE(contains(textOf(dropped("a"), lost),
+                       "WARNING: lost: account: it has no type [dropped-no-type]; its data is still in /copy\n"));
+  const Verdict unsaved{.kind = Verdict::Kind::notSaved, .cause = "no space"};
+  EXPECT_TRUE(contains(textOf(dropped("a"), unsaved), "WARNING: the accounts were not saved: no space\n"));
+}
+
 TEST(TheText, HidesCredentialsWhereverTheyStand) {
   const std::string secret = "do not show me";
   const platform::Dictionary nested{{"Token", secret}};
-  const std::vector<RecordChange> changes{
+  const std::vector<Change> changes{
       {.key = "Password", .from = secret, .to = "x" + secret},
       {.key = "Passwords", .from = platform::Array{secret}, .to = platform::Array{}},
       {.key = "Harmless", .oldKey = "Password", .to = secret},
@@ -107,12 +111,11 @@ TEST(TheText, HidesCredentialsWhereverTheyStand) {
       {.key = "List", .from = platform::Array{nested}, .to = platform::Array{1}},
       {.key = "Blob", .to = platform::Bytes(secret.begin(), secret.end())},
   };
-  for (const RecordChange& change : changes) {
+  for (const Change& change : changes) {
     Explanation explanation;
     explanation.add(changed(change));
-    const host::Outcome outcome{.dataClass = "accounts"};
-    EXPECT_FALSE(contains(host::textOf(explanation, outcome), secret)) << change.key;
-    EXPECT_FALSE(contains(host::jsonDocumentOf(explanation, outcome), secret)) << change.key;
+    EXPECT_FALSE(contains(host::textOf(explanation, {}, {}), secret)) << change.key;
+    EXPECT_FALSE(contains(host::jsonDocumentOf(explanation, {}, {}), secret)) << change.key;
   }
 }
 

@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include "migrator/version_chain.h"
 #include "tests/support/fact_recorder.h"
 #include "tests/support/step_test.h"
 
@@ -49,6 +50,45 @@ TEST_F(ExplainedSteps, TellThatMailWentUnderANewParent) {
   const std::string parent = store->allBasicAccounts()[0]->identifier()->string();
   EXPECT_THAT(told("_migrateAccountsFrom8B117:"),
               ElementsAre("added " + parent, "moved N in " + parent + " into " + parent));
+}
+
+struct FailingMigrator {
+  bool fail(AccountsManager&) { return false; }
+};
+
+TEST_F(ExplainedSteps, TellWhichOfThemFailed) {
+  load({account("LDAP", "LDAPAccount", "L")}, 4);
+  FailingMigrator failing;
+  const VersionStep<FailingMigrator, AccountsManager> step{4, "_step:", "what it does", &FailingMigrator::fail};
+  EXPECT_FALSE(runAsStage(failing, step, *store));
+  EXPECT_THAT(told("_step:"), ElementsAre("lost (failed-step: _step: version 4 to 5: what it does)"));
+}
+
+class ExplainedConversions : public ExplainedSteps {
+ protected:
+  // What is told of a legacy mail file with this content.
+  std::vector<std::string> toldOf(const Dictionary& file) {
+    load({});
+    device.put(accountsettings::mailAccountsPath(), file);
+    static_cast<void>(migrator._migrateMailAccounts(*store));
+    return recorder->lines();
+  }
+};
+
+TEST_F(ExplainedConversions, TellOfEachAccountOfAFileOfWhichOneIsRefused) {
+  const Dictionary good{{"AccountType", "IMAPAccount"}, {"uniqueId", "G"}};
+  const std::string of = " of " + accountsettings::mailAccountsPath();
+  EXPECT_THAT(toldOf({{"DeliveryAccounts", Array{good}}, {"MailAccounts", Array{good, Dictionary{{"uniqueId", "B"}}}}}),
+              ElementsAre("lost G (refused-file: MailAccounts[0]" + of + ")",
+                          "lost B (refused-description: MailAccounts[1]" + of + ")",
+                          "lost G (refused-file: DeliveryAccounts[0]" + of + ")"));
+}
+
+TEST_F(ExplainedConversions, TellOfAFileThatCannotBeRead) {
+  load({});
+  device.files->put(accountsettings::mailAccountsPath(), "no property list");
+  static_cast<void>(migrator._migrateMailAccounts(*store));
+  EXPECT_THAT(recorder->lines(), ElementsAre(StartsWith("lost (unreadable-legacy-file: ")));
 }
 
 }  // namespace

@@ -31,8 +31,9 @@ class ThreeReleases {
 };
 
 using Step = VersionStep<ThreeReleases, Record>;
-constexpr std::array<Step, 3> kChain{
-    {{4, "first", &ThreeReleases::first}, {5, "second", &ThreeReleases::second}, {6, "third", &ThreeReleases::third}}};
+constexpr std::array<Step, 3> kChain{{{4, "first", "", &ThreeReleases::first},
+                                      {5, "second", "", &ThreeReleases::second},
+                                      {6, "third", "", &ThreeReleases::third}}};
 
 class VersionChain : public testing::Test {
  protected:

@@ -36,9 +36,9 @@ class ReportTest(BrowserTest):
 
     def simulated_rehearsal(self, number):
         account = {"type": "Mail", "name": f"Account {number}", "identifier": f"identifier-{number * 7919}"}
-        facts = [{"action": "changed", "account": account, "changes": [{"key": f"Key {each}", "to": each * number}]}
+        facts = [{"fact": "changed", "account": account, "changes": [{"key": f"Key {each}", "to": each * number}]}
                  for each in range(10)]
-        explanation = {"stages": [{"stage": "load", "steps": facts}], "result": {"success": True, "lost": []}}
+        explanation = {"stages": [{"stage": "load", "facts": facts}], "result": {"success": True, "verdict": "kept"}}
         losses = {f"code-{number // 10 % 5}": 1 + number % 3} if number % 10 == 0 else {}
         return Rehearsed(
             "lost" if losses else "kept", stored_version=number % 13, accounts=number % 40, losses=losses,

@@ -117,7 +117,7 @@ class LegacyFilesTest(LegacyCase):
         device.write("etc/passwd", "root:*:0:0::/var/root:/bin/sh\n")
         before = device.read(SETTINGS)
         run = device.migrate(HOST)
-        self.assertEqual(0, run.status)
+        self.assertEqual(6, run.status)
         self.assertEqual([MIGRATING], run.console())
         self.assertEqual("Failed to save accounts to filesystem.", run.messages()[-1])
         self.assertEqual(before, device.read(SETTINGS))
@@ -133,7 +133,7 @@ class LegacyFilesTest(LegacyCase):
         run = device.migrate(HOST)
         self.assertEqual(0, run.status)
         self.assertEqual([EARLY_RETURN], run.console())
-        self.assertEqual(["console", "result"], [event["event"] for event in run.events])
+        self.assertEqual(["start", "console", "result"], [event["event"] for event in run.events])
         self.assert_files(device, [SETTINGS, SETTINGS_COPY, AUTO_FETCH, RECORDS_SWITCH])
         self.assertEqual([before, before], [device.read(SETTINGS), device.read(SETTINGS_COPY)])
 

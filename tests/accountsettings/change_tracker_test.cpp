@@ -1,4 +1,4 @@
-#include "accountsettings/store_watch.h"
+#include "accountsettings/change_tracker.h"
 
 #include <stdexcept>
 
@@ -8,8 +8,7 @@
 namespace tests {
 namespace {
 
-using accountsettings::StoreWatch;
-using records::RunFact;
+using accountsettings::ChangeTracker;
 using Lines = std::vector<std::string>;
 
 class WatchedStore : public AccountStore {
@@ -27,21 +26,20 @@ class WatchedStore : public AccountStore {
 TEST_F(WatchedStore, TellsHowManyAccountsOfWhichVersionWereLoaded) {
   loadOutdated({properties("a"), properties("b")});
   ASSERT_EQ(recorder->facts.size(), 1U);
-  EXPECT_EQ(recorder->facts[0], (RunFact{.kind = RunFact::Kind::loaded, .count = 2, .version = 3}));
+  EXPECT_EQ(recorder->facts[0], (records::Fact{records::Loaded{2, 3}}));
 }
 
 TEST_F(WatchedStore, TellsByWhichRuleARecordIsLeftOut) {
   loadOutdated({"no dictionary", Dictionary{{"Identifier", "a"}, {"Class", "C"}},
                 Dictionary{{"Identifier", "b"}, {"Type", "Odd"}}, Dictionary{{"Identifier", "c"}, {"Type", "Mail"}}});
-  EXPECT_EQ(recorder->lines(), (Lines{"dropped (it is no account record)", "dropped a (it has no type)",
-                                      "dropped b (its type is unknown: \"Odd\")", "dropped c (it has no class)"}));
+  EXPECT_EQ(recorder->lines(), (Lines{"lost (dropped-no-record)", "lost a (dropped-no-type)",
+                                      "lost b (dropped-unknown-type: \"Odd\")", "lost c (dropped-no-class)"}));
 }
 
 TEST_F(WatchedStore, TellsOfRepairsWhileLoading) {
   loadOutdated({properties("a", {{"AccountPath", "Mail/IMAP-x"}}, "Mail"), properties("b", {}, "Mail")});
   EXPECT_EQ(recorder->lines(),
-            (Lines{"changed a: Class \"TestAccount\" -> \"IMAPAccount\"",
-                   "dropped b (the mail application does not know its class, and its AccountPath names none)"}));
+            (Lines{"changed a: Class \"TestAccount\" -> \"IMAPAccount\"", "lost b (dropped-unknown-class)"}));
 }
 
 TEST_F(WatchedStore, TellsOfAnIdentifierThatARecordIsGiven) {
@@ -58,23 +56,21 @@ TEST_F(WatchedStore, TellsWhatBecameOfTheAccountsWhenItIsLookedAt) {
   store->insertAccount(account("c"));
   store->_tellChanges();
   store->_tellChanges();
-  EXPECT_EQ(recorder->lines(), (Lines{"changed a: +Port 2", "added c", "dropped b (it was deleted)"}));
+  EXPECT_EQ(recorder->lines(), (Lines{"changed a: +Port 2", "added c", "lost b (deleted)"}));
 }
 
 TEST_F(WatchedStore, TellsWhyAccountsOfAReplacedTypeWent) {
   const Store store = loadOutdated({properties("a", {}, "SMTP"), properties("b", {}, "SMTP")});
   store->replaceAccountsWithTypes_withAccounts({"SMTP"}, {account("b", {{"Port", 2}}, "SMTP")});
   store->_tellChanges();
-  EXPECT_EQ(recorder->lines(),
-            (Lines{"changed b: +Port 2",
-                   "dropped a (the accounts of its type were replaced, and it is none of the new ones)"}));
+  EXPECT_EQ(recorder->lines(), (Lines{"changed b: +Port 2", "lost a (replaced-with-type)"}));
 }
 
 TEST_F(WatchedStore, TellsIntoWhichAccountsOneWasFolded) {
   const Store store = loadOutdated({properties("a"), properties("b"), properties("c")});
   const Account folded = store->accountWithIdentifier("a");
   for (const std::string_view into : {"b", "c"}) {
-    store->_runWatch()->willBeFolded(*folded, *store->accountWithIdentifier(into), "the same user");
+    store->_changeTracker()->willBeFolded(*folded, *store->accountWithIdentifier(into), "the same user");
   }
   store->deleteAccount(folded);
   store->_tellChanges();
@@ -84,7 +80,7 @@ TEST_F(WatchedStore, TellsIntoWhichAccountsOneWasFolded) {
 TEST_F(WatchedStore, TellsFromWhatAnAccountWasConverted) {
   const Store store = loadOutdated({});
   const Account made = account("a");
-  store->_runWatch()->comesFrom(*made, {{"uniqueId", "a"}, {"Class", "TestAccount"}}, "MailAccounts[0]");
+  store->_changeTracker()->comesFrom(*made, {{"uniqueId", "a"}, {"Class", "TestAccount"}}, "MailAccounts[0]", "/mail");
   store->insertAccount(made);
   store->_tellChanges();
   EXPECT_EQ(recorder->lines(), Lines{"converted a: uniqueId now Identifier \"a\", +Type \"CalDAV\" (MailAccounts[0])"});
@@ -98,15 +94,15 @@ TEST_F(WatchedStore, TellsOfASaveAndWhatStageItsChangesBelongTo) {
   EXPECT_EQ(recorder->lines(), (Lines{"added b", "changed b: Class \"TestAccount\" -> \"POPAccount\""}));
   EXPECT_EQ(recorder->stages, (Lines{"", "", "save", "save"}));
   EXPECT_EQ(recorder->facts.back(),
-            (RunFact{.kind = RunFact::Kind::saved, .path = kSettingsFile.string(), .count = 2, .version = 12}));
+            (records::Fact{records::Saved{kSettingsFile.string(), 2, AccountsManager::currentVersion()}}));
 }
 
 TEST_F(WatchedStore, TellsWhyASaveFailed) {
   const Store store = loadOutdated({properties("a")});
   device.files->failing.insert("rename");
   store->saveAllAccounts();
-  EXPECT_EQ(recorder->facts.back().kind, RunFact::Kind::saveFailed);
-  EXPECT_TRUE(recorder->facts.back().reason.starts_with("Could not rename ")) << recorder->facts.back().reason;
+  const auto& failed = std::get<records::SaveFailed>(recorder->facts.back());
+  EXPECT_TRUE(failed.cause.starts_with("Could not rename ")) << failed.cause;
 }
 
 TEST_F(WatchedStore, TellsOnceOfWhatEverySaveDoes) {
@@ -114,9 +110,7 @@ TEST_F(WatchedStore, TellsOnceOfWhatEverySaveDoes) {
   store->insertAccount(account("a", {}, "Mail"));
   store->saveAllAccounts();
   store->saveAllAccounts();
-  EXPECT_EQ(
-      recorder->lines(),
-      (Lines{"added a", "kept a (the mail application does not know its class, and its AccountPath names none)"}));
+  EXPECT_EQ(recorder->lines(), (Lines{"added a", "kept a (its class is unknown and no directory tells a better one)"}));
 }
 
 TEST_F(WatchedStore, TellsWhatTheFileKeptOfAnAccountThatSomebodyElseChanged) {
@@ -124,6 +118,32 @@ TEST_F(WatchedStore, TellsWhatTheFileKeptOfAnAccountThatSomebodyElseChanged) {
   putFile({properties("a", {{"Port", 2}})});
   store->saveAllAccounts();
   EXPECT_EQ(recorder->lines(), Lines{"changed a: Port 1 -> 2"});
+}
+
+TEST_F(WatchedStore, TellsOfARecordThatAnotherOneWithItsIdentifierReplaces) {
+  const Store store = loadOutdated({properties("a", {{"Port", 1}}), properties("a", {{"Port", 2}})});
+  store->saveAllAccounts();
+  store->saveAllAccounts();
+  EXPECT_EQ(recorder->lines(), Lines{"lost a (replaced-duplicate)"});
+}
+
+TEST_F(WatchedStore, TellsOfAnAccountThatItsParentsRecordReplaces) {
+  const Store store = loadOutdated({properties("p", {{"ChildAccounts", Array{properties("c")}}})});
+  store->insertAccount(account("c"));
+  store->saveAllAccounts();
+  EXPECT_EQ(recorder->lines().back(), "lost c (replaced-duplicate)");
+}
+
+TEST_F(WatchedStore, TellsOfNoLossWhereTwoRecordsAreAlike) {
+  loadOutdated({properties("a"), properties("a")})->saveAllAccounts();
+  EXPECT_EQ(recorder->lines(), Lines{});
+}
+
+TEST_F(WatchedStore, TellsThatAFileIsOfANewerVersion) {
+  putFile({properties("a")}, static_cast<std::int64_t>(AccountsManager::currentVersion()) + 1);
+  AccountsManager::initInsideOfMigration();
+  const std::string newer = std::to_string(AccountsManager::currentVersion() + 1);
+  EXPECT_EQ(recorder->lines(), Lines{"lost (newer-settings-file: version " + newer + ")"});
 }
 
 // Hears of stages and wants no facts.
@@ -134,23 +154,25 @@ class StageObserver final : public platform::RunObserver {
 };
 
 TEST_F(WatchedStore, IsWatchedByNobodyWhereNobodyWantsFacts) {
-  const std::size_t before = StoreWatch::statesTaken();
+  const std::size_t before = ChangeTracker::statesTaken();
   for (const auto& observer : {std::shared_ptr<platform::RunObserver>{std::make_shared<StageObserver>()}, {}}) {
     device.setObserver(observer);
     const Store store = loadOutdated({properties("a")});
     store->insertAccount(account("b"));
     store->saveAllAccounts();
-    EXPECT_EQ(store->_runWatch(), nullptr);
+    EXPECT_EQ(store->_changeTracker(), nullptr);
   }
-  EXPECT_EQ(StoreWatch::statesTaken(), before);
+  EXPECT_EQ(ChangeTracker::statesTaken(), before);
 }
 
 class FailingObserver final : public records::FactObserver {
  public:
   int calls = 0;
+  bool hasLostTrack = false;
   void stageBegan(std::string_view, std::string_view) override {}
   void stageEnded(std::string_view) override {}
-  void told(const RunFact&) override {
+  void lostTrack() noexcept override { hasLostTrack = true; }
+  void told(const records::Fact&) override {
     ++calls;
     throw std::runtime_error{"observer"};
   }
@@ -164,6 +186,7 @@ TEST_F(WatchedStore, IsAsItWouldBeWithAnObserverThatFails) {
   store->saveAllAccounts();
   EXPECT_EQ(fileAccounts().size(), 2U);
   EXPECT_EQ(failing->calls, 1);
+  EXPECT_TRUE(failing->hasLostTrack);
 }
 
 }  // namespace

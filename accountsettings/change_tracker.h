@@ -18,53 +18,56 @@ namespace accountsettings {
 // when it was last looked at, so that whatever changes accounts is told of without doing anything for it. Who knows
 // more than can be seen (why an account goes, where one comes from) says it here before it happens.
 //
-// A store has a watch only where an observer wants facts; without one nothing is copied, compared or kept. Nothing that
-// goes wrong here reaches the store: the watch falls silent instead.
-class ACCOUNT_EXPORT StoreWatch {
+// A store has a tracker only where an observer wants facts; without one nothing is copied, compared or kept. Nothing
+// that goes wrong here reaches the store: the tracker falls silent instead.
+class ACCOUNT_EXPORT ChangeTracker {
  public:
   using Accounts = std::vector<std::shared_ptr<BasicAccount>>;
 
   // Null where nobody wants to know.
-  [[nodiscard]] static std::unique_ptr<StoreWatch> ofRun();
+  [[nodiscard]] static std::unique_ptr<ChangeTracker> ofRun();
   // How many states of stores were ever copied in this process.
   [[nodiscard]] static std::size_t statesTaken();
 
   // --- Loading: each element of the file, then the store ---
   void leftOut(const PropertyValue& element);  // no account could be made of it
   void loaded(const PropertyValue& element, const BasicAccount& account);
-  void givenUp(const PropertyValue& element, std::string_view rule);
+  void givenUp(const PropertyValue& element, records::LossCode code);
+  void readFile(const platform::Status& status);  // how that ended
   void loadedAll(const Accounts& accounts, std::uint64_t version);
 
-  // --- What is known of an account beforehand; of several rules the first counts ---
-  void willGo(const BasicAccount& account, std::string_view rule);
+  // --- What is known of an account beforehand; what is said first counts ---
+  void willGo(const BasicAccount& account, records::LossCode code);
   void willBeFolded(const BasicAccount& account, const BasicAccount& into, std::string_view rule);
-  // It is made of this legacy description, which lay at `origin`.
-  void comesFrom(const BasicAccount& account, const Dictionary& description, std::string origin);
+  // It is made of this description in the legacy file; `place` says to people where in it.
+  void comesFrom(const BasicAccount& account, const Dictionary& description, std::string place, std::string file);
 
   // Tells what became of the accounts since the last call.
   void look(const Accounts& accounts);
 
   // --- Saving: what could not be repaired, what was written in place of the accounts, and how that ended. What is as
   // it was at the last save is not told again. ---
-  void unrepaired(const BasicAccount& account, std::string_view rule);
+  void unrepaired(const BasicAccount& account, records::LossCode fault);
   void written(const Accounts& accounts, const Array& records);
   void savedAll(std::size_t count, std::uint64_t version, const std::string& path, const platform::Status& status);
 
  private:
   struct Departure {
-    std::string rule;
-    std::vector<records::RecordName> into;
+    records::LossCode code{};
+    std::string reason{};  // of one that is folded
+    std::vector<records::Name> into{};
   };
   struct Origin {
     std::string place;
+    std::string file;
     Dictionary description;
   };
 
-  explicit StoreWatch(std::shared_ptr<records::FactObserver> observer) : _observer{std::move(observer)} {}
+  explicit ChangeTracker(std::shared_ptr<records::FactObserver> observer) : _observer{std::move(observer)} {}
   template <typename Action>
   void attempt(const Action& action) noexcept;
   void tell(const Difference& difference);
-  void tellGone(records::RunFact fact, const BasicAccount* account);
+  void tellGone(const records::Lost& lost, const BasicAccount* account);
   void tellConverted(const Difference& difference, const Origin& origin);
   [[nodiscard]] bool wasToldAtLastSave(std::size_t place) const;
 
@@ -72,8 +75,8 @@ class ACCOUNT_EXPORT StoreWatch {
   StoreState _known;
   std::unordered_map<const BasicAccount*, Departure> _departures;
   std::unordered_map<const BasicAccount*, Origin> _origins;
-  std::vector<records::RunFact> _atLastSave;
-  std::vector<records::RunFact> _atThisSave;
+  std::vector<records::Fact> _atLastSave;
+  std::vector<records::Fact> _atThisSave;
 };
 
 }  // namespace accountsettings
