@@ -1,6 +1,5 @@
 #include "platform/linux/linux_platform.h"
 
-#include "platform/default_platform.h"
 #include "platform/linux/device/device_configuration.h"
 #include "platform/linux/device/linux_clock.h"
 #include "platform/linux/device/linux_localized_strings.h"
