@@ -104,7 +104,8 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
   if (session) ended = session->end(endOf(watchers.watch->explanation(), outcome), options.snapshots.keep);
   if (watchers.trace) {
     watchers.trace->result(migrator.dataClassName(), success);
-    if (!watchers.trace->complete()) say("the trace is incomplete: not every event could be written");
+    const platform::Status& traced = watchers.trace->outcome();
+    if (!traced.isOk()) say("the trace is incomplete: not every event could be written: " + traced.reason());
   }
   explain(options, watchers, outcome);
   if (ended == snapshots::Ended::rolledBack) {
