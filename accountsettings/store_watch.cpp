@@ -4,6 +4,7 @@
 #include <atomic>
 #include <utility>
 
+#include "accountsettings/accounts_manager.h"
 #include "accountsettings/vocabulary.h"
 #include "platform/description.h"
 #include "platform/run_stage.h"
@@ -33,16 +34,16 @@ Dictionary propertiesIn(const PropertyValue& element) {
 }
 
 // Why no account can be made of a file's element.
-std::string faultOf(const PropertyValue& element) {
-  const Dictionary* const properties = element.asDictionary();
-  if (properties == nullptr) return "it is no account record";
-  const PropertyValue* const type = properties->find(kAccountType);
-  if (type == nullptr) return "it has no type";
-  const Text* const name = type->asText();
-  if (name == nullptr || !BasicAccount::_isValidAccountType(*name)) {
-    return "its type is unknown: " + platform::description(*type);
+std::string faultOf(const LeftOutRecord& record) {
+  switch (record.why) {
+    case WhyLeftOut::noRecord: return "it is no account record";
+    case WhyLeftOut::noType: return "it has no type";
+    case WhyLeftOut::unknownType:
+      return "its type is unknown: " + platform::description(*record.element.asDictionary()->find(kAccountType));
+    case WhyLeftOut::noClass: return "it has no class";
+    case WhyLeftOut::givenUp: return "it is beyond repair";
   }
-  return "it has no class";
+  return {};
 }
 
 }  // namespace
@@ -65,8 +66,8 @@ void StoreWatch::attempt(const Action& action) noexcept {
 
 // --- Loading ---
 
-void StoreWatch::leftOut(const PropertyValue& element) {
-  attempt([&] { givenUp(element, faultOf(element)); });
+void StoreWatch::leftOut(const LeftOutRecord& record) {
+  attempt([&] { givenUp(record.element, faultOf(record)); });
 }
 
 void StoreWatch::givenUp(const PropertyValue& element, std::string_view rule) {
@@ -83,9 +84,14 @@ void StoreWatch::loaded(const PropertyValue& element, const BasicAccount& accoun
   });
 }
 
-void StoreWatch::loadedAll(const Accounts& accounts, std::uint64_t version) {
+void StoreWatch::loadedAll(const Accounts& accounts, const LoadOutcome& outcome) {
   attempt([&] {
     _known = stateOf(accounts);
+    if (outcome.hasUnreadFile()) {
+      const std::string path = AccountsManager::fullPathToAccountSettingsPlist();
+      _observer->told({.kind = Kind::unread, .reason = outcome.reading.reason(), .path = path});
+    }
+    const auto version = static_cast<std::uint64_t>(outcome.storedVersion.value_or(0));
     _observer->told({.kind = Kind::loaded, .count = accounts.size(), .version = version});
   });
 }
@@ -173,14 +179,15 @@ void StoreWatch::written(const Accounts& accounts, const Array& records) {
 }
 
 void StoreWatch::savedAll(std::size_t count, std::uint64_t version, const std::string& path,
-                          const platform::Status& status) {
+                          const SaveOutcome& outcome) {
   attempt([&] {
     for (std::size_t place = 0; place < _atThisSave.size(); ++place) {
       if (!wasToldAtLastSave(place)) _observer->told(_atThisSave[place]);
     }
     _atLastSave = std::exchange(_atThisSave, {});
-    const Kind kind = status.isOk() ? Kind::saved : Kind::saveFailed;
-    _observer->told({.kind = kind, .reason = status.description(), .path = path, .count = count, .version = version});
+    const Kind kind = outcome.isSaved() ? Kind::saved : Kind::saveFailed;
+    _observer->told(
+        {.kind = kind, .reason = outcome.status.description(), .path = path, .count = count, .version = version});
   });
 }
 

@@ -8,9 +8,9 @@
 #include <vector>
 
 #include "accountsettings/record_changes.h"
+#include "accountsettings/store_outcomes.h"
 #include "platform/export.h"
 #include "platform/run_observer.h"
-#include "platform/status.h"
 
 namespace accountsettings {
 
@@ -30,10 +30,10 @@ class ACCOUNT_EXPORT StoreWatch {
   [[nodiscard]] static std::size_t statesTaken();
 
   // --- Loading: each element of the file, then the store ---
-  void leftOut(const PropertyValue& element);  // no account could be made of it
+  void leftOut(const LeftOutRecord& record);  // no account could be made of it
   void loaded(const PropertyValue& element, const BasicAccount& account);
   void givenUp(const PropertyValue& element, std::string_view rule);
-  void loadedAll(const Accounts& accounts, std::uint64_t version);
+  void loadedAll(const Accounts& accounts, const LoadOutcome& outcome);
 
   // --- What is known of an account beforehand; of several rules the first counts ---
   void willGo(const BasicAccount& account, std::string_view rule);
@@ -48,7 +48,7 @@ class ACCOUNT_EXPORT StoreWatch {
   // it was at the last save is not told again. ---
   void unrepaired(const BasicAccount& account, std::string_view rule);
   void written(const Accounts& accounts, const Array& records);
-  void savedAll(std::size_t count, std::uint64_t version, const std::string& path, const platform::Status& status);
+  void savedAll(std::size_t count, std::uint64_t version, const std::string& path, const SaveOutcome& outcome);
 
  private:
   struct Departure {

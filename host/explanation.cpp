@@ -41,12 +41,21 @@ void Explanation::forEachFact(const Action& action) const {
   }
 }
 
-const RunFact* Explanation::lastSave() const {
+template <typename Condition>
+const RunFact* Explanation::lastFact(const Condition& condition) const {
   const RunFact* last = nullptr;
-  forEachFact([&last](const RunFact& fact) {
-    if (fact.kind == RunFact::Kind::saved || fact.kind == RunFact::Kind::saveFailed) last = &fact;
+  forEachFact([&](const RunFact& fact) {
+    if (condition(fact.kind)) last = &fact;
   });
   return last;
+}
+
+const RunFact* Explanation::lastSave() const {
+  return lastFact([](RunFact::Kind kind) { return kind == RunFact::Kind::saved || kind == RunFact::Kind::saveFailed; });
+}
+
+const RunFact* Explanation::unreadFile() const {
+  return lastFact([](RunFact::Kind kind) { return kind == RunFact::Kind::unread; });
 }
 
 std::vector<std::string> Explanation::lostFiles() const {

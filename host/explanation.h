@@ -31,12 +31,16 @@ class Explanation {
   [[nodiscard]] std::string_view outerStage() const;
   // How the last attempt to save ended; null where there was none.
   [[nodiscard]] const platform::RunFact* lastSave() const;
+  // The settings file that stood there and could not be read; null where there was none.
+  [[nodiscard]] const platform::RunFact* unreadFile() const;
   // The removed files whose accounts are on the device no longer, since they could not be converted or no save of them
   // went through.
   [[nodiscard]] std::vector<std::string> lostFiles() const;
   [[nodiscard]] std::size_t count(platform::RunFact::Kind kind) const;
 
  private:
+  template <typename Condition>
+  [[nodiscard]] const platform::RunFact* lastFact(const Condition& condition) const;
   template <typename Action>
   void forEachFact(const Action& action) const;
 

@@ -125,6 +125,7 @@ std::string shown(const RunFact& fact) {
   const std::string subject = shown(fact.subject);
   switch (fact.kind) {
     case Kind::loaded: return "";
+    case Kind::unread: return "  NOT READ: " + fact.path + because(fact);
     case Kind::added: return "  added: " + subject + "\n";
     case Kind::converted: return "  converted: " + subject + " from " + fact.reason + "\n" + conversionOf(fact);
     case Kind::changed: return "  " + subject + "\n" + changesOf(fact);
@@ -189,8 +190,16 @@ std::string result(const Explanation& explanation, const Outcome& outcome) {
          tally(explanation) + "\n";
 }
 
+// What became of the file that stood in the place of the settings and could not be read.
+std::string fateOfUnread(const RunFact& unread, const RunFact* save) {
+  const std::string text = "\nWARNING: " + unread.path + " could not be read";
+  if (save == nullptr || save->kind != Kind::saved) return text + "; it is still there.\n";
+  return text + "; " + (save->count == 0 ? "an empty one" : "another one") + " was put in its place.\n";
+}
+
 std::string warnings(const Explanation& explanation) {
   std::string text;
+  if (const RunFact* const unread = explanation.unreadFile()) text += fateOfUnread(*unread, explanation.lastSave());
   for (const std::string& file : explanation.lostFiles()) {
     text += "\nWARNING: the accounts of " + file + " are lost: the file was removed although they were not saved.\n";
   }

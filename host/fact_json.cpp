@@ -16,9 +16,10 @@ using platform::RecordName;
 using platform::RunFact;
 
 // In the order of the kinds.
-constexpr std::array<std::string_view, 15> kActions{
-    "loaded", "added",  "converted", "changed",     "moved",        "folded",         "dropped",         "repeated",
-    "kept",   "failed", "saved",     "save-failed", "file-removed", "source-removed", "file-not-removed"};
+constexpr std::array<std::string_view, 16> kActions{
+    "loaded",         "load-failed",     "added", "converted", "changed", "moved",       "folded",
+    "dropped",        "repeated",        "kept",  "failed",    "saved",   "save-failed", "file-removed",
+    "source-removed", "file-not-removed"};
 
 Json jsonOfInteger(PropertyValue::Integer integer) {
   return integer.isAboveInt64 ? Json(integer.bits) : Json(static_cast<std::int64_t>(integer.bits));

@@ -80,14 +80,10 @@ void explain(const Options& options, const Watchers& watchers, const Outcome& ou
   if (!commandline::print(text)) say("the explanation could not be written to standard output");
 }
 
-bool isSaved(const Explanation& explanation) {
-  const platform::RunFact* const save = explanation.lastSave();
-  return save == nullptr || save->kind != platform::RunFact::Kind::saveFailed;
-}
-
-snapshots::RunEnd endOf(const Explanation& explanation, const Outcome& outcome) {
+snapshots::RunEnd endOf(const RunWatch& watch, const Outcome& outcome) {
+  const Explanation& explanation = watch.explanation();
   snapshots::RunEnd end{.isMigrated = outcome.success,
-                        .isSaved = isSaved(explanation),
+                        .isSaved = !watch.hasLastSaveFailed(),
                         .onlyInSnapshot = {},
                         .explanation = textOf(explanation, outcome),
                         .explanationAsJson = jsonDocumentOf(explanation, outcome)};
@@ -101,7 +97,7 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
   watchers.progress->clear();
   const Outcome outcome{.dataClass = migrator.dataClassName(), .success = success, .isRehearsal = options.isRehearsal};
   auto ended = snapshots::Ended::asItIs;
-  if (session) ended = session->end(endOf(watchers.watch->explanation(), outcome), options.snapshots.keep);
+  if (session) ended = session->end(endOf(*watchers.watch, outcome), options.snapshots.keep);
   if (watchers.trace) {
     watchers.trace->result(migrator.dataClassName(), success);
     const platform::Status& traced = watchers.trace->outcome();

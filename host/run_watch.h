@@ -7,6 +7,7 @@
 #include "host/progress_line.h"
 #include "host/trace.h"
 #include "platform/platform.h"
+#include "platform/status.h"
 
 namespace host {
 
@@ -22,8 +23,12 @@ class RunWatch final : public platform::RunObserver {
   void stageEnded(std::string_view stage) override;
   [[nodiscard]] bool wantsFacts() const override { return _isExplained; }
   void told(const platform::RunFact& fact) override;
+  void saveBegan() override { _hasLastSaveFailed = true; }
+  void saveEnded(const platform::Status& status) override { _hasLastSaveFailed = !status.isOk(); }
   void progressed(std::size_t done, std::size_t total) override;
 
+  // Whether there was a save and the last one came to nothing, whatever ended it.
+  [[nodiscard]] bool hasLastSaveFailed() const { return _hasLastSaveFailed; }
   [[nodiscard]] const Explanation& explanation() const { return _explanation; }
 
  private:
@@ -32,6 +37,7 @@ class RunWatch final : public platform::RunObserver {
 
   std::shared_ptr<Trace> _trace;
   bool _isExplained;
+  bool _hasLastSaveFailed = false;
   std::shared_ptr<ProgressLine> _progress;
   Explanation _explanation;
 };

@@ -35,6 +35,7 @@ struct RecordChange {
 struct RunFact {
   enum class Kind : std::uint8_t {
     loaded,         // records were read: `count`, `version`; no subject
+    unread,         // the file `path` stands there and none of its records was read; `reason`; no subject
     added,          // a new record
     converted,      // a new record, or one in place of that with its identifier: `reason` is from what, and `changes`
     changed,        // a record: `changes`

@@ -6,6 +6,7 @@
 namespace platform {
 
 struct RunFact;
+class Status;
 
 // Is told of each stage of a migration run as it begins and ends, stages within stages included, and of what each did.
 // Silent by default: nothing is computed for an observer that is not there, and no fact for one that wants none.
@@ -19,6 +20,9 @@ class RunObserver {
   [[nodiscard]] virtual bool wantsFacts() const { return false; }
   // One fact of the stage that began last and has not ended, in the order in which they are found out.
   virtual void told(const RunFact& /*fact*/) {}
+  // An attempt to save begins, and ends; one that an exception ends is not told to end.
+  virtual void saveBegan() {}
+  virtual void saveEnded(const Status& /*status*/) {}
   // How many of its records the present stage is done with; told every few hundred of them.
   virtual void progressed(std::size_t /*done*/, std::size_t /*total*/) {}
 };

@@ -6,7 +6,7 @@ import pty
 import subprocess
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL
+from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS
 from device_case import HOST, PLUGINS, DeviceTest
 
 MOVED_BY = "_migrateAccountsFrom8B117:"
@@ -79,6 +79,14 @@ class Machines(ExplainTest):
         repaired = [step["changes"] for step in changed if step["in"] == "save"]
         self.assertEqual([[{"key": "Class", "from": "MailAccount", "to": "POPAccount"}]], repaired)
 
+    def test_are_told_of_settings_that_could_not_be_read(self):
+        device = self.device()
+        device.write(SETTINGS, "bplist00 but no more")
+        self.assertEqual(
+            [{"in": "load", "action": "load-failed", "reason": "it is no property list, or not a whole one",
+              "file": str(device.path(SETTINGS))}],
+            self.steps(device, "load-failed"))
+
     def test_are_told_of_files_that_went(self):
         device = self.example("legacy-files")
         removed = [step["file"] for step in self.steps(device, "source-removed")]
@@ -106,6 +114,28 @@ class People(ExplainTest):
         device = self.device(Version=12, Accounts=[account(f"a{n}", "Unheard of") for n in range(100)])
         dropped = [line for line in self.text(device) if line.startswith("  dropped: ")]
         self.assertEqual(100, len(dropped))
+
+    def cut_off(self):
+        """A device whose settings file ends after three fifths, and what it was before."""
+        device = self.example("current")
+        settings = device.path(SETTINGS)
+        settings.write_bytes(settings.read_bytes()[:settings.stat().st_size * 6 // 10])
+        return device
+
+    def test_are_told_that_the_settings_could_not_be_read_and_what_was_put_in_their_place(self):
+        for options in ((), ("--dry-run",)):
+            with self.subTest(options=options):
+                device = self.cut_off()
+                path = device.path(SETTINGS)
+                lines = self.text(device, *options)
+                self.assertIn(f"  NOT READ: {path}: it is no property list, or not a whole one", lines)
+                self.assertIn(f"WARNING: {path} could not be read; an empty one was put in its place.", lines)
+                self.assertNotIn("No account was changed.", lines)
+
+    def test_are_told_that_a_file_that_could_not_be_read_is_still_there_where_nothing_was_saved(self):
+        device = self.cut_off()
+        device.write("etc/passwd", "root:*:0:0::/var/root:/bin/sh\n")
+        self.assertIn(f"WARNING: {device.path(SETTINGS)} could not be read; it is still there.", self.text(device))
 
     def test_are_warned_when_legacy_files_went_although_the_save_failed(self):
         device = self.example("legacy-files")

@@ -10,8 +10,9 @@ namespace {
 using platform::RecordChange;
 using platform::RunFact;
 
-constexpr std::array kNames{"loaded", "added",  "converted", "changed",    "moved",   "folded",  "dropped",  "repeated",
-                            "kept",   "failed", "saved",     "saveFailed", "removed", "removed", "unremoved"};
+constexpr std::array kNames{"loaded",     "unread",  "added",    "converted", "changed", "moved",
+                            "folded",     "dropped", "repeated", "kept",      "failed",  "saved",
+                            "saveFailed", "removed", "removed",  "unremoved"};
 
 std::string shown(const RecordChange& change) {
   const std::string to = change.to ? platform::description(*change.to) : "";

@@ -180,7 +180,7 @@ class Scan {
   [[nodiscard]] bool push(Open kind) {
     _open.push_back(kind);
     if (kind != Open::plist) _containers.push_back({kind == Open::dictionary});
-    return _containers.size() <= kDeepestNesting || refuse(Cause::excessive);
+    return _containers.size() <= kDeepestNesting || giveUp(Cause::excessive);
   }
 
   [[nodiscard]] bool pop(Open kind) {
@@ -196,7 +196,7 @@ class Scan {
     const bool isContainer = tag.name == "dict" || tag.name == "array";
     const bool isRoot = _containers.empty();
     if (isRoot && tag.name != "dict")
-      return refuse(isContainer || isScalar(tag.name) ? Cause::unsuitable : Cause::malformed);
+      return giveUp(isContainer || isScalar(tag.name) ? Cause::unsuitable : Cause::malformed);
     if (isRoot && tag.isEmpty) return keepEmptyRoot();
     if (tag.isEmpty) return isContainer || isScalar(tag.name);
     if (isContainer) return push(tag.name == "dict" ? Open::dictionary : Open::array);
@@ -265,7 +265,7 @@ class Scan {
       const std::span<char> text = _file.subspan(part.begin, part.end - part.begin);
       if (!part.isVerbatim) _movedBytes += repairXmlText(text) * text.size();
     }
-    return _movedBytes <= kMostMovedBytes || refuse(Cause::excessive);
+    return _movedBytes <= kMostMovedBytes || giveUp(Cause::excessive);
   }
 
   [[nodiscard]] bool countKey(const Tag& tag) {
@@ -273,7 +273,7 @@ class Scan {
     const std::string_view key = _text.substr(_parts.front().begin, _parts.front().end - _parts.front().begin);
     const bool isPlain = _parts.size() == 1 && key.find('&') == std::string_view::npos;
     _keySteps += _containers.back().keys.add(key, isPlain);
-    return _keySteps <= kMostKeySteps || refuse(Cause::excessive);
+    return _keySteps <= kMostKeySteps || giveUp(Cause::excessive);
   }
 
   // libplist takes of data no more than stands before the first comment.
@@ -284,7 +284,7 @@ class Scan {
     }
   }
 
-  [[nodiscard]] bool refuse(Cause cause) {
+  [[nodiscard]] bool giveUp(Cause cause) {
     _refusal = cause;
     return false;
   }
