@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <cerrno>
+
 #include "host/explanation_output.h"
 #include "host/run_watch.h"
 
@@ -120,6 +122,31 @@ TEST(AWatch, WantsFactsOnlyForAnExplanation) {
   const auto progress = std::make_shared<host::ProgressLine>(-1);
   EXPECT_FALSE((RunWatch{nullptr, false, progress}.wantsFacts()));
   EXPECT_TRUE((RunWatch{nullptr, true, progress}.wantsFacts()));
+}
+
+TEST(ARunWatch, KnowsWhetherTheLastSaveFailed) {
+  RunWatch watch{nullptr, false, nullptr};
+  EXPECT_FALSE(watch.hasLastSaveFailed());
+  watch.saveBegan();
+  EXPECT_TRUE(watch.hasLastSaveFailed());  // as where an exception ends it
+  watch.saveEnded({});
+  EXPECT_FALSE(watch.hasLastSaveFailed());
+  watch.saveBegan();
+  watch.saveEnded(platform::Status::failure(EIO, "rename"));
+  EXPECT_TRUE(watch.hasLastSaveFailed());
+}
+
+TEST(AnExplanation, SaysWhatBecameOfSettingsThatCouldNotBeRead) {
+  const RunFact unread{.kind = Kind::unread, .reason = "why", .path = "/settings"};
+  const RunFact empty{.kind = Kind::saved, .path = "/settings", .count = 0, .version = 12};
+  Explanation explanation;
+  explanation.began("load");
+  explanation.add(unread);
+  const host::Outcome outcome{.dataClass = "accounts", .success = true};
+  EXPECT_TRUE(contains(host::textOf(explanation, outcome), "\n  NOT READ: /settings: why\n"));
+  EXPECT_TRUE(contains(host::textOf(explanation, outcome), "/settings could not be read; it is still there.\n"));
+  explanation.add(empty);
+  EXPECT_TRUE(contains(host::textOf(explanation, outcome), "could not be read; an empty one was put in its place.\n"));
 }
 
 }  // namespace
