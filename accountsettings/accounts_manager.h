@@ -10,6 +10,7 @@
 
 #include "accountsettings/basic_account.h"
 #include "accountsettings/runtime_fixer.h"
+#include "accountsettings/store_outcomes.h"
 #include "platform/exclusive_file_lock.h"
 #include "platform/export.h"
 #include "platform/file_system.h"
@@ -50,9 +51,13 @@ class ACCOUNT_EXPORT AccountsManager {
   ~AccountsManager();
 
   // Repairs, merges and writes the file as data version 12, whatever version was loaded. The file is the old one or the
-  // new one, never in between. Success is seen only in the log and in whether notifications follow; after a failure the
-  // accounts and what they are compared with are as before. Accounts that only the file holds are dropped from it.
+  // new one, never in between. Success is seen in the log, in whether notifications follow, and in `lastSaveOutcome`;
+  // after a failure the accounts and what they are compared with are as before. Accounts that only the file holds are
+  // dropped from it.
   void saveAllAccounts();
+  // Internal: how the store came by its accounts, and how its last save ended.
+  [[nodiscard]] const LoadOutcome& loadOutcome() const { return _loadOutcome; }
+  [[nodiscard]] const SaveOutcome& lastSaveOutcome() const { return _lastSaveOutcome; }
   // Internal: takes the state against which the next save's change notifications are computed.
   void _setOriginalAccountDictionaries();
   // Internal: new fixers, one of each kind; the store asks its own at each load and each save.
@@ -150,20 +155,22 @@ class ACCOUNT_EXPORT AccountsManager {
  private:
   AccountsManager();
   // Loading. An element that is no dictionary is read as an empty one.
-  [[nodiscard]] static std::shared_ptr<AccountsManager> _loadedFromFile(std::unique_ptr<ChangeTracker> tracker);
-  [[nodiscard]] static std::shared_ptr<AccountsManager> _loaded(const Array* accounts,
-                                                                std::unique_ptr<ChangeTracker> tracker);
-  [[nodiscard]] bool _offerLoaded(const Account& account, const PropertyValue& element);
-  void _loadAccounts(const Array& accounts);
+  [[nodiscard]] static std::shared_ptr<AccountsManager> loadedFromFile(std::unique_ptr<ChangeTracker> tracker);
+  [[nodiscard]] static std::shared_ptr<AccountsManager> loaded(const Array* accounts,
+                                                               std::unique_ptr<ChangeTracker> tracker);
+  [[nodiscard]] bool offerLoaded(const Account& account, std::size_t position, const PropertyValue& element);
+  void loadAccounts(const Array& accounts);
   [[nodiscard]] static Account accountFromElement(const PropertyValue& element);
   void registerAccount(const Account& account);
   void loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
 
+  void leaveOut(std::size_t position, const PropertyValue& element, WhyLeftOut why);
+
   // Saving. Fixing, like offering, answers whether a fixer had something to do.
-  [[nodiscard]] platform::Status _writeFile() const;
-  [[nodiscard]] bool _fixAccountsForSaving();
-  [[nodiscard]] Array _mergedRecords() const;
-  void _tellFixers(bool saved);
+  void writeFile();
+  [[nodiscard]] bool fixAccountsForSaving();
+  [[nodiscard]] Array mergedRecords() const;
+  void tellFixers(bool saved);
 
   // By notifier, what changed since the state was last taken.
   [[nodiscard]] NotificationTable notificationTable() const;
@@ -193,6 +200,8 @@ class ACCOUNT_EXPORT AccountsManager {
   // index is made by those.
   std::vector<std::pair<Text, Dictionary>> _originalAccountsByID;
   std::uint64_t _dataVersion = 0;
+  LoadOutcome _loadOutcome;
+  SaveOutcome _lastSaveOutcome;
   RuntimeFixers _runtimeFixers;
   std::unique_ptr<ChangeTracker> _tracker;  // null unless a run is observed
 };

@@ -21,9 +21,22 @@ using platform::Status;
 
 constexpr const char* kSave = "-[AccountsManager saveAllAccounts]";
 
-std::uint64_t versionIn(const Dictionary& file) {
+using Serialized = std::shared_ptr<const Bytes>;
+using SaveStage = SaveOutcome::Stage;
+
+std::optional<std::int64_t> versionIn(const Dictionary& file) {
   const PropertyValue* const version = file.find(kPlistVersionKey);
-  return version == nullptr ? 0 : static_cast<std::uint64_t>(version->integerValue().value_or(0));
+  return version == nullptr ? std::nullopt : version->integerValue();
+}
+
+WhyLeftOut faultOf(const PropertyValue& element) {
+  const Dictionary* const properties = element.asDictionary();
+  if (properties == nullptr) return WhyLeftOut::noRecord;
+  const PropertyValue* const type = properties->find(kAccountType);
+  if (type == nullptr) return WhyLeftOut::noType;
+  const Text* const name = type->asText();
+  const bool isKnown = name != nullptr && BasicAccount::_isValidAccountType(*name);
+  return isKnown ? WhyLeftOut::noClass : WhyLeftOut::unknownType;
 }
 
 void logCalculated(const BasicAccount& account, const Dictionary& merged) {
@@ -36,8 +49,8 @@ void logCalculated(const BasicAccount& account, const Dictionary& merged) {
                      dataclasses);
 }
 
-Result<std::shared_ptr<const Bytes>> serialized(const Dictionary& root) {
-  Result<std::shared_ptr<const Bytes>> list = platform::current().propertyLists->serialize(root);
+Result<Serialized> serialized(const Dictionary& root) {
+  Result<Serialized> list = platform::current().propertyLists->serialize(root);
   if (!list.isOk()) {
     _ASLogSystem().log(kSave, "Failed to serialize account settings data: %@", list.status().reason());
   }
@@ -53,30 +66,30 @@ Status giveToOwner(FileSystem& files, const Path& path) {
   return status;
 }
 
-Status moveOntoSettingsFile(FileSystem& files, const Path& temporary) {
-  Status status = giveToOwner(files, temporary);
-  if (status.isOk()) status = files.rename(temporary, AccountsManager::fullPathToAccountSettingsPlist());
-  return status;
+SaveOutcome moveOntoSettingsFile(FileSystem& files, const Path& temporary) {
+  if (Status given = giveToOwner(files, temporary); !given.isOk()) return {SaveStage::givingAway, std::move(given)};
+  Status moved = files.rename(temporary, AccountsManager::fullPathToAccountSettingsPlist());
+  return {moved.isOk() ? SaveStage::saved : SaveStage::replacing, std::move(moved)};
 }
 
 // The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails or is
 // thrown, no temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
-Status replaceSettingsFile(const Result<std::shared_ptr<const Bytes>>& data) {
+SaveOutcome replaceSettingsFile(const Result<Serialized>& data) {
   FileSystem& files = *platform::current().files;
   const Result<Path> name = files.temporaryName();
-  if (!name.isOk()) return name.status();
-  if (!data.isOk()) return data.status();
+  if (!data.isOk()) return {SaveStage::serializing, data.status()};
+  if (!name.isOk()) return {SaveStage::naming, name.status()};
   const Path& temporary = name.value();
-  if (Status made = files.create(temporary, *data.value()); !made.isOk()) return made;
-  Status status;
+  if (Status made = files.create(temporary, *data.value()); !made.isOk()) return {SaveStage::creating, std::move(made)};
+  SaveOutcome outcome;
   try {
-    status = moveOntoSettingsFile(files, temporary);
+    outcome = moveOntoSettingsFile(files, temporary);
   } catch (...) {
     std::ignore = files.remove(temporary);
     throw;
   }
-  if (!status.isOk()) std::ignore = files.remove(temporary);
-  return status;
+  if (!outcome.isSaved()) std::ignore = files.remove(temporary);
+  return outcome;
 }
 
 }  // namespace
@@ -99,14 +112,17 @@ AccountsManager::RuntimeFixers AccountsManager::_createRuntimeFixers() const {
 std::shared_ptr<AccountsManager> AccountsManager::init() { return initInsideOfMigration(); }
 
 std::shared_ptr<AccountsManager> AccountsManager::initInsideOfMigration() {
-  return _loadedFromFile(ChangeTracker::ofRun());
+  return loadedFromFile(ChangeTracker::ofRun());
 }
 
-std::shared_ptr<AccountsManager> AccountsManager::_loadedFromFile(std::unique_ptr<ChangeTracker> tracker) {
-  const auto read = platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist());
-  const Dictionary file = read.valueOr({});
-  std::shared_ptr<AccountsManager> store = _loaded(file.array(kPlistAccountsKey), std::move(tracker));
-  store->setDataVersion(versionIn(file));
+std::shared_ptr<AccountsManager> AccountsManager::loadedFromFile(std::unique_ptr<ChangeTracker> tracker) {
+  Result<Dictionary> read = platform::current().propertyLists->readDictionary(fullPathToAccountSettingsPlist());
+  const Dictionary file = read.isOk() ? read.value() : Dictionary{};
+  std::shared_ptr<AccountsManager> store = loaded(file.array(kPlistAccountsKey), std::move(tracker));
+  store->_loadOutcome.isFromFile = true;
+  store->_loadOutcome.reading = read.status();
+  store->_loadOutcome.storedVersion = versionIn(file);
+  store->setDataVersion(static_cast<std::uint64_t>(store->_loadOutcome.storedVersion.value_or(0)));
   if (store->_tracker) store->_tracker->readFile(read.status());
   if (store->_tracker) store->_tracker->loadedAll(store->_orderedTopLevelAccounts, store->_dataVersion);
   return store;
@@ -117,41 +133,48 @@ std::shared_ptr<AccountsManager> AccountsManager::initWithAccounsInfoArray(const
 }
 
 std::shared_ptr<AccountsManager> AccountsManager::_initWithAccountsInfo(const Array* accounts) {
-  return _loaded(accounts, nullptr);
+  return loaded(accounts, nullptr);
 }
 
-std::shared_ptr<AccountsManager> AccountsManager::_loaded(const Array* accounts,
-                                                          std::unique_ptr<ChangeTracker> tracker) {
+std::shared_ptr<AccountsManager> AccountsManager::loaded(const Array* accounts,
+                                                         std::unique_ptr<ChangeTracker> tracker) {
   std::shared_ptr<AccountsManager> store{new AccountsManager};
   store->_tracker = std::move(tracker);
-  if (accounts != nullptr) store->_loadAccounts(*accounts);
+  if (accounts != nullptr) store->loadAccounts(*accounts);
   store->_setOriginalAccountDictionaries();
   return store;
 }
 
-void AccountsManager::_loadAccounts(const Array& accounts) {
+void AccountsManager::loadAccounts(const Array& accounts) {
   bool isFixed = false;
   platform::RunProgress progress{accounts.size()};
-  for (const PropertyValue& properties : accounts) {
+  for (std::size_t position = 0; position < accounts.size(); ++position) {
     progress.next();
+    const PropertyValue& properties = accounts[position];
     const Account account = accountFromElement(properties);
     if (account == nullptr) {
       _ASLogSystem().log("-[AccountsManager _initWithAccountsInfo:]", "ERROR: Failed to create a BasicAccount from %@",
                          properties);
+      leaveOut(position, properties, faultOf(properties));
       if (_tracker) _tracker->leftOut(properties);
       continue;
     }
-    isFixed |= _offerLoaded(account, properties);
+    isFixed |= offerLoaded(account, position, properties);
   }
-  if (isFixed) _tellFixers(false);
+  if (isFixed) tellFixers(false);
 }
 
-bool AccountsManager::_offerLoaded(const Account& account, const PropertyValue& element) {
+void AccountsManager::leaveOut(std::size_t position, const PropertyValue& element, WhyLeftOut why) {
+  _loadOutcome.leftOut.push_back({position, element, why});
+}
+
+bool AccountsManager::offerLoaded(const Account& account, std::size_t position, const PropertyValue& element) {
   bool isFixed = false;
   for (const auto& fixer : _runtimeFixers) {
     const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
     if (answer != FixAnswer::drop) registerAccount(account);
     isFixed |= answer != FixAnswer::nothingToDo;
+    if (answer == FixAnswer::drop) leaveOut(position, element, WhyLeftOut::givenUp);
     if (!_tracker) continue;
     answer == FixAnswer::drop ? _tracker->givenUp(element, ASRuntimeFixMailAccount::kFaultOfDropped)
                               : _tracker->loaded(element, *account);
@@ -164,7 +187,7 @@ AccountsManager::Account AccountsManager::accountFromElement(const PropertyValue
   return BasicAccount::initWithProperties(properties == nullptr ? Dictionary{} : *properties);
 }
 
-void AccountsManager::_tellFixers(bool saved) {
+void AccountsManager::tellFixers(bool saved) {
   for (const auto& fixer : _runtimeFixers) fixer->accountsHaveBeenSaved(saved);
 }
 
@@ -189,30 +212,32 @@ void AccountsManager::saveAllAccounts() {
   _tellChanges();
   const platform::RunStage stage{"save"};
   _ASLogSystem().log(kSave, "Saving all accounts");
-  const bool isFixed = _fixAccountsForSaving();
-  const bool isSaved = _writeFile().isOk();
+  const bool isFixed = fixAccountsForSaving();
+  writeFile();
+  const bool isSaved = _lastSaveOutcome.isSaved();
   if (isSaved) {
     for (const Account& account : _orderedTopLevelAccounts) account->setOriginalProperties(account->propertiesToSave());
   } else {
     _ASLogSystem().log(kSave, "Failed to save accounts to filesystem.");
   }
-  if (isFixed) _tellFixers(true);  // after a failed save, too
+  if (isFixed) tellFixers(true);  // after a failed save, too
   if (!isSaved || shouldSkipNotifications()) return;
   _sendNotificationsForChangedAccounts();
   _setOriginalAccountDictionaries();
 }
 
-Status AccountsManager::_writeFile() const {
+void AccountsManager::writeFile() {
   _tellChanges();
-  Array records = _mergedRecords();
+  _lastSaveOutcome = {SaveStage::merging};
+  Array records = mergedRecords();
   if (_tracker) _tracker->written(_orderedTopLevelAccounts, records);
   const Dictionary root{{kPlistAccountsKey, std::move(records)}, {kPlistVersionKey, currentVersion()}};
-  Status status = replaceSettingsFile(serialized(root));
-  if (_tracker) _tracker->savedAll(count(), currentVersion(), fullPathToAccountSettingsPlist(), status);
-  return status;
+  _lastSaveOutcome.stage = SaveStage::serializing;
+  _lastSaveOutcome = replaceSettingsFile(serialized(root));
+  if (_tracker) _tracker->savedAll(count(), currentVersion(), fullPathToAccountSettingsPlist(), _lastSaveOutcome.status);
 }
 
-bool AccountsManager::_fixAccountsForSaving() {
+bool AccountsManager::fixAccountsForSaving() {
   bool isFixed = false;
   for (const Account& account : std::views::reverse(_orderedTopLevelAccounts)) {
     for (const auto& fixer : _runtimeFixers) {
@@ -228,8 +253,8 @@ bool AccountsManager::_fixAccountsForSaving() {
   return isFixed;
 }
 
-Array AccountsManager::_mergedRecords() const {
-  const std::shared_ptr<AccountsManager> fileAsItStands = _loadedFromFile(nullptr);
+Array AccountsManager::mergedRecords() const {
+  const std::shared_ptr<AccountsManager> fileAsItStands = loadedFromFile(nullptr);
   Array records;
   records.reserve(_orderedTopLevelAccounts.size());
   platform::RunProgress progress{count()};

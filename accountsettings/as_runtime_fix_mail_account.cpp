@@ -4,6 +4,7 @@
 
 #include "accountsettings/log_handle.h"
 #include "accountsettings/product_values.h"
+#include "platform/kept_for_life.h"
 #include "platform/platform.h"
 
 namespace accountsettings {
@@ -39,7 +40,9 @@ ASRuntimeFixMailAccount::ASRuntimeFixMailAccount()
 ASRuntimeFixMailAccount::~ASRuntimeFixMailAccount() = default;
 
 const std::unordered_set<std::string_view>& ASRuntimeFixMailAccount::supportedAccountTypes() const {
-  static const std::unordered_set<std::string_view> types{kNimbraAccountType, kMailAccountType};
+  using Types = const std::unordered_set<std::string_view>;
+  static Types& types =
+      platform::keptForLife<Types>(std::initializer_list<std::string_view>{kNimbraAccountType, kMailAccountType});
   return types;
 }
 

@@ -6,6 +6,7 @@
 #include "accountsettings/basic_account.h"
 #include "accountsettings/dataclass_lists.h"
 #include "platform/insertion_ordered_map.h"
+#include "platform/kept_for_life.h"
 #include "platform/platform.h"
 
 // The tables live as long as the process and are never destroyed, so that modules may ask until the very end.
@@ -26,6 +27,7 @@ struct AccountType {
 using AccountTypes = platform::InsertionOrderedMap<AccountType>;
 
 std::mutex classLock;
+// Both are kept for the life of the process: what they answer is handed out by pointer.
 std::atomic<const AccountTypes*> typeTable = nullptr;
 std::atomic<const Dictionary*> creatorTable = nullptr;
 
@@ -83,10 +85,9 @@ const AccountTypes& loadedAccountTypes() {
 const AccountType* accountTypeNamed(std::string_view type) { return loadedAccountTypes().find(type); }
 
 bool answerForDataclass(std::string_view dataclass, std::string_view question) {
-  static std::once_flag once;
-  static const Dictionary* table = nullptr;
-  std::call_once(once, [] { table = new Dictionary{BasicAccount::_dataclassesProperties().value_or(Dictionary{})}; });
-  const Dictionary* const properties = table->dictionary(dataclass);
+  static const Dictionary& table =
+      platform::keptForLife<Dictionary>(BasicAccount::_dataclassesProperties().value_or(Dictionary{}));
+  const Dictionary* const properties = table.dictionary(dataclass);
   return properties != nullptr && booleanUnder(question, *properties);
 }
 
@@ -117,12 +118,11 @@ void BasicAccount::initialize() {
 }
 
 const Dataclasses& BasicAccount::allSupportedDataclasses() {
-  static const auto& canonicalOrder =
-      *new Dataclasses{kAccountDataclassMail,        kAccountDataclassContacts,      kAccountDataclassCalendars,
-                       kAccountDataclassReminders,   kAccountDataclassBookmarks,     kAccountDataclassNotes,
-                       kAccountDataclassMediaStream, kAccountDataclassDeviceLocator, kAccountDataclassContactsSearch,
-                       kAccountDataclassBackup,      kAccountDataclassQuorvel,       kAccountDataclassKeyValue,
-                       kAccountDataclassTickora,     kAccountDataclassSharedStreams};
+  static const Dataclasses& canonicalOrder = platform::keptForLife<Dataclasses>(std::initializer_list<Text>{
+      kAccountDataclassMail, kAccountDataclassContacts, kAccountDataclassCalendars, kAccountDataclassReminders,
+      kAccountDataclassBookmarks, kAccountDataclassNotes, kAccountDataclassMediaStream, kAccountDataclassDeviceLocator,
+      kAccountDataclassContactsSearch, kAccountDataclassBackup, kAccountDataclassQuorvel, kAccountDataclassKeyValue,
+      kAccountDataclassTickora, kAccountDataclassSharedStreams});
   return canonicalOrder;
 }
 
@@ -132,7 +132,7 @@ const Dataclasses* BasicAccount::supportedDataclassesForAccountType(std::string_
 }
 
 const Dataclasses& BasicAccount::orderedSupportedDataclassesForAccountType(std::string_view type) {
-  static const auto& none = *new Dataclasses;
+  static const Dataclasses& none = platform::keptForLife<Dataclasses>();
   const AccountType* const found = accountTypeNamed(type);
   return found == nullptr ? none : found->orderedSupportedDataclasses;
 }

@@ -1,5 +1,6 @@
 #include "accountsettings/log_handle.h"
 
+#include "platform/kept_for_life.h"
 #include "platform/platform.h"
 
 namespace accountsettings {
@@ -19,7 +20,7 @@ void LogHandle::write(const LogSite& site, std::string_view format,
 }
 
 const LogHandle& _ASLogSystem() {
-  static const LogHandle handle{platform::current().systemLog};
+  static const LogHandle& handle = platform::keptForLife<LogHandle>(platform::current().systemLog);
   return handle;
 }
 

@@ -15,14 +15,15 @@ namespace {
 
 using Event = nlohmann::ordered_json;
 
-bool writeLine(int descriptor, const std::string& line) {
+// 0, or the number of the error; a part of a line is no line.
+int writeLine(int descriptor, const std::string& line) {
   constexpr int attempts = 100;
   for (int attempt = 0; attempt < attempts; ++attempt) {
     const auto written = ::write(descriptor, line.data(), line.size());
-    if (written >= 0) return static_cast<std::size_t>(written) == line.size();
-    if (errno != EINTR) return false;
+    if (written >= 0) return static_cast<std::size_t>(written) == line.size() ? 0 : ENOSPC;
+    if (errno != EINTR) return errno;
   }
-  return false;
+  return EINTR;
 }
 
 template <typename Service>
@@ -81,19 +82,23 @@ void wrap(std::shared_ptr<Service>& service, const std::shared_ptr<Trace>& trace
 }  // namespace
 
 platform::Result<std::shared_ptr<Trace>> Trace::open(const std::filesystem::path& path) {
-  platform::Descriptor file = platform::openToAppend(path);
-  if (!file.isOpen()) return platform::Status::failure(errno, "open the trace file " + path.string());
-  return std::shared_ptr<Trace>{new Trace{std::move(file)}};
+  auto file = platform::openToAppend(path);
+  if (file.isOk()) return std::shared_ptr<Trace>{new Trace{file.take()}};
+  return platform::Status::failure(file.status().errorNumber(), "open the trace file " + path.string());
+}
+
+void Trace::lose(int cause) noexcept {
+  if (_outcome.isOk()) _outcome = platform::Status::failure(cause, "write an event");
 }
 
 template <typename MakeEvent>
 void Trace::append(const MakeEvent& makeEvent) noexcept {
   try {
     const Event event = makeEvent();
-    if (!writeLine(_file.number(), event.dump(-1, ' ', false, Event::error_handler_t::replace) + '\n'))
-      _complete = false;
+    const int failed = writeLine(_file.number(), event.dump(-1, ' ', false, Event::error_handler_t::replace) + '\n');
+    if (failed != 0) lose(failed);
   } catch (...) {
-    _complete = false;
+    lose(ENOMEM);
   }
 }
 

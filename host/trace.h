@@ -18,7 +18,7 @@ namespace host {
 
 // The events of one run, one JSON object a line, in the order in which they are told. Each event is appended with one
 // write and nothing is kept back, so a run that dies leaves the events up to its end. Text that is no UTF-8 is shown
-// with replacement characters. An event that cannot be written is lost and the run goes on; `complete` tells of it.
+// with replacement characters. An event that cannot be written is lost and the run goes on; `outcome` tells of it.
 class Trace {
  public:
   // Appends to the file, which is made where there is none; mode 0600. What somebody else may have put there is
@@ -41,16 +41,17 @@ class Trace {
   void fact(std::string_view stage, std::string_view outerStage, const records::Fact& fact) noexcept;
   void result(std::string_view dataClass, bool success, const Verdict& verdict) noexcept;
 
-  // Whether every event so far was written.
-  [[nodiscard]] bool complete() const { return _complete; }
+  // Success where every event so far was written; else why the first of the others was not.
+  [[nodiscard]] const platform::Status& outcome() const { return _outcome; }
 
  private:
   explicit Trace(platform::Descriptor file) : _file{std::move(file)} {}
+  void lose(int cause) noexcept;
   template <typename MakeEvent>
   void append(const MakeEvent& makeEvent) noexcept;
 
   platform::Descriptor _file;
-  bool _complete = true;
+  platform::Status _outcome;
 };
 
 // Puts the trace in front of the platform's two logs and two notices: each event is traced, then passed on.

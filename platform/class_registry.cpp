@@ -4,6 +4,8 @@
 #include <mutex>
 #include <vector>
 
+#include "platform/kept_for_life.h"
+
 namespace platform {
 namespace {
 
@@ -12,10 +14,10 @@ struct Table {
   std::vector<std::shared_ptr<const ClassInfo>> classes;
 };
 
-// Never destroyed: modules leave it while the process ends.
+// Modules leave it while the process ends.
 Table& table() {
-  static auto* const only = new Table;
-  return *only;
+  static Table& only = keptForLife<Table>();
+  return only;
 }
 
 class ProcessClassRegistry final : public ClassRegistry {

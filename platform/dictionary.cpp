@@ -25,6 +25,9 @@ Index indexOf(const std::vector<Dictionary::Entry>& entries) {
 }  // namespace
 
 struct Dictionary::Contents {
+  // The dictionaries that share these. The standard library's pointers count theirs, too, but promise nothing of what
+  // has happened in other threads before a count is read.
+  std::atomic<std::size_t> holders = 1;
   std::vector<Entry> entries;
 
   Contents() = default;
@@ -70,11 +73,20 @@ struct Dictionary::Contents {
   mutable std::atomic<Index*> _index = nullptr;
 };
 
-Dictionary::Dictionary(std::initializer_list<Entry> entries) {
+Dictionary::Dictionary(const Dictionary& other) noexcept : _contents{other._contents} {
+  if (_contents != nullptr) _contents->holders.fetch_add(1, std::memory_order_relaxed);
+}
+
+Dictionary::~Dictionary() {
+  if (_contents != nullptr && _contents->holders.fetch_sub(1, std::memory_order_acq_rel) == 1) delete _contents;
+}
+
+// What is begun after the default constructor is given back where an exception ends it.
+Dictionary::Dictionary(std::initializer_list<Entry> entries) : Dictionary() {
   for (const Entry& entry : entries) set(entry.key, entry.value);
 }
 
-Dictionary::Dictionary(std::vector<Entry> entries) {
+Dictionary::Dictionary(std::vector<Entry> entries) : Dictionary() {
   if (!entries.empty()) editable().entries = std::move(entries);
 }
 
@@ -105,12 +117,13 @@ const Dictionary* Dictionary::dictionary(std::string_view key) const {
 }
 
 Dictionary::Contents& Dictionary::editable() {
-  // Counting one more holder orders this thread after every reader that has let go of the contents by now.
-  const std::shared_ptr<Contents> held = _contents;
-  if (held == nullptr) {
-    _contents = std::make_shared<Contents>();
-  } else if (held.use_count() > 2) {
-    _contents = std::make_shared<Contents>(*held);
+  if (_contents == nullptr) {
+    _contents = new Contents;
+  } else if (_contents->holders.load(std::memory_order_acquire) > 1) {
+    // Who is alone by now comes after all that the others did before they let go.
+    Dictionary own;
+    own._contents = new Contents{*_contents};
+    std::swap(_contents, own._contents);
   }
   return *_contents;
 }

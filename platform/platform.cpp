@@ -3,32 +3,33 @@
 #include <mutex>
 #include <optional>
 
-#include "platform/default_platform.h"
+#include "platform/kept_for_life.h"
 
 namespace platform {
 namespace {
 
-std::mutex& guard() {
-  static std::mutex mutex;
-  return mutex;
-}
+struct Held {
+  std::mutex guard;
+  std::optional<Platform> platform;
+};
 
-std::optional<Platform>& held() {
-  static std::optional<Platform> platform;
-  return platform;
+Held& held() {
+  static Held& held = keptForLife<Held>();
+  return held;
 }
 
 }  // namespace
 
 const Platform& current() {
-  const std::scoped_lock lock{guard()};
-  if (!held()) held() = makeDefaultPlatform();
-  return *held();
+  const std::scoped_lock lock{held().guard};
+  std::optional<Platform>& platform = held().platform;
+  if (!platform) platform = makeDefaultPlatform();
+  return *platform;
 }
 
 void setCurrent(Platform platform) {
-  const std::scoped_lock lock{guard()};
-  held() = std::move(platform);
+  const std::scoped_lock lock{held().guard};
+  held().platform = std::move(platform);
 }
 
 }  // namespace platform

@@ -50,7 +50,11 @@ struct Platform {
   std::shared_ptr<RunObserver> observer;  // null where nobody watches
 };
 
-// The process's platform. Until somebody sets one it is the device's own, made at the first call.
+// The device's own platform, with no option set. An embedding program may replace what it wants to and set that.
+[[nodiscard]] ACCOUNT_EXPORT Platform makeDefaultPlatform();
+
+// The process's platform, kept for the life of the process: destructors of globals may use it. Until somebody sets one
+// it is the device's own, made at the first call.
 [[nodiscard]] ACCOUNT_EXPORT const Platform& current();
 
 // Sets the process's platform. To be called before the first use of anything that is built on it, from one thread; what

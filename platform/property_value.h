@@ -46,6 +46,15 @@ class ACCOUNT_EXPORT Dictionary {
 
   Dictionary() = default;
   Dictionary(std::initializer_list<Entry> entries);
+  Dictionary(const Dictionary& other) noexcept;
+  Dictionary(Dictionary&& other) noexcept : _contents{std::exchange(other._contents, nullptr)} {}
+  Dictionary& operator=(const Dictionary& other) noexcept { return *this = Dictionary(other); }
+  Dictionary& operator=(Dictionary&& other) noexcept {
+    Dictionary moved(std::move(other));
+    std::swap(_contents, moved._contents);
+    return *this;
+  }
+  ~Dictionary();
   // Of entries whose keys all differ; nobody looks whether they do.
   explicit Dictionary(std::vector<Entry> entries);
 
@@ -67,7 +76,7 @@ class ACCOUNT_EXPORT Dictionary {
   void set(Text key, PropertyValue value);
   // Takes the key out and answers the value it had; nothing where it was absent.
   std::optional<PropertyValue> remove(std::string_view key);
-  void clear() { _contents = nullptr; }
+  void clear() { *this = Dictionary{}; }
 
   // Whether both are the same contents in memory, which is what copies are until one is edited.
   [[nodiscard]] bool isIdenticalTo(const Dictionary& other) const { return _contents == other._contents; }
@@ -78,7 +87,7 @@ class ACCOUNT_EXPORT Dictionary {
   struct Contents;
   Contents& editable();
 
-  std::shared_ptr<Contents> _contents;
+  Contents* _contents = nullptr;  // shared with the copies; null while there never was an entry
 };
 
 // The one value type of files and accounts. It is a value: a copy costs one reference count, and a copy that is edited

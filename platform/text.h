@@ -65,6 +65,6 @@ class ACCOUNT_EXPORT Text {
 [[nodiscard]] ACCOUNT_EXPORT bool isWellFormedText(std::string_view bytes);
 
 // The length of the part before the first byte that is NUL or not ASCII.
-[[nodiscard]] std::size_t plainPrefix(std::string_view bytes);
+[[nodiscard]] ACCOUNT_EXPORT std::size_t plainPrefix(std::string_view bytes);
 
 }  // namespace platform

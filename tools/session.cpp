@@ -7,6 +7,7 @@
 #include <utility>
 
 #include "platform/linux/linux_platform.h"
+#include "platform/silent_services.h"
 #include "platform/temporary_directory.h"
 
 namespace tools {
@@ -70,8 +71,6 @@ Array withChild(const Array& children, const BasicAccount& child) {
 
 Session::Session(const Options& options) : _opensModules{options.opensModules()} {
   auto platform = platform::makeLinuxPlatform(options.device);
-  _saves = std::make_shared<SaveWatch>(platform.systemLog);
-  platform.systemLog = _saves;
   if (!_opensModules) {
     platform.modules = std::make_shared<ClosedModuleLoader>();
     platform.preferencesChanged = std::make_shared<NoNotice>();
@@ -87,13 +86,14 @@ AccountsManager& Session::accounts() {
 
 void Session::loadAccounts() {
   AccountsManager::waitForMigrationToFinish();
-  const auto path = AccountsManager::fullPathToAccountSettingsPlist();
-  const auto& platform = platform::current();
+  auto accounts = AccountsManager::init();
   // The store takes a file that it cannot read for an empty one; saving would then lose what is in it.
-  if (platform.files->kindOf(path).isOk() && !platform.propertyLists->readDictionary(path).isOk()) {
-    throw Failure{ExitStatus::failed, "the account settings cannot be read: " + path.string()};
+  if (const auto& outcome = accounts->loadOutcome(); outcome.hasUnreadFile()) {
+    throw Failure{ExitStatus::failed,
+                  "the account settings cannot be read: " + AccountsManager::fullPathToAccountSettingsPlist().string() +
+                      ": " + outcome.reading.reason()};
   }
-  _accounts = AccountsManager::init();
+  _accounts = std::move(accounts);
 }
 
 Account Session::accountWithIdentifier(std::string_view identifier) {
@@ -107,14 +107,11 @@ Account Session::accountWithIdentifier(std::string_view identifier) {
 }
 
 void Session::beginExamination(const std::optional<platform::Path>& file) {
-  _saves->keepToYourself();
-  if (!file) {
-    AccountsManager::waitForMigrationToFinish();
-    return;
-  }
   auto platform = platform::current();
-  platform.propertyLists = std::make_shared<SettingsFromElsewhere>(platform.propertyLists, *file);
+  platform.systemLog = std::make_shared<platform::SilentSystemLog>();
+  if (file) platform.propertyLists = std::make_shared<SettingsFromElsewhere>(platform.propertyLists, *file);
   platform::setCurrent(std::move(platform));
+  if (!file) AccountsManager::waitForMigrationToFinish();
 }
 
 void Session::beginChanges() {
@@ -141,13 +138,14 @@ void Session::save() {
   } catch (const std::bad_alloc&) {
     throw;  // before the file was written or after it
   } catch (const std::exception& failure) {
+    if (!accounts().lastSaveOutcome().isSaved()) throw;
     throw Failure{ExitStatus::faultyInstallation,
                   "the accounts were saved, but not announced: " + std::string{failure.what()}};
   }
-  if (!_saves->hasFailed()) return;
+  const auto& outcome = accounts().lastSaveOutcome();
+  if (outcome.isSaved()) return;
   const auto path = AccountsManager::fullPathToAccountSettingsPlist().string();
-  throw Failure{ExitStatus::failed,
-                "the accounts could not be saved to " + path + (_saves->cause().empty() ? "" : ": " + _saves->cause())};
+  throw Failure{ExitStatus::failed, "the accounts could not be saved to " + path + ": " + outcome.status.description()};
 }
 
 }  // namespace tools

@@ -8,7 +8,6 @@
 
 #include "accountsettings/accounts_manager.h"
 #include "tools/options.h"
-#include "tools/save_watch.h"
 
 namespace tools {
 
@@ -40,14 +39,14 @@ class Session {
   void beginChanges();
   // Keeps what was changed of the account: a child's record is a copy of what its parent holds.
   static void keepChanges(const Account& account);
-  // Writes the file. Throws Failure where it cannot be written, and where it was but nobody could be told.
+  // Writes the file. Throws Failure, with the cause, where it cannot be written, and where it was but nobody could be
+  // told.
   void save();
 
  private:
   void loadAccounts();
 
   bool _opensModules;
-  std::shared_ptr<SaveWatch> _saves;
   std::shared_ptr<AccountsManager> _accounts;
 };
 

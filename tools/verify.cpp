@@ -1,5 +1,4 @@
 #include <filesystem>
-#include <fstream>
 #include <nlohmann/json.hpp>
 #include <optional>
 
@@ -35,21 +34,25 @@ void append(Findings& findings, Findings more) {
   findings.insert(findings.end(), std::make_move_iterator(more.begin()), std::make_move_iterator(more.end()));
 }
 
-Finding unreadable(const Path& path, platform::FileKind kind) {
-  if (kind != platform::FileKind::file) {
-    return {"unreadable", "", "", "there is something else than a file", "a migration cannot save"};
+Finding unreadable(const Path& path, const platform::Status& reading) {
+  if (reading.cause() == platform::Cause::other) {
+    const auto kind = platform::current().files->kindOf(path);
+    if (kind.isOk() && kind.value() != platform::FileKind::file) {
+      return {"unreadable", "", "", "there is something else than a file", "a migration cannot save"};
+    }
+    throw Failure{ExitStatus::failed, "the file cannot be opened: " + path.string() + ": " + reading.reason()};
   }
-  if (!std::ifstream{path}.is_open()) throw Failure{ExitStatus::failed, "the file cannot be opened: " + path.string()};
-  return {"unreadable", "", "", "it is no property list whose root is a dictionary",
+  const bool isPlanted = reading.cause() == platform::Cause::unsafe;
+  return {"unreadable", "", "",
+          isPlanted ? "somebody else may have put it there: " + reading.reason() : reading.reason(),
           "a migration takes it for an empty one and saves a file without accounts in its place"};
 }
 
 Examined examine(const Path& path) {
-  const auto& platform = platform::current();
-  const auto kind = platform.files->kindOf(path);
-  if (!kind.isOk()) return {path, false, 0, {}};
-  const auto file = platform.propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist());
-  if (!file.isOk()) return {path, true, 0, {unreadable(path, kind.value())}};
+  const auto file =
+      platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist());
+  if (file.cause() == platform::Cause::missing) return {path, false, 0, {}};
+  if (!file.isOk()) return {path, true, 0, {unreadable(path, file.status())}};
   const Dictionary& root = file.value();
   Examined examined{path, true, recordsIn(root).size(), findingsOfRoot(root)};
   append(examined.findings, findingsOfVersion(root));

@@ -1,4 +1,4 @@
-#include "platform/linux/linux_base_directories.h"
+#include "platform/linux/linux_services.h"
 
 #include <pwd.h>
 #include <unistd.h>

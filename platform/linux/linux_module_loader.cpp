@@ -1,4 +1,4 @@
-#include "platform/linux/linux_module_loader.h"
+#include "platform/linux/linux_services.h"
 
 #include <dlfcn.h>
 #include <sys/stat.h>

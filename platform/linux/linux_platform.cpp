@@ -1,18 +1,10 @@
 #include "platform/linux/linux_platform.h"
 
-#include "platform/default_platform.h"
-#include "platform/linux/device/device_configuration.h"
-#include "platform/linux/device/linux_clock.h"
-#include "platform/linux/device/linux_localized_strings.h"
-#include "platform/linux/device/linux_preferences_store.h"
-#include "platform/linux/device/linux_unique_identifiers.h"
+#include "platform/linux/device/device_services.h"
 #include "platform/linux/files/linux_file_locks.h"
 #include "platform/linux/files/linux_file_system.h"
-#include "platform/linux/linux_base_directories.h"
-#include "platform/linux/linux_module_loader.h"
-#include "platform/linux/logs/bus_notices.h"
-#include "platform/linux/logs/linux_console_log.h"
-#include "platform/linux/logs/linux_system_log.h"
+#include "platform/linux/linux_services.h"
+#include "platform/linux/logs/logs_and_notices.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace platform {
@@ -22,7 +14,7 @@ Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   services.files = makeFileSystem(treesOf(*services.directories));
   services.propertyLists = makeLibplistPropertyListStore(services.files);
   const DeviceConfiguration configuration{services.directories, services.propertyLists};
-  services.preferences = makePreferencesStore(services.directories, services.propertyLists);
+  services.preferences = makePreferencesStore(configuration);
   const std::shared_ptr<SystemBus> bus = makeSystemBus();
   services.preferencesChanged = makePreferencesChangedNotice(bus);
   services.cloudTabs = makeCloudTabsNotice(bus);
@@ -36,7 +28,7 @@ Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   services.systemAccount = makeSystemAccountQuery();
   services.modules = makeModuleLoader();
   services.classes = makeProcessClassRegistry();
-  services.strings = makeLocalizedStrings(services.directories, services.propertyLists);
+  services.strings = makeLocalizedStrings(configuration);
   services.identifiers = makeUniqueIdentifiers();
   services.clock = makeClock();
   return services;

@@ -29,6 +29,20 @@ TEST_F(WatchedStore, TellsHowManyAccountsOfWhichVersionWereLoaded) {
   EXPECT_EQ(recorder->facts[0], (records::Fact{records::Loaded{2, 3}}));
 }
 
+TEST_F(WatchedStore, TellsOfAFileThatStandsThereAndCannotBeRead) {
+  device.files->put(kSettingsFile, "no property list");
+  AccountsManager::initInsideOfMigration();
+  ASSERT_EQ(recorder->facts.size(), 2U);
+  EXPECT_EQ(
+      recorder->facts[0],
+      (RunFact{.kind = RunFact::Kind::unread, .reason = "it is no property list", .path = kSettingsFile.string()}));
+}
+
+TEST_F(WatchedStore, TellsNoSuchThingWhereThereIsNoFile) {
+  AccountsManager::initInsideOfMigration();
+  EXPECT_TRUE(recorder->lines().empty());
+}
+
 TEST_F(WatchedStore, TellsByWhichRuleARecordIsLeftOut) {
   loadOutdated({"no dictionary", Dictionary{{"Identifier", "a"}, {"Class", "C"}},
                 Dictionary{{"Identifier", "b"}, {"Type", "Odd"}}, Dictionary{{"Identifier", "c"}, {"Type", "Mail"}}});

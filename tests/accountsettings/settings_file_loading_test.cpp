@@ -1,6 +1,7 @@
 #include <gtest/gtest.h>
 
 #include <algorithm>
+#include <cerrno>
 
 #include "tests/support/account_store.h"
 
@@ -42,6 +43,53 @@ TEST_F(LoadingTheSettingsFile, GivesAnEmptyStoreOfVersionZeroWithoutAWordWhereTh
   EXPECT_EQ(store->count(), 0U);
   EXPECT_EQ(store->dataVersion(), 0U);
   EXPECT_TRUE(device.logMessages().empty());
+}
+
+TEST_F(LoadingTheSettingsFile, IsRememberedByTheStore) {
+  putFile({properties("a")}, 7);
+  const accountsettings::LoadOutcome outcome = AccountsManager::init()->loadOutcome();
+  EXPECT_TRUE(outcome.isFromFile);
+  EXPECT_TRUE(outcome.reading.isOk());
+  EXPECT_EQ(outcome.storedVersion, 7);
+  EXPECT_TRUE(outcome.leftOut.empty());
+}
+
+TEST_F(LoadingTheSettingsFile, IsToldApartFromFindingNoFileAndFromFindingOneThatCannotBeRead) {
+  EXPECT_EQ(AccountsManager::init()->loadOutcome().reading.cause(), platform::Cause::missing);
+  EXPECT_FALSE(AccountsManager::init()->loadOutcome().hasUnreadFile());
+  device.files->put(kSettingsFile, "no property list");
+  EXPECT_EQ(AccountsManager::init()->loadOutcome().reading.cause(), platform::Cause::malformed);
+  device.files->failing = {"read"};
+  EXPECT_EQ(AccountsManager::init()->loadOutcome().reading.errorNumber(), EIO);
+  EXPECT_TRUE(AccountsManager::init()->loadOutcome().hasUnreadFile());
+}
+
+TEST_F(LoadingTheSettingsFile, SaysNothingOfAccountsThatWereInMemory) {
+  const Store store = AccountsManager::initWithAccounsInfoArray({properties("a")});
+  EXPECT_FALSE(store->loadOutcome().isFromFile);
+  EXPECT_FALSE(store->loadOutcome().hasUnreadFile());
+}
+
+TEST_F(LoadingTheSettingsFile, RemembersWhichRecordsItLeftOutAndWhy) {
+  using accountsettings::WhyLeftOut;
+  const Array records{"no dictionary",
+                      Dictionary{{"Identifier", "a"}, {"Class", "C"}},
+                      properties("kept"),
+                      Dictionary{{"Identifier", "b"}, {"Type", "Odd"}},
+                      Dictionary{{"Identifier", "c"}, {"Type", "Mail"}},
+                      properties("d", {}, "Mail")};
+  const Store store = load(records);
+  const std::vector<std::pair<std::size_t, WhyLeftOut>> expected{{0, WhyLeftOut::noRecord},
+                                                                 {1, WhyLeftOut::noType},
+                                                                 {3, WhyLeftOut::unknownType},
+                                                                 {4, WhyLeftOut::noClass},
+                                                                 {5, WhyLeftOut::givenUp}};
+  ASSERT_EQ(store->loadOutcome().leftOut.size(), expected.size());
+  for (std::size_t index = 0; index < expected.size(); ++index) {
+    const accountsettings::LeftOutRecord& record = store->loadOutcome().leftOut[index];
+    EXPECT_EQ(std::pair(record.position, record.why), expected[index]) << index;
+    EXPECT_EQ(record.element, records[record.position]);
+  }
 }
 
 TEST_F(LoadingTheSettingsFile, GivesAnEmptyStoreWhereTheAccountsAreEmptyOrMissingOrNoArray) {

@@ -8,6 +8,7 @@ namespace tests {
 namespace {
 
 using Lines = std::vector<std::string>;
+using Stage = accountsettings::SaveOutcome::Stage;
 
 constexpr const char* kSave = "-[AccountsManager saveAllAccounts]";
 constexpr const char* kCalendars = "com.vorlix.Dataclass.Calendars";
@@ -242,6 +243,7 @@ struct Failure {
   const char* name;
   std::function<void(FakeDevice&)> arrange;
   Lines messages;
+  Stage stage;
 };
 
 void PrintTo(const Failure& failure, std::ostream* stream) { *stream << failure.name; }
@@ -264,6 +266,9 @@ TEST_P(FailingToSaveAccounts, SaysSoAndLeavesFileAndMemoryAsTheyWere) {
   const Lines messages = messagesOf(kSave);
   ASSERT_GE(messages.size(), 2U);
   EXPECT_EQ(Lines(messages.begin() + 2, messages.end()), GetParam().messages);
+  EXPECT_TRUE(store->lastSaveOutcome().hasFailed());
+  EXPECT_EQ(store->lastSaveOutcome().stage, GetParam().stage);
+  EXPECT_FALSE(store->lastSaveOutcome().status.isOk());
 }
 
 INSTANTIATE_TEST_SUITE_P(
@@ -271,22 +276,67 @@ INSTANTIATE_TEST_SUITE_P(
     testing::Values(
         Failure{"WithoutSerialisation",
                 [](FakeDevice& device) { device.propertyLists->serializeError = "out of ink"; },
-                {"Failed to serialize account settings data: out of ink", "Failed to save accounts to filesystem."}},
+                {"Failed to serialize account settings data: out of ink", "Failed to save accounts to filesystem."},
+                Stage::serializing},
         Failure{"WithoutATemporaryName",
                 [](FakeDevice& device) { device.files->hasTemporaryNames = false; },
-                {"Failed to save accounts to filesystem."}},
+                {"Failed to save accounts to filesystem."},
+                Stage::naming},
         Failure{"WithoutSpace",
                 [](FakeDevice& device) { device.files->failing = {"create"}; },
-                {"Failed to save accounts to filesystem."}},
+                {"Failed to save accounts to filesystem."},
+                Stage::creating},
         Failure{"WithoutOwner",
                 [](FakeDevice& device) { device.files->accounts.clear(); },
                 {"Could not set attributes on the temporary account settings plist. Could not set the owner of "
                  "/var/mobile/tmp/file1: No such file or directory (errno 2)",
-                 "Failed to save accounts to filesystem."}},
+                 "Failed to save accounts to filesystem."},
+                Stage::givingAway},
         Failure{"OntoAnotherVolume",
                 [](FakeDevice& device) { device.files->failing = {"rename"}; },
-                {"Failed to save accounts to filesystem."}}),
+                {"Failed to save accounts to filesystem."},
+                Stage::replacing}),
     [](const auto& failure) { return failure.param.name; });
+
+TEST_F(SavingAccounts, IsRememberedByTheStore) {
+  const Store store = load({properties("a")});
+  EXPECT_EQ(store->lastSaveOutcome().stage, Stage::none);
+  AccountsManager::_setShouldSkipNotifications(true);
+  store->saveAllAccounts();
+  EXPECT_TRUE(store->lastSaveOutcome().isSaved());
+  EXPECT_FALSE(store->lastSaveOutcome().hasFailed());
+}
+
+TEST_F(SavingAccounts, ThatEndsInAnExceptionHasFailedUnlessTheFileWasWritten) {
+  const Store store = load({properties("a")});
+  AccountsManager::_setShouldSkipNotifications(true);
+  device.propertyLists->beforeRead = [](const Path&) { throw std::bad_alloc{}; };
+  EXPECT_THROW(store->saveAllAccounts(), std::bad_alloc);
+  EXPECT_TRUE(store->lastSaveOutcome().hasFailed());
+  device.propertyLists->beforeRead = nullptr;
+  store->saveAllAccounts();
+  EXPECT_TRUE(store->lastSaveOutcome().isSaved());
+}
+
+class SaveListener final : public platform::RunObserver {
+ public:
+  std::vector<std::string> heard;
+  void stageBegan(std::string_view) override {}
+  void stageEnded(std::string_view) override {}
+  void saveBegan() override { heard.emplace_back("began"); }
+  void saveEnded(const platform::Status& status) override { heard.push_back("ended " + status.reason()); }
+};
+
+TEST_F(SavingAccounts, TellsTheObserverOfTheRunHowItEnds) {
+  const auto listener = std::make_shared<SaveListener>();
+  device.setObserver(listener);
+  AccountsManager::_setShouldSkipNotifications(true);
+  const Store store = load({properties("a")});
+  store->saveAllAccounts();
+  device.propertyLists->serializeError = "out of ink";
+  store->saveAllAccounts();
+  EXPECT_EQ(listener->heard, (Lines{"began", "ended ", "began", "ended out of ink"}));
+}
 
 TEST_F(SavingAccounts, SucceedsAfterAFailure) {
   const Store store = load({properties("a")});

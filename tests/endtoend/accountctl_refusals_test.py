@@ -101,23 +101,23 @@ class UnknownAccounts(AccountctlTest):
 
 
 class AccountsThatCannotBeRead(AccountctlTest):
-    def assert_left_alone(self):
+    def assert_left_alone(self, cause):
         for words in (["list"], ["show", "M1"], *CHANGES):
             with self.subTest(words=words):
-                message = f"the account settings cannot be read: {self.tree.path(SETTINGS)}"
+                message = f"the account settings cannot be read: {self.tree.path(SETTINGS)}: {cause}"
                 self.assert_refused(FAILED, message, *words)
 
     def test_because_they_are_no_property_list(self):
         self.tree.write(SETTINGS, "bplist00 but no more")
-        self.assert_left_alone()
+        self.assert_left_alone("it is no property list, or not a whole one")
 
     def test_because_they_are_an_array(self):
         self.tree.write_plist(SETTINGS, [HOME_MAIL])
-        self.assert_left_alone()
+        self.assert_left_alone("its root is no dictionary")
 
     def test_because_they_are_a_directory(self):
         self.tree.path(SETTINGS).mkdir()
-        self.assert_left_alone()
+        self.assert_left_alone("Is a directory (errno 21)")
 
 
 class AccountsOfAnEarlierRelease(AccountctlTest):
@@ -132,8 +132,6 @@ class AccountsOfAnEarlierRelease(AccountctlTest):
 
 
 class FailedSaves(AccountctlTest):
-    NO_OWNER = "Could not set attributes on the temporary account settings plist. "
-
     def setUp(self):
         super().setUp()
         self.put(HOME_MAIL, CLOUD)
@@ -151,13 +149,13 @@ class FailedSaves(AccountctlTest):
 
     def test_for_want_of_a_mobile_user_say_so(self):
         self.tree.write("etc/passwd", "")
-        self.assert_not_saved(f": {self.NO_OWNER}.+")
+        self.assert_not_saved(": Could not find the account mobile: .+")
 
     def test_where_the_directory_may_not_be_written(self):
         directory = self.tree.path(SETTINGS).parent
         directory.chmod(0o555)
         self.addCleanup(directory.chmod, 0o755)
-        self.assert_not_saved("", prepare=without_capabilities(CAP_DAC_OVERRIDE))
+        self.assert_not_saved(r": Could not .+: Permission denied \(errno 13\)", prepare=without_capabilities(CAP_DAC_OVERRIDE))
 
     def test_where_the_temporary_directory_is_on_another_volume(self):
         if SHARED_MEMORY.stat().st_dev == self.scratch.stat().st_dev:

@@ -274,7 +274,7 @@ class Refusals(VerifyTest):
         self.put(HOME_MAIL)
         self.tree.path(SETTINGS).chmod(0)
         self.assert_refused(
-            1, f"the file cannot be opened: {self.tree.path(SETTINGS)}", "verify",
+            1, f"the file cannot be opened: {self.tree.path(SETTINGS)}: Permission denied (errno 13)", "verify",
             prepare=without_capabilities(CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH),
         )
 

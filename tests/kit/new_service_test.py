@@ -24,7 +24,7 @@ class DeviceColourQuery {
 
 }  // namespace platform
 """
-REAL = """#include "platform/linux/device/device_configuration.h"
+REAL = """#include "platform/linux/device/device_services.h"
 
 namespace platform {
 namespace {
@@ -89,7 +89,7 @@ class NewService(KitTest):
 
     def test_is_made_in_five_steps(self):
         self.write("platform/device_colour_query.h", SERVICE)
-        aggregate, header = "platform/platform.h", "platform/linux/device/device_configuration.h"
+        aggregate, header = "platform/platform.h", "platform/linux/device/device_services.h"
         for name in (aggregate, header):
             self.insert(name, '#include "platform/device_info_query.h"', '#include "platform/device_colour_query.h"\n')
         member = "  std::shared_ptr<DeviceColourQuery> deviceColour;\n"

@@ -1,4 +1,4 @@
-#include "platform/linux/device/linux_clock.h"
+#include "platform/linux/device/device_services.h"
 
 #include <gtest/gtest.h>
 

@@ -7,7 +7,7 @@
 #include <new>
 
 #include "platform/linux/linux_platform.h"
-#include "platform/linux/logs/linux_system_log.h"
+#include "platform/linux/logs/logs_and_notices.h"
 #include "tests/support/fake_platform.h"
 
 namespace tests {

@@ -68,10 +68,7 @@ Descriptor makeNew(const Place& place) {
   return file;
 }
 
-}  // namespace
-
-Descriptor openToAppend(const std::filesystem::path& path) {
-  const Place place = PathResolver{}.openParent(path);
+Descriptor openOrMake(const Place& place) {
   for (int attempt = 0; place.parent.isOpen() && attempt < attempts; ++attempt) {
     Descriptor file = openExisting(place);
     if (file.isOpen() || errno != ENOENT) return file;
@@ -79,6 +76,15 @@ Descriptor openToAppend(const std::filesystem::path& path) {
     if (file.isOpen() || errno != EEXIST) return file;
   }
   return {};
+}
+
+}  // namespace
+
+Result<Descriptor> openToAppend(const std::filesystem::path& path) {
+  Descriptor file = openOrMake(PathResolver{}.openParent(path));
+  if (file.isOpen()) return file;
+  const int cause = errno;
+  return Status::failure(cause, "open " + path.string());
 }
 
 }  // namespace platform

@@ -4,6 +4,7 @@
 
 #include "platform/export.h"
 #include "platform/linux/files/descriptor.h"
+#include "platform/status.h"
 
 namespace platform {
 
@@ -13,7 +14,7 @@ namespace platform {
 // - a pipe or a character device of theirs in a directory in which nobody else can write. A pipe needs a reader
 // (ENXIO):
 //   opening waits for nobody.
-// Everything else is refused, a link too, with errno set: what the run tells would go to somebody else.
-[[nodiscard]] ACCOUNT_EXPORT Descriptor openToAppend(const std::filesystem::path& path);
+// Everything else is refused, a link too: what the run tells would go to somebody else.
+ACCOUNT_EXPORT Result<Descriptor> openToAppend(const std::filesystem::path& path);
 
 }  // namespace platform

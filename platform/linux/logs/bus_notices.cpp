@@ -1,4 +1,4 @@
-#include "platform/linux/logs/bus_notices.h"
+#include "platform/linux/logs/logs_and_notices.h"
 
 #include <mutex>
 #include <string>

@@ -1,4 +1,4 @@
-#include "platform/linux/logs/linux_console_log.h"
+#include "platform/linux/logs/logs_and_notices.h"
 
 #include <unistd.h>
 

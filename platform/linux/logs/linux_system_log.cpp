@@ -1,4 +1,4 @@
-#include "platform/linux/logs/linux_system_log.h"
+#include "platform/linux/logs/logs_and_notices.h"
 
 #define SD_JOURNAL_SUPPRESS_LOCATION
 #include <sys/uio.h>

@@ -1,8 +1,7 @@
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 
 #include "platform/linux/property_lists/known_property_lists.h"
-#include "platform/linux/property_lists/libplist_reader.h"
-#include "platform/linux/property_lists/libplist_writer.h"
+#include "platform/linux/property_lists/libplist_conversion.h"
 
 namespace platform {
 namespace {

@@ -1,4 +1,4 @@
-#include "platform/linux/property_lists/libplist_writer.h"
+#include "platform/linux/property_lists/libplist_conversion.h"
 
 #include <limits>
 #include <string>
@@ -7,7 +7,6 @@
 
 #include "platform/linux/property_lists/binary_plist_scan.h"
 #include "platform/linux/property_lists/libplist_node.h"
-#include "platform/linux/property_lists/libplist_reader.h"
 
 namespace platform {
 namespace {

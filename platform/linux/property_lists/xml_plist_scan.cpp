@@ -3,10 +3,10 @@
 #include <algorithm>
 #include <cstdint>
 #include <string_view>
+#include <unordered_set>
 #include <vector>
 
 #include "platform/linux/property_lists/libplist_node.h"
-#include "platform/linux/property_lists/xml_key_cost.h"
 #include "platform/linux/property_lists/xml_text_repair.h"
 
 namespace platform {
@@ -19,6 +19,50 @@ constexpr char kNoUtf8 = '\xFF';
 // libplist moves the rest of a text for each entity in it.
 constexpr std::uint64_t kMostMovedBytes = std::uint64_t{1} << 33U;
 constexpr std::uint64_t kMostKeySteps = std::uint64_t{1} << 24U;
+
+constexpr std::size_t kTableFrom = 250;  // libplist counts keys and values
+constexpr std::size_t kTableSize = 4096;
+
+std::uint32_t tableHash(std::string_view key) {
+  std::uint32_t hash = 5381;
+  for (const char character : key) hash = hash * 33 + static_cast<std::uint32_t>(character);
+  return hash;
+}
+
+// What libplist spends on the keys of one XML dictionary: it searches all entries for each new key, from some 500 on
+// through a table of fixed size, and walks to the place of a key that comes again. Keys can be made to fall into one
+// place of that table, or to come again and again.
+class XmlKeyCost {
+ public:
+  // The steps that this key takes, given those before it. A key with entities or sections in it counts as the dearest,
+  // since its characters are not known here.
+  std::uint64_t add(std::string_view key, bool isPlain);
+
+ private:
+  bool record(std::uint32_t hash);
+
+  std::vector<std::uint32_t> _hashes;
+  std::unordered_set<std::uint32_t> _known;  // the same, from where the library has its table on
+  std::vector<std::uint32_t> _chains;        // how many keys share a place of the table
+};
+
+std::uint64_t XmlKeyCost::add(std::string_view key, bool isPlain) {
+  const std::uint32_t hash = tableHash(key);
+  _hashes.push_back(hash);
+  if (_hashes.size() <= kTableFrom) return _hashes.size();
+  if (_chains.empty()) {
+    _chains.resize(kTableSize);
+    for (const std::uint32_t earlier : _hashes) record(earlier);
+    return _hashes.size();
+  }
+  const bool isNew = record(hash);
+  return isNew && isPlain ? _chains[hash % kTableSize] : _hashes.size();
+}
+
+bool XmlKeyCost::record(std::uint32_t hash) {
+  ++_chains[hash % kTableSize];
+  return _known.insert(hash).second;
+}
 
 class Scan {
  public:
@@ -136,7 +180,7 @@ class Scan {
   [[nodiscard]] bool push(Open kind) {
     _open.push_back(kind);
     if (kind != Open::plist) _containers.push_back({kind == Open::dictionary});
-    return _containers.size() <= kDeepestNesting || refuse(Cause::excessive);
+    return _containers.size() <= kDeepestNesting || giveUp(Cause::excessive);
   }
 
   [[nodiscard]] bool pop(Open kind) {
@@ -152,7 +196,7 @@ class Scan {
     const bool isContainer = tag.name == "dict" || tag.name == "array";
     const bool isRoot = _containers.empty();
     if (isRoot && tag.name != "dict")
-      return refuse(isContainer || isScalar(tag.name) ? Cause::unsuitable : Cause::malformed);
+      return giveUp(isContainer || isScalar(tag.name) ? Cause::unsuitable : Cause::malformed);
     if (isRoot && tag.isEmpty) return keepEmptyRoot();
     if (tag.isEmpty) return isContainer || isScalar(tag.name);
     if (isContainer) return push(tag.name == "dict" ? Open::dictionary : Open::array);
@@ -221,7 +265,7 @@ class Scan {
       const std::span<char> text = _file.subspan(part.begin, part.end - part.begin);
       if (!part.isVerbatim) _movedBytes += repairXmlText(text) * text.size();
     }
-    return _movedBytes <= kMostMovedBytes || refuse(Cause::excessive);
+    return _movedBytes <= kMostMovedBytes || giveUp(Cause::excessive);
   }
 
   [[nodiscard]] bool countKey(const Tag& tag) {
@@ -229,7 +273,7 @@ class Scan {
     const std::string_view key = _text.substr(_parts.front().begin, _parts.front().end - _parts.front().begin);
     const bool isPlain = _parts.size() == 1 && key.find('&') == std::string_view::npos;
     _keySteps += _containers.back().keys.add(key, isPlain);
-    return _keySteps <= kMostKeySteps || refuse(Cause::excessive);
+    return _keySteps <= kMostKeySteps || giveUp(Cause::excessive);
   }
 
   // libplist takes of data no more than stands before the first comment.
@@ -240,7 +284,7 @@ class Scan {
     }
   }
 
-  [[nodiscard]] bool refuse(Cause cause) {
+  [[nodiscard]] bool giveUp(Cause cause) {
     _refusal = cause;
     return false;
   }

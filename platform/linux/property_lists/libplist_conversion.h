@@ -1,6 +1,7 @@
 #pragma once
 
 #include <cstddef>
+#include <memory>
 #include <string>
 
 #include "platform/property_value.h"
@@ -22,6 +23,9 @@ struct ParsedPropertyList {
 // (see property_list_store.h), and `attempt` is what was tried. The bytes are this function's own: values that are
 // merely malformed are repaired in them.
 Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt);
+
+// The dictionary as a binary property list, read back and compared before it is answered. Never null.
+Result<std::shared_ptr<const Bytes>> writePropertyList(const Dictionary& dictionary);
 
 // Whether a binary property list that is safe for libplist holds exactly these values in their order.
 [[nodiscard]] bool readsBackAs(const Bytes& safe, const Dictionary& values);

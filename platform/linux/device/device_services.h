@@ -1,14 +1,21 @@
 #pragma once
 
+#include <chrono>
+#include <functional>
 #include <memory>
 
 #include "platform/base_directories.h"
+#include "platform/clock.h"
 #include "platform/device_info_query.h"
+#include "platform/export.h"
 #include "platform/external_sources_query.h"
+#include "platform/localized_strings.h"
+#include "platform/preferences_store.h"
 #include "platform/profile_restrictions.h"
 #include "platform/property_list_store.h"
 #include "platform/system_account_query.h"
 #include "platform/tethered_sync_query.h"
+#include "platform/unique_identifiers.h"
 
 namespace platform {
 
@@ -18,9 +25,10 @@ struct DeviceConfiguration {
   std::shared_ptr<BaseDirectories> directories;
   std::shared_ptr<PropertyListStore> propertyLists;
 
-  // The dictionary in ROOT/etc/vorlix/NAME or HOME/Library/Preferences/NAME.
+  // The dictionary in ROOT/etc/vorlix/NAME, HOME/Library/Preferences/NAME or RESOURCES/NAME.
   [[nodiscard]] Result<Dictionary> ofSystem(std::string_view name) const;
   [[nodiscard]] Result<Dictionary> ofUser(std::string_view name) const;
+  [[nodiscard]] Result<Dictionary> ofProduct(const Path& name) const;
 };
 
 // ROOT/etc/vorlix/device-info.plist: the keys of the questions. Without an answer there, "CPUArchitecture" is the
@@ -41,5 +49,25 @@ struct DeviceConfiguration {
 
 // Fixed for every device.
 [[nodiscard]] std::shared_ptr<SystemAccountQuery> makeSystemAccountQuery();
+
+// The preferences that the user's home directory holds: the domain's switches are the keys of the property list
+// HOME/Library/Preferences/DOMAIN.plist.
+[[nodiscard]] std::shared_ptr<PreferencesStore> makePreferencesStore(DeviceConfiguration configuration);
+
+// String tables lie in the resources as property lists, one dictionary from key to text each:
+//
+//   RESOURCES/strings/LANGUAGE/TABLE.strings
+//
+// LANGUAGE is a locale's name without encoding ("pt_BR", "pt", "en"). The user's language is that of the environment
+// (LC_ALL, LC_MESSAGES, LANG); a key is looked up in its table, then in those of the ever more general languages
+// ("pt_BR", "pt"), then in English. A table is read once.
+[[nodiscard]] std::shared_ptr<LocalizedStrings> makeLocalizedStrings(DeviceConfiguration configuration);
+
+[[nodiscard]] std::shared_ptr<UniqueIdentifiers> makeUniqueIdentifiers();
+
+using Instant = std::chrono::sys_time<std::chrono::milliseconds>;
+
+// The clock that shows the instant which `now` answers; without one, the system's.
+[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<Clock> makeClock(std::function<Instant()> now = nullptr);
 
 }  // namespace platform

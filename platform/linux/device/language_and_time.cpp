@@ -1,0 +1,126 @@
+#include <dlfcn.h>
+
+#include <algorithm>
+#include <cstdlib>
+#include <map>
+#include <mutex>
+#include <vector>
+
+#include "platform/linux/device/device_services.h"
+#include "platform/linux/device/icu/icu_functions.h"
+#include "platform/linux/files/own_directory.h"
+
+namespace platform {
+namespace {
+
+const IcuFunctions* openedFunctions() {
+  const std::string file = ownDirectory() / "account-settings/platform-icu.so";
+  void* const library = ::dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
+  if (library == nullptr) return nullptr;
+  const auto functions = reinterpret_cast<IcuFunctionsGetter>(::dlsym(library, kIcuFunctionsSymbol));
+  return functions == nullptr ? nullptr : functions();
+}
+
+// ICU's functions, opened by the first who asks. Null where the library that has them does not stand where it was
+// installed or cannot be opened: dates are then not written and texts are in English, but no account waits for that.
+const IcuFunctions* icuFunctions() {
+  static const IcuFunctions* const functions = openedFunctions();
+  return functions;
+}
+
+// --- Texts in the user's language ---
+
+constexpr const char* kBaseLanguage = "en";
+
+std::string localeOfEnvironment() {
+  for (const char* const variable : {"LC_ALL", "LC_MESSAGES", "LANG"}) {
+    const char* const value = std::getenv(variable);
+    if (value != nullptr && *value != '\0') return value;
+  }
+  return {};
+}
+
+// Whatever the environment says becomes part of a path only as a plain name.
+bool isLanguageName(std::string_view name) {
+  return !name.empty() && std::all_of(name.begin(), name.end(), [](char letter) {
+    return (letter >= 'a' && letter <= 'z') || (letter >= 'A' && letter <= 'Z') || (letter >= '0' && letter <= '9') ||
+           letter == '_';
+  });
+}
+
+// The locale in which there is no user and no language. A device starts in it, and ICU is not needed to know that.
+bool isOfNobody(std::string_view locale) {
+  const std::string_view name = locale.substr(0, locale.find('.'));
+  return name.empty() || name == "C" || name == "POSIX";
+}
+
+// The user's language and the more general ones, then English.
+std::vector<std::string> languages() {
+  const std::string environment = localeOfEnvironment();
+  const IcuFunctions* const icu = isOfNobody(environment) ? nullptr : icuFunctions();
+  std::vector<std::string> names = icu == nullptr ? std::vector<std::string>{} : icu->localeNames(environment);
+  names.erase(std::ranges::find_if_not(names, isLanguageName), names.end());
+  names.emplace_back(kBaseLanguage);
+  return names;
+}
+
+class LinuxLocalizedStrings final : public LocalizedStrings {
+ public:
+  explicit LinuxLocalizedStrings(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
+
+  [[nodiscard]] std::optional<std::string> text(std::string_view table, std::string_view key) const override {
+    if (table.find('/') != std::string_view::npos) return std::nullopt;
+    const std::string file = std::string{table} + ".strings";
+    for (const std::string& language : languages()) {
+      const Dictionary entries = tableAt(Path{language} / file);
+      if (const Text* const found = entries.text(key)) return found->string();
+    }
+    return std::nullopt;
+  }
+
+ private:
+  [[nodiscard]] Dictionary tableAt(const Path& name) const {
+    const std::scoped_lock lock{_guard};
+    const auto known = _tables.find(name);
+    if (known != _tables.end()) return known->second;
+    Dictionary entries = _configuration.ofProduct(Path{"strings"} / name).valueOr({});
+    return _tables.emplace(name, std::move(entries)).first->second;
+  }
+
+  DeviceConfiguration _configuration;
+  mutable std::mutex _guard;
+  mutable std::map<Path, Dictionary> _tables;
+};
+
+// --- The time of day ---
+
+Instant systemInstant() { return std::chrono::floor<std::chrono::milliseconds>(std::chrono::system_clock::now()); }
+
+class LinuxClock final : public Clock {
+ public:
+  explicit LinuxClock(std::function<Instant()> now) : _now{std::move(now)} {}
+
+  Result<std::string> currentLocalTime(std::string_view pattern) const override {
+    const IcuFunctions* const icu = icuFunctions();
+    if (icu == nullptr) return Status::failure(Cause::missing, "tell the time", "there is no date library");
+    std::optional<std::string> time = icu->localTime(_now().time_since_epoch().count(), pattern);
+    if (time) return *std::move(time);
+    return Status::failure(Cause::unsuitable, "tell the time",
+                           "there is no such date pattern: " + std::string{pattern});
+  }
+
+ private:
+  std::function<Instant()> _now;
+};
+
+}  // namespace
+
+std::shared_ptr<LocalizedStrings> makeLocalizedStrings(DeviceConfiguration configuration) {
+  return std::make_shared<LinuxLocalizedStrings>(std::move(configuration));
+}
+
+std::shared_ptr<Clock> makeClock(std::function<Instant()> now) {
+  return std::make_shared<LinuxClock>(now ? std::move(now) : &systemInstant);
+}
+
+}  // namespace platform
