@@ -12,6 +12,10 @@ complete -c migration-host -l dry-run
 complete -c migration-host -l snapshots -r -a '(__fish_complete_directories)'
 complete -c migration-host -l keep -x
 complete -c migration-host -l list-snapshots -a json
+complete -c migration-host -l if-needed
 complete -c migration-host -l restore -x
+complete -c migration-host -l undo
+complete -c migration-host -l release -x
+complete -c migration-host -l of -x
 complete -c migration-host -l help -s h
 complete -c migration-host -l version
