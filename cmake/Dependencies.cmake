@@ -10,7 +10,6 @@ pkg_check_modules(utf8proc REQUIRED IMPORTED_TARGET libutf8proc)
 find_package(utf8cpp REQUIRED)
 find_package(CLI11 REQUIRED)
 find_package(ICU REQUIRED COMPONENTS i18n uc)
-find_package(sdbus-c++ REQUIRED)
 find_package(nlohmann_json REQUIRED)
 
 if(ACCOUNTS_TESTS)

@@ -1,10 +1,10 @@
 // Tells every program on the device of account changes, by signals on the system bus. com.vorlix.Accounts1.xml
 // describes them.
 
-#include <sdbus-c++/sdbus-c++.h>
+#include <systemd/sd-bus.h>
 
 #include <chrono>
-#include <map>
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -20,76 +20,141 @@ namespace {
 using accountsettings::AccountClassInfo;
 using platform::Dictionary;
 using platform::PropertyValue;
-using Entry = std::map<std::string, sdbus::Variant>;
+using std::chrono::microseconds;
 
 constexpr const char* kPath = "/com/vorlix/Accounts";
 constexpr const char* kInterface = "com.vorlix.Accounts1";
-constexpr std::chrono::seconds kPatience{1};
+constexpr microseconds kPatience = std::chrono::seconds{1};
+
+struct MessageReleaser {
+  void operator()(sd_bus_message* message) const { ::sd_bus_message_unref(message); }
+};
+using Message = std::unique_ptr<sd_bus_message, MessageReleaser>;
+
+Message newMessage(int result, sd_bus_message* made) { return Message{result < 0 ? nullptr : made}; }
+
+Message newSignal(sd_bus& bus, const char* name) {
+  sd_bus_message* made = nullptr;
+  return newMessage(::sd_bus_message_new_signal(&bus, &made, kPath, kInterface, name), made);
+}
 
 // Returns once the bus has taken everything that was sent before, so that signals keep their order whoever sends the
 // next one, and none is lost when the process ends.
-void waitForBus(sdbus::IConnection& connection) {
-  std::string identifier;
-  sdbus::createProxy(connection, "org.freedesktop.DBus", "/org/freedesktop/DBus")
-      ->callMethod("GetId")
-      .onInterface("org.freedesktop.DBus")
-      .withTimeout(kPatience)
-      .storeResultsTo(identifier);
+void waitForBus(sd_bus& bus) {
+  sd_bus_message* made = nullptr;
+  const auto question =
+      newMessage(::sd_bus_message_new_method_call(&bus, &made, "org.freedesktop.DBus", "/org/freedesktop/DBus",
+                                                  "org.freedesktop.DBus", "GetId"),
+                 made);
+  if (question == nullptr) return;
+  sd_bus_message* reply = nullptr;
+  ::sd_bus_call(&bus, question.get(), static_cast<std::uint64_t>(kPatience.count()), nullptr, &reply);
+  const Message released{reply};
 }
 
-// Without a bus nothing happens. A connection of its own for each signal asks nothing of the process: no event loop, no
-// thread, nothing to carry over a fork or a restart of the bus.
-template <typename... Arguments>
-void announce(const char* signalName, const Arguments&... arguments) noexcept {
-  try {
-    if (platform::openSystemBus() == nullptr) return;  // sdbus would wait for one that does not answer
-    const auto connection = sdbus::createSystemBusConnection();
-    const auto object = sdbus::createObject(*connection, kPath);
-    auto signal = object->createSignal(kInterface, signalName);
-    static_cast<void>((signal << ... << arguments));
-    object->emitSignal(signal);
-    waitForBus(*connection);
-  } catch (...) {  // NOLINT(bugprone-empty-catch): an account change never fails for want of listeners
+// Adds a signal's arguments. After the first that cannot be added, such as a text that no message can carry, nothing
+// more is.
+class Arguments {
+ public:
+  explicit Arguments(sd_bus_message& signal) : _signal{signal} {}
+
+  void open(char kind, const char* contents) { attempt(&::sd_bus_message_open_container, kind, contents); }
+  void close() { attempt(&::sd_bus_message_close_container); }
+  void add(const std::string& text) { attempt(&::sd_bus_message_append_basic, SD_BUS_TYPE_STRING, text.c_str()); }
+  void add(std::int32_t number) { attempt(&::sd_bus_message_append_basic, SD_BUS_TYPE_INT32, &number); }
+  [[nodiscard]] bool areComplete() const { return _areComplete; }
+
+ private:
+  template <typename Call, typename... Given>
+  void attempt(Call call, Given... given) {
+    _areComplete = _areComplete && call(&_signal, given...) >= 0;
   }
+
+  sd_bus_message& _signal;
+  bool _areComplete = true;
+};
+
+// Without a bus nothing happens. A connection of its own for each
+// signal asks nothing of the process: no event loop, no thread, nothing to carry over a fork or a restart of the bus.
+template <typename Fill>
+void announce(const char* name, const Fill& fill) try {
+  const auto bus = platform::openSystemBus();
+  const auto signal = bus == nullptr ? nullptr : newSignal(*bus, name);
+  if (signal == nullptr) return;
+  Arguments arguments{*signal};
+  fill(arguments);
+  if (arguments.areComplete() && ::sd_bus_send(bus.get(), signal.get(), nullptr) >= 0) waitForBus(*bus);
+} catch (...) {  // NOLINT(bugprone-empty-catch): an account change never fails for want of listeners, or of memory
 }
 
-std::vector<std::string> textsOf(const platform::Array& array) {
-  std::vector<std::string> texts;
+void announceDataclass(const char* name, std::string_view identifier, std::string_view dataclass) {
+  const std::string texts[] = {std::string{identifier}, std::string{dataclass}};
+  announce(name, [&](Arguments& arguments) {
+    for (const std::string& text : texts) arguments.add(text);
+  });
+}
+
+// --- Change entries ---
+
+void addTexts(Arguments& arguments, const platform::Array& array) {
+  arguments.open(SD_BUS_TYPE_VARIANT, "as");
+  arguments.open(SD_BUS_TYPE_ARRAY, "s");
   for (const PropertyValue& element : array) {
-    if (const auto* const text = element.asText()) texts.push_back(text->string());
+    if (const auto* const text = element.asText()) arguments.add(text->string());
   }
-  return texts;
+  arguments.close();
+  arguments.close();
 }
 
-// A change entry as a D-Bus dictionary. Only what has the type that the interface promises is passed on.
-Entry entryOf(const Dictionary& change) {
-  Entry entry;
-  for (const auto& [key, value] : change) {
-    if (const auto* const text = value.asText()) {
-      entry.emplace(key.string(), sdbus::Variant{text->string()});
-    } else if (const auto* const array = value.asArray()) {
-      entry.emplace(key.string(), sdbus::Variant{textsOf(*array)});
-    } else if (value.asInteger()) {
-      entry.emplace(key.string(), sdbus::Variant{static_cast<std::int32_t>(value.integerValue().value_or(0))});
-    }
+template <typename Value>
+void addVariant(Arguments& arguments, const char* kind, const Value& value) {
+  arguments.open(SD_BUS_TYPE_VARIANT, kind);
+  arguments.add(value);
+  arguments.close();
+}
+
+// Whether the value has a type that the interface promises; nothing else is passed on.
+bool isPassedOn(const PropertyValue& value) {
+  return value.asText() != nullptr || value.asArray() != nullptr || value.asInteger().has_value();
+}
+
+void addValue(Arguments& arguments, const PropertyValue& value) {
+  if (const auto* const text = value.asText()) {
+    addVariant(arguments, "s", text->string());
+  } else if (const auto* const array = value.asArray()) {
+    addTexts(arguments, *array);
+  } else {
+    addVariant(arguments, "i", static_cast<std::int32_t>(value.integerValue().value_or(0)));
   }
-  return entry;
+}
+
+void addEntry(Arguments& arguments, const Dictionary& change) {
+  arguments.open(SD_BUS_TYPE_ARRAY, "{sv}");
+  for (const auto& [key, value] : change) {
+    if (!isPassedOn(value)) continue;
+    arguments.open(SD_BUS_TYPE_DICT_ENTRY, "sv");
+    arguments.add(key.string());
+    addValue(arguments, value);
+    arguments.close();
+  }
+  arguments.close();
 }
 
 void noteAccountChanges(const std::vector<Dictionary>& changes) {
-  std::vector<Entry> entries;
-  entries.reserve(changes.size());
-  for (const Dictionary& change : changes) entries.push_back(entryOf(change));
-  announce("AccountsChanged", entries);
+  announce("AccountsChanged", [&](Arguments& arguments) {
+    arguments.open(SD_BUS_TYPE_ARRAY, "a{sv}");
+    for (const Dictionary& change : changes) addEntry(arguments, change);
+    arguments.close();
+  });
 }
 
 std::shared_ptr<const AccountClassInfo> announcer() {
   auto info = std::make_shared<AccountClassInfo>("AccountAnnouncer");
   info->accountWillChange_forDataclass = [](std::string_view identifier, std::string_view dataclass) {
-    announce("AccountWillChange", std::string{identifier}, std::string{dataclass});
+    announceDataclass("AccountWillChange", identifier, dataclass);
   };
   info->accountDidChange_forDataclass = [](std::string_view identifier, std::string_view dataclass) {
-    announce("AccountDidChange", std::string{identifier}, std::string{dataclass});
+    announceDataclass("AccountDidChange", identifier, dataclass);
   };
   info->noteAccountChanges = noteAccountChanges;
   return info;

@@ -19,6 +19,11 @@ constexpr const char* kHidden = "<hidden>";
 
 Json jsonOf(const std::optional<Text>& text) { return text ? Json(text->string()) : Json(nullptr); }
 
+bool isDeviceLocal(const BasicAccount& account) {
+  const auto type = account.type();
+  return type && *type == accountsettings::kOnMyDeviceAccountType;
+}
+
 Json numberOf(const PropertyValue& value) {
   const auto integer = value.asInteger();
   if (!integer) return *value.asReal();
@@ -43,10 +48,17 @@ std::string joinedDataclasses(const BasicAccount::Dataclasses& dataclasses) {
 }
 
 std::string nameOf(const BasicAccount& account) {
-  const auto type = account.type();
-  const bool isDeviceLocal = type && *type == accountsettings::kOnMyDeviceAccountType;
-  if (isDeviceLocal) return accountsettings::DeviceLocalAccount::class_typeString();
+  if (isDeviceLocal(account)) return accountsettings::DeviceLocalAccount::class_typeString();
   return account.displayName().value_or(Text{}).string();
+}
+
+std::string ownText(const BasicAccount& account, std::string_view key) {
+  const Text* const text = account.properties().text(key);
+  return text == nullptr ? std::string{} : text->string();
+}
+
+std::string ownName(const BasicAccount& account) {
+  return isDeviceLocal(account) ? nameOf(account) : ownText(account, accountsettings::kAccountDisplayName);
 }
 
 ChildrenByParent childrenByParent(const AccountsManager& accounts) {

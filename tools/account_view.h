@@ -15,8 +15,14 @@ namespace tools {
 // "Mail, Notes".
 [[nodiscard]] std::string joinedDataclasses(const BasicAccount::Dataclasses& dataclasses);
 
+// The key under which accounts of most types have the name of their server.
+constexpr std::string_view kAccountHost = "Hostname";
+
 // What people call the account; empty where it has no name.
 [[nodiscard]] std::string nameOf(const BasicAccount& account);
+// A text of the account's own, not of its parent; empty where it has none. The second is its name, as nameOf has it.
+[[nodiscard]] std::string ownText(const BasicAccount& account, std::string_view key);
+[[nodiscard]] std::string ownName(const BasicAccount& account);
 // The indexed children of all top-level accounts by their parent, each parent's in order.
 using ChildrenByParent = std::unordered_map<const BasicAccount*, std::vector<Account>>;
 [[nodiscard]] ChildrenByParent childrenByParent(const AccountsManager& accounts);

@@ -3,6 +3,7 @@
 #include <functional>
 #include <nlohmann/json.hpp>
 
+#include "platform/characters.h"
 #include "tools/account_view.h"
 #include "tools/commands.h"
 #include "tools/key_value.h"
@@ -15,7 +16,7 @@ using accountsettings::Text;
 using Json = nlohmann::ordered_json;
 using Dataclasses = BasicAccount::Dataclasses;
 
-[[noreturn]] void refuse(const std::string& message) { throw Failure{ExitStatus::wrongUse, message}; }
+[[noreturn]] void refuseUse(const std::string& message) { throw Failure{ExitStatus::wrongUse, message}; }
 
 std::string printedChange(const BasicAccount& account, bool asJson) {
   return asJson ? Json{{"account", jsonOf(account)}}.dump(2) + "\n" : std::string{};
@@ -52,23 +53,36 @@ void changeAndSave(Session& session, const Account& account, const Dataclasses& 
 
 Dataclasses enabledOf(const BasicAccount& account) { return account.enabledDataclasses().value_or(Dataclasses{}); }
 
+// The data class of those that the name means, in short or in full, in whatever case; null where it is none of them.
+const Text* dataclassNamed(const std::string& name, const Dataclasses& dataclasses) {
+  const std::string meant = platform::caseFolded(fullDataclass(name));
+  const auto found = std::ranges::find_if(dataclasses, [&](const Text& each) {
+    return platform::caseFolded(each) == meant || platform::caseFolded(each) == platform::caseFolded(name);
+  });
+  return found == dataclasses.end() ? nullptr : &*found;
+}
+
+std::string hintForDataclass(const std::string& name, const Dataclasses& dataclasses) {
+  std::vector<std::string> names;
+  for (const Text& each : dataclasses) names.push_back(shortDataclass(each));
+  return commandline::hintFor(shortDataclass(name), names);
+}
+
 // The data class that the name means for the account.
 Text supportedDataclass(const BasicAccount& account, const std::string& name) {
   const auto& supported = account.supportedDataclasses();
-  const auto found = std::ranges::find_if(supported, [&](const Text& each) {
-    return each == std::string_view{name} || each == std::string_view{fullDataclass(name)};
-  });
-  if (found != supported.end()) return *found;
-  const auto& known = BasicAccount::allSupportedDataclasses();
-  const bool isKnown = std::ranges::find(known, Text{fullDataclass(name)}) != known.end();
-  if (!isKnown) refuse("unknown data class: " + name);
-  refuse("accounts of the type " + account.type().value_or(Text{}).string() + " do not support " +
-         shortDataclass(name));
+  if (const Text* const found = dataclassNamed(name, supported)) return *found;
+  const Text* const known = dataclassNamed(name, BasicAccount::allSupportedDataclasses());
+  if (known == nullptr) {
+    throw Failure{ExitStatus::wrongUse, "unknown data class: " + name, hintForDataclass(name, supported)};
+  }
+  refuseUse("accounts of the type " + account.type().value_or(Text{}).string() + " do not support " +
+            shortDataclass(*known));
 }
 
 std::string switchDataclass(Session& session, const Words& arguments, bool asJson, bool enabled) {
   session.beginChanges();
-  const auto account = session.accountWithIdentifier(arguments[0]);
+  const auto account = session.accountMeantBy(arguments[0]);
   const auto dataclass = supportedDataclass(*account, arguments[1]);
   changeAndSave(session, account, {dataclass}, [&] {
     account->setEnabled_forDataclass(enabled, dataclass);
@@ -78,19 +92,19 @@ std::string switchDataclass(Session& session, const Words& arguments, bool asJso
 }
 
 Dictionary typeAndClass(const std::string& type, const std::string& className) {
-  if (!BasicAccount::_isValidAccountType(type)) refuse("unknown account type: " + type);
-  if (className.empty()) refuse("an account needs a class");
+  if (!BasicAccount::_isValidAccountType(type)) refuseUse("unknown account type: " + type);
+  if (className.empty()) refuseUse("an account needs a class");
   return {{accountsettings::kAccountType, type}, {accountsettings::kAccountClass, className}};
 }
 
 void setProperty(Dictionary& properties, const KeyValue& property, std::size_t position) {
   const auto place = "property " + std::to_string(position);
   if (property.key == accountsettings::kAccountType || property.key == accountsettings::kAccountClass) {
-    refuse(place + " sets " + property.key + ", which stands before the properties");
+    refuseUse(place + " sets " + property.key + ", which stands before the properties");
   }
   const auto* const text = property.value.asText();
   const bool hasText = text != nullptr && !text->empty();
-  if (property.key == accountsettings::kAccountIdentifier && !hasText) refuse(place + " is no identifier");
+  if (property.key == accountsettings::kAccountIdentifier && !hasText) refuseUse(place + " is no identifier");
   properties.set(property.key, property.value);
 }
 
@@ -122,47 +136,47 @@ void removeEveryRecord(AccountsManager& accounts, const Account& account) {
 
 }  // namespace
 
-Outcome enableDataclass(Session& session, const Words& arguments, bool asJson) {
-  return switchDataclass(session, arguments, asJson, true);
+Outcome enableDataclass(Session& session, const Words& arguments, const Options& options) {
+  return switchDataclass(session, arguments, options.printsJson, true);
 }
 
-Outcome disableDataclass(Session& session, const Words& arguments, bool asJson) {
-  return switchDataclass(session, arguments, asJson, false);
+Outcome disableDataclass(Session& session, const Words& arguments, const Options& options) {
+  return switchDataclass(session, arguments, options.printsJson, false);
 }
 
-Outcome renameAccount(Session& session, const Words& arguments, bool asJson) {
-  if (arguments[1].empty()) refuse("an account's name cannot be empty");
+Outcome renameAccount(Session& session, const Words& arguments, const Options& options) {
+  if (arguments[1].empty()) refuseUse("an account's name cannot be empty");
   session.beginChanges();
-  const auto account = session.accountWithIdentifier(arguments[0]);
+  const auto account = session.accountMeantBy(arguments[0]);
   const auto type = account->type();
-  if (type && *type == accountsettings::kOnMyDeviceAccountType) refuse("the device's own account has a fixed name");
+  if (type && *type == accountsettings::kOnMyDeviceAccountType) refuseUse("the device's own account has a fixed name");
   changeAndSave(session, account, enabledOf(*account), [&] {
     account->setDisplayName(arguments[1]);
     Session::keepChanges(account);
   });
-  return printedChange(*account, asJson);
+  return printedChange(*account, options.printsJson);
 }
 
-Outcome addAccount(Session& session, const Words& arguments, bool asJson) {
+Outcome addAccount(Session& session, const Words& arguments, const Options& options) {
   session.beginChanges();
   const auto account = newAccount(arguments);
   const auto identifier = account->identifier().value_or(Text{}).string();
-  if (isRegistered(session, *account)) refuse("there is an account with the identifier " + identifier);
+  if (isRegistered(session, *account)) refuseUse("there is an account with the identifier " + identifier);
   changeAndSave(session, account, enabledOf(*account), [&] { session.accounts().insertAccount(account); });
-  return asJson ? printedChange(*account, true) : identifier + "\n";
+  return options.printsJson ? printedChange(*account, true) : identifier + "\n";
 }
 
-Outcome removeAccount(Session& session, const Words& arguments, bool asJson) {
+Outcome removeAccount(Session& session, const Words& arguments, const Options& options) {
   session.beginChanges();
-  const auto account = session.accountWithIdentifier(arguments[0]);
+  const auto account = session.accountMeantBy(arguments[0]);
   changeAndSave(session, account, enabledOf(*account), [&] { removeEveryRecord(session.accounts(), account); });
-  return asJson ? Json{{"removed", arguments[0]}}.dump(2) + "\n" : std::string{};
+  return options.printsJson ? Json{{"removed", jsonOf(*account)["identifier"]}}.dump(2) + "\n" : std::string{};
 }
 
-Outcome saveAccounts(Session& session, const Words&, bool asJson) {
+Outcome saveAccounts(Session& session, const Words&, const Options& options) {
   session.beginChanges();
   session.save();
-  return asJson ? Json{{"saved", session.accounts().count()}}.dump(2) + "\n" : std::string{};
+  return options.printsJson ? Json{{"saved", session.accounts().count()}}.dump(2) + "\n" : std::string{};
 }
 
 }  // namespace tools

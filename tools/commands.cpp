@@ -7,20 +7,39 @@ namespace {
 
 constexpr std::size_t kAnyNumber = std::numeric_limits<std::size_t>::max();
 
+constexpr std::string_view kId =
+    "ID is an account's or a child account's identifier, the beginning of one that no other has, or what a person "
+    "calls "
+    "the account: its name, its user name, or user@host, in any case.";
+constexpr std::string_view kIdAndDataclass =
+    "ID is an account's identifier, its unique beginning, name, user name or user@host. DATACLASS is written Mail or "
+    "com.vorlix.Dataclass.Mail, in any case; the account's type must support it.";
+constexpr std::string_view kProperties =
+    "TYPE is one that the command types lists, CLASS the name of the account's class. KEY=VALUE gives a property a "
+    "text, "
+    "KEY:=JSON any other value. Give no password so: other users of the machine see what stands on a command line.";
+
 }  // namespace
 
 const std::vector<Command>& commands() {
   static const std::vector<Command> all{
-      {"list", "", "all accounts, children below their parents", 0, 0, listAccounts},
-      {"show", "ID", "one account with its properties", 1, 1, showAccount},
-      {"verify", "[FILE]", "what a migration would do about each fault", 0, 1, verifySettings},
-      {"types", "", "the account types, with their data classes", 0, 0, listTypes},
-      {"enable", "ID DATACLASS", "switch a data class on", 2, 2, enableDataclass},
-      {"disable", "ID DATACLASS", "switch a data class off", 2, 2, disableDataclass},
-      {"rename", "ID NAME", "change what the account is called", 2, 2, renameAccount},
-      {"add", "TYPE CLASS [KEY=VALUE]...", "add an account and print its identifier", 2, kAnyNumber, addAccount},
-      {"remove", "ID", "remove an account, with its children", 1, 1, removeAccount},
-      {"save", "", "repair what needs it and save the accounts", 0, 0, saveAccounts},
+      {"list", "", "all accounts, children below their parents",
+       "On a terminal, long cells are shortened in the middle so that a line fits; --wide shortens nothing, --columns "
+       "says "
+       "which columns are shown.",
+       0, 0, listAccounts},
+      {"show", "ID", "one account with its properties", kId, 1, 1, showAccount},
+      {"verify", "[FILE]", "what a migration would do about each fault",
+       "Without FILE, the device's own settings file is examined. Nothing is changed.", 0, 1, verifySettings},
+      {"types", "", "the account types, with their data classes", "", 0, 0, listTypes},
+      {"enable", "ID DATACLASS", "switch a data class on", kIdAndDataclass, 2, 2, enableDataclass},
+      {"disable", "ID DATACLASS", "switch a data class off", kIdAndDataclass, 2, 2, disableDataclass},
+      {"rename", "ID NAME", "change what the account is called", kId, 2, 2, renameAccount},
+      {"add", "TYPE CLASS [KEY=VALUE]...", "add an account and print its identifier", kProperties, 2, kAnyNumber,
+       addAccount},
+      {"remove", "ID", "remove an account, with its children", kId, 1, 1, removeAccount},
+      {"save", "", "repair what needs it and save the accounts", "", 0, 0, saveAccounts},
+      {"help", "[COMMAND]", "what a command does and takes", "", 0, 1, helpOnCommand},
   };
   return all;
 }

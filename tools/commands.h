@@ -25,27 +25,36 @@ struct Command {
   std::string_view name;
   std::string_view arguments;  // as the help shows them
   std::string_view summary;
+  std::string_view details;  // for the help on this command alone
   std::size_t fewestArguments;
   std::size_t mostArguments;
-  Outcome (*run)(Session& session, const Words& arguments, bool asJson);
+  Outcome (*run)(Session& session, const Words& arguments, const Options& options);
 };
 
 [[nodiscard]] const std::vector<Command>& commands();
 
+// help.cpp
+[[nodiscard]] std::string help(const Options& options);
+// The command of that name; throws WrongUse where there is none.
+[[nodiscard]] const Command& commandNamed(const std::string& name);
+// How the command is written: "show ID".
+[[nodiscard]] std::string usageOf(const Command& command);
+Outcome helpOnCommand(Session& session, const Words& arguments, const Options& options);
+
 // reports.cpp
-Outcome listAccounts(Session& session, const Words& arguments, bool asJson);
-Outcome showAccount(Session& session, const Words& arguments, bool asJson);
-Outcome listTypes(Session& session, const Words& arguments, bool asJson);
+Outcome listAccounts(Session& session, const Words& arguments, const Options& options);
+Outcome showAccount(Session& session, const Words& arguments, const Options& options);
+Outcome listTypes(Session& session, const Words& arguments, const Options& options);
 
 // verify.cpp; ends with ExitStatus::findings where it has something to tell of the file.
-Outcome verifySettings(Session& session, const Words& arguments, bool asJson);
+Outcome verifySettings(Session& session, const Words& arguments, const Options& options);
 
 // changes.cpp; each saves the accounts.
-Outcome enableDataclass(Session& session, const Words& arguments, bool asJson);
-Outcome disableDataclass(Session& session, const Words& arguments, bool asJson);
-Outcome renameAccount(Session& session, const Words& arguments, bool asJson);
-Outcome addAccount(Session& session, const Words& arguments, bool asJson);
-Outcome removeAccount(Session& session, const Words& arguments, bool asJson);
-Outcome saveAccounts(Session& session, const Words& arguments, bool asJson);
+Outcome enableDataclass(Session& session, const Words& arguments, const Options& options);
+Outcome disableDataclass(Session& session, const Words& arguments, const Options& options);
+Outcome renameAccount(Session& session, const Words& arguments, const Options& options);
+Outcome addAccount(Session& session, const Words& arguments, const Options& options);
+Outcome removeAccount(Session& session, const Words& arguments, const Options& options);
+Outcome saveAccounts(Session& session, const Words& arguments, const Options& options);
 
 }  // namespace tools

@@ -10,7 +10,7 @@ namespace {
 using Json = nlohmann::ordered_json;
 using platform::PropertyValue;
 
-[[noreturn]] void refuse(const std::string& problem, std::size_t position) {
+[[noreturn]] void refuseProperty(const std::string& problem, std::size_t position) {
   throw Failure{ExitStatus::wrongUse, "property " + std::to_string(position) + " " + problem};
 }
 
@@ -26,7 +26,7 @@ PropertyValue valueOf(const Json& json, std::size_t position) {
     for (const auto& element : json) elements.push_back(valueOf(element, position));
     return elements;
   }
-  if (!json.is_object()) refuse("holds null, which is no value", position);
+  if (!json.is_object()) refuseProperty("holds null, which is no value", position);
   platform::Dictionary members;
   for (const auto& [key, member] : json.items()) members.set(key, valueOf(member, position));
   return members;
@@ -34,7 +34,7 @@ PropertyValue valueOf(const Json& json, std::size_t position) {
 
 PropertyValue parsedValue(std::string_view text, std::size_t position) {
   const auto json = Json::parse(text, nullptr, false);
-  if (json.is_discarded()) refuse("is no valid JSON after :=", position);
+  if (json.is_discarded()) refuseProperty("is no valid JSON after :=", position);
   return valueOf(json, position);
 }
 
@@ -42,11 +42,11 @@ PropertyValue parsedValue(std::string_view text, std::size_t position) {
 
 KeyValue parseKeyValue(std::string_view argument, std::size_t position) {
   const auto equals = argument.find('=');
-  if (equals == std::string_view::npos) refuse("is not written KEY=VALUE or KEY:=JSON", position);
+  if (equals == std::string_view::npos) refuseProperty("is not written KEY=VALUE or KEY:=JSON", position);
   const bool isJson = equals > 0 && argument[equals - 1] == ':';
   const auto key = argument.substr(0, isJson ? equals - 1 : equals);
   const auto value = argument.substr(equals + 1);
-  if (key.empty()) refuse("has no key", position);
+  if (key.empty()) refuseProperty("has no key", position);
   return {std::string{key}, isJson ? parsedValue(value, position) : PropertyValue{value}};
 }
 

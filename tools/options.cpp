@@ -1,7 +1,11 @@
 #include "tools/options.h"
 
+#include <unistd.h>
+
 #include <algorithm>
 #include <filesystem>
+#include <optional>
+#include <string_view>
 #include <system_error>
 
 #include "platform/text.h"
@@ -9,9 +13,16 @@
 namespace tools {
 namespace {
 
+using commandline::Form;
 using commandline::WrongUse;
 
-std::vector<commandline::Option> optionsInto(Options& options) {
+// What is taken as it is written, to be looked at when everything is known.
+struct Written {
+  std::optional<std::string> columns;
+  std::optional<std::string> colour;
+};
+
+std::vector<commandline::Option> optionsInto(Options& options, Written& written) {
   return {
       {"--root", "DIR", "the root of the device's file tree (default: /)", &options.device.systemRoot},
       {"--home", "DIR", "the mobile user's home directory (default: the process's; under a root, var/mobile in it)",
@@ -22,6 +33,10 @@ std::vector<commandline::Option> optionsInto(Options& options) {
        "there",
        &options.opensModulesOfOtherRoots},
       {"--json", "", "print JSON", &options.printsJson},
+      {"--columns", "LIST", "of a list: identifier, type, class, name, user, host, enabled", &written.columns},
+      {"--wide", "", "shorten nothing, however narrow the terminal is", &options.printsEverything},
+      {"--color", "", "bold and faint text: =auto, =always or =never",
+       Form{&written.colour, {"auto", "always", "never"}}},
       {"--help,-h", "", "print this text", &options.printsHelp},
       {"--version", "", "print the version", &options.printsVersion},
   };
@@ -35,7 +50,28 @@ void checkWords(const Options& options) {
   throw WrongUse{"argument " + std::to_string(found - words.begin() + 1) + " of " + options.command + " is not UTF-8"};
 }
 
+std::vector<std::string> partsOf(std::string_view list) {
+  std::vector<std::string> parts;
+  while (true) {
+    const auto part = list.substr(0, list.find(','));
+    parts.emplace_back(part);
+    if (part.size() == list.size()) return parts;
+    list.remove_prefix(part.size() + 1);
+  }
+}
+
+commandline::Colour colourFor(const std::string& form) {
+  if (form == "auto") return commandline::Colour::automatic;
+  return form == "never" ? commandline::Colour::never : commandline::Colour::always;
+}
+
 }  // namespace
+
+commandline::Page Options::page() const {
+  auto page = commandline::pageOn(STDOUT_FILENO, colour);
+  if (printsEverything) page.columns.reset();
+  return page;
+}
 
 bool Options::opensModules() const {
   if (!device.systemRoot || opensModulesOfOtherRoots) return true;
@@ -45,7 +81,10 @@ bool Options::opensModules() const {
 
 Options parseArguments(std::span<const char* const> arguments) {
   Options options;
-  auto words = commandline::readOptions(optionsInto(options), arguments);
+  Written written;
+  auto words = commandline::readOptions(optionsInto(options, written), arguments);
+  if (written.columns) options.columns = partsOf(*written.columns);
+  if (written.colour) options.colour = colourFor(*written.colour);
   if (!words.empty()) {
     options.command = std::move(words.front());
     if (options.command.empty()) throw WrongUse{"unknown command: "};
@@ -61,7 +100,8 @@ Options parseArguments(std::span<const char* const> arguments) {
 
 std::string helpOfOptions(const commandline::Page& page) {
   Options options;
-  return commandline::helpOf(optionsInto(options), page);
+  Written written;
+  return commandline::helpOf(optionsInto(options, written), page);
 }
 
 }  // namespace tools

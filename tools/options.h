@@ -29,6 +29,9 @@ struct Options {
   platform::LinuxPlatformOptions device;
   bool opensModulesOfOtherRoots = false;
   bool printsJson = false;
+  bool printsEverything = false;  // however narrow the terminal is
+  commandline::Colour colour = commandline::Colour::automatic;
+  std::vector<std::string> columns;  // of a list of accounts; empty for the usual ones
   bool printsHelp = false;
   bool printsVersion = false;
   std::string command;                 // empty where none is given
@@ -37,6 +40,8 @@ struct Options {
   // Whether the device's modules may be opened, and so whether anybody can be told of changes. The modules of an image
   // that is merely mounted somewhere are foreign code; they are opened only where that is asked for.
   [[nodiscard]] bool opensModules() const;
+  // How standard output is to be written.
+  [[nodiscard]] commandline::Page page() const;
 };
 
 // Reads the arguments that follow the program's name, as commandline/options.h says. Throws Failure (wrong use) for

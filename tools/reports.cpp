@@ -1,9 +1,16 @@
+#include <unistd.h>
+
+#include <algorithm>
 #include <exception>
+#include <iterator>
 #include <nlohmann/json.hpp>
 #include <optional>
 
 #include "accountsettings/service_objects.h"
+#include "commandline/program.h"
 #include "commandline/table.h"
+#include "platform/characters.h"
+#include "platform/platform.h"
 #include "tools/account_view.h"
 #include "tools/commands.h"
 
@@ -18,11 +25,88 @@ using Rows = std::vector<commandline::Row>;
 
 std::string textOf(const std::optional<Text>& text) { return text ? text->string() : std::string{}; }
 
-commandline::Row rowOf(const BasicAccount& account, std::string_view indentation) {
-  return commandline::Row{std::string{indentation} + textOf(account.identifier()), textOf(account.type()),
-                          textOf(account.accountClass()), nameOf(account),
-                          joinedDataclasses(account.enabledDataclasses().value_or(BasicAccount::Dataclasses{}))};
+// --- The table of accounts ---
+
+struct Column {
+  std::string_view name;  // as --columns has it; in capitals the heading
+  bool isUsual;
+  std::string (*cell)(const BasicAccount& account);
+};
+
+std::string shownName(const BasicAccount& account) {
+  const std::string name = nameOf(account);
+  return name.empty() ? "(no name)" : name;
 }
+
+constexpr Column kColumns[] = {
+    {"identifier", true, [](const BasicAccount& account) { return textOf(account.identifier()); }},
+    {"type", true, [](const BasicAccount& account) { return textOf(account.type()); }},
+    {"class", true, [](const BasicAccount& account) { return textOf(account.accountClass()); }},
+    {"name", true, shownName},
+    {"user", true, [](const BasicAccount& account) { return ownText(account, accountsettings::kAccountUsername); }},
+    {"host", false, [](const BasicAccount& account) { return ownText(account, kAccountHost); }},
+    {"enabled", true,
+     [](const BasicAccount& account) {
+       return joinedDataclasses(account.enabledDataclasses().value_or(BasicAccount::Dataclasses{}));
+     }},
+};
+
+const Column& columnNamed(const std::string& name) {
+  const auto* const found = std::ranges::find(kColumns, platform::caseFolded(name), &Column::name);
+  if (found != std::end(kColumns)) return *found;
+  std::vector<std::string> names;
+  for (const Column& each : kColumns) names.emplace_back(each.name);
+  throw commandline::WrongUse{"unknown column: " + name, commandline::hintFor(name, names)};
+}
+
+std::vector<Column> columnsFor(const Options& options) {
+  std::vector<Column> columns;
+  for (const std::string& name : options.columns) columns.push_back(columnNamed(name));
+  if (columns.empty()) {
+    std::ranges::copy_if(kColumns, std::back_inserter(columns), [](const Column& each) { return each.isUsual; });
+  }
+  return columns;
+}
+
+commandline::Row headingOf(const std::vector<Column>& columns) {
+  std::vector<std::string> cells;
+  for (const Column& column : columns) cells.push_back(platform::upperCased(column.name));
+  return commandline::Row{std::move(cells), commandline::Emphasis::strong};
+}
+
+commandline::Row rowOf(const std::vector<Column>& columns, const BasicAccount& account, std::string_view indentation) {
+  std::vector<std::string> cells;
+  for (const Column& column : columns) cells.push_back(column.cell(account));
+  cells.front().insert(0, indentation);
+  return commandline::Row{std::move(cells)};
+}
+
+std::string counted(std::size_t count, std::string_view what) {
+  return std::to_string(count) + " " + std::string{what} + (count == 1 ? "" : "s");
+}
+
+// "12 accounts, 2 of them in others"
+std::string tally(std::size_t accounts, std::size_t children) {
+  const std::string all = counted(accounts + children, "account");
+  return children == 0 ? all : all + ", " + std::to_string(children) + " of them in others";
+}
+
+bool isThere(const platform::Path& path) { return platform::current().files->kindOf(path).isOk(); }
+
+bool hasLegacyFilesOnly() {
+  return !isThere(AccountsManager::fullPathToAccountSettingsPlist()) &&
+         (isThere(accountsettings::daAccountPath()) || isThere(accountsettings::mailAccountsPath()));
+}
+
+// What a reader of the list cannot see in it.
+void sayWhatIsNotListed() {
+  if (hasLegacyFilesOnly()) {
+    commandline::say("accountctl",
+                     "the device has account files of the first releases alone; a migration converts them");
+  }
+}
+
+// --- One account ---
 
 Json treeOf(ChildrenByParent& byParent, const BasicAccount& account) {
   auto tree = jsonOf(account);
@@ -79,29 +163,36 @@ Rows propertiesOf(const BasicAccount& account) {
 
 }  // namespace
 
-Outcome listAccounts(Session& session, const Words&, bool asJson) {
+Outcome listAccounts(Session& session, const Words&, const Options& options) {
   const auto& accounts = session.accounts();
   auto byParent = childrenByParent(accounts);
-  if (asJson) {
+  if (options.printsJson) {
     Json report{{"version", accounts.dataVersion()}, {"accounts", Json::array()}};
     for (const auto& account : accounts.allBasicAccounts()) report["accounts"].push_back(treeOf(byParent, *account));
     return report.dump(2) + "\n";
   }
-  Rows rows{{"IDENTIFIER", "TYPE", "CLASS", "NAME", "ENABLED"}};
+  const auto columns = columnsFor(options);
+  Rows rows{headingOf(columns)};
   for (const auto& account : accounts.allBasicAccounts()) {
-    rows.push_back(rowOf(*account, ""));
-    for (const auto& child : byParent[account.get()]) rows.push_back(rowOf(*child, "  "));
+    rows.push_back(rowOf(columns, *account, ""));
+    for (const auto& child : byParent[account.get()]) rows.push_back(rowOf(columns, *child, "  "));
   }
-  return commandline::table(rows);
+  sayWhatIsNotListed();
+  const auto page = options.page();
+  const std::size_t top = accounts.allBasicAccounts().size();
+  const bool isForPeople = ::isatty(STDOUT_FILENO) == 1;
+  return commandline::table(rows, page) + (isForPeople ? tally(top, rows.size() - 1 - top) + "\n" : "");
 }
 
-Outcome showAccount(Session& session, const Words& arguments, bool asJson) {
-  const auto account = session.accountWithIdentifier(arguments[0]);
+Outcome showAccount(Session& session, const Words& arguments, const Options& options) {
+  const auto account = session.accountMeantBy(arguments[0]);
   const auto service = serviceOf(session, *account);
   auto byParent = childrenByParent(session.accounts());
-  if (!asJson) {
-    return commandline::table(summaryOf(byParent, account, service)) + "Properties\n" +
-           commandline::table(propertiesOf(*account));
+  if (!options.printsJson) {
+    const auto page = options.page();
+    return commandline::table(summaryOf(byParent, account, service), page) +
+           commandline::emphasised("Properties", commandline::Emphasis::strong, page) + "\n" +
+           commandline::table(propertiesOf(*account), page);
   }
   auto report = treeOf(byParent, *account);
   report["service"] = jsonOf(service);
@@ -109,9 +200,9 @@ Outcome showAccount(Session& session, const Words& arguments, bool asJson) {
   return report.dump(2) + "\n";
 }
 
-Outcome listTypes(Session&, const Words&, bool asJson) {
+Outcome listTypes(Session&, const Words&, const Options& options) {
   Json report{{"types", Json::array()}};
-  Rows rows{{"TYPE", "DATA CLASSES"}};
+  Rows rows{commandline::Row{{"TYPE", "DATA CLASSES"}, commandline::Emphasis::strong}};
   for (const Text& type : BasicAccount::accountTypes()) {
     const auto* const listed = BasicAccount::supportedDataclassesForAccountType(type);
     const auto dataclasses =
@@ -119,7 +210,7 @@ Outcome listTypes(Session&, const Words&, bool asJson) {
     report["types"].push_back({{"type", type.string()}, {"supported", tools::jsonOf(dataclasses)}});
     rows.push_back({type.string(), joinedDataclasses(dataclasses)});
   }
-  return asJson ? report.dump(2) + "\n" : commandline::table(rows);
+  return options.printsJson ? report.dump(2) + "\n" : commandline::table(rows, options.page());
 }
 
 }  // namespace tools

@@ -96,16 +96,6 @@ void Session::loadAccounts() {
   _accounts = std::move(accounts);
 }
 
-Account Session::accountWithIdentifier(std::string_view identifier) {
-  auto found = accounts().accountWithIdentifier(identifier);
-  if (found != nullptr && hasIdentifier(*found, identifier)) return found;
-  // A child's identifier has led to its parent.
-  for (const auto& account : accounts().allBasicSyncableAccounts()) {
-    if (hasIdentifier(*account, identifier)) return account;
-  }
-  throw Failure{ExitStatus::noSuchAccount, "no account has the identifier " + std::string{identifier}};
-}
-
 void Session::beginExamination(const std::optional<platform::Path>& file) {
   auto platform = platform::current();
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();

@@ -26,8 +26,9 @@ class Session {
   // cannot be read as account settings.
   [[nodiscard]] AccountsManager& accounts();
 
-  // The account or child account of that identifier; throws Failure where there is none.
-  [[nodiscard]] Account accountWithIdentifier(std::string_view identifier);
+  // The account or child account that the word means: the one of that identifier, else the only one whose identifier
+  // begins so or that is called so (lookup.cpp says how). Throws Failure where there is none, or more than one.
+  [[nodiscard]] Account accountMeantBy(const std::string& word);
 
   // Makes the session one that only looks and of which nobody is told, not even the log. The settings are read from
   // the file that is named, wherever it lies, else from the device's own once no migration is running. To be called

@@ -98,7 +98,7 @@ std::string jsonFor(const Examined& examined) {
 
 }  // namespace
 
-Outcome verifySettings(Session& session, const Words& arguments, bool asJson) {
+Outcome verifySettings(Session& session, const Words& arguments, const Options& options) {
   const bool isNamed = !arguments.empty();
   if (isNamed && arguments[0].empty()) throw Failure{ExitStatus::wrongUse, "the file to verify has no name"};
   const auto named = isNamed ? std::optional{std::filesystem::absolute(arguments[0])} : std::nullopt;
@@ -106,7 +106,7 @@ Outcome verifySettings(Session& session, const Words& arguments, bool asJson) {
   const auto examined = examine(named.value_or(AccountsManager::fullPathToAccountSettingsPlist()));
   if (isNamed && !examined.exists) throw Failure{ExitStatus::failed, "there is no file " + named->string()};
   const auto status = examined.findings.empty() ? ExitStatus::done : ExitStatus::findings;
-  return {asJson ? jsonFor(examined) : reportFor(examined), status};
+  return {options.printsJson ? jsonFor(examined) : reportFor(examined), status};
 }
 
 }  // namespace tools

@@ -1,6 +1,7 @@
 """What accountctl refuses or fails to do: one clear line, a status that scripts can tell by, and the device as it was."""
 
 import os
+import re
 import subprocess
 import tempfile
 import unittest
@@ -36,6 +37,9 @@ class WrongUse(AccountctlTest):
     def test_of_commands(self):
         self.assert_wrong("no command is given (see --help)")
         self.assert_wrong("unknown command: lst (see --help)", "lst")
+        self.assert_wrong("unknown command: lst (see --help)", "help", "lst")
+        self.assert_wrong("unknown column: nam (see --help)", "list", "--columns=nam")
+        self.assert_wrong("--columns is for list (see --help)", "types", "--columns=name")
         self.assert_wrong("usage: accountctl list", "list", "M1")
         self.assert_wrong("usage: accountctl show ID", "show")
         self.assert_wrong("usage: accountctl enable ID DATACLASS", "enable", "M1")
@@ -43,7 +47,8 @@ class WrongUse(AccountctlTest):
         self.assert_wrong("usage: accountctl add TYPE CLASS [KEY=VALUE]...", "add", "Mail")
 
     def test_of_data_classes(self):
-        self.assert_wrong("unknown data class: mail", "enable", "M1", "mail")
+        self.assert_wrong("unknown data class: mial", "enable", "M1", "mial")
+        self.assert_wrong("accounts of the type Mail do not support Contacts", "enable", "M1", "CONTACTS")
         self.assert_wrong("accounts of the type Mail do not support Contacts", "enable", "M1", "Contacts")
         self.assert_wrong("accounts of the type Mail do not support Contacts", "disable", "M1", "Contacts")
 
@@ -95,6 +100,14 @@ class UnknownAccounts(AccountctlTest):
             with self.subTest(words=words):
                 command, *rest = words
                 self.assert_refused(NO_ACCOUNT, "no account has the identifier M7", command, "M7", *rest)
+
+    def test_are_told_apart_from_those_of_whom_there_are_several(self):
+        self.put(HOME_MAIL, changed(HOME_MAIL, Identifier="M2"), CLOUD)
+        several = "several accounts are meant by "
+        for word in ("m", "home", "ines@imap.example.com"):
+            self.assert_refused(WRONG_USE, f"{several}{word}: M1 (Home), M2 (Home)", "remove", word)
+        self.assert_refused(WRONG_USE, f"{several}ines: M1 (Home), M2 (Home), C1", "rename", "ines", "Work")
+        self.assert_refused(NO_ACCOUNT, "no account has the identifier ", "remove", "")
 
     def test_with_marks_that_steer_a_terminal_are_named_without_them(self):
         self.assert_refused(NO_ACCOUNT, "no account has the identifier a\ufffd[2Jb", "show", "a\x1b[2Jb")
@@ -204,7 +217,19 @@ class Help(AccountctlTest):
             self.assertIn(name, text)
 
     def test_fits_a_terminal(self):
-        self.assertLessEqual(max(map(len, self.done("--help"))), 80)
+        for words in (["--help"], ["-h"], ["help"], ["help", "list"], ["help", "add"]):
+            self.assertLessEqual(max(map(len, self.done(*words))), 80)
+
+    def test_is_the_same_however_it_is_asked_for(self):
+        self.assertEqual(self.done("--help"), self.done("-h"))
+        self.assertEqual(self.done("--help"), self.done("help"))
+
+    def test_on_a_command_says_what_it_does_and_takes(self):
+        for command in re.findall(r"^  ([a-z]+) ", "\n".join(self.done("--help")), re.MULTILINE):
+            with self.subTest(command=command):
+                told = self.done("help", command)
+                self.assertTrue(told[0].startswith(f"Usage: accountctl [OPTION]... {command}"))
+                self.assertGreater(len(told), 2)
 
     def test_version(self):
         self.assertRegex(self.done("--version")[0], r"^accountctl \d+\.\d+\.\d+$")

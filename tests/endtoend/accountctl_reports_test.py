@@ -5,7 +5,7 @@ import plistlib
 import unittest
 
 from accountctl_case import CLOUD, CONTACTS, DIRECTORY, HOME_MAIL, MAIL, NOTES, RESOURCES, AccountctlTest, changed
-from device import SETTINGS
+from device import LEGACY_MAIL, SETTINGS
 
 SECRET = "vy8-Quince"
 
@@ -15,12 +15,12 @@ class Lists(AccountctlTest):
         self.put(HOME_MAIL, CLOUD, DIRECTORY)
         self.assertEqual(
             [
-                "IDENTIFIER  TYPE           CLASS                NAME     ENABLED",
-                "M1          Mail           IMAPAccount          Home     Mail, Notes",
-                "V1          VorlixAccount  KQAccount            Cirrant  Contacts",
-                "  C1        CalDAV         MobileCalDAVAccount  Cirrant  Contacts",
-                "  K1        KeldorIMAP     KeldorIMAPAccount    Cirrant  Contacts",
-                "L1          LDAP           LDAPAccount",
+                "IDENTIFIER  TYPE           CLASS                NAME       USER  ENABLED",
+                "M1          Mail           IMAPAccount          Home       ines  Mail, Notes",
+                "V1          VorlixAccount  KQAccount            Cirrant          Contacts",
+                "  C1        CalDAV         MobileCalDAVAccount  Cirrant    ines  Contacts",
+                "  K1        KeldorIMAP     KeldorIMAPAccount    Cirrant          Contacts",
+                "L1          LDAP           LDAPAccount          (no name)",
             ],
             self.done("list"),
         )
@@ -52,7 +52,7 @@ class Lists(AccountctlTest):
         self.assertEqual([None, []], [each["enabled"] for each in listed["accounts"]])
 
     def test_nothing_on_a_device_without_accounts(self):
-        self.assertEqual(["IDENTIFIER  TYPE  CLASS  NAME  ENABLED"], self.done("list"))
+        self.assertEqual(["IDENTIFIER  TYPE  CLASS  NAME  USER  ENABLED"], self.done("list"))
         self.assertEqual({"version": 0, "accounts": []}, json.loads("\n".join(self.done("list", "--json"))))
         self.assertFalse(self.tree.path(SETTINGS).exists())
 
@@ -61,22 +61,49 @@ class Lists(AccountctlTest):
         self.assertEqual(3, json.loads("\n".join(self.done("list", "--json")))["version"])
 
     def test_columns_by_what_is_seen_of_a_name(self):
-        names = ["Öre", "Cafe\u0301", "日本", "plain"]
+        names = ["Öre", "Cafe\u0301", "日本", "plain", "\U0001f680", "\U0001f468\u200d\U0001f469\u200d\U0001f467",
+                 "\U0001f1e9\U0001f1ea", "ก็ดี", "नमस्ते"]
         self.put(*(changed(HOME_MAIL, Identifier=str(index), DisplayName=name) for index, name in enumerate(names)))
         self.assertEqual(
             [
-                "IDENTIFIER  TYPE  CLASS        NAME   ENABLED",
-                "0           Mail  IMAPAccount  Öre    Mail, Notes",
-                "1           Mail  IMAPAccount  Cafe\u0301   Mail, Notes",
-                "2           Mail  IMAPAccount  日本   Mail, Notes",
-                "3           Mail  IMAPAccount  plain  Mail, Notes",
+                "NAME   ENABLED",
+                "Öre    Mail, Notes",
+                "Cafe\u0301   Mail, Notes",
+                "日本   Mail, Notes",
+                "plain  Mail, Notes",
+                "\U0001f680     Mail, Notes",
+                "\U0001f468\u200d\U0001f469\u200d\U0001f467     Mail, Notes",
+                "\U0001f1e9\U0001f1ea     Mail, Notes",
+                "ก็ดี     Mail, Notes",
+                "नमस्ते   Mail, Notes",
             ],
-            self.done("list"),
+            self.done("list", "--columns", "name,enabled"),
         )
 
     def test_names_that_would_steer_a_terminal_or_break_the_line_as_they_are_harmless(self):
         self.put(changed(HOME_MAIL, DisplayName="a\nb\x1b[31m\u202ec"))
-        self.assertEqual("M1          Mail  IMAPAccount  a\ufffdb\ufffd[31m\ufffdc  Mail, Notes", self.done("list")[1])
+        self.assertEqual("M1          a\ufffdb\ufffd[31m\ufffdc", self.done("list", "--columns=identifier,name")[1])
+
+    def test_the_columns_that_are_asked_for(self):
+        self.put(HOME_MAIL, CLOUD)
+        self.assertEqual(
+            [
+                "USER    HOST              IDENTIFIER",
+                "ines    imap.example.com  M1",
+                "                          V1",
+                "  ines                    C1",
+                "                          K1",
+            ],
+            self.done("list", "--columns=user,Host,identifier"),
+        )
+
+    def test_on_a_device_with_files_of_the_first_releases_alone_a_word_on_them(self):
+        self.tree.write_plist(LEGACY_MAIL, {"Accounts": []})
+        run = self.accountctl("list")
+        told = "accountctl: the device has account files of the first releases alone; a migration converts them"
+        self.assertEqual((0, [told]), (run.status, run.errors))
+        self.put(HOME_MAIL)
+        self.assertEqual([], self.accountctl("list").errors)
 
 
 class Shows(AccountctlTest):

@@ -216,6 +216,18 @@ class Progress(ExplainTest):
         self.assertEqual(["done"], run.errors)
 
 
+class Terminals(ExplainTest):
+    def test_are_not_steered_by_what_is_explained(self):
+        device = self.device(Version=11, Accounts=[
+            {"Type": "Mail", "Class": "IMAPAccount", "Identifier": "a\u009b2Jb\nc", "DisplayName": "\u202ed\x1b[31m"},
+            {"Type": "Mail", "Class": "IMAPAccount", "Identifier": "a\u009b2Jb\nc"},
+        ])
+        shown = "\n".join(device.migrate(HOST, "--explain", "--dry-run").output)
+        self.assertIn("2J", shown)
+        for mark in "\u009b\u202e\x1b":
+            self.assertNotIn(mark, shown)
+
+
 class StandardOutput(ExplainTest):
     def test_that_cannot_be_written_is_said_and_does_not_change_the_status(self):
         with open("/dev/full", "wb") as full:

@@ -1,7 +1,6 @@
 // The announcer on a real bus, a private one, with a real subscriber, while accountctl edits a real file.
 
 #include <gmock/gmock.h>
-#include <sdbus-c++/sdbus-c++.h>
 #include <spawn.h>
 #include <sys/socket.h>
 #include <sys/un.h>
@@ -11,10 +10,9 @@
 #include <chrono>
 #include <cstring>
 #include <fstream>
-#include <map>
-#include <thread>
 
 #include "tests/modules/module_device.h"
+#include "tests/support/bus_subscriber.h"
 #include "tests/support/private_bus.h"
 
 namespace tests {
@@ -83,67 +81,6 @@ class EditedDevice {
   const ScratchDirectory _scratch;
 };
 
-// One change entry as text, its members' kinds checked by reading them.
-std::string textOf(const std::map<std::string, sdbus::Variant>& entry) {
-  std::string text;
-  for (const auto& [key, value] : entry) {
-    text += (text.empty() ? "" : "; ") + key + " ";
-    if (key == "ChangeType") text += std::to_string(value.get<std::int32_t>());
-    if (key == "AccountID" || key == "AccountType") text += value.get<std::string>();
-    if (key != "OriginalDataclasses") continue;
-    for (const std::string& dataclass : value.get<Texts>()) text += dataclass + ",";
-  }
-  return text;
-}
-
-// Hears every signal of the interface.
-class Subscriber {
- public:
-  explicit Subscriber(const std::string& path = kPath, std::string interface = kInterface)
-      : _interface{std::move(interface)},
-        _connection{sdbus::createSystemBusConnection()},
-        _object{sdbus::createObject(*_connection, path)} {
-    const std::string match = "type='signal',path='" + path + "',interface='" + _interface + "'";
-    _slot = _connection->addMatch(match, [this](sdbus::Message& message) { hear(message); });
-  }
-
-  // Everything that was sent until now: the bus keeps the order of what it is sent, so a last signal of the
-  // subscriber's own comes after all of it.
-  const Texts& heard() {
-    _object->emitSignal("Last").onInterface(_interface);
-    const auto end = steady_clock::now() + 30s;
-    while (!_heardLast && steady_clock::now() < end) {
-      if (!_connection->processPendingRequest()) std::this_thread::sleep_for(2ms);
-    }
-    EXPECT_TRUE(_heardLast);
-    return _heard;
-  }
-
- private:
-  void hear(sdbus::Message& message) {
-    const auto member = message.getMemberName();
-    if (member == "Last") {
-      _heardLast = true;
-    } else if (member == "AccountsChanged") {
-      std::vector<std::map<std::string, sdbus::Variant>> entries;
-      message >> entries;
-      for (const auto& entry : entries) _heard.push_back(member + " " + textOf(entry));
-    } else {
-      std::string identifier;
-      std::string dataclass;
-      message >> identifier >> dataclass;
-      _heard.push_back(member + " " + identifier + " " + dataclass);
-    }
-  }
-
-  std::string _interface;
-  std::unique_ptr<sdbus::IConnection> _connection;
-  std::unique_ptr<sdbus::IObject> _object;
-  sdbus::Slot _slot;
-  Texts _heard;
-  bool _heardLast = false;
-};
-
 std::string changed(int type, const std::string& identifier, const std::string& accountType, const Texts& originals) {
   std::string text = "AccountsChanged AccountID " + identifier + "; AccountType " + accountType + "; ChangeType " +
                      std::to_string(type) + "; OriginalDataclasses ";
@@ -155,7 +92,7 @@ class Announcer : public ::testing::Test {
  protected:
   const EditedDevice device;
   PrivateBus bus;
-  Subscriber subscriber;
+  BusSubscriber subscriber{kPath, kInterface};
 };
 
 TEST_F(Announcer, TellsOfADataclassThatIsSwitchedOnBeforeDuringAndAfter) {
@@ -204,7 +141,7 @@ TEST_F(Announcer, IsNotAskedUnderAnotherRoot) {
 }
 
 TEST_F(Announcer, LeavesItToTheMailApplicationsNoticeToTellOfARepairAndToNobodyUnderAnotherRoot) {
-  Subscriber mailApplication{"/com/vorlix/Notices", "com.vorlix.Notices1"};
+  BusSubscriber mailApplication{"/com/vorlix/Notices", "com.vorlix.Notices1"};
   const Texts repaired{"add", "Mail", "MailAccount", "AccountPath=Mail/IMAP-x"};
   EXPECT_EQ(device.editWithoutModules(repaired), 0);
   EXPECT_EQ(device.edit(repaired), 0);
@@ -216,10 +153,17 @@ TEST_F(Announcer, FindsABusThatWasStartedAgain) {
   bus.stop();
   EXPECT_EQ(device.edit({"enable", "A", "Notes"}), 0);
   bus.start();
-  Subscriber later;
+  BusSubscriber later{kPath, kInterface};
   EXPECT_EQ(device.edit({"disable", "A", "Notes"}), 0);
   EXPECT_THAT(later.heard(), ElementsAre("AccountWillChange A " + kNotes, changed(1, "A", "Mail", {kMail, kNotes}),
                                          "AccountDidChange A " + kNotes));
+}
+
+TEST_F(Announcer, TellsNothingOfATextThatNoMessageCarries) {
+  EXPECT_EQ(device.edit({"add", "LDAP", "LDAPAccount", "Identifier=\uFFFF"}), 0);
+  EXPECT_EQ(device.edit({"remove", "A"}), 0);
+  EXPECT_THAT(subscriber.heard(), ElementsAre("AccountWillChange A " + kMail, changed(2, "A", "Mail", {kMail}),
+                                              "AccountDidChange A " + kMail));
 }
 
 TEST(AnnouncerWithoutABus, LetsTheChangeBeMadeAllTheSame) {

@@ -2,19 +2,17 @@
 
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
-#include <sdbus-c++/sdbus-c++.h>
 #include <sys/socket.h>
 #include <sys/un.h>
 #include <unistd.h>
 
-#include <array>
 #include <chrono>
 #include <cstdlib>
 #include <cstring>
 #include <filesystem>
-#include <thread>
 
 #include "platform/linux/linux_platform.h"
+#include "tests/support/bus_subscriber.h"
 #include "tests/support/fake_platform.h"
 #include "tests/support/private_bus.h"
 #include "tests/support/scratch_directory.h"
@@ -26,39 +24,9 @@ using namespace std::chrono_literals;
 using testing::ElementsAre;
 
 // Hears every signal of the notices' interface.
-class Subscriber {
+class Subscriber : public BusSubscriber {
  public:
-  Subscriber() : _connection{sdbus::createSystemBusConnection()} {
-    _slot = _connection->addMatch("type='signal',path='/com/vorlix/Notices',interface='com.vorlix.Notices1'",
-                                  [this](sdbus::Message& message) { hear(message); });
-  }
-
-  // What was heard, once there are so many notices or the time is over.
-  const std::vector<std::string>& heard(std::size_t count) {
-    const auto end = std::chrono::steady_clock::now() + 5s;
-    while (_heard.size() < count && std::chrono::steady_clock::now() < end) {
-      if (!_connection->processPendingRequest()) std::this_thread::sleep_for(5ms);
-    }
-    return _heard;
-  }
-
- private:
-  void hear(sdbus::Message& message) {
-    if (message.getMemberName() == "CloudTabs") {
-      bool enabled = false;
-      message >> enabled;
-      _heard.emplace_back(enabled ? "tabs on" : "tabs off");
-    } else {
-      std::string domain;
-      std::string key;
-      message >> domain >> key;
-      _heard.push_back(message.getMemberName() + " " + domain + " " + key);
-    }
-  }
-
-  std::unique_ptr<sdbus::IConnection> _connection;
-  sdbus::Slot _slot;
-  std::vector<std::string> _heard;
+  Subscriber() : BusSubscriber{"/com/vorlix/Notices", "com.vorlix.Notices1"} {}
 };
 
 TEST(Notices, AreSignalsOnTheSystemBus) {
@@ -68,8 +36,8 @@ TEST(Notices, AreSignalsOnTheSystemBus) {
   device.preferencesChanged->post("com.vorlix.mobilemail", "MailAccounts");
   device.cloudTabs->post(true);
   device.cloudTabs->post(false);
-  EXPECT_THAT(subscriber.heard(3),
-              ElementsAre("PreferencesChanged com.vorlix.mobilemail MailAccounts", "tabs on", "tabs off"));
+  EXPECT_THAT(subscriber.heard(),
+              ElementsAre("PreferencesChanged com.vorlix.mobilemail MailAccounts", "CloudTabs 1", "CloudTabs 0"));
 }
 
 TEST(Notices, ArriveAlthoughTheirSenderEndsAtOnce) {
@@ -81,7 +49,7 @@ TEST(Notices, ArriveAlthoughTheirSenderEndsAtOnce) {
     ::_exit(0);
   }
   ::waitpid(sender, nullptr, 0);
-  EXPECT_THAT(subscriber.heard(1), ElementsAre("tabs on"));
+  EXPECT_THAT(subscriber.heard(), ElementsAre("CloudTabs 1"));
 }
 
 TEST(Notices, ArriveOnABusThatWasStartedAgain) {
@@ -93,7 +61,7 @@ TEST(Notices, ArriveOnABusThatWasStartedAgain) {
   bus.start();
   Subscriber subscriber;
   device.cloudTabs->post(true);
-  EXPECT_THAT(subscriber.heard(1), ElementsAre("tabs on"));
+  EXPECT_THAT(subscriber.heard(), ElementsAre("CloudTabs 1"));
 }
 
 TEST(Notices, ArriveOnABusThatWasStartedAgainSinceTheLast) {
@@ -104,7 +72,7 @@ TEST(Notices, ArriveOnABusThatWasStartedAgainSinceTheLast) {
   bus.start();
   Subscriber subscriber;
   device.cloudTabs->post(true);
-  EXPECT_THAT(subscriber.heard(1), ElementsAre("tabs on"));
+  EXPECT_THAT(subscriber.heard(), ElementsAre("CloudTabs 1"));
 }
 
 TEST(Notices, AreLostWithoutABus) {
@@ -148,7 +116,7 @@ TEST(Notices, ThatNoMessageCanCarryAreLost) {
   EXPECT_NO_THROW(device.preferencesChanged->post("not \xff text", "key"));
   Subscriber subscriber;
   device.cloudTabs->post(true);
-  EXPECT_THAT(subscriber.heard(1), ElementsAre("tabs on"));
+  EXPECT_THAT(subscriber.heard(), ElementsAre("CloudTabs 1"));
 }
 
 TEST(Notices, OfTheTestsAreKeptInTheirOrder) {
