@@ -116,9 +116,10 @@ BasicAccount::Dataclasses dataclassesConcerned(ChangeType change, const Dictiona
   return concerned;
 }
 
-const PropertyValue* currentElseOriginal(const Dictionary* current, const Dictionary* original, std::string_view key) {
-  const PropertyValue* const value = current == nullptr ? nullptr : current->find(key);
-  return value != nullptr || original == nullptr ? value : original->find(key);
+// A value of another kind is no text: then the original tells it, as where there is none.
+const Text* textOfEither(const Dictionary* current, const Dictionary* original, std::string_view key) {
+  const Text* const text = current == nullptr ? nullptr : current->text(key);
+  return text != nullptr || original == nullptr ? text : original->text(key);
 }
 
 // The entry ends at the first value that is missing: one without an identifier tells only of the kind of change.
@@ -126,9 +127,9 @@ Dictionary changeEntry(ChangeType change, const Dictionary* original, const Dict
   Dictionary entry{{kASChangeAccountChangeTypeKey, static_cast<std::int32_t>(change)}};
   for (const auto& [key, property] : {std::pair{kASChangeAccountIdentifierKey, kAccountIdentifier},
                                       std::pair{kASChangeAccountTypeKey, kAccountType}}) {
-    const PropertyValue* const value = currentElseOriginal(current, original, property);
-    if (value == nullptr) return entry;
-    entry.set(key, *value);
+    const Text* const text = textOfEither(current, original, property);
+    if (text == nullptr) return entry;
+    entry.set(key, *text);
   }
   const Array* const enabled = enabledIn(original);
   entry.set(kASChangeAccountOriginallyEnabledDataclassesKey, enabled == nullptr ? Array{} : *enabled);
@@ -167,8 +168,7 @@ void AccountsManager::accountDidChange_forDataclass(const BasicAccount& account,
 void AccountsManager::_addNotificationToDictionary_forChangeType_originalProperties_currentProperties(
     NotificationTable& table, ChangeType change, const Dictionary* original, const Dictionary* current) const {
   // Nobody listens for an account that has no type; the file is written, so that is no failure any more.
-  const PropertyValue* const property = currentElseOriginal(current, original, kAccountType);
-  const Text* const type = property == nullptr ? nullptr : property->asText();
+  const Text* const type = textOfEither(current, original, kAccountType);
   if (type == nullptr) return;
   std::vector<std::string> names;
   for (const Text& dataclass : dataclassesConcerned(change, original, current)) {

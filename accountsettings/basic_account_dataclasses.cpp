@@ -1,6 +1,9 @@
 #include <algorithm>
 #include <array>
-#include <cmath>
+#include <bit>
+#include <map>
+#include <set>
+#include <string>
 #include <unordered_set>
 
 #include "accountsettings/basic_account.h"
@@ -23,42 +26,68 @@ Dataclasses intersection(const Dataclasses& list, const Dataclasses& other) {
   return common;
 }
 
-std::size_t hashOfNumber(double number) { return std::isnan(number) ? 0 : std::hash<double>{}(number); }
+void write(std::string& key, const PropertyValue& value);
 
-// Equal values have one hash, so that of a dictionary does not depend on its order.
-std::size_t hashOf(const PropertyValue& value) {
-  std::size_t hash = static_cast<std::size_t>(value.kind());
-  if (const Text* const text = value.asText()) return std::hash<std::string_view>{}(text->view());
-  if (const auto integer = value.asInteger()) return integer->bits;
-  if (const double* const real = value.asReal()) return hashOfNumber(*real);
-  if (const platform::Date* const date = value.asDate()) return hashOfNumber(date->secondsSince2001);
-  if (const platform::Uid* const uid = value.asUid()) return uid->number;
-  if (const platform::Bytes* const data = value.asData()) {
-    for (const std::uint8_t byte : *data) hash = 31 * hash + byte;
-  } else if (const Array* const array = value.asArray()) {
-    for (const PropertyValue& element : *array) hash = 31 * hash + hashOf(element);
-  } else if (const Dictionary* const dictionary = value.asDictionary()) {
-    for (const auto& [key, held] : *dictionary) hash += 31 * std::hash<std::string_view>{}(key.view()) + hashOf(held);
-  }
-  return hash;
+template <typename Number>
+void writeNumber(std::string& key, Number number) {
+  const auto bytes = std::bit_cast<std::array<char, sizeof number>>(number);
+  key.append(bytes.data(), bytes.size());
 }
 
-struct HashOfElement {
-  std::size_t operator()(const PropertyValue* element) const { return hashOf(*element); }
-};
+void writeSized(std::string& key, std::string_view bytes) {
+  writeNumber(key, bytes.size());
+  key += bytes;
+}
 
-struct AreEqualElements {
-  bool operator()(const PropertyValue* left, const PropertyValue* right) const { return *left == *right; }
-};
+void writeEach(std::string& key, const Array& array) {
+  writeNumber(key, array.size());
+  for (const PropertyValue& element : array) write(key, element);
+}
+
+// Dictionaries are equal whatever their order.
+void writeEach(std::string& key, const Dictionary& dictionary) {
+  std::map<std::string_view, const PropertyValue*> sorted;
+  for (const auto& [name, held] : dictionary) sorted.emplace(name.view(), &held);
+  writeNumber(key, sorted.size());
+  for (const auto& [name, held] : sorted) {
+    writeSized(key, name);
+    write(key, *held);
+  }
+}
+
+// Equal values, and only they, write the same bytes.
+void write(std::string& key, const PropertyValue& value) {
+  key.push_back(static_cast<char>(value.kind()));
+  if (const Text* const text = value.asText()) return writeSized(key, text->view());
+  if (const auto integer = value.asInteger()) {
+    writeNumber(key, integer->isAboveInt64);
+    return writeNumber(key, integer->bits);
+  }
+  if (const double* const real = value.asReal()) return writeNumber(key, *real);
+  if (const bool* const boolean = value.asBoolean()) return writeNumber(key, *boolean);
+  if (const platform::Date* const date = value.asDate()) return writeNumber(key, date->secondsSince2001);
+  if (const platform::Uid* const uid = value.asUid()) return writeNumber(key, uid->number);
+  if (const platform::Bytes* const data = value.asData()) {
+    return writeSized(key, {reinterpret_cast<const char*>(data->data()), data->size()});
+  }
+  if (const Array* const array = value.asArray()) return writeEach(key, *array);
+  if (const Dictionary* const dictionary = value.asDictionary()) writeEach(key, *dictionary);
+}
+
+std::string keyOf(const PropertyValue& value) {
+  std::string key;
+  write(key, value);
+  return key;
+}
 
 // The elements of a stored list as a set: each once, of whatever kind, in the order in which they first stand.
 Array setOfElements(const Array* stored) {
   if (stored == nullptr) return {};
-  std::unordered_set<const PropertyValue*, HashOfElement, AreEqualElements> seen;
+  std::set<std::string> seen;  // ordered: no list of a file can make it slow
   Array elements;
   elements.reserve(stored->size() + 1);
   std::ranges::copy_if(*stored, std::back_inserter(elements),
-                       [&seen](const PropertyValue& element) { return seen.insert(&element).second; });
+                       [&seen](const PropertyValue& element) { return seen.insert(keyOf(element)).second; });
   return elements;
 }
 
@@ -103,7 +132,9 @@ Dataclasses grantedDataclasses(const BasicAccount& account) {
 }  // namespace
 
 const Dataclasses& BasicAccount::supportedDataclasses() const {
-  return orderedSupportedDataclassesForAccountType(type().value_or(Text{}));
+  static const Dataclasses& none = *new Dataclasses;  // for the life of the process
+  const std::optional<Text> ofType = type();
+  return ofType ? orderedSupportedDataclassesForAccountType(*ofType) : none;
 }
 
 Dataclasses BasicAccount::provisionedDataclasses() const {

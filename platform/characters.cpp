@@ -55,7 +55,10 @@ std::string spelt(const Character& character) {
 
 // The part that is ASCII and safe whatever follows it.
 std::size_t plainLength(std::string_view text) {
-  const auto* const end = std::ranges::find_if(text, [](char byte) { return byte < 0x20 || byte == 0x7F; });
+  const auto* const end = std::ranges::find_if(text, [](char letter) {
+    const auto byte = static_cast<unsigned char>(letter);
+    return byte < 0x20 || byte >= 0x7F;
+  });
   return static_cast<std::size_t>(end - text.begin());
 }
 

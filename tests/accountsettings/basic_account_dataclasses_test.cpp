@@ -61,6 +61,15 @@ TEST_F(RecordDataclasses, SupportedAreNoneForATypeThatIsUnknownOrGone) {
   EXPECT_EQ(account->supportedDataclasses(), Dataclasses{});
 }
 
+TEST_F(RecordDataclasses, SupportedAreNoneWithoutATypeEvenWhereThereIsATypeOfNoName) {
+  Dictionary types = tests::accountTypesProperties();
+  types.set("", Dictionary{{"Supported Dataclasses", Array{kMail}}});
+  device.put("/resources/AccountTypesProperties.plist", types);
+  const auto account = make("CalDAV");
+  account->removeAccountPropertyForKey("Type");
+  EXPECT_EQ(account->supportedDataclasses(), Dataclasses{});
+}
+
 TEST_F(RecordDataclasses, AllSupportedOnesAreProvisionedUnlessTheServiceSaysOtherwise) {
   EXPECT_EQ(make("CalDAV")->provisionedDataclasses(), (Dataclasses{kCalendars, kReminders}));
   EXPECT_EQ(make("CalDAV", {{"Provisioned Dataclasses", "odd"}})->provisionedDataclasses(),

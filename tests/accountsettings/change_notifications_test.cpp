@@ -265,6 +265,14 @@ TEST_F(ChangeEntries, TakeIdentifierAndTypeFromTheOriginalWhereTheAccountHasLost
   EXPECT_THAT(*table.find("NotesNotifier"), ElementsAre(entry(1, "a", {kNotes})));
 }
 
+TEST_F(ChangeEntries, TakeTheTypeFromTheOriginalWhereTheAccountsIsNoText) {
+  const Dictionary original = exchange("a", {kNotes});
+  const Dictionary current{{"Identifier", "a"}, {"Type", 5}, {"Enabled Dataclasses", Array{kNotes}}};
+  const auto table = tableOf(ChangeType::present, &original, &current);
+  ASSERT_NE(table.find("NotesNotifier"), nullptr);
+  EXPECT_THAT(*table.find("NotesNotifier"), ElementsAre(entry(1, "a", {kNotes})));
+}
+
 TEST_F(ChangeEntries, EndAtTheFirstValueThatIsMissing) {
   const Dictionary nameless{{"Type", "Exchange"}, {"Enabled Dataclasses", Array{kNotes}}};
   EXPECT_THAT(*tableOf(ChangeType::added, nullptr, &nameless).find("NotesNotifier"),
