@@ -86,7 +86,8 @@ class _Run:
 
     def _task(self, image):
         how = self.campaign
-        return Task(image.path, image.kind, image.content, how.host, how.release.digest, how.limits, how.bounds)
+        return Task(image.path, image.kind, image.content, how.host, how.release.digest, how.limits, how.bounds,
+                    image.identifiers)
 
     def _chunks(self, paths):
         paths = iter(paths)

@@ -1,5 +1,6 @@
 """What a run reads of a device, and what stands there: the identity of an image's contents."""
 
+import functools
 import hashlib
 import os
 import re
@@ -53,11 +54,12 @@ class Footprint(NamedTuple):
 
 
 def target_of(root):
-    """For `resolved`: what a link in the directory `root` says."""
+    """For `resolved`: what a link in the directory `root` says. It looks at each path once."""
 
+    @functools.cache
     def target(path):
         try:
-            return os.readlink(os.path.join(root, path))
+            return os.readlink(f"{root}/{path}")
         except OSError:
             return None
 
@@ -97,7 +99,7 @@ def look_at(root):
     target = target_of(root)
     for path in (*FILES, *DIRECTORIES):
         place = resolved(path, target)
-        kind, content = _what_stands_at(os.path.join(root, place)) if place is not None else ("link", b"")
+        kind, content = _what_stands_at(f"{root}/{place}") if place is not None else ("link", b"")
         digest.update(f"{path}\0{kind}\0{len(content)}\0".encode())
         digest.update(content)
         identifiers.update(match.decode() for match in UUID.findall(content))

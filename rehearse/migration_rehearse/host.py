@@ -3,6 +3,7 @@
 import hashlib
 import os
 import resource
+import select
 import selectors
 import shutil
 import signal
@@ -16,8 +17,10 @@ from migration_rehearse.footprint import GROUPS, USERS, read_file
 ENVIRONMENT = {"PATH": "/usr/sbin:/usr/bin:/sbin:/bin", "LC_ALL": "C.UTF-8", "HOME": "/nonexistent"}
 PLUGIN_FROM_PROGRAM = ("../lib/*/account-settings/accounts-migrator.so", "../lib/account-settings/accounts-migrator.so")
 RESOURCES_FROM_PROGRAM = "../share/account-settings"
+PRLIMIT = "/usr/bin/prlimit"
 MAX_TABLE = 1 << 20  # bytes of a device's passwd or group file
 MAX_ERRORS = 1 << 20
+SECONDS_TO_END = 1.0  # after its last word
 
 
 class HostUnusable(Exception):
@@ -87,9 +90,11 @@ class Host(NamedTuple):
         program = Path(self.program).resolve()
         plugin = Path(self.plugin) if self.plugin else self._installed_plugin(program)
         libraries = {library for binary in (program, plugin) for library in own_libraries(binary)}
-        resources = Path(self.resources) if self.resources else program.parent / RESOURCES_FROM_PROGRAM
-        tables = sorted(path for path in resources.rglob("*") if path.suffix in (".plist", ".strings"))
+        tables = sorted(path for path in self.resource_directory().rglob("*") if path.suffix in (".plist", ".strings"))
         return [program, plugin, *sorted(libraries), *tables]
+
+    def resource_directory(self):
+        return Path(self.resources) if self.resources else Path(self.program).resolve().parent / RESOURCES_FROM_PROGRAM
 
     def _installed_plugin(self, program):
         found = [path for pattern in PLUGIN_FROM_PROGRAM for path in sorted(program.parent.glob(pattern))]
@@ -137,7 +142,7 @@ def limited(command, limits):
     options = ["--core=0"]
     options += [f"--cpu={int(limits.seconds) + 1}"] if limits.seconds else []
     options += [f"--as={limits.memory}"] if limits.memory else []
-    return [shutil.which("prlimit") or "prlimit", *options, "--", *command]
+    return [PRLIMIT, *options, "--", *command]
 
 
 def run(command, limits, environment=ENVIRONMENT):
@@ -150,7 +155,7 @@ def run(command, limits, environment=ENVIRONMENT):
     try:
         reading.until_end()
     finally:
-        _kill(process)
+        _end(process, 0 if reading.stopped else SECONDS_TO_END)
         _, status, usage = os.wait4(process.pid, 0)
         process.returncode = os.waitstatus_to_exitcode(status)
         process.stdout.close()
@@ -160,14 +165,11 @@ def run(command, limits, environment=ENVIRONMENT):
                  time.monotonic() - begun, usage.ru_utime + usage.ru_stime, peak * 1024)
 
 
-def _kill(process):
-    """Ends what is left of it, once its output has ended or is of no more interest."""
-    if os.waitid(os.P_PID, process.pid, os.WEXITED | os.WNOHANG | os.WNOWAIT) is None:
-        deadline = time.monotonic() + 1
-        while time.monotonic() < deadline:
-            if os.waitid(os.P_PID, process.pid, os.WEXITED | os.WNOHANG | os.WNOWAIT) is not None:
-                break
-            time.sleep(0.001)
+def _end(process, seconds):
+    """Ends what is left of it, once it had so long to end by itself."""
+    end = os.pidfd_open(process.pid)
+    select.select([end], [], [], seconds)
+    os.close(end)
     try:
         os.killpg(process.pid, signal.SIGKILL)
     except ProcessLookupError:
@@ -202,10 +204,10 @@ class _Reading:
         if not block:
             selector.unregister(key.fileobj)
             return
-        self._look_at_memory()
         if key.data is self.errors:
             self.errors += block[: MAX_ERRORS - len(self.errors)]
             return
+        self._look_at_memory()
         self.output += block
         if self.limits.output and len(self.output) > self.limits.output:
             self.stopped = "too-much-output"

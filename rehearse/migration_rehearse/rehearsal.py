@@ -39,6 +39,7 @@ class Identified(NamedTuple):
     signature: str
     content: str
     fault: tuple = ()
+    identifiers: frozenset = frozenset()  # of a directory: those that occur in it
 
 
 class Task(NamedTuple):
@@ -51,6 +52,7 @@ class Task(NamedTuple):
     digest: str
     limits: host.Limits
     bounds: unpacking.Bounds
+    identifiers: frozenset = frozenset()
 
 
 class Rehearsed(NamedTuple):
@@ -103,7 +105,7 @@ def _identify_directory(path):
     looked = footprint.look_at(path)
     if not looked.is_device:
         return _faulty(path, "no-device")
-    return Identified(path, DIRECTORY, "", "directory:" + looked.digest)
+    return Identified(path, DIRECTORY, "", "directory:" + looked.digest, (), looked.identifiers)
 
 
 def _faulty(path, cause, detail=""):
@@ -114,13 +116,14 @@ def _faulty(path, cause, detail=""):
 def rehearse(task):
     """What the run would do to the image. Every fault of the image is an answer; raises HostUnusable where the host is
     another one here than where the task was made."""
-    if _digest_here(task.host) != task.digest:
+    if digest_here(task.host) != task.digest:
         raise host.HostUnusable(f"{task.host.program} on {platform.node()} is another build")
     try:
         if task.kind == DIRECTORY:
-            return _rehearse_tree(task, os.path.abspath(task.path))
+            return _rehearse_tree(task, os.path.abspath(task.path), task.identifiers)
         with tempfile.TemporaryDirectory(prefix="migration-rehearse-", ignore_cleanup_errors=True) as scratch:
-            return _rehearse_tree(task, unpacking.unpack(task.path, scratch, task.bounds))
+            root = unpacking.unpack(task.path, scratch, task.bounds)
+            return _rehearse_tree(task, root, footprint.look_at(root).identifiers)
     except Fault as fault:
         return unrehearsed(fault.cause, fault.detail)
     except OSError as failure:
@@ -128,15 +131,15 @@ def rehearse(task):
 
 
 @functools.cache
-def _digest_here(program):
+def digest_here(program):
+    """The digest of a host, reckoned once in a process."""
     return program.digest()
 
 
-def _rehearse_tree(task, root):
+def _rehearse_tree(task, root, identifiers):
     ended = host.run([*host.as_mobile(root), *task.host.command(root)], task.limits)
     measured = {"status": ended.status, "seconds": ended.seconds, "processor_seconds": ended.processor_seconds,
                 "peak_memory": ended.peak_memory}
-    identifiers = footprint.look_at(root).identifiers
     errors = explained.lasting(ended.errors.decode(errors="replace"), root, identifiers)
     console = [line for line in errors.splitlines() if REHEARSAL_NOTICE not in line][:MAX_CONSOLE]
     if ended.stopped or ended.status < 0:

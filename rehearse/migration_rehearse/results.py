@@ -133,6 +133,12 @@ class Results:
         except sqlite3.Error as failure:
             raise ResultFault(f"{self.path}: {failure}") from failure
 
+    def _change_all(self, statement, rows):
+        try:
+            self.database.executemany(statement, rows)
+        except sqlite3.Error as failure:
+            raise ResultFault(f"{self.path}: {failure}") from failure
+
     def commit(self):
         try:
             if self.database.in_transaction:
@@ -202,10 +208,10 @@ class Results:
         values += [_storable(rehearsed.counts.get(name)) for name in COUNTS]
         marks = ", ".join("?" * len(COLUMNS))
         added = self.change(f"INSERT INTO rehearsals ({', '.join(COLUMNS)}) VALUES ({marks})", values).lastrowid
-        for fact, count in rehearsed.facts.items():
-            self.change("INSERT INTO facts VALUES (?, ?, ?)", (added, self._kind(fact), count))
-        for code, count in rehearsed.losses.items():
-            self.change("INSERT INTO losses VALUES (?, ?, ?)", (added, code, count))
+        facts = [(added, self._kind(fact), count) for fact, count in rehearsed.facts.items()]
+        losses = [(added, code, count) for code, count in rehearsed.losses.items()]
+        self._change_all("INSERT INTO facts VALUES (?, ?, ?)", facts)
+        self._change_all("INSERT INTO losses VALUES (?, ?, ?)", losses)
 
     def _forget(self, content, release):
         earlier = self.row("SELECT id FROM rehearsals WHERE content = ? AND release = ?", (content, release.id))

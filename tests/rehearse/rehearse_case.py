@@ -87,4 +87,4 @@ class RehearseTest(DeviceTest):
         program = host.Host(str(HOST))
         return rehearsal.rehearse(rehearsal.Task(
             identified.path, identified.kind, identified.content, program, program.digest(), host.Limits(),
-            unpacking.Bounds(**bounds)))
+            unpacking.Bounds(**bounds), identified.identifiers))
