@@ -5,7 +5,7 @@ import signal
 import sys
 import time
 
-from migration_rehearse import campaign, compare, engines, host, options, report, telling
+from migration_rehearse import anonymise, campaign, compare, engines, host, options, report, telling
 from migration_rehearse.listing import Listing
 from migration_rehearse.results import ResultFault, Results
 
@@ -34,7 +34,7 @@ def _interrupt(*_):
 
 
 def _command(name):
-    return {"": run, "merge": merge, "report": make_report, "compare": make_comparison}[name]
+    return {"": run, "merge": merge, "report": make_report, "compare": make_comparison, "anonymise": make_anonymous}[name]
 
 
 def say(what, status):
@@ -131,3 +131,25 @@ def make_comparison(arguments, version):
     for name, devices in failed.items():
         say(f"gate: {devices:,} devices break {name} ({compare.RULES[name]})", LOSSES)
     return LOSSES if failed or rules is None and comparison.different else NOTHING_LOST
+
+
+def make_anonymous(arguments, version):
+    made = options.parser("anonymise", version, "Makes an archive of what a run reads, with all that is personal replaced.",
+                          epilog="Exit status: 0 the archive is made, and the migration does the same with it as with the image;\n"
+                          "2 wrong use; 3 there can be no such archive; 5 the host cannot be used.")
+    made.add_argument("image", metavar="IMAGE", help="a device's file tree, or an archive of one")
+    made.add_argument("--output", metavar="FILE", default="anonymised.tar.gz",
+                      help="the archive (default: anonymised.tar.gz)")
+    made.add_argument("--key", metavar="FILE", default="campaign.key",
+                      help="the campaign's key, made when it is missing (default: campaign.key)")
+    options.add_host_options(made)
+    asked = made.parse_args(arguments)
+    program = host.Host(asked.host, asked.plugin, asked.resources).found()
+    try:
+        words = anonymise.anonymise(asked.image, anonymise.key_of(asked.key), asked.output, program)
+    except anonymise.CannotAnonymise as why:
+        return say(why, SOME_UNREHEARSED)
+    except OSError as failure:
+        return say(f"{failure.filename}: {failure.strerror}", SOME_UNREHEARSED)
+    print(f"{asked.output}: {words:,} words replaced; the migration does the same with it")
+    return NOTHING_LOST

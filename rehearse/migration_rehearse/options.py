@@ -8,7 +8,7 @@ from pathlib import Path
 from migration_rehearse.host import Limits
 from migration_rehearse.unpacking import Bounds
 
-COMMANDS = ("merge", "report", "compare")
+COMMANDS = ("merge", "report", "compare", "anonymise")
 RESULTS = "rehearsals.sqlite"
 STATUSES = """\
 Exit status: 0 nothing is lost, 1 accounts are lost, not saved or not migrated, 2 wrong use, 3 some images could not be
@@ -21,6 +21,7 @@ Rehearses a release of the account migration over many device images, none of wh
   migration-rehearse merge FILE FILE...      add the results of the others to the first file
   migration-rehearse report FILE             make a page of the results
   migration-rehearse compare OLD NEW         tell which devices end differently under another release
+  migration-rehearse anonymise IMAGE         make an archive for sharing, without personal data
 """
 UNITS = {"": 1, "k": 1 << 10, "m": 1 << 20, "g": 1 << 30, "t": 1 << 40}
 
