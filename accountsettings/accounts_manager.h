@@ -20,6 +20,9 @@ namespace accountsettings {
 
 class StoreWatch;
 
+// The data version that this release writes: the one that the last step of a migration leaves.
+inline constexpr std::uint64_t kCurrentVersion = 12;
+
 // The change that a change entry tells of.
 enum class ChangeType : std::int32_t { added = 0, present = 1, removed = 2 };
 
@@ -49,9 +52,10 @@ class ACCOUNT_EXPORT AccountsManager {
   AccountsManager& operator=(const AccountsManager&) = delete;
   ~AccountsManager();
 
-  // Repairs, merges and writes the file as data version 12, whatever version was loaded. The file is the old one or the
-  // new one, never in between. Success is seen only in the log and in whether notifications follow; after a failure the
-  // accounts and what they are compared with are as before. Accounts that only the file holds are dropped from it.
+  // Repairs, merges and writes the file as the current data version, whatever version was loaded. The file is the old
+  // one or the new one, never in between. Success is seen only in the log and in whether notifications follow; after a
+  // failure the accounts and what they are compared with are as before. Accounts that only the file holds are dropped
+  // from it.
   void saveAllAccounts();
   // Internal: takes the state against which the next save's change notifications are computed.
   void _setOriginalAccountDictionaries();
@@ -70,8 +74,7 @@ class ACCOUNT_EXPORT AccountsManager {
   static void releaseMigrationLock(std::unique_ptr<platform::ExclusiveFileLock> lock);
   // For other clients of the library: returns when no migration is running.
   static void waitForMigrationToFinish();
-  // The data version that this release writes: 12.
-  [[nodiscard]] static std::uint64_t currentVersion();
+  [[nodiscard]] static std::uint64_t currentVersion();  // kCurrentVersion, as this library was built with it
   [[nodiscard]] std::uint64_t dataVersion() const { return _dataVersion; }
   void setDataVersion(std::uint64_t version) { _dataVersion = version; }
   // Internal: while set, saves send no notifications. Process-wide, written by the migration's thread only.

@@ -10,9 +10,9 @@
 namespace migrator {
 namespace {
 
-using Step = VersionStep<AccountsDataMigrator, AccountsManager>;
+using Step = AccountsDataMigrator::Step;
 
-constexpr std::array<Step, 12> kSteps{{
+constexpr auto kSteps = std::to_array<Step>({
     {0, "_migrateAccountsFrom7A149:", &AccountsDataMigrator::_migrateAccountsFrom7A149},
     {1, "_migrateAccountsFrom7A150:", &AccountsDataMigrator::_migrateAccountsFrom7A150},
     {2, "_migrateAccountsFrom7A153:", &AccountsDataMigrator::_migrateAccountsFrom7A153},
@@ -25,7 +25,8 @@ constexpr std::array<Step, 12> kSteps{{
     {9, "_migrateAccountsFrom9A182:", &AccountsDataMigrator::_migrateAccountsFrom9A182},
     {10, "_migrateAccountsFrom9A334:", &AccountsDataMigrator::_migrateAccountsFrom9A334},
     {11, "_migrateAccountsFrom9B176:", &AccountsDataMigrator::_migrateAccountsFrom9B176},
-}};
+});
+static_assert(leadsTo(accountsettings::kCurrentVersion, kSteps));
 
 // The same reading as the store's: whatever gives no integer is version 0.
 std::uint64_t versionOf(const Dictionary& settings) {
@@ -55,6 +56,8 @@ bool AccountsDataMigrator::_migrateNewAccountsInfo(AccountsManager& store) {
     return (this->*step.run)(store);
   });
 }
+
+std::span<const AccountsDataMigrator::Step> AccountsDataMigrator::versionSteps() { return kSteps; }
 
 bool AccountsDataMigrator::_newAccountsInformationPresent() {
   return platform::current().files->kindOf(AccountsManager::fullPathToAccountSettingsPlist()).isOk();

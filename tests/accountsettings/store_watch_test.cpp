@@ -97,8 +97,9 @@ TEST_F(WatchedStore, TellsOfASaveAndWhatStageItsChangesBelongTo) {
   store->saveAllAccounts();
   EXPECT_EQ(recorder->lines(), (Lines{"added b", "changed b: Class \"TestAccount\" -> \"POPAccount\""}));
   EXPECT_EQ(recorder->stages, (Lines{"", "", "save", "save"}));
-  EXPECT_EQ(recorder->facts.back(),
-            (RunFact{.kind = RunFact::Kind::saved, .path = kSettingsFile.string(), .count = 2, .version = 12}));
+  EXPECT_EQ(
+      recorder->facts.back(),
+      (RunFact{.kind = RunFact::Kind::saved, .path = kSettingsFile.string(), .count = 2, .version = kCurrentVersion}));
 }
 
 TEST_F(WatchedStore, TellsWhyASaveFailed) {

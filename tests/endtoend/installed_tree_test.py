@@ -5,7 +5,7 @@ import subprocess
 import unittest
 from pathlib import Path
 
-from device import EXAMPLES, SETTINGS, lines, plain_environment
+from device import CURRENT_VERSION, EXAMPLES, SETTINGS, lines, plain_environment
 from device_case import DeviceTest
 
 BUILD_TREE = Path(os.environ["BUILD_TREE"])
@@ -64,7 +64,7 @@ class InstalledTree(DeviceTest):
         device = self.example("first-generation")
         (self.library / "account-settings" / "platform-icu.so").unlink()
         self.assertEqual(0, device.migrate(self.prefix / "bin" / "migration-host").status)
-        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+        self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
 
     def build_with_cmake(self):
         build = self.scratch / "with-cmake"

@@ -14,6 +14,7 @@
 #include <map>
 #include <thread>
 
+#include "accountsettings/accounts_manager.h"
 #include "tests/modules/module_device.h"
 #include "tests/support/private_bus.h"
 
@@ -32,8 +33,10 @@ constexpr const char* kSettings = "var/mobile/Library/Preferences/com.vorlix.acc
 const std::string kMail = "com.vorlix.Dataclass.Mail";
 const std::string kNotes = "com.vorlix.Dataclass.Notes";
 
-constexpr const char* kOneAccount = R"(<?xml version="1.0" encoding="UTF-8"?>
-<plist version="1.0"><dict><key>Version</key><integer>12</integer><key>Accounts</key><array><dict>
+const std::string kOneAccount = R"(<?xml version="1.0" encoding="UTF-8"?>
+<plist version="1.0"><dict><key>Version</key><integer>)" +
+                                std::to_string(accountsettings::kCurrentVersion) +
+                                R"(</integer><key>Accounts</key><array><dict>
 <key>Type</key><string>Mail</string><key>Class</key><string>IMAPAccount</string>
 <key>Identifier</key><string>A</string>
 <key>Enabled Dataclasses</key><array><string>com.vorlix.Dataclass.Mail</string></array>
