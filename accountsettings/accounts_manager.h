@@ -151,28 +151,30 @@ class ACCOUNT_EXPORT AccountsManager {
   void _sendNotificationsForChangedAccounts();
 
  private:
-  AccountsManager();
+  ACCOUNT_HIDDEN AccountsManager();
   // Loading. An element that is no dictionary is read as an empty one.
-  [[nodiscard]] static std::shared_ptr<AccountsManager> _loadedFromFile(std::unique_ptr<StoreWatch> watch);
-  [[nodiscard]] static std::shared_ptr<AccountsManager> _loaded(const Array* accounts,
-                                                                std::unique_ptr<StoreWatch> watch);
-  [[nodiscard]] bool _offerLoaded(const Account& account, const PropertyValue& element);
-  void _loadAccounts(const Array& accounts);
-  [[nodiscard]] static Account accountFromElement(const PropertyValue& element);
-  void registerAccount(const Account& account);
-  void loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
+  [[nodiscard]] ACCOUNT_HIDDEN static std::shared_ptr<AccountsManager> _loadedFromFile(
+      std::unique_ptr<StoreWatch> watch);
+  [[nodiscard]] ACCOUNT_HIDDEN static std::shared_ptr<AccountsManager> _loaded(const Array* accounts,
+                                                                               std::unique_ptr<StoreWatch> watch);
+  [[nodiscard]] ACCOUNT_HIDDEN bool _offerLoaded(const Account& account, const PropertyValue& element);
+  ACCOUNT_HIDDEN void _loadAccounts(const Array& accounts);
+  [[nodiscard]] ACCOUNT_HIDDEN static Account accountFromElement(const PropertyValue& element);
+  ACCOUNT_HIDDEN void registerAccount(const Account& account);
+  ACCOUNT_HIDDEN void loadChild(const PropertyValue& properties, const Account& parent,
+                                const std::optional<Text>& parentIdentifier);
 
   // Saving. Fixing, like offering, answers whether a fixer had something to do.
-  [[nodiscard]] platform::Status _writeFile() const;
-  [[nodiscard]] bool _fixAccountsForSaving();
-  [[nodiscard]] Array _mergedRecords() const;
-  void _tellFixers(bool saved);
+  [[nodiscard]] ACCOUNT_HIDDEN platform::Status _writeFile() const;
+  [[nodiscard]] ACCOUNT_HIDDEN bool _fixAccountsForSaving();
+  [[nodiscard]] ACCOUNT_HIDDEN Array _mergedRecords() const;
+  ACCOUNT_HIDDEN void _tellFixers(bool saved);
 
   // By notifier, what changed since the state was last taken.
-  [[nodiscard]] NotificationTable notificationTable() const;
+  [[nodiscard]] ACCOUNT_HIDDEN NotificationTable notificationTable() const;
 
   // Takes the identifier, whichever record is registered under it, and its children out of the indexes.
-  void forgetIdentifierOfAccount(const BasicAccount& account);
+  ACCOUNT_HIDDEN void forgetIdentifierOfAccount(const BasicAccount& account);
 
   // The order and the index that replacing accounts by types builds, and the accounts that have no place in it yet.
   struct Replacement {
@@ -180,10 +182,10 @@ class ACCOUNT_EXPORT AccountsManager {
     AccountsByID byID;
     Accounts toPlace;
   };
-  void replaceInPlace(const Types& types, Replacement& replacement);
-  void appendAccount(const Account& account, Replacement& replacement);
-  void moveChild(const Account& child, const Replacement& replacement);
-  void takeFromRecordedParent(const Text& child, const Account& newParent);
+  ACCOUNT_HIDDEN void replaceInPlace(const Types& types, Replacement& replacement);
+  ACCOUNT_HIDDEN void appendAccount(const Account& account, Replacement& replacement);
+  ACCOUNT_HIDDEN void moveChild(const Account& child, const Replacement& replacement);
+  ACCOUNT_HIDDEN void takeFromRecordedParent(const Text& child, const Account& newParent);
 
   AccountsByID _topLevelAccountsByID;
   Accounts _orderedTopLevelAccounts;

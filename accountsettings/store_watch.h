@@ -20,14 +20,14 @@ namespace accountsettings {
 //
 // A store has a watch only where an observer wants facts; without one nothing is copied, compared or kept. Nothing that
 // goes wrong here reaches the store: the watch falls silent instead.
-class ACCOUNT_EXPORT StoreWatch {
+class StoreWatch {
  public:
   using Accounts = std::vector<std::shared_ptr<BasicAccount>>;
 
   // Null where nobody wants to know.
   [[nodiscard]] static std::unique_ptr<StoreWatch> ofRun();
   // How many states of stores were ever copied in this process.
-  [[nodiscard]] static std::size_t statesTaken();
+  [[nodiscard]] ACCOUNT_EXPORT static std::size_t statesTaken();
 
   // --- Loading: each element of the file, then the store ---
   void leftOut(const PropertyValue& element);  // no account could be made of it
@@ -37,9 +37,9 @@ class ACCOUNT_EXPORT StoreWatch {
 
   // --- What is known of an account beforehand; of several rules the first counts ---
   void willGo(const BasicAccount& account, std::string_view rule);
-  void willBeFolded(const BasicAccount& account, const BasicAccount& into, std::string_view rule);
+  ACCOUNT_EXPORT void willBeFolded(const BasicAccount& account, const BasicAccount& into, std::string_view rule);
   // It is made of this legacy description, which lay at `origin`.
-  void comesFrom(const BasicAccount& account, const Dictionary& description, std::string origin);
+  ACCOUNT_EXPORT void comesFrom(const BasicAccount& account, const Dictionary& description, std::string origin);
 
   // Tells what became of the accounts since the last call.
   void look(const Accounts& accounts);

@@ -49,6 +49,12 @@ class InstalledTree(DeviceTest):
                 needs_the_house = any("(NEEDED)" in line and "[libaccount" in line for line in dynamic)
                 self.assertEqual(needs_the_house, any("(RUNPATH)" in line and "[$ORIGIN" in line for line in dynamic))
 
+    def test_offers_no_header_of_what_the_library_keeps_to_itself(self):
+        headers = self.prefix / "include" / "account-settings" / "accountsettings"
+        offered = {path.name for path in headers.iterdir()}
+        self.assertIn("accounts_manager.h", offered)
+        self.assertEqual(set(), offered & {"file_paths.h", "record_changes.h", "store_watch.h"})
+
     def test_migrates_a_device(self):
         device = self.example("current")
         before = device.read_plist(SETTINGS)
