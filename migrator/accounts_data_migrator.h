@@ -101,8 +101,4 @@ class AccountsDataMigrator final : public platform::DataClassMigrator {
   bool _foundOldDAAccountsToMigrate = false;
 };
 
-// Whether the device's region calls Gmail "Google Mail". Asked of the device once per process, also under concurrent
-// callers; no answer counts as no.
-[[nodiscard]] ACCOUNT_EXPORT bool _UseGoogleMail();
-
 }  // namespace migrator

@@ -11,6 +11,7 @@ from device_case import DeviceTest
 BUILD_TREE = Path(os.environ["BUILD_TREE"])
 LIBRARY_DIRECTORY = os.environ["LIBRARY_DIRECTORY"]
 SOURCES = EXAMPLES.parent / "list-accounts"
+CLIENTS = Path(__file__).resolve().parent / "clients"
 IDENTIFIER = "55E4F607-1829-43A4-95B6-C7D8E9FA0B05"
 NOTES = "com.vorlix.Dataclass.Notes"
 
@@ -89,13 +90,13 @@ class InstalledTree(DeviceTest):
         sanitizers = os.environ["SANITIZE"]
         return [f"-fsanitize={sanitizers}"] if sanitizers else []
 
-    def build_with_pkg_config(self):
-        program = self.scratch / "with-pkg-config"
+    def build_with_pkg_config(self, source=SOURCES / "main.cpp"):
+        program = self.scratch / source.stem
         options = run(
             "pkg-config", "--cflags", "--libs", "account-settings", PKG_CONFIG_PATH=str(self.library / "pkgconfig")
         )[0].split()
         run(
-            os.environ["CXX"], SOURCES / "main.cpp", *self.sanitizer_flags(), *options,
+            os.environ["CXX"], source, *self.sanitizer_flags(), *options,
             f"-Wl,-rpath,{self.library}", "-o", program,
         )
         return program
@@ -117,6 +118,13 @@ class InstalledTree(DeviceTest):
 
     def test_serves_a_program_built_with_pkg_config(self):
         self.assert_lists_and_switches(self.build_with_pkg_config())
+
+    def test_offers_what_is_published_to_programs_that_include_it_or_look_it_up(self):
+        program = self.build_with_pkg_config(CLIENTS / "published_functions.cpp")
+        device = self.device()
+        self.assertEqual(["Gmail"], run(program, device.root))
+        device.write_plist("etc/vorlix/device-info.plist", {"RegionalBehaviorGoogleMail": True})
+        self.assertEqual(["Google Mail"], run(program, device.root))
 
 
 if __name__ == "__main__":
