@@ -21,6 +21,9 @@ namespace accountsettings {
 
 class ChangeTracker;
 
+// The data version that this release writes: the one that the last step of a migration leaves.
+inline constexpr std::uint64_t kCurrentVersion = 12;
+
 // The change that a change entry tells of.
 enum class ChangeType : std::int32_t { added = 0, present = 1, removed = 2 };
 
@@ -50,7 +53,7 @@ class ACCOUNT_EXPORT AccountsManager {
   AccountsManager& operator=(const AccountsManager&) = delete;
   ~AccountsManager();
 
-  // Repairs, merges and writes the file as data version 12, whatever version was loaded. The file is the old one or the
+  // Repairs, merges and writes the file as the current data version, whatever version was loaded. The file is the old one or the
   // new one, never in between. Success is seen in the log, in whether notifications follow, and in `lastSaveOutcome`;
   // after a failure the accounts and what they are compared with are as before. Accounts that only the file holds are
   // dropped from it.
@@ -75,8 +78,7 @@ class ACCOUNT_EXPORT AccountsManager {
   static void releaseMigrationLock(std::unique_ptr<platform::ExclusiveFileLock> lock);
   // For other clients of the library: returns when no migration is running.
   static void waitForMigrationToFinish();
-  // The data version that this release writes: 12.
-  [[nodiscard]] static std::uint64_t currentVersion();
+  [[nodiscard]] static std::uint64_t currentVersion();  // kCurrentVersion, as this library was built with it
   [[nodiscard]] std::uint64_t dataVersion() const { return _dataVersion; }
   void setDataVersion(std::uint64_t version) { _dataVersion = version; }
   // Internal: while set, saves send no notifications. Process-wide, written by the migration's thread only.
@@ -153,30 +155,30 @@ class ACCOUNT_EXPORT AccountsManager {
   void _sendNotificationsForChangedAccounts();
 
  private:
-  AccountsManager();
+  ACCOUNT_HIDDEN AccountsManager();
   // Loading. An element that is no dictionary is read as an empty one.
-  [[nodiscard]] static std::shared_ptr<AccountsManager> loadedFromFile(std::unique_ptr<ChangeTracker> tracker);
-  [[nodiscard]] static std::shared_ptr<AccountsManager> loaded(const Array* accounts,
+  [[nodiscard]] ACCOUNT_HIDDEN static std::shared_ptr<AccountsManager> loadedFromFile(std::unique_ptr<ChangeTracker> tracker);
+  [[nodiscard]] ACCOUNT_HIDDEN static std::shared_ptr<AccountsManager> loaded(const Array* accounts,
                                                                std::unique_ptr<ChangeTracker> tracker);
-  [[nodiscard]] bool offerLoaded(const Account& account, std::size_t position, const PropertyValue& element);
-  void loadAccounts(const Array& accounts);
-  [[nodiscard]] static Account accountFromElement(const PropertyValue& element);
-  void registerAccount(const Account& account);
-  void loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
+  [[nodiscard]] ACCOUNT_HIDDEN bool offerLoaded(const Account& account, std::size_t position, const PropertyValue& element);
+  ACCOUNT_HIDDEN void loadAccounts(const Array& accounts);
+  [[nodiscard]] ACCOUNT_HIDDEN static Account accountFromElement(const PropertyValue& element);
+  ACCOUNT_HIDDEN void registerAccount(const Account& account);
+  ACCOUNT_HIDDEN void loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
 
-  void leaveOut(std::size_t position, const PropertyValue& element, WhyLeftOut why);
+  ACCOUNT_HIDDEN void leaveOut(std::size_t position, const PropertyValue& element, WhyLeftOut why);
 
   // Saving. Fixing, like offering, answers whether a fixer had something to do.
-  void writeFile();
-  [[nodiscard]] bool fixAccountsForSaving();
-  [[nodiscard]] Array mergedRecords() const;
-  void tellFixers(bool saved);
+  ACCOUNT_HIDDEN void writeFile();
+  [[nodiscard]] ACCOUNT_HIDDEN bool fixAccountsForSaving();
+  [[nodiscard]] ACCOUNT_HIDDEN Array mergedRecords() const;
+  ACCOUNT_HIDDEN void tellFixers(bool saved);
 
   // By notifier, what changed since the state was last taken.
-  [[nodiscard]] NotificationTable notificationTable() const;
+  [[nodiscard]] ACCOUNT_HIDDEN NotificationTable notificationTable() const;
 
   // Takes the identifier, whichever record is registered under it, and its children out of the indexes.
-  void forgetIdentifierOfAccount(const BasicAccount& account);
+  ACCOUNT_HIDDEN void forgetIdentifierOfAccount(const BasicAccount& account);
 
   // The order and the index that replacing accounts by types builds, and the accounts that have no place in it yet.
   struct Replacement {
@@ -184,10 +186,10 @@ class ACCOUNT_EXPORT AccountsManager {
     AccountsByID byID;
     Accounts toPlace;
   };
-  void replaceInPlace(const Types& types, Replacement& replacement);
-  void appendAccount(const Account& account, Replacement& replacement);
-  void moveChild(const Account& child, const Replacement& replacement);
-  void takeFromRecordedParent(const Text& child, const Account& newParent);
+  ACCOUNT_HIDDEN void replaceInPlace(const Types& types, Replacement& replacement);
+  ACCOUNT_HIDDEN void appendAccount(const Account& account, Replacement& replacement);
+  ACCOUNT_HIDDEN void moveChild(const Account& child, const Replacement& replacement);
+  ACCOUNT_HIDDEN void takeFromRecordedParent(const Text& child, const Account& newParent);
 
   AccountsByID _topLevelAccountsByID;
   Accounts _orderedTopLevelAccounts;

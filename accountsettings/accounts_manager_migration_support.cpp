@@ -46,7 +46,7 @@ void AccountsManager::releaseMigrationLock(std::unique_ptr<ExclusiveFileLock> lo
 
 void AccountsManager::waitForMigrationToFinish() { releaseMigrationLock(createAndLockMigrationLock()); }
 
-std::uint64_t AccountsManager::currentVersion() { return 12; }
+std::uint64_t AccountsManager::currentVersion() { return kCurrentVersion; }
 
 void AccountsManager::_setShouldSkipNotifications(bool skip) { skipsNotifications = skip; }
 

@@ -76,6 +76,4 @@ void ASRuntimeFixMailAccount::accountsHaveBeenSaved(bool saved) {
   _shouldNotifyMobileMail = false;
 }
 
-void reportMailAccountClassFound(const Dictionary& /*properties*/, std::string_view /*reason*/) {}
-
 }  // namespace accountsettings

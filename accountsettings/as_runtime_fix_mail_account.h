@@ -35,8 +35,4 @@ class ACCOUNT_EXPORT ASRuntimeFixMailAccount final : public RuntimeFixer {
   bool _shouldNotifyMobileMail = false;
 };
 
-// Called for a converted account that still has the generic class "MailAccount": a place to observe such accounts from
-// outside. Does nothing.
-ACCOUNT_EXPORT void reportMailAccountClassFound(const Dictionary& properties, std::string_view reason);
-
 }  // namespace accountsettings

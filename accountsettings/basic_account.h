@@ -150,10 +150,11 @@ class ACCOUNT_EXPORT BasicAccount : public std::enable_shared_from_this<BasicAcc
 
  private:
   // Answers whether the record may be used.
-  [[nodiscard]] bool acceptProperties(const Dictionary& properties);
-  [[nodiscard]] std::optional<Text> textForKey(std::string_view key) const;
+  [[nodiscard]] ACCOUNT_HIDDEN bool acceptProperties(const Dictionary& properties);
+  [[nodiscard]] ACCOUNT_HIDDEN std::optional<Text> textForKey(std::string_view key) const;
   // The supported data classes of a type in the canonical order; an empty list for an unknown type.
-  [[nodiscard]] static const Dataclasses& orderedSupportedDataclassesForAccountType(std::string_view type);
+  [[nodiscard]] ACCOUNT_HIDDEN static const Dataclasses& orderedSupportedDataclassesForAccountType(
+      std::string_view type);
 
   Dictionary _originalProperties;
   Dictionary _properties;

@@ -20,14 +20,14 @@ namespace accountsettings {
 //
 // A store has a tracker only where an observer wants facts; without one nothing is copied, compared or kept. Nothing
 // that goes wrong here reaches the store: the tracker falls silent instead.
-class ACCOUNT_EXPORT ChangeTracker {
+class ChangeTracker {
  public:
   using Accounts = std::vector<std::shared_ptr<BasicAccount>>;
 
   // Null where nobody wants to know.
   [[nodiscard]] static std::unique_ptr<ChangeTracker> ofRun();
   // How many states of stores were ever copied in this process.
-  [[nodiscard]] static std::size_t statesTaken();
+  [[nodiscard]] ACCOUNT_EXPORT static std::size_t statesTaken();
 
   // --- Loading: each element of the file, then the store ---
   void leftOut(const PropertyValue& element);  // no account could be made of it
@@ -38,9 +38,9 @@ class ACCOUNT_EXPORT ChangeTracker {
 
   // --- What is known of an account beforehand; what is said first counts ---
   void willGo(const BasicAccount& account, records::LossCode code);
-  void willBeFolded(const BasicAccount& account, const BasicAccount& into, std::string_view rule);
+  ACCOUNT_EXPORT void willBeFolded(const BasicAccount& account, const BasicAccount& into, std::string_view rule);
   // It is made of this description in the legacy file; `place` says to people where in it.
-  void comesFrom(const BasicAccount& account, const Dictionary& description, std::string place, std::string file);
+  ACCOUNT_EXPORT void comesFrom(const BasicAccount& account, const Dictionary& description, std::string place, std::string file);
 
   // Tells what became of the accounts since the last call.
   void look(const Accounts& accounts);

@@ -21,6 +21,6 @@ inline constexpr StringConstant kMigrationLockName{"AccountMigrationInProgress"}
 [[nodiscard]] ACCOUNT_EXPORT platform::Path mailAutoFetchMarkerPath();
 // A loadable module, by the path that the configuration names it by: relative to the system root, with or without a
 // slash at its front.
-[[nodiscard]] ACCOUNT_EXPORT std::string modulePath(const platform::Text& framework);
+[[nodiscard]] std::string modulePath(const platform::Text& framework);
 
 }  // namespace accountsettings

@@ -24,11 +24,11 @@ struct Difference {
   bool isReplacement = false;  // another object in the place of the one with its identifier; perhaps nothing else
 };
 
-[[nodiscard]] ACCOUNT_EXPORT records::Name nameOf(const Dictionary& properties, std::string_view parent = {});
+[[nodiscard]] records::Name nameOf(const Dictionary& properties, std::string_view parent = {});
 
 // The keys that differ, in the order of `after`, then those that went. Children that can be told apart are records of
 // their own, so "ChildAccounts" is a key like others only where it holds something else.
-[[nodiscard]] ACCOUNT_EXPORT std::vector<records::Change> changesOf(const Dictionary& before, const Dictionary& after);
+[[nodiscard]] std::vector<records::Change> changesOf(const Dictionary& before, const Dictionary& after);
 
 // What became of the accounts and their children: first what is there afterwards, in its order, then what went. A
 // top-level account is itself as long as it is the same object, whatever its identifier; a child is the one with its

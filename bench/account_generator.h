@@ -3,6 +3,7 @@
 #include <cstddef>
 #include <cstdint>
 
+#include "accountsettings/accounts_manager.h"
 #include "platform/property_value.h"
 
 namespace bench {
@@ -18,7 +19,7 @@ constexpr std::size_t kPopulationPeriod = 100;
 
 struct Population {
   std::size_t accounts = 1000;
-  std::uint64_t version = 12;
+  std::uint64_t version = accountsettings::kCurrentVersion;
   std::size_t children = 2;
   std::uint64_t seed = 20071109;
 };

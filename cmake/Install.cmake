@@ -43,8 +43,11 @@ endforeach()
 install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md
   DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT library)
 
+# What the store, the plug-in and the tests share is not for other programs.
+set(internal_headers "/(file_paths|record_changes|change_tracker)[.]h$")
 foreach(folder accountsettings records platform)
   file(GLOB headers CONFIGURE_DEPENDS "${CMAKE_SOURCE_DIR}/${folder}/*.h")
+  list(FILTER headers EXCLUDE REGEX "${internal_headers}")
   install(FILES ${headers} DESTINATION "${headers_dir}/${folder}" COMPONENT development)
 endforeach()
 # For programs that work on a device's file tree which stands elsewhere than at "/".

@@ -100,7 +100,8 @@ void checkWhatIsLeft(const FuzzedDevice& device) {
 
 bool isCurrent(const std::optional<Dictionary>& settings) {
   const PropertyValue* const version = settings ? settings->find("Version") : nullptr;
-  return version != nullptr && *version == PropertyValue{12} && settings->array("Accounts") != nullptr;
+  return version != nullptr && *version == PropertyValue{accountsettings::kCurrentVersion} &&
+         settings->array("Accounts") != nullptr;
 }
 
 void checkAgain(FuzzedDevice& device) {

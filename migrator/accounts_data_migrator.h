@@ -2,12 +2,14 @@
 
 #include <memory>
 #include <optional>
+#include <span>
 #include <string>
 #include <string_view>
 #include <vector>
 
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/basic_account.h"
+#include "migrator/version_chain.h"
 #include "platform/data_class_migrator.h"
 
 namespace migrator {
@@ -61,6 +63,9 @@ class AccountsDataMigrator final : public platform::DataClassMigrator {
   // --- Version steps: dispatch (version_steps.cpp) ---
   bool _migrateNewAccountsInfo(AccountsManager& store);
   [[nodiscard]] static bool _newAccountsInformationPresent();
+  // The table of steps: one for each version before the current one, in order.
+  using Step = VersionStep<AccountsDataMigrator, AccountsManager>;
+  [[nodiscard]] static std::span<const Step> versionSteps();
   bool _migrateAccountsFrom7A149(AccountsManager& store);
 
   // --- First generation (first_generation_steps.cpp, caldav_matching.cpp) ---
@@ -95,9 +100,5 @@ class AccountsDataMigrator final : public platform::DataClassMigrator {
   bool _foundOldMailAccountsToMigrate = false;
   bool _foundOldDAAccountsToMigrate = false;
 };
-
-// Whether the device's region calls Gmail "Google Mail". Asked of the device once per process, also under concurrent
-// callers; no answer counts as no.
-[[nodiscard]] ACCOUNT_EXPORT bool _UseGoogleMail();
 
 }  // namespace migrator

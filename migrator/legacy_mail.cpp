@@ -1,9 +1,8 @@
 #include <algorithm>
 #include <array>
-#include <mutex>
 #include <utility>
 
-#include "accountsettings/as_runtime_fix_mail_account.h"
+#include "accountsettings/mail_functions.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/legacy_conversion.h"
 #include "migrator/stored_names.h"
@@ -93,16 +92,6 @@ std::optional<ConvertedMail> convertedMail(const LegacySource& outgoingServers, 
 }
 
 }  // namespace
-
-bool _UseGoogleMail() {
-  static std::once_flag asked;
-  static bool answer = false;
-  std::call_once(asked, [] {
-    const std::optional<PropertyValue> regional = platform::current().deviceInfo->answer("RegionalBehaviorGoogleMail");
-    answer = regional && regional->booleanValue().value_or(false);
-  });
-  return answer;
-}
 
 Text AccountsDataMigrator::_accountTypeForMailAccountClass(std::string_view className) {
   return mailClassNamed(className).type;

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <algorithm>
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <span>
@@ -31,6 +32,14 @@ template <typename Migrator, typename Store>
   const bool hasSucceeded = (migrator.*step.run)(store);
   if (!hasSucceeded) tellFailedStep(step.name, words);
   return hasSucceeded;
+}
+
+// Whether every version from 0 on has its step, in order, and the last step leaves `version`.
+template <typename Step, std::size_t Count>
+[[nodiscard]] constexpr bool leadsTo(std::uint64_t version, const std::array<Step, Count>& chain) {
+  std::uint64_t next = 0;
+  return std::ranges::all_of(chain, [&next](const Step& step) { return step.storedVersion == next++; }) &&
+         next == version;
 }
 
 // Enters the chain at the step of the stored version and runs that step and every following one with `runStep`, until

@@ -9,9 +9,9 @@
 namespace migrator {
 namespace {
 
-using Step = VersionStep<AccountsDataMigrator, AccountsManager>;
+using Step = AccountsDataMigrator::Step;
 
-constexpr std::array<Step, 12> kSteps{{
+constexpr auto kSteps = std::to_array<Step>({
     {0, "_migrateAccountsFrom7A149:", "nothing changes but the version",
      &AccountsDataMigrator::_migrateAccountsFrom7A149},
     {1, "_migrateAccountsFrom7A150:", "each account keeps the identifier it was synced by, and gets one of its own",
@@ -36,7 +36,8 @@ constexpr std::array<Step, 12> kSteps{{
      &AccountsDataMigrator::_migrateAccountsFrom9A334},
     {11, "_migrateAccountsFrom9B176:", "passes follow documents in the primary account, and cloud tabs bookmarks",
      &AccountsDataMigrator::_migrateAccountsFrom9B176},
-}};
+});
+static_assert(leadsTo(accountsettings::kCurrentVersion, kSteps));
 
 // The same reading as the store's: whatever gives no integer is version 0.
 std::uint64_t versionOf(const Dictionary& settings) {
@@ -64,6 +65,8 @@ bool AccountsDataMigrator::_migrateNewAccountsInfo(AccountsManager& store) {
   return runVersionSteps(std::span{kSteps}, storedVersion,
                          [&](const Step& step) { return runAsStage(*this, step, store); });
 }
+
+std::span<const AccountsDataMigrator::Step> AccountsDataMigrator::versionSteps() { return kSteps; }
 
 bool AccountsDataMigrator::_newAccountsInformationPresent() {
   return platform::current().files->kindOf(AccountsManager::fullPathToAccountSettingsPlist()).isOk();

@@ -3,13 +3,19 @@
 import json
 import os
 import plistlib
+import re
 import shutil
 import stat
 import subprocess
 from pathlib import Path
 from typing import NamedTuple
 
-EXAMPLES = Path(__file__).resolve().parent.parent / "examples" / "devices"
+TREE = Path(__file__).resolve().parent.parent
+EXAMPLES = TREE / "examples" / "devices"
+
+# The data version that a migration leaves, as the library declares it.
+DECLARATION = (TREE / "accountsettings/accounts_manager.h").read_text(encoding="utf-8")
+CURRENT_VERSION = int(re.search(r"kCurrentVersion = (\d+);", DECLARATION)[1])
 
 HOME = "var/mobile"
 PREFERENCES = HOME + "/Library/Preferences"

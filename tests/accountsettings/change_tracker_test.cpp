@@ -108,7 +108,7 @@ TEST_F(WatchedStore, TellsOfASaveAndWhatStageItsChangesBelongTo) {
   EXPECT_EQ(recorder->lines(), (Lines{"added b", "changed b: Class \"TestAccount\" -> \"POPAccount\""}));
   EXPECT_EQ(recorder->stages, (Lines{"", "", "save", "save"}));
   EXPECT_EQ(recorder->facts.back(),
-            (records::Fact{records::Saved{kSettingsFile.string(), 2, AccountsManager::currentVersion()}}));
+            (records::Fact{records::Saved{kSettingsFile.string(), 2, accountsettings::kCurrentVersion}}));
 }
 
 TEST_F(WatchedStore, TellsWhyASaveFailed) {

@@ -1,5 +1,7 @@
 #include <gtest/gtest.h>
 
+#include <string>
+
 #include "accountsettings/assertion_failure.h"
 #include "accountsettings/file_paths.h"
 #include "tests/support/account_store.h"
@@ -12,6 +14,8 @@ using Lines = std::vector<std::string>;
 
 const Path kLegacyExchangeFile = "/var/mobile/Library/Preferences/com.vorlix.DataAccess.plist";
 const Path kLegacyMailFile = "/var/mobile/Library/Mail/Accounts.plist";
+
+constexpr std::uint64_t kBefore = kCurrentVersion - 1;
 
 class SupportingMigrations : public AccountStore {
  protected:
@@ -34,7 +38,9 @@ class SupportingMigrations : public AccountStore {
   }
 };
 
-TEST_F(SupportingMigrations, WritesDataVersionTwelve) { EXPECT_EQ(AccountsManager::currentVersion(), 12U); }
+TEST_F(SupportingMigrations, AnswersTheVersionThatTheHeaderNames) {
+  EXPECT_EQ(AccountsManager::currentVersion(), kCurrentVersion);
+}
 
 TEST_F(SupportingMigrations, SkipsNoNotificationsToBeginWith) {
   EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
@@ -44,7 +50,7 @@ TEST_F(SupportingMigrations, SetsTheDataVersionOfAStoreAndNothingElse) {
   const Store store = load({properties("a")});
   store->setDataVersion(UINT64_MAX);
   EXPECT_EQ(store->dataVersion(), UINT64_MAX);
-  EXPECT_EQ(file().find("Version")->integerValue(), 12);
+  EXPECT_EQ(*file().find("Version"), PropertyValue{kCurrentVersion});
 }
 
 TEST_F(SupportingMigrations, HoldsTheMigrationLockUntilItIsReleased) {
@@ -119,9 +125,17 @@ TEST_F(SupportingMigrations, NeedsNoneOfAFileWithoutAVersionAndSaysSo) {
 }
 
 TEST_F(SupportingMigrations, ComparesVersionsWithoutSign) {
-  const std::vector<std::pair<PropertyValue, bool>> cases{
-      {0, true},    {11, true},   {12, false},   {13, false},         {-1, false}, {UINT64_MAX, false},
-      {11.9, true}, {"11", true}, {"12", false}, {"no number", true}, {-0.5, true}};
+  const std::vector<std::pair<PropertyValue, bool>> cases{{0, true},
+                                                          {kBefore, true},
+                                                          {kCurrentVersion, false},
+                                                          {kCurrentVersion + 1, false},
+                                                          {-1, false},
+                                                          {UINT64_MAX, false},
+                                                          {static_cast<double>(kBefore) + 0.9, true},
+                                                          {std::to_string(kBefore), true},
+                                                          {std::to_string(kCurrentVersion), false},
+                                                          {"no number", true},
+                                                          {-0.5, true}};
   for (const auto& [version, isNeeded] : cases) {
     putFile({}, version);
     EXPECT_EQ(AccountsManager::accountSettingsNeedsToBeMigrated(), isNeeded)
@@ -130,26 +144,27 @@ TEST_F(SupportingMigrations, ComparesVersionsWithoutSign) {
 }
 
 TEST_F(SupportingMigrations, SaysHowFarTheFileIsOutOfDate) {
-  putFile({}, 11);
+  putFile({}, kBefore);
   EXPECT_TRUE(AccountsManager::accountSettingsNeedsToBeMigrated());
-  EXPECT_EQ(messagesOf(kCheck), (Lines{"Account Settings Version out of date: savedVersion=11, currentVersion=12"}));
+  EXPECT_EQ(messagesOf(kCheck), (Lines{"Account Settings Version out of date: savedVersion=" + std::to_string(kBefore) +
+                                       ", currentVersion=" + std::to_string(kCurrentVersion)}));
 }
 
 TEST_F(SupportingMigrations, SaysNothingOfAFileThatIsUpToDate) {
-  putFile({}, 12);
+  putFile({}, kCurrentVersion);
   EXPECT_FALSE(AccountsManager::accountSettingsNeedsToBeMigrated());
   EXPECT_TRUE(device.logMessages().empty());
 }
 
 TEST_F(SupportingMigrations, MigratesNothingOnACurrentDeviceAndSaysNothing) {
-  putFile({}, 12);
+  putFile({}, kCurrentVersion);
   const Decision nothing{false, false, false};
   EXPECT_EQ(decide(nothing), nothing);
   EXPECT_TRUE(device.logMessages().empty());
 }
 
 TEST_F(SupportingMigrations, MigratesAnOutdatedSettingsFile) {
-  putFile({}, 11);
+  putFile({}, kBefore);
   const Decision settings{false, false, true};
   EXPECT_EQ(decide(settings), settings);
   EXPECT_EQ(messagesOf(kDecide), (Lines{"Accounts settings needs migration! oldMailAccountsPresent=0, "

@@ -5,6 +5,7 @@
 #include <algorithm>
 
 #include "accountsettings/assertion_failure.h"
+#include "accountsettings/mail_functions.h"
 #include "tests/support/account_store.h"
 
 namespace tests {

@@ -31,7 +31,7 @@ TEST_F(SavingAccounts, WritesAnEmptyStoreAsAnEmptyArrayAndTheCurrentVersion) {
   const Dictionary root = file();
   ASSERT_EQ(root.size(), 2U);
   EXPECT_EQ(root.begin()[0].key, Text{"Accounts"});
-  EXPECT_EQ(root, (Dictionary{{"Accounts", Array{}}, {"Version", 12}}));
+  EXPECT_EQ(root, (Dictionary{{"Accounts", Array{}}, {"Version", kCurrentVersion}}));
 }
 
 TEST_F(SavingAccounts, StampsTheCurrentVersionAndChangesNothingElse) {
@@ -39,14 +39,14 @@ TEST_F(SavingAccounts, StampsTheCurrentVersionAndChangesNothingElse) {
                        properties("b", {{"Enabled Dataclasses", "of an odd kind"}})};
   putFile(accounts, 3);
   AccountsManager::init()->saveAllAccounts();
-  EXPECT_EQ(file(), (Dictionary{{"Accounts", accounts}, {"Version", 12}}));
+  EXPECT_EQ(file(), (Dictionary{{"Accounts", accounts}, {"Version", kCurrentVersion}}));
 }
 
 TEST_F(SavingAccounts, WritesTheCurrentVersionWhateverTheStoreIsStampedWith) {
   const Store store = load({});
   store->setDataVersion(5);
   store->saveAllAccounts();
-  EXPECT_EQ(file().find("Version")->integerValue(), 12);
+  EXPECT_EQ(*file().find("Version"), PropertyValue{kCurrentVersion});
   EXPECT_EQ(store->dataVersion(), 5U);
 }
 

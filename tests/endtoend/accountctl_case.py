@@ -3,7 +3,7 @@
 import os
 from pathlib import Path
 
-from device import SETTINGS, TEMPORARY, Run, run_host
+from device import CURRENT_VERSION, SETTINGS, TEMPORARY, Run, run_host
 from device_case import PLUGINS, DeviceTest
 
 ACCOUNTCTL = Path(os.environ["ACCOUNTCTL"])
@@ -46,7 +46,7 @@ class AccountctlTest(DeviceTest):
         super().setUp()
         self.tree = self.device()
 
-    def put(self, *accounts, version=12):
+    def put(self, *accounts, version=CURRENT_VERSION):
         self.tree.write_plist(SETTINGS, {"Version": version, "Accounts": list(accounts)})
 
     def accounts(self):

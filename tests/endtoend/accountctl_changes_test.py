@@ -8,7 +8,7 @@ import unittest
 from accountctl_case import (
     CALENDARS, CLOUD, CONTACTS, DIRECTORY, HOME_MAIL, MAIL, NOTES, AccountctlTest, changed,
 )
-from device import SETTINGS, TEMPORARY
+from device import CURRENT_VERSION, SETTINGS, TEMPORARY
 
 IDENTIFIER = r"^[0-9A-F]{8}-[0-9A-F]{4}-[0-9A-F]{4}-[0-9A-F]{4}-[0-9A-F]{12}$"
 
@@ -19,7 +19,7 @@ class Changes(AccountctlTest):
         self.put(HOME_MAIL, CLOUD, DIRECTORY)
 
     def assert_left(self, *accounts):
-        self.assertEqual({"Accounts": list(accounts), "Version": 12}, self.tree.read_plist(SETTINGS))
+        self.assertEqual({"Accounts": list(accounts), "Version": CURRENT_VERSION}, self.tree.read_plist(SETTINGS))
 
     def cloud_with(self, place, **more):
         children = list(CLOUD["ChildAccounts"])

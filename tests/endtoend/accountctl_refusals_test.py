@@ -7,7 +7,7 @@ import tempfile
 import unittest
 
 from accountctl_case import ACCOUNTCTL, CLOUD, DIRECTORY, HOME_MAIL, AccountctlTest, changed
-from device import SETTINGS, run_host
+from device import CURRENT_VERSION, SETTINGS, run_host
 from failed_saves_test import CAP_DAC_OVERRIDE, SHARED_MEMORY, without_capabilities
 
 FAILED, WRONG_USE, NO_ACCOUNT, FAULTY_INSTALLATION = 1, 2, 3, 4
@@ -135,7 +135,7 @@ class AccountsThatCannotBeRead(AccountctlTest):
 
 class AccountsOfAnEarlierRelease(AccountctlTest):
     def test_are_not_changed_before_they_are_migrated(self):
-        self.put(HOME_MAIL, version=11)
+        self.put(HOME_MAIL, version=CURRENT_VERSION - 1)
         for words in CHANGES:
             with self.subTest(words=words):
                 self.assert_refused(

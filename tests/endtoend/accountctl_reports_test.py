@@ -5,7 +5,7 @@ import plistlib
 import unittest
 
 from accountctl_case import CLOUD, CONTACTS, DIRECTORY, HOME_MAIL, MAIL, NOTES, RESOURCES, AccountctlTest, changed
-from device import LEGACY_MAIL, SETTINGS
+from device import CURRENT_VERSION, LEGACY_MAIL, SETTINGS
 
 SECRET = "vy8-Quince"
 
@@ -29,7 +29,7 @@ class Lists(AccountctlTest):
         self.put(HOME_MAIL, CLOUD)
         listed = json.loads("\n".join(self.done("list", "--json")))
         self.assertEqual(["version", "accounts"], list(listed))
-        self.assertEqual(12, listed["version"])
+        self.assertEqual(CURRENT_VERSION, listed["version"])
         self.assertEqual(
             {
                 "identifier": "M1",

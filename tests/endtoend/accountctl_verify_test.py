@@ -4,7 +4,7 @@ import json
 import unittest
 
 from accountctl_case import CLOUD, DIRECTORY, HOME_MAIL, AccountctlTest, changed
-from device import LEGACY_MAIL, SETTINGS
+from device import CURRENT_VERSION, LEGACY_MAIL, SETTINGS
 from device_case import HOST
 from failed_saves_test import CAP_DAC_OVERRIDE, without_capabilities
 
@@ -61,7 +61,7 @@ class Structure(VerifyTest):
         for content in (b"bplist00 but no more", b"<plist><array/></plist>", b""):
             self.tree.write(SETTINGS, content)
             self.assertEqual([("unreadable", None, None)], self.found())
-            self.assertEqual({"Accounts": [], "Version": 12}, self.migrated())
+            self.assertEqual({"Accounts": [], "Version": CURRENT_VERSION}, self.migrated())
 
     def test_that_is_a_directory_keeps_a_migration_from_saving(self):
         self.tree.path(SETTINGS).mkdir()
@@ -69,17 +69,17 @@ class Structure(VerifyTest):
         self.assertIn("Failed to save accounts to filesystem.", self.tree.migrate(HOST).messages())
 
     def test_without_accounts(self):
-        self.tree.write_plist(SETTINGS, {"Version": 12})
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION})
         self.assertEqual([("no-accounts", "Accounts", None)], self.found())
         self.assertEqual([], self.migrated()["Accounts"])
 
     def test_with_accounts_of_another_kind_loses_them(self):
-        self.tree.write_plist(SETTINGS, {"Version": 12, "Accounts": {"M1": HOME_MAIL}})
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": {"M1": HOME_MAIL}})
         self.assertEqual([("no-accounts", "Accounts", None)], self.found())
         self.assertEqual([], self.migrated()["Accounts"])
 
     def test_with_further_keys_loses_them(self):
-        self.tree.write_plist(SETTINGS, {"Version": 12, "Accounts": [], "Owner": "ines"})
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": [], "Owner": "ines"})
         self.assertEqual([("unknown-key", "Owner", None)], self.found())
         self.assertEqual(["Accounts", "Version"], sorted(self.migrated()))
 
@@ -91,25 +91,25 @@ class Versions(VerifyTest):
         self.tree.write_plist(SETTINGS, {"Accounts": [self.UMBRELLA], **root})
         self.assertEqual([(kind, "Version", None) for kind in kinds], self.found())
         migrated = self.migrated()
-        self.assertEqual((12, is_upgraded), (migrated["Version"], migrated["Accounts"] != [self.UMBRELLA]))
+        self.assertEqual((CURRENT_VERSION, is_upgraded), (migrated["Version"], migrated["Accounts"] != [self.UMBRELLA]))
 
     def test_older(self):
         for version in (0, 1):
             self.assert_version(["version-older"], True, Version=version)
-        self.assertEqual(["a migration upgrades the accounts from there to 12"], self.said)
+        self.assertEqual([f"a migration upgrades the accounts from there to {CURRENT_VERSION}"], self.said)
 
     def test_newer(self):
-        for version in (13, 2**40, -1, 2**64 - 1):
+        for version in (CURRENT_VERSION + 1, 2**40, -1, 2**64 - 1):
             self.assert_version(["version-newer"], False, Version=version)
 
     def test_absent_or_no_number(self):
         self.assert_version(["version-absent"], False)
-        for version in (True, b"12", [12], {}):
+        for version in (True, str(CURRENT_VERSION).encode(), [CURRENT_VERSION], {}):
             self.assert_version(["version-odd"], False, Version=version)
 
     def test_of_an_odd_kind_that_is_read_as_a_number(self):
-        self.assert_version(["version-odd"], False, Version="12")
-        self.assert_version(["version-odd"], False, Version=12.9)
+        self.assert_version(["version-odd"], False, Version=str(CURRENT_VERSION))
+        self.assert_version(["version-odd"], False, Version=CURRENT_VERSION + 0.9)
         self.assert_version(["version-odd", "version-older"], True, Version="1 and a half")
 
     def test_absent_beside_legacy_files_means_every_step(self):
@@ -249,7 +249,7 @@ class Report(VerifyTest):
             [
                 f"{self.tree.path(SETTINGS)}: 1 account, 2 findings",
                 "Version: the data version is 3",
-                "    a migration upgrades the accounts from there to 12",
+                f"    a migration upgrades the accounts from there to {CURRENT_VERSION}",
                 "Accounts[0] (M1): Class is MailAccount, which the mail application does not know",
                 "    a migration sets it to IMAPAccount",
             ],

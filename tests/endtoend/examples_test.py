@@ -3,7 +3,7 @@
 import os
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY, HOME, exactly
+from device import CURRENT_VERSION, HOME, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY, exactly
 from device_case import HOST, DeviceTest
 
 MOBILE = 501
@@ -35,7 +35,7 @@ class Examples(DeviceTest):
                 self.assertEqual(before[path], after[path], path)
         self.assertEqual(("file", 0o600, self.owner), after[SETTINGS][:3])
         self.assertEqual(("directory", 0o700, self.owner), after[TEMPORARY][:3])
-        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+        self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
         self.assertTrue(device.read(SETTINGS).startswith(b"bplist00"))
 
     def accounts(self, device):

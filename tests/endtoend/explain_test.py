@@ -1,12 +1,13 @@
 """The explanation of a run: for people, for machines, and as facts in the trace."""
 
 import json
+import re
 import os
 import pty
 import subprocess
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS_COPY
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS_COPY
 from device_case import HOST, PLUGINS, DeviceTest
 
 MOVED_BY = "_migrateAccountsFrom8B117:"
@@ -15,6 +16,10 @@ SECRET = "correct horse battery staple"
 
 def account(identifier, type="CalDAV", **more):
     return {"Identifier": identifier, "Type": type, "Class": "SomeAccount", **more}
+
+
+def in_order_of_releases(stage):
+    return [int(part) if part.isdigit() else part for part in re.split(r"(\d+)", stage)]
 
 
 class ExplainTest(DeviceTest):
@@ -37,10 +42,10 @@ class Machines(ExplainTest):
         self.assertEqual((2, False, True), (document["schema"], document["rehearsal"], document["complete"]))
         stages = [stage["stage"] for stage in document["stages"] if stage["stage"] != "save"]
         self.assertEqual(["copy aside", "load"], stages[:2])
-        self.assertEqual(sorted(stages[2:]), stages[2:])
+        self.assertEqual(sorted(stages[2:], key=in_order_of_releases), stages[2:])
         counts = {"kept": 0, "changed": 7, "added": 3, "converted": 0, "moved": 2, "folded": 1, "dropped": 0, "lost": 0}
         self.assertEqual({"dataClass": "accounts", "success": True, "verdict": "kept", "storedVersion": 1,
-                          "accounts": 10, "version": 12, "counts": counts}, document["result"])
+                          "accounts": 10, "version": CURRENT_VERSION, "counts": counts}, document["result"])
 
     def test_are_told_which_host_did_it_where_and_when(self):
         device = self.example("current")
@@ -81,7 +86,7 @@ class Machines(ExplainTest):
         self.assertIn('"fact": "folded", "account": {"type": "CalDAV", "name": "June\'s Google Calendar"', document)
 
     def test_are_told_of_each_lost_account_by_a_code_and_where_its_data_still_are(self):
-        device = self.device(Version=12, Accounts=[account("a", "Unheard of"), account("b", "Mail", DisplayName="B"), 7])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[account("a", "Unheard of"), account("b", "Mail", DisplayName="B"), 7])
         document = self.document(device)
         copy = str(device.path(SETTINGS_COPY))
         nameless = {"name": "", "where": copy}
@@ -109,7 +114,8 @@ class Machines(ExplainTest):
 class People(ExplainTest):
     def test_read_that_nothing_happened_in_a_few_lines(self):
         self.assertEqual(["What the run did", "", "No account was changed.", "",
-                          "result: success; everything was kept; 5 accounts of data version 12, stored before as version 12",
+                          f"result: success; everything was kept; 5 accounts of data version {CURRENT_VERSION}, "
+                          f"stored before as version {CURRENT_VERSION}",
                           "accounts: 5 kept"], self.text(self.example("current"))[:-1])
 
     def test_read_what_became_of_an_account_under_the_stage(self):
@@ -125,7 +131,7 @@ class People(ExplainTest):
         self.assertIn("  and 60 more accounts with other values", lines)
 
     def test_read_of_every_account_that_was_dropped(self):
-        device = self.device(Version=12, Accounts=[account(f"a{n}", "Unheard of") for n in range(100)])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[account(f"a{n}", "Unheard of") for n in range(100)])
         lost = [line for line in self.text(device) if line.startswith("  lost: ")]
         self.assertEqual(100, len(lost))
 

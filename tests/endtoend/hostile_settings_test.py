@@ -5,10 +5,10 @@ import resource
 import struct
 import unittest
 
-from device import SETTINGS, SETTINGS_COPY, TEMPORARY, exactly
+from device import CURRENT_VERSION, SETTINGS, SETTINGS_COPY, TEMPORARY, exactly
 from device_case import HOST, DeviceTest
 
-EMPTY = {"Accounts": [], "Version": 12}
+EMPTY = {"Accounts": [], "Version": CURRENT_VERSION}
 MEBIBYTE = 1024  # of the unit in which the system counts
 REJECTED = "ERROR: Failed to create a BasicAccount from "
 GOOD = {"Type": "Mail", "Class": "IMAPAccount", "Identifier": "GOOD", "DisplayName": "Good"}
@@ -54,8 +54,8 @@ UNREADABLE = {
     "empty": b"",
     "text": b"These are no account settings.",
     "only a header": b"bplist00",
-    "truncated": plistlib.dumps({"Accounts": [GOOD], "Version": 12}, fmt=plistlib.FMT_BINARY)[:-20],
-    "truncated XML": plistlib.dumps({"Accounts": [GOOD], "Version": 12})[:-40],
+    "truncated": plistlib.dumps({"Accounts": [GOOD], "Version": CURRENT_VERSION}, fmt=plistlib.FMT_BINARY)[:-20],
+    "truncated XML": plistlib.dumps({"Accounts": [GOOD], "Version": CURRENT_VERSION})[:-40],
     "an array at the root": plistlib.dumps([GOOD], fmt=plistlib.FMT_BINARY),
     "a text at the root": plistlib.dumps("Accounts", fmt=plistlib.FMT_BINARY),
     "nested a million deep": nested_arrays(1_000_000),
@@ -96,8 +96,8 @@ class HostileSettings(DeviceTest):
 
     def test_elements_of_the_wrong_kind_are_skipped_and_named(self):
         wrong = [1, "text", [], {}, b"\x00", True, {"Type": 7, "Class": []}]
-        device, run = self.migrate(plistlib.dumps({"Accounts": [*wrong, GOOD], "Version": 12}))
-        self.assertEqual({"Accounts": [GOOD], "Version": 12}, device.read_plist(SETTINGS))
+        device, run = self.migrate(plistlib.dumps({"Accounts": [*wrong, GOOD], "Version": CURRENT_VERSION}))
+        self.assertEqual({"Accounts": [GOOD], "Version": CURRENT_VERSION}, device.read_plist(SETTINGS))
         rejected = [message for message in run.messages() if message.startswith(REJECTED)]
         # The file is read twice: once as the run begins and once as it is saved.
         self.assertEqual(2 * len(wrong), len(rejected))
@@ -105,17 +105,17 @@ class HostileSettings(DeviceTest):
     def test_accounts_that_are_no_array_count_as_none(self):
         for accounts in ("text", 3, {"0": GOOD}):
             with self.subTest(accounts=accounts):
-                device, _ = self.migrate(plistlib.dumps({"Accounts": accounts, "Version": 12}))
+                device, _ = self.migrate(plistlib.dumps({"Accounts": accounts, "Version": CURRENT_VERSION}))
                 self.assertEqual(EMPTY, device.read_plist(SETTINGS))
 
     def test_values_of_the_wrong_kind_stay_as_they_are(self):
         odd = {**GOOD, "DisplayName": 7, "Enabled Dataclasses": "Mail", "ChildAccounts": [1, {}, "x"], "Username": []}
-        device, _ = self.migrate(plistlib.dumps({"Accounts": [odd], "Version": 12}))
-        self.assertEqual(exactly({"Accounts": [odd], "Version": 12}), exactly(device.read_plist(SETTINGS)))
+        device, _ = self.migrate(plistlib.dumps({"Accounts": [odd], "Version": CURRENT_VERSION}))
+        self.assertEqual(exactly({"Accounts": [odd], "Version": CURRENT_VERSION}), exactly(device.read_plist(SETTINGS)))
 
     def test_keys_beside_accounts_and_version_are_not_written(self):
-        device, _ = self.migrate(plistlib.dumps({"Accounts": [GOOD], "Version": 12, "Other": 1}))
-        self.assertEqual({"Accounts": [GOOD], "Version": 12}, device.read_plist(SETTINGS))
+        device, _ = self.migrate(plistlib.dumps({"Accounts": [GOOD], "Version": CURRENT_VERSION, "Other": 1}))
+        self.assertEqual({"Accounts": [GOOD], "Version": CURRENT_VERSION}, device.read_plist(SETTINGS))
 
 
 if __name__ == "__main__":

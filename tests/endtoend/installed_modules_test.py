@@ -7,7 +7,7 @@ import unittest
 from pathlib import Path
 
 from accountctl_case import ACCOUNTCTL, DIRECTORY, HOME_MAIL
-from device import EXAMPLES, SETTINGS, plain_environment, run_host
+from device import CURRENT_VERSION, EXAMPLES, SETTINGS, plain_environment, run_host
 from device_case import DeviceTest
 
 BUILD_TREE = Path(os.environ["BUILD_TREE"])
@@ -31,7 +31,7 @@ class InstalledModules(DeviceTest):
         run("cmake", "--install", BUILD_TREE, "--prefix", self.prefix)
         self.resources = self.prefix / os.environ["DATA_DIRECTORY"] / "account-settings"
         self.modules = self.prefix / os.environ["LIBRARY_DIRECTORY"] / "account-settings" / "modules"
-        self.tree = self.device(Version=12, Accounts=[HOME_MAIL, DIRECTORY])
+        self.tree = self.device(Version=CURRENT_VERSION, Accounts=[HOME_MAIL, DIRECTORY])
 
     def accountctl(self, *words):
         return run_host(self.prefix / "bin" / ACCOUNTCTL.name, "--root", self.tree.root, "--modules", *words)

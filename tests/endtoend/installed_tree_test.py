@@ -5,12 +5,13 @@ import subprocess
 import unittest
 from pathlib import Path
 
-from device import EXAMPLES, SETTINGS, lines, plain_environment
+from device import CURRENT_VERSION, EXAMPLES, SETTINGS, lines, plain_environment
 from device_case import DeviceTest
 
 BUILD_TREE = Path(os.environ["BUILD_TREE"])
 LIBRARY_DIRECTORY = os.environ["LIBRARY_DIRECTORY"]
 SOURCES = EXAMPLES.parent / "list-accounts"
+CLIENTS = Path(__file__).resolve().parent / "clients"
 IDENTIFIER = "55E4F607-1829-43A4-95B6-C7D8E9FA0B05"
 NOTES = "com.vorlix.Dataclass.Notes"
 
@@ -49,6 +50,12 @@ class InstalledTree(DeviceTest):
                 needs_the_house = any("(NEEDED)" in line and "[libaccount" in line for line in dynamic)
                 self.assertEqual(needs_the_house, any("(RUNPATH)" in line and "[$ORIGIN" in line for line in dynamic))
 
+    def test_offers_no_header_of_what_the_library_keeps_to_itself(self):
+        headers = self.prefix / "include" / "account-settings" / "accountsettings"
+        offered = {path.name for path in headers.iterdir()}
+        self.assertIn("accounts_manager.h", offered)
+        self.assertEqual(set(), offered & {"file_paths.h", "record_changes.h", "change_tracker.h"})
+
     def test_migrates_a_device(self):
         device = self.example("current")
         before = device.read_plist(SETTINGS)
@@ -64,7 +71,7 @@ class InstalledTree(DeviceTest):
         device = self.example("first-generation")
         (self.library / "account-settings" / "platform-icu.so").unlink()
         self.assertEqual(0, device.migrate(self.prefix / "bin" / "migration-host").status)
-        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+        self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
 
     def build_with_cmake(self):
         build = self.scratch / "with-cmake"
@@ -83,13 +90,13 @@ class InstalledTree(DeviceTest):
         sanitizers = os.environ["SANITIZE"]
         return [f"-fsanitize={sanitizers}"] if sanitizers else []
 
-    def build_with_pkg_config(self):
-        program = self.scratch / "with-pkg-config"
+    def build_with_pkg_config(self, source=SOURCES / "main.cpp"):
+        program = self.scratch / source.stem
         options = run(
             "pkg-config", "--cflags", "--libs", "account-settings", PKG_CONFIG_PATH=str(self.library / "pkgconfig")
         )[0].split()
         run(
-            os.environ["CXX"], SOURCES / "main.cpp", *self.sanitizer_flags(), *options,
+            os.environ["CXX"], source, *self.sanitizer_flags(), *options,
             f"-Wl,-rpath,{self.library}", "-o", program,
         )
         return program
@@ -111,6 +118,13 @@ class InstalledTree(DeviceTest):
 
     def test_serves_a_program_built_with_pkg_config(self):
         self.assert_lists_and_switches(self.build_with_pkg_config())
+
+    def test_offers_what_is_published_to_programs_that_include_it_or_look_it_up(self):
+        program = self.build_with_pkg_config(CLIENTS / "published_functions.cpp")
+        device = self.device()
+        self.assertEqual(["Gmail"], run(program, device.root))
+        device.write_plist("etc/vorlix/device-info.plist", {"RegionalBehaviorGoogleMail": True})
+        self.assertEqual(["Google Mail"], run(program, device.root))
 
 
 if __name__ == "__main__":

@@ -3,7 +3,7 @@
 import plistlib
 import unittest
 
-from device import LEGACY_MAIL, SETTINGS, SETTINGS_COPY
+from device import CURRENT_VERSION, LEGACY_MAIL, SETTINGS, SETTINGS_COPY
 from device_case import HOST, DeviceTest
 
 KEPT = {"Type": "LDAP", "Class": "LDAPAccount", "Identifier": "KEPT"}
@@ -34,7 +34,7 @@ class LossesTest(DeviceTest):
 
 class KnownLosses(LossesTest):
     def test_an_account_that_the_fixer_drops_is_named_in_the_log_and_stands_in_the_copy(self):
-        device = self.device(Version=12, Accounts=[KEPT, UNFIXABLE])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[KEPT, UNFIXABLE])
         run = self.migrate(device)
         self.assertEqual([KEPT], self.accounts(device))
         self.assertEqual([KEPT, UNFIXABLE], self.accounts(device, SETTINGS_COPY))
@@ -43,14 +43,14 @@ class KnownLosses(LossesTest):
 
     def test_a_file_that_cannot_be_read_is_replaced_and_stands_in_the_copy(self):
         device = self.device()
-        content = plistlib.dumps({"Version": 12, "Accounts": [KEPT]}, fmt=plistlib.FMT_BINARY)[:-1]
+        content = plistlib.dumps({"Version": CURRENT_VERSION, "Accounts": [KEPT]}, fmt=plistlib.FMT_BINARY)[:-1]
         device.write(SETTINGS, content)
         self.migrate(device)
         self.assertEqual([], self.accounts(device))
         self.assertEqual(content, device.read(SETTINGS_COPY))
 
     def test_a_legacy_account_that_the_file_holds_as_a_child_becomes_its_parents_record(self):
-        device = self.device(Version=12, Accounts=[PARENT])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[PARENT])
         device.write_plist(LEGACY_MAIL, {"MailAccounts": [
             {"AccountType": "NimbraAccount", "uniqueId": "LEGACY", "Username": "ines", "Signature": "lost"}
         ]})

@@ -8,7 +8,7 @@ import threading
 import unittest
 
 from accountctl_case import ACCOUNTCTL, MAIL
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, TEMPORARY, plain_environment
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, TEMPORARY, plain_environment
 from device_case import HOST, DeviceTest
 
 ROUNDS = 3
@@ -46,7 +46,7 @@ class ManyAtOnce(DeviceTest):
 
     def test_leave_a_whole_file_with_every_account_once(self):
         for _ in range(ROUNDS):
-            device = self.device(Version=12, Accounts=[account(number) for number in range(CLIENTS)])
+            device = self.device(Version=CURRENT_VERSION, Accounts=[account(number) for number in range(CLIENTS)])
             identifiers = [f"M{number}" for number in range(CLIENTS)]
             ended = threading.Event()
             editor = threading.Thread(target=self.edit, args=(device, ended))
@@ -63,7 +63,7 @@ class ManyAtOnce(DeviceTest):
                 ended.set()
                 editor.join()
             settings = self.assert_whole(device.read(SETTINGS), identifiers)
-            self.assertEqual(12, settings["Version"])
+            self.assertEqual(CURRENT_VERSION, settings["Version"])
             self.assertEqual([], list(device.path(TEMPORARY).iterdir()))
 
     def test_convert_legacy_accounts_once(self):

@@ -2,8 +2,9 @@
 
 import plistlib
 import random
+from pathlib import Path
 
-from device import HOME, LEGACY_EXCHANGE, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY
+from device import CURRENT_VERSION, HOME, LEGACY_EXCHANGE, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY
 
 TYPES = ["Mail", "Mail", "Nimbra", "Nimbra", "VorlixAccount", "CalDAV", "Exchange", "SMTP", "Gmail", "Yahoo",
          "OnMyDevice", "LDAP", "IMAPNotes", "Unheard of"]
@@ -12,6 +13,8 @@ CLASSES = ["IMAPAccount", "POPAccount", "GmailAccount", "YahooAccount", "AOLAcco
 DATACLASSES = ["Mail", "Contacts", "Calendars", "Reminders", "Bookmarks", "Notes", "DeviceLocator", "Quorvel",
                "KeyValue", "Tickora", "Unheard of"]
 PATHS = ["Mail/IMAP-x", "Mail/POP-x", "Mail/Lumo-x", "elsewhere", ""]
+# What the version steps beyond the third generation name, by release: each key with the values that it is to have.
+STEP_KEYS = plistlib.loads((Path(__file__).parent.parent / "support" / "step_keys.plist").read_bytes())
 SENTINEL = PREFERENCES + "/.removingOldAccounts"
 RECORDS_SWITCH = PREFERENCES + "/com.vorlix.accountsettings-logging.plist"
 
@@ -65,6 +68,8 @@ class RandomDevice:
             "ChildAccounts": (0.3 if depth < 2 else 0, lambda: [
                 self.odd(self.account(depth + 1)) for _ in range(self.random.randrange(3))]),
         }
+        for keys in STEP_KEYS.values():
+            candidates.update((key, (0.5, lambda values=values: self.one_of(values))) for key, values in keys.items())
         return {key: self.odd(make()) for key, (chance, make) in candidates.items() if self.maybe(chance)}
 
     def accounts(self):
@@ -83,7 +88,7 @@ class RandomDevice:
         return [self.odd(self.description(class_key, class_chance)) for _ in range(self.random.randrange(4))]
 
     def settings(self):
-        root = {"Accounts": self.odd(self.accounts()), "Version": self.odd(self.random.randrange(14))}
+        root = {"Accounts": self.odd(self.accounts()), "Version": self.odd(self.random.randrange(CURRENT_VERSION + 2))}
         return plistlib.dumps(root, fmt=plistlib.FMT_BINARY, sort_keys=False)
 
     def fill(self, device):

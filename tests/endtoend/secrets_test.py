@@ -7,7 +7,7 @@ import unittest
 from pathlib import Path
 
 from accountctl_case import ACCOUNTCTL
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, run_host
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, run_host
 from device_case import HOST, DeviceTest
 
 DEVICES = Path(__file__).parent / "devices"
@@ -86,7 +86,7 @@ class Secrets(DeviceTest):
         return run
 
     def test_of_any_version_are_in_the_files_and_in_no_output(self):
-        for version in range(13):
+        for version in range(CURRENT_VERSION + 1):
             with self.subTest(version=version):
                 golden = plistlib.loads((DEVICES / f"version-{version:02}" / "settings.plist").read_bytes())
                 golden["Accounts"] += [REFUSED, UNFIXABLE]

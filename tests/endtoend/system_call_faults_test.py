@@ -15,7 +15,7 @@ import unittest
 from collections import Counter
 from pathlib import Path
 
-from device import LEGACY_MAIL, SETTINGS, TEMPORARY, Device, plain_environment
+from device import CURRENT_VERSION, LEGACY_MAIL, SETTINGS, TEMPORARY, Device, plain_environment
 from device_case import HOST, can_trace_calls, strace
 
 READING = ["openat", "openat2", "read", "newfstatat"]
@@ -136,7 +136,7 @@ class SystemCallFaults(unittest.TestCase):
         self.check(0)
 
     def test_leave_a_current_device_whole(self):
-        self.check(12)
+        self.check(CURRENT_VERSION)
 
 
 if __name__ == "__main__":

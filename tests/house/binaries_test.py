@@ -1,7 +1,9 @@
 """How every program, library and module is linked, built and installed, and what it exports.
 
-What a library exports is reviewed: exported/NAME.txt lists it, and a library without a list exports nothing. After a
-change that was meant, write the lists anew and read the difference:
+What a library exports is reviewed, signature by signature: exported/NAME.txt is its public interface, and
+exported/NAME.internal.txt what the house itself needs of it beyond that (the plug-in, the tools, the tests). A library
+without lists exports nothing. After a change that was meant, write the lists anew, which puts what is new among the
+internal, move what is public, and read the difference:
 
     python3 tests/house/binaries_test.py --write BUILD_TREE
 """
@@ -16,6 +18,10 @@ import unittest
 from pathlib import Path
 
 REVIEWED = Path(__file__).resolve().parent / "exported"
+INTERNAL = ".internal"
+SOURCES = Path(__file__).resolve().parent.parent.parent
+# Private to a class, and called by those of its operations that stand in the header.
+CALLED_BY_INLINE_OPERATIONS = {"LogHandle::write", "Dictionary::editable"}
 
 
 def output_of(*command):
@@ -51,16 +57,40 @@ def imported_by(path):
     return {line.split()[-1].split("@")[0] for line in output_of("nm", "-D", "--undefined-only", path).splitlines()}
 
 
-def reviewed_for(name):
-    listed = REVIEWED / f"{name}.txt"
+def list_of(name, kind=""):
+    return REVIEWED / f"{name}{kind}.txt"
+
+
+def reviewed_for(name, kind=""):
+    listed = list_of(name, kind)
     return listed.read_text(encoding="utf-8").splitlines() if listed.is_file() else []
 
 
 def write_lists(libraries):
     for path in libraries:
-        exported = exported_by(path)
-        if exported:
-            (REVIEWED / f"{name_of(path)}.txt").write_text("\n".join(exported) + "\n", encoding="utf-8")
+        exported, name = exported_by(path), name_of(path)
+        public = set(reviewed_for(name)) & set(exported)
+        for kind, names in (("", public), (INTERNAL, set(exported) - public)):
+            list_of(name, kind).unlink(missing_ok=True)
+            if names:
+                list_of(name, kind).write_text("\n".join(sorted(names)) + "\n", encoding="utf-8")
+
+
+def private_members(header):
+    """What a header declares as private: CLASS::NAME of each operation."""
+    class_name, is_private = None, False
+    for line in header.read_text(encoding="utf-8").splitlines():
+        opened = re.match(r"class (?:\[\[\w+\]\] |ACCOUNT_\w+ )*(\w+)(?: final)?(?: :.*)? \{$", line)
+        if opened:
+            class_name, is_private = opened[1], True
+        elif re.match(r" (?:public|protected):", line):
+            is_private = False
+        elif line == " private:":
+            is_private = True
+        elif line == "};":
+            class_name = None
+        elif class_name and is_private and (named := re.match(r"  (?:\S.*?[ *&])?(\w+)\(", line)):
+            yield f"{class_name}::{named[1]}"
 
 
 class Binaries(unittest.TestCase):
@@ -120,11 +150,20 @@ class Binaries(unittest.TestCase):
     @unittest.skipIf(os.environ.get("SANITIZE"), "sanitizers export what they need themselves")
     def test_export_what_was_reviewed_and_nothing_else(self):
         for path in self.each(self.libraries):
-            self.assertEqual(reviewed_for(name_of(path)), exported_by(path))
+            name = name_of(path)
+            self.assertEqual(sorted(reviewed_for(name) + reviewed_for(name, INTERNAL)), exported_by(path))
+
+    def test_export_no_private_member(self):
+        headers = [*SOURCES.glob("accountsettings/*.h"), *SOURCES.glob("platform/*.h")]
+        private = {member for header in headers for member in private_members(header)}
+        self.assertIn("AccountsManager::_mergedRecords", private)
+        for path in self.each(self.libraries):
+            exported = {match[1] for line in exported_by(path) if (match := re.match(r"\w+::(\w+::\w+)", line))}
+            self.assertEqual(set(), exported & private - CALLED_BY_INLINE_OPERATIONS)
 
     def test_of_a_list_are_still_built(self):
         built = {name_of(path) for path in self.libraries}
-        self.assertLessEqual({listed.stem for listed in REVIEWED.glob("*.txt")}, built)
+        self.assertLessEqual({listed.name.split(".")[0] for listed in REVIEWED.glob("*.txt")}, built)
 
     def test_guard_their_stack(self):
         for path in self.each():

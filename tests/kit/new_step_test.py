@@ -14,8 +14,8 @@ DEVICES = "tests/endtoend/devices"
 
 class NewStep(KitTest):
     PARTS = (
-        ".clang-format", "README.md", "accountsettings/", "docs/", "migrator/", "tests/endtoend/devices/",
-        "tests/migrator/", "tools/new-step",
+        ".clang-format", "README.md", "accountsettings/", "docs/", "examples/devices/", "migrator/",
+        "tests/endtoend/devices/", "tests/migrator/", "tests/support/step_keys.plist", "tools/new-step",
     )
 
     def setUp(self):
@@ -24,8 +24,7 @@ class NewStep(KitTest):
         self.old = self.current_version()
 
     def current_version(self):
-        source = self.read("accountsettings/accounts_manager_migration_support.cpp")
-        return int(re.search(r"currentVersion\(\) \{ return (\d+); \}", source)[1])
+        return int(re.search(r"kCurrentVersion = (\d+);", self.read("accountsettings/accounts_manager.h"))[1])
 
     def rows(self):
         return re.findall(r"^    \{(\d+), \"(\w+):\", &AccountsDataMigrator::(\w+)\},$", self.read(CHAIN), re.MULTILINE)
@@ -45,7 +44,6 @@ class NewStep(KitTest):
         self.add("9C201")
         name = "_migrateAccountsFrom9C201"
         self.assertEqual([*rows, (str(self.old), name, name)], self.rows())
-        self.assertIn(f"std::array<Step, {len(rows) + 1}>", self.read(CHAIN))
         self.assertEqual(self.old + 1, self.current_version())
 
     def test_stands_in_the_file_of_its_generation(self):
@@ -68,10 +66,23 @@ class NewStep(KitTest):
         expected = plistlib.loads((device / "expected.plist").read_bytes())
         self.assertEqual((self.old + 1, settings["Accounts"]), (settings["Version"], expected["Accounts"]))
 
-    def test_gives_the_device_of_the_last_version_something_to_migrate(self):
+    def test_keeps_the_current_example_current(self):
         self.add("9C201")
-        expected = plistlib.loads(self.read(f"{DEVICES}/version-{self.old:02}/expected.plist").encode())
-        self.assertEqual((self.old + 1, ["Migrating accounts"]), (expected["Version"], expected["Console"]))
+        settings = "var/mobile/Library/Preferences/com.vorlix.accountsettings.plist"
+        example = plistlib.loads(self.read(f"examples/devices/current/{settings}").encode())
+        self.assertEqual(self.old + 1, example["Version"])
+
+    def test_has_a_place_for_the_keys_that_it_names(self):
+        self.add("9C201")
+        self.add("9C202")
+        keys = plistlib.loads(self.read("tests/support/step_keys.plist").encode())
+        self.assertEqual(["9C201", "9C202"], list(keys)[-2:])
+
+    def test_raises_the_version_that_the_documents_show(self):
+        self.add("9C201")
+        self.assertIn(f"Version {self.old + 1} is current.", self.read("docs/FORMAT.md"))
+        for document in ("README.md", "docs/EXPLAIN.md", "docs/FORMAT.md"):
+            self.assertNotRegex(self.read(document), rf"data version (0 -> )?{self.old}\b")
 
     def test_is_followed_by_the_next_one(self):
         self.add("9C201")
@@ -93,8 +104,10 @@ class NewStep(KitTest):
         sources = [path for path in changed if path.suffix in (".cpp", ".h")]
         subprocess.run(["clang-format-16", "--dry-run", "-Werror", *sources], cwd=self.tree, check=True)
 
-    def test_names_the_places_that_tell_the_last_version(self):
-        self.assertIn("  tests/migrator/version_steps_test.cpp", self.add("9C201").splitlines())
+    def test_tells_what_is_to_be_written(self):
+        told = self.add("9C201").split("\n\n")[1]
+        for name in ("migrator/third_generation_steps.cpp", "tests/migrator/step_from_9C201_test.cpp"):
+            self.assertIn(name, told)
 
     def test_is_refused_for_a_release_that_is_not_the_next(self):
         self.assert_refused("the chain ends with 9B176, and 9B176 is no later release", "9B176")
@@ -104,12 +117,12 @@ class NewStep(KitTest):
         self.assert_refused("there is no name for the generation of 13A1; add it to GENERATIONS", "13A1")
 
     def test_is_refused_where_the_sources_are_not_as_they_were(self):
-        path = self.tree / CHAIN
-        path.write_text(path.read_text().replace("std::array<Step", "std::array< Step"))
+        path = self.tree / "accountsettings/accounts_manager.h"
+        path.write_text(path.read_text().replace("kCurrentVersion = ", "kCurrentVersion{"))
         self.before = self.contents()
         refused = self.new_step("9C201")
         self.assertEqual(1, refused.returncode)
-        self.assertIn(f"new-step: {CHAIN} is not as it is expected: 0 places match", refused.stderr)
+        self.assertIn("accounts_manager.h is not as it is expected: nothing matches", refused.stderr)
         self.assertEqual(self.before, self.contents())
 
     def test_says_how_it_is_used(self):

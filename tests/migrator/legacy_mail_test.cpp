@@ -6,16 +6,17 @@
 #include <atomic>
 #include <thread>
 
+#include "accountsettings/mail_functions.h"
 #include "accountsettings/vocabulary.h"
 #include "migrator/accounts_data_migrator.h"
 #include "tests/support/migration_device.h"
 
 using namespace tests;
+using accountsettings::_UseGoogleMail;
 using accountsettings::AccountsManager;
 using accountsettings::BasicAccount;
 using accountsettings::kMailAccountType;
 using accountsettings::kSMTPAccountType;
-using migrator::_UseGoogleMail;
 using migrator::AccountsDataMigrator;
 using testing::ElementsAre;
 using testing::IsEmpty;

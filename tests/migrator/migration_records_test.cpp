@@ -86,7 +86,7 @@ TEST_F(MigrationRecords, SwitchIsReadOncePerProcess) {
 
 TEST_F(MigrationRecords, ReportHoldsWhatWasCollatedAndTheSavedSettings) {
   migrator._collatedMigrationData = Dictionary{{"OldMailAccounts", Dictionary{{"a", 1}}}};
-  device.putSettings(12, {});
+  device.putSettings(accountsettings::kCurrentVersion, {});
   migrator._saveCollatedMigrationInformation();
   const Dictionary expected{{"OldMailAccounts", Dictionary{{"a", 1}}},
                             {"NewAccounSettings", device.dictionaryAt(kSettingsFile)}};
@@ -124,7 +124,7 @@ TEST_F(MigrationRecords, ReportDirectoryThatIsThereStaysAsItIs) {
 }
 
 TEST_F(MigrationRecords, NothingCollatedMakesTheDirectoryButNoReport) {
-  device.putSettings(12, {});
+  device.putSettings(accountsettings::kCurrentVersion, {});
   migrator._saveCollatedMigrationInformation();
   EXPECT_TRUE(device.files->exists(kReportDirectory));
   EXPECT_FALSE(device.files->exists(kReportFile));

@@ -1,18 +1,34 @@
 #include <cstdlib>
+#include <fstream>
+#include <iterator>
 #include <map>
 #include <random>
 #include <set>
 
 #include "accountsettings/device_local_account.h"
+#include "tests/support/property_list_files.h"
 #include "tests/support/step_test.h"
 
 namespace migrator {
 namespace {
 
+using accountsettings::kCurrentVersion;
 using tests::dataclasses;
+
+constexpr int kVersions = kCurrentVersion + 1;
 
 constexpr std::string_view kMarker = "Marker";  // which account of the file a record was
 constexpr std::string_view kForeignKey = "Foreign";
+
+// By release, what the steps that came later name: each key with the values that it is to have.
+const Dictionary& stepKeys() {
+  static const Dictionary keys = [] {
+    std::ifstream file{STEP_KEYS};
+    const std::string bytes{std::istreambuf_iterator{file}, {}};
+    return tests::PropertyListFiles{}.read(bytes).value();
+  }();
+  return keys;
+}
 
 // Settings files of accounts as odd as a file can hold them.
 class RandomFiles {
@@ -32,9 +48,8 @@ class RandomFiles {
   using Words = std::vector<std::string_view>;
 
   bool maybe() { return below(2) == 0; }
-  std::string_view oneOf(const Words& words) {
-    return words[static_cast<std::size_t>(below(static_cast<int>(words.size())))];
-  }
+  std::size_t placeAmong(std::size_t count) { return static_cast<std::size_t>(below(static_cast<int>(count))); }
+  std::string_view oneOf(const Words& words) { return words[placeAmong(words.size())]; }
 
   PropertyValue identifier() {
     const int number = _areIdentifiersUnique ? ++_identifiers : below(4);
@@ -87,6 +102,14 @@ class RandomFiles {
     if (below(4) == 0) properties.set("Subscribed Calendars", anything());
     if (below(4) == 0) properties.set("AccountPath", sometimesOdd(oneOf({"Mail/IMAP-x", "Mail/Lumo-x", "elsewhere"})));
   }
+  void addStepKeys(Dictionary& properties) {
+    for (const Dictionary::Entry& step : stepKeys()) {
+      for (const Dictionary::Entry& key : *step.value.asDictionary()) {
+        const Array& values = *key.value.asArray();
+        if (maybe()) properties.set(key.key, sometimesOdd(values.at(placeAmong(values.size()))));
+      }
+    }
+  }
   Dictionary account(bool isTopLevel) {
     static const Words kTypes{"Mail",          "Mail",   "Nimbra",     "Nimbra",   "VorlixAccount",
                               "VorlixAccount", "CalDAV", "CalDAV",     "Exchange", "SMTP",
@@ -103,6 +126,7 @@ class RandomFiles {
     if (below(3) == 0) properties.set("Sync Identifier", sometimesOdd("sync"));
     addSettings(properties);
     if (maybe()) addCalDAV(properties);
+    addStepKeys(properties);
     if (isTopLevel && below(3) == 0) properties.set("ChildAccounts", sometimesOdd(children()));
     properties.set(kMarker, ++_markers);
     properties.set(kForeignKey, anything());
@@ -136,8 +160,8 @@ class RandomStores : public tests::StepTest {
     start(accounts, version);
     store.reset();
     EXPECT_TRUE(AccountsDataMigrator{}.performMigration());
-    EXPECT_EQ(device.dictionaryAt(AccountsManager::fullPathToAccountSettingsPlist()).find("Version")->integerValue(),
-              12);
+    EXPECT_EQ(*device.dictionaryAt(AccountsManager::fullPathToAccountSettingsPlist()).find("Version"),
+              PropertyValue{kCurrentVersion});
     return savedAccounts();
   }
 };
@@ -183,7 +207,7 @@ class Losses {
 TEST_F(RandomStores, LoseNoAccountButByARuleAndNoKeyThatNoStepNames) {
   for (int round = 0; round < rounds(); ++round) {
     RandomFiles random{static_cast<std::uint32_t>(round)};
-    const int version = random.below(13);
+    const int version = random.below(kVersions);
     const Array before = random.accounts(true);
     start(before, version);
     const Losses losses{*store, version};
@@ -202,10 +226,10 @@ TEST_F(RandomStores, LoseNoAccountButByARuleAndNoKeyThatNoStepNames) {
 TEST_F(RandomStores, StayAsTheyAreWhenMigratedAgain) {
   for (int round = 0; round < rounds() / 4; ++round) {
     RandomFiles random{static_cast<std::uint32_t>(round)};
-    const Array once = migrated(random.accounts(true), random.below(13));
+    const Array once = migrated(random.accounts(true), random.below(kVersions));
     store = AccountsManager::initInsideOfMigration();
     EXPECT_EQ(store->count(), once.size()) << "round " << round;
-    EXPECT_EQ(migrated(once, 12), once) << "round " << round;
+    EXPECT_EQ(migrated(once, kCurrentVersion), once) << "round " << round;
     EXPECT_TRUE(device.console->lines.empty());
   }
 }
@@ -213,7 +237,7 @@ TEST_F(RandomStores, StayAsTheyAreWhenMigratedAgain) {
 TEST_F(RandomStores, AreMigratedAlsoWhereAccountsShareIdentifiers) {
   for (int round = 0; round < rounds(); ++round) {
     RandomFiles random{static_cast<std::uint32_t>(round)};
-    const int version = random.below(13);
+    const int version = random.below(kVersions);
     const Array before = random.accounts(false);
     start(before, version);
     const bool isAnythingLoaded = store->count() > 0;
@@ -223,8 +247,6 @@ TEST_F(RandomStores, AreMigratedAlsoWhereAccountsShareIdentifiers) {
 
 class RandomStoresOneStepEarlier : public RandomStores, public testing::WithParamInterface<int> {
  protected:
-  using Step = bool (AccountsDataMigrator::*)(AccountsManager&);
-
   // With the account that makes the step of the on-device account do nothing.
   static Array withCurrentOnDeviceAccount(Array accounts) {
     std::erase_if(accounts, [](const PropertyValue& element) {
@@ -241,23 +263,16 @@ class RandomStoresOneStepEarlier : public RandomStores, public testing::WithPara
     for (const auto& account : store->allBasicAccounts()) properties.emplace_back(account->properties());
     return properties;
   }
-  bool hasNothingToDo(Step step, const Array& accounts, int version) {
-    start(accounts, version);
+  bool hasNothingToDo(const Array& accounts) {
+    start(accounts, GetParam());
     const Array before = properties();
-    std::ignore = (migrator.*step)(*store);
+    const auto& step = AccountsDataMigrator::versionSteps()[static_cast<std::size_t>(GetParam())];
+    std::ignore = (migrator.*step.run)(*store);
     return properties() == before;
   }
 };
 
 constexpr int kStepOfTheOnDeviceAccount = 2;
-
-constexpr std::array kSteps{
-    &AccountsDataMigrator::_migrateAccountsFrom7A149, &AccountsDataMigrator::_migrateAccountsFrom7A150,
-    &AccountsDataMigrator::_migrateAccountsFrom7A153, &AccountsDataMigrator::_migrateAccountsFrom7A241,
-    &AccountsDataMigrator::_migrateAccountsFrom7A242, &AccountsDataMigrator::_migrateAccountsFrom8A293,
-    &AccountsDataMigrator::_migrateAccountsFrom8B117, &AccountsDataMigrator::_migrateAccountsFrom8C136,
-    &AccountsDataMigrator::_migrateAccountsFrom8F191, &AccountsDataMigrator::_migrateAccountsFrom9A182,
-    &AccountsDataMigrator::_migrateAccountsFrom9A334, &AccountsDataMigrator::_migrateAccountsFrom9B176};
 
 TEST_P(RandomStoresOneStepEarlier, BecomeTheSameWhereThatStepHasNothingToDo) {
   int compared = 0;
@@ -265,7 +280,7 @@ TEST_P(RandomStoresOneStepEarlier, BecomeTheSameWhereThatStepHasNothingToDo) {
     RandomFiles random{static_cast<std::uint32_t>(round)};
     Array accounts = random.accounts(true);
     if (GetParam() == kStepOfTheOnDeviceAccount) accounts = withCurrentOnDeviceAccount(accounts);
-    if (!hasNothingToDo(kSteps.at(static_cast<std::size_t>(GetParam())), accounts, GetParam())) continue;
+    if (!hasNothingToDo(accounts)) continue;
     device.identifiers->made = 0;
     const Array entered = migrated(accounts, GetParam() + 1);
     device.identifiers->made = 0;
@@ -275,7 +290,30 @@ TEST_P(RandomStoresOneStepEarlier, BecomeTheSameWhereThatStepHasNothingToDo) {
   EXPECT_GT(compared, 0);
 }
 
-INSTANTIATE_TEST_SUITE_P(EveryStep, RandomStoresOneStepEarlier, testing::Range(0, 12));
+INSTANTIATE_TEST_SUITE_P(EveryStep, RandomStoresOneStepEarlier, testing::Range<int>(0, kCurrentVersion));
+
+class RandomStoresOfAStep : public RandomStoresOneStepEarlier {
+ protected:
+  RandomStoresOfAStep() { device.deviceInfo->answers["CPUArchitecture"] = "armv6"; }
+};
+
+TEST_P(RandomStoresOfAStep, GiveItSomethingToDo) {
+  for (int round = 0; round < rounds(); ++round) {
+    if (!hasNothingToDo(RandomFiles{static_cast<std::uint32_t>(round)}.accounts(true))) return;
+  }
+  FAIL() << "no account has what this step changes; name the keys in " << STEP_KEYS;
+}
+
+// Two steps change nothing but the version.
+std::vector<int> stepsThatChangeAccounts() {
+  std::vector<int> steps;
+  for (int version = 0; version < static_cast<int>(kCurrentVersion); ++version) {
+    if (version != 0 && version != 8) steps.push_back(version);
+  }
+  return steps;
+}
+
+INSTANTIATE_TEST_SUITE_P(ThatChangesAccounts, RandomStoresOfAStep, testing::ValuesIn(stepsThatChangeAccounts()));
 
 }  // namespace
 }  // namespace migrator

@@ -68,6 +68,17 @@ TEST_F(VersionChain, AnswersWhatTheLastStepAnswers) {
   EXPECT_FALSE(run(6));
 }
 
+TEST(LeadingTo, AVersionTakesAStepForEachBeforeItInOrder) {
+  const Step none{0, "", nullptr};
+  const Step first{1, "", nullptr};
+  const Step second{2, "", nullptr};
+  EXPECT_TRUE(leadsTo(3, std::array{none, first, second}));
+  EXPECT_FALSE(leadsTo(2, std::array{none, first, second}));
+  EXPECT_FALSE(leadsTo(4, std::array{none, first, second}));
+  EXPECT_FALSE(leadsTo(3, std::array{none, second, first}));
+  EXPECT_FALSE(leadsTo(2, std::array{first, second}));
+}
+
 TEST_F(VersionChain, RefusesAVersionWithoutAStep) {
   EXPECT_FALSE(run(3));
   EXPECT_FALSE(run(7));

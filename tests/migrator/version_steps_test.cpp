@@ -7,10 +7,13 @@
 namespace migrator {
 namespace {
 
+using accountsettings::kCurrentVersion;
 using tests::account;
 
+// The releases of the three generations, of which it is known when each step saves; every later step saves once.
 const std::vector<std::string> kReleases{"7A149", "7A150", "7A153", "7A241", "7A242", "8A293",
                                          "8B117", "8C136", "8F191", "9A182", "9A334", "9B176"};
+const auto kLaterSaves = static_cast<std::ptrdiff_t>(kCurrentVersion - kReleases.size());
 
 class Stages final : public platform::RunObserver {
  public:
@@ -37,14 +40,18 @@ class Dispatch : public tests::StepTest {
 
   void expectStepsFrom(std::size_t first) const {
     std::vector<std::string> expected;
-    for (std::size_t step = first; step < kReleases.size(); ++step) {
-      expected.push_back("_migrateAccountsFrom" + kReleases[step] + ":");
-    }
+    for (const auto& step : AccountsDataMigrator::versionSteps().subspan(first)) expected.emplace_back(step.name);
     EXPECT_EQ(stages->steps, expected);
   }
 
   std::shared_ptr<Stages> stages = std::make_shared<Stages>(store);
 };
+
+TEST(VersionSteps, BeginWithThoseOfTheThreeGenerations) {
+  for (std::size_t step = 0; step < kReleases.size(); ++step) {
+    EXPECT_EQ(AccountsDataMigrator::versionSteps()[step].name, "_migrateAccountsFrom" + kReleases[step] + ":");
+  }
+}
 
 struct Entry {
   PropertyValue version;
@@ -60,35 +67,48 @@ TEST_P(DispatchOfAStoredVersion, EntersTheChainAtTheStepOfThatVersion) {
   load({account("LDAP", "LDAPAccount", "L")}, GetParam().version);
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
   expectStepsFrom(GetParam().firstStep);
-  EXPECT_EQ(saves(), GetParam().saves);
-  EXPECT_GE(store->dataVersion(), 12U);
+  EXPECT_EQ(saves(), GetParam().saves + kLaterSaves);
+  EXPECT_EQ(store->dataVersion(), kCurrentVersion);
 }
 
 INSTANTIATE_TEST_SUITE_P(EveryVersion, DispatchOfAStoredVersion,
                          testing::Values(Entry{0, 0, 6}, Entry{1, 1, 6}, Entry{2, 2, 6}, Entry{3, 3, 6}, Entry{4, 4, 6},
                                          Entry{5, 5, 6}, Entry{6, 6, 6}, Entry{7, 7, 5}, Entry{8, 8, 4}, Entry{9, 9, 3},
-                                         Entry{10, 10, 2}, Entry{11, 11, 1}, Entry{12, 12, 0}, Entry{13, 12, 0}));
+                                         Entry{10, 10, 2}, Entry{11, 11, 1}));
 
 INSTANTIATE_TEST_SUITE_P(OddVersions, DispatchOfAStoredVersion,
-                         testing::Values(Entry{-1, 12, 0}, Entry{std::numeric_limits<std::int64_t>::min(), 12, 0},
-                                         Entry{std::numeric_limits<std::int64_t>::max(), 12, 0},
-                                         Entry{std::numeric_limits<std::uint64_t>::max(), 12, 0}, Entry{"7", 7, 5},
-                                         Entry{"11 and more", 11, 1}, Entry{"-3", 12, 0}, Entry{"twelve", 0, 6},
+                         testing::Values(Entry{"7", 7, 5}, Entry{"11 and more", 11, 1}, Entry{"twelve", 0, 6},
                                          Entry{"", 0, 6}, Entry{9.99, 9, 3}, Entry{-0.5, 0, 6}, Entry{true, 0, 6},
-                                         Entry{Array{12}, 0, 6}, Entry{Dictionary{{"Version", 12}}, 0, 6},
-                                         Entry{platform::Date{12}, 0, 6}));
+                                         Entry{Array{7}, 0, 6}, Entry{Dictionary{{"Version", 7}}, 0, 6},
+                                         Entry{platform::Date{7}, 0, 6}));
 
 TEST_P(DispatchOfAStoredVersion, ReadsTheVersionAsTheStoreDoes) {
   load({}, GetParam().version);
-  EXPECT_EQ(std::min<std::uint64_t>(store->dataVersion(), kReleases.size()), GetParam().firstStep);
+  EXPECT_EQ(store->dataVersion(), GetParam().firstStep);
 }
+
+class DispatchOfAVersionWithoutSteps : public Dispatch, public testing::WithParamInterface<PropertyValue> {};
+
+TEST_P(DispatchOfAVersionWithoutSteps, LeavesTheFileAndItsVersionAlone) {
+  load({account("LDAP", "LDAPAccount", "L")}, GetParam());
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  expectStepsFrom(kCurrentVersion);
+  EXPECT_EQ(saves(), 0);
+  EXPECT_GE(store->dataVersion(), kCurrentVersion);
+}
+
+INSTANTIATE_TEST_SUITE_P(CurrentOrNewer, DispatchOfAVersionWithoutSteps,
+                         testing::Values(kCurrentVersion, kCurrentVersion + 1, -1,
+                                         std::numeric_limits<std::int64_t>::min(),
+                                         std::numeric_limits<std::int64_t>::max(),
+                                         std::numeric_limits<std::uint64_t>::max(), "-3"));
 
 TEST_F(Dispatch, RunsAllStepsForAFileWithoutAVersion) {
   putSettings({{"Accounts", Array{account("LDAP", "LDAPAccount", "L")}}});
   store = AccountsManager::initInsideOfMigration();
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
   expectStepsFrom(0);
-  EXPECT_EQ(store->dataVersion(), 12U);
+  EXPECT_EQ(store->dataVersion(), kCurrentVersion);
 }
 
 TEST_F(Dispatch, RunsAllStepsWhereThereIsNoFile) {
@@ -107,6 +127,7 @@ TEST_F(Dispatch, GoesByTheFileAndNotByTheStore) {
 TEST_F(Dispatch, LeavesTheStampAtSixUntilTheLastStepOfTheSecondGeneration) {
   load({}, 6);
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  stages->versions.resize(6);
   EXPECT_EQ(stages->versions, (std::vector<std::uint64_t>{6, 6, 9, 10, 11, 12}));
 }
 
@@ -126,7 +147,7 @@ TEST_F(Dispatch, SaysInTheLogWhatTheStepsDoInTheirOrder) {
   std::vector<std::string> expected{"Replacing accounts", "Replacing accounts",  // identifiers
                                     "Replacing accounts",                        // the on-device account
                                     "Replacing accounts", "Deleting account:"};  // hosted notes; the folded partner
-  for (int save = 0; save < 6; ++save) {
+  for (std::ptrdiff_t save = 0; save < 6 + kLaterSaves; ++save) {
     expected.emplace_back("Saving all accounts");
     for (const std::string type : {"Gmail", "OnMyDevice"}) {
       expected.insert(expected.end(),
@@ -137,14 +158,14 @@ TEST_F(Dispatch, SaysInTheLogWhatTheStepsDoInTheirOrder) {
 }
 
 TEST_F(Dispatch, LeavesStoreAndFileOfACurrentVersionAlone) {
-  load({account("Mail", "IMAPAccount", "M", {{"uniqueId", "U"}})}, 12);
+  load({account("Mail", "IMAPAccount", "M", {{"uniqueId", "U"}})}, kCurrentVersion);
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
   EXPECT_EQ(value(0, "Identifier"), PropertyValue{"M"});
   EXPECT_TRUE(device.outputs.empty());
 }
 
 TEST_F(Dispatch, ReadsTheFileOnceForTheVersionAndOnceForTheReport) {
-  load({}, 12);
+  load({}, kCurrentVersion);
   device.propertyLists->reads.clear();
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
   const tests::Path file = AccountsManager::fullPathToAccountSettingsPlist();
@@ -182,9 +203,9 @@ TEST_F(DispatchWithAReport, CollectsAnEmptyDictionaryForAFileThatCannotBeRead) {
 }
 
 TEST_F(DispatchWithAReport, CollectsTheFileAlsoWhereNoStepRuns) {
-  load({}, 12);
+  load({}, kCurrentVersion);
   EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
-  EXPECT_EQ(collected(), (PropertyValue{Dictionary{{"Version", 12}, {"Accounts", Array{}}}}));
+  EXPECT_EQ(collected(), (PropertyValue{Dictionary{{"Version", kCurrentVersion}, {"Accounts", Array{}}}}));
 }
 
 TEST_F(Dispatch, CollectsNothingWhereNoReportIsWanted) {

@@ -11,6 +11,7 @@
 #include <cstring>
 #include <fstream>
 
+#include "accountsettings/accounts_manager.h"
 #include "tests/modules/module_device.h"
 #include "tests/support/bus_subscriber.h"
 #include "tests/support/private_bus.h"
@@ -30,8 +31,10 @@ constexpr const char* kSettings = "var/mobile/Library/Preferences/com.vorlix.acc
 const std::string kMail = "com.vorlix.Dataclass.Mail";
 const std::string kNotes = "com.vorlix.Dataclass.Notes";
 
-constexpr const char* kOneAccount = R"(<?xml version="1.0" encoding="UTF-8"?>
-<plist version="1.0"><dict><key>Version</key><integer>12</integer><key>Accounts</key><array><dict>
+const std::string kOneAccount = R"(<?xml version="1.0" encoding="UTF-8"?>
+<plist version="1.0"><dict><key>Version</key><integer>)" +
+                                std::to_string(accountsettings::kCurrentVersion) +
+                                R"(</integer><key>Accounts</key><array><dict>
 <key>Type</key><string>Mail</string><key>Class</key><string>IMAPAccount</string>
 <key>Identifier</key><string>A</string>
 <key>Enabled Dataclasses</key><array><string>com.vorlix.Dataclass.Mail</string></array>

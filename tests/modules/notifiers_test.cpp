@@ -19,7 +19,7 @@ class Notifiers : public ModuleDevice {
     const Dictionary account{
         {"Type", "Mail"}, {"Class", "IMAPAccount"}, {"Identifier", "A"}, {"Enabled Dataclasses", Array{kMail, kNotes}}};
     device.put(AccountsManager::fullPathToAccountSettingsPlist(),
-               Dictionary{{"Version", 12}, {"Accounts", Array{account}}});
+               Dictionary{{"Version", accountsettings::kCurrentVersion}, {"Accounts", Array{account}}});
     return AccountsManager::init();
   }
   void putNotifiers(const Array& entries) { putCreators("Mail", entries); }

@@ -6,7 +6,7 @@ import subprocess
 import zlib
 from pathlib import Path
 
-from device import LEGACY_MAIL, SETTINGS, Device
+from device import CURRENT_VERSION, LEGACY_MAIL, SETTINGS, Device
 from device_case import HOST, DeviceTest
 
 from migration_rehearse import host, rehearsal, unpacking
@@ -22,7 +22,7 @@ class RehearseTest(DeviceTest):
         super().setUp()
         self.file = self.scratch / "results.sqlite"
 
-    def image(self, name, accounts=(KEPT,), version=12, mobile=None):
+    def image(self, name, accounts=(KEPT,), version=CURRENT_VERSION, mobile=None):
         """A device in a directory of its own."""
         device = Device(self.scratch / name)
         device.set_mobile(*(mobile or (os.getuid(), os.getgid())))
@@ -37,7 +37,7 @@ class RehearseTest(DeviceTest):
     def fleet(self, count):
         """Devices that all differ, every third of which loses an account."""
         return [self.image(f"device-{number}", [{**KEPT, "Identifier": f"K{number}"}, *([UNFIXABLE] * (number % 3 == 0))],
-                           version=number % 13) for number in range(count)]
+                           version=number % (CURRENT_VERSION + 1)) for number in range(count)]
 
     def rehearse(self, *arguments, status=0, results=None, text=None, **more):
         """Runs the program, which must end with this status; answers what it printed."""

@@ -10,6 +10,7 @@ from selenium.webdriver.common.keys import Keys
 from selenium.webdriver.support.ui import Select, WebDriverWait
 
 from browser_case import BrowserTest
+from device import CURRENT_VERSION
 from migration_rehearse.rehearsal import Identified, Rehearsed
 from migration_rehearse.results import Results
 from rehearse_case import KEPT, UNFIXABLE
@@ -41,7 +42,8 @@ class ReportTest(BrowserTest):
         explanation = {"stages": [{"stage": "load", "facts": facts}], "result": {"success": True, "verdict": "kept"}}
         losses = {f"code-{number // 10 % 5}": 1 + number % 3} if number % 10 == 0 else {}
         return Rehearsed(
-            "lost" if losses else "kept", stored_version=number % 13, accounts=number % 40, losses=losses,
+            "lost" if losses else "kept", stored_version=number % (CURRENT_VERSION + 1),
+            accounts=number % 40, losses=losses,
             counts={"changed": 1, "lost": sum(losses.values())}, facts={("load", "changed", ""): 10},
             seconds=0.01 * (1 + number % 97), peak_memory=(8 + number % 5) << 20, fingerprint=number.to_bytes(16, "big"),
             document=zlib.compress(json.dumps({"console": [], "explanation": explanation}).encode()))

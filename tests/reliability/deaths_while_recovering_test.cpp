@@ -67,7 +67,7 @@ TEST_P(DyingAgain, WhileRecoveringLosesNoAccountAndIsFinishedByTheNextRun) {
 
 INSTANTIATE_TEST_SUITE_P(OfSomeVersions, DyingAgain,
                          testing::Values(DeviceForm{0, tests::kBothLegacyFiles}, DeviceForm{6, tests::kLegacyMailOnly},
-                                         DeviceForm{12, tests::kNoLegacyFiles}),
+                                         DeviceForm{tests::kCurrentVersion, tests::kNoLegacyFiles}),
                          tests::nameOf);
 
 }  // namespace

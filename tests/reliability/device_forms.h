@@ -8,9 +8,12 @@
 #include <string>
 #include <tuple>
 
+#include "accountsettings/accounts_manager.h"
 #include "tests/reliability/scratch_device.h"
 
 namespace tests {
+
+inline constexpr int kCurrentVersion{accountsettings::kCurrentVersion};
 
 // The legacy files that a device has.
 struct LegacyForm {

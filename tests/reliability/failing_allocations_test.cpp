@@ -45,7 +45,7 @@ TEST_P(ShortOfMemory, RunsLoseNoAccountAndAreFinishedByTheNextRun) {
 
 INSTANTIATE_TEST_SUITE_P(OfSomeVersions, ShortOfMemory,
                          testing::Values(DeviceForm{0, tests::kBothLegacyFiles}, DeviceForm{6, tests::kNoLegacyFiles},
-                                         DeviceForm{12, tests::kNoLegacyFiles}),
+                                         DeviceForm{tests::kCurrentVersion, tests::kNoLegacyFiles}),
                          tests::nameOf);
 
 }  // namespace

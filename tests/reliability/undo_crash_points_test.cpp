@@ -141,8 +141,10 @@ TEST_P(DyingRestores, AreFinishedByTheNextRun) {
   print("running after a restore", operations, 3 * points);
 }
 
-const auto kEveryDevice = testing::Combine(testing::Range(0, 13), testing::ValuesIn(tests::kLegacyForms));
-const auto kSomeDevices = testing::Combine(testing::Values(0, 6, 11, 12), testing::ValuesIn(tests::kLegacyForms));
+const auto kEveryDevice =
+    testing::Combine(testing::Range(0, tests::kCurrentVersion + 1), testing::ValuesIn(tests::kLegacyForms));
+const auto kSomeDevices = testing::Combine(testing::Values(0, 6, tests::kCurrentVersion - 1, tests::kCurrentVersion),
+                                           testing::ValuesIn(tests::kLegacyForms));
 
 INSTANTIATE_TEST_SUITE_P(OfEveryVersionAndLegacyForm, DyingUndoableRuns, kEveryDevice, tests::nameOf);
 INSTANTIATE_TEST_SUITE_P(OfSomeVersions, RunsDyingAgain, kSomeDevices, tests::nameOf);

@@ -18,7 +18,6 @@
 #include "platform/linux/files/linux_file_locks.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
-#include "platform/run_fact.h"
 #include "tests/support/fake_platform.h"
 #include "tests/support/mishap_file_keeper.h"
 
@@ -74,22 +73,21 @@ Child childOn(const std::filesystem::path& root, const Mishap& mishap) {
 }
 
 // Remembers how the last save ended.
-class SaveWatch final : public platform::RunObserver {
+class LastSave final : public records::FactObserver {
  public:
-  void stageBegan(std::string_view /*stage*/) override {}
+  void stageBegan(std::string_view /*stage*/, std::string_view /*words*/) override {}
   void stageEnded(std::string_view /*stage*/) override {}
-  [[nodiscard]] bool wantsFacts() const override { return true; }
-  void told(const platform::RunFact& fact) override {
-    if (fact.kind == platform::RunFact::Kind::saved) isSaved = true;
-    if (fact.kind == platform::RunFact::Kind::saveFailed) isSaved = false;
+  void told(const records::Fact& fact) override {
+    if (std::holds_alternative<records::Saved>(fact)) isSaved = true;
+    if (std::holds_alternative<records::SaveFailed>(fact)) isSaved = false;
   }
-  void progressed(std::size_t /*done*/, std::size_t /*total*/) override {}
+  void lostTrack() noexcept override {}
 
   bool isSaved = true;
 };
 
 int migrate(Child& child) {
-  const auto watch = std::make_shared<SaveWatch>();
+  const auto watch = std::make_shared<LastSave>();
   child.place.services.observer = watch;
   platform::setCurrent(child.place.services);
   migrator::AccountsDataMigrator migrator;

@@ -7,6 +7,7 @@
 
 using namespace tests;
 using accountsettings::AccountsManager;
+using accountsettings::kCurrentVersion;
 using migrator::AccountsDataMigrator;
 using testing::Contains;
 using testing::ElementsAre;
@@ -52,9 +53,7 @@ class RunSequence : public testing::Test {
   MigrationDevice device;
   AccountsDataMigrator migrator;
 
-  [[nodiscard]] std::int64_t savedVersion() {
-    return device.dictionaryAt(kSettingsFile).find("Version")->integerValue().value_or(-1);
-  }
+  [[nodiscard]] PropertyValue savedVersion() { return *device.dictionaryAt(kSettingsFile).find("Version"); }
   // Everything that happened, without the library's log.
   [[nodiscard]] std::vector<std::string> happenings() const {
     std::vector<std::string> without = device.outputs;
@@ -66,13 +65,13 @@ class RunSequence : public testing::Test {
 TEST_F(RunSequence, IsOfTheDataClassAccounts) { EXPECT_EQ(migrator.dataClassName(), "accounts"); }
 
 TEST_F(RunSequence, NothingToMigrateStillSavesStampsAndTellsTheMailApplication) {
-  device.putSettings(12, {account("A")});
+  device.putSettings(kCurrentVersion, {account("A")});
   device.files->put(kAutoFetchMarker, "");
   EXPECT_TRUE(migrator.performMigration());
   EXPECT_THAT(happenings(), ElementsAre("began copy aside", "ended copy aside", "began decision", "ended decision",
                                         "began load", "ended load", "began save", "ended save", kMailNotice));
   EXPECT_EQ(versionSteps().runs, 0);
-  EXPECT_EQ(savedVersion(), 12);
+  EXPECT_EQ(savedVersion(), PropertyValue{kCurrentVersion});
   EXPECT_THAT(device.savedIdentifiers(), ElementsAre("A"));
   EXPECT_FALSE(device.files->exists(kAutoFetchMarker));
   EXPECT_FALSE(AccountsManager::shouldSkipNotifications());
@@ -80,7 +79,7 @@ TEST_F(RunSequence, NothingToMigrateStillSavesStampsAndTellsTheMailApplication) 
 
 TEST_F(RunSequence, EmptyDeviceGetsAnEmptySettingsFile) {
   EXPECT_TRUE(migrator.performMigration());
-  EXPECT_EQ(savedVersion(), 12);
+  EXPECT_EQ(savedVersion(), PropertyValue{kCurrentVersion});
   EXPECT_THAT(device.savedAccounts(), IsEmpty());
   EXPECT_THAT(device.console->lines, ElementsAre("Error trying to save an accountsettings plist copy: Could not copy " +
                                                  kSettingsFile.string() + ": No such file or directory (errno 2)"));
@@ -93,7 +92,7 @@ TEST_F(RunSequence, OutOfDateSettingsPassThroughTheVersionStepsOnly) {
                                         "began load", "ended load", "console Migrating accounts", "began version steps",
                                         "ended version steps", "began save", "ended save", kMailNotice));
   EXPECT_EQ(versionSteps().runs, 1);
-  EXPECT_EQ(savedVersion(), 12);
+  EXPECT_EQ(savedVersion(), PropertyValue{kCurrentVersion});
 }
 
 TEST_F(RunSequence, BothLegacyFilesAreConvertedExchangeFirstThenTheVersionStepsRun) {
@@ -120,7 +119,7 @@ struct LegacyRow {
 TEST_F(RunSequence, LegacyFilesAloneBringTheVersionStepsAboutToo) {
   for (const LegacyRow& row : {LegacyRow{true, false}, LegacyRow{false, true}}) {
     versionSteps().runs = 0;
-    device.putSettings(12, {});
+    device.putSettings(kCurrentVersion, {});
     if (row.exchange) device.put(kLegacyExchangeFile, legacyExchange("E1"));
     if (row.mail) device.put(kLegacyMailFile, legacyMail("M1"));
     EXPECT_TRUE(AccountsDataMigrator{}.performMigration());
@@ -150,7 +149,7 @@ TEST_F(RunSequence, StoreIsStampedBeforeItIsSavedEvenAfterFailedVersionSteps) {
     device.propertyLists->beforeRead = [&](const Path&) { versionsAtSave.push_back(store.dataVersion()); };
   };
   EXPECT_FALSE(migrator.performMigration());
-  EXPECT_THAT(versionsAtSave, ElementsAre(12));
+  EXPECT_THAT(versionsAtSave, ElementsAre(kCurrentVersion));
 }
 
 TEST_F(RunSequence, StoreIsGoneBeforeTheLegacyFilesAre) {
@@ -181,7 +180,7 @@ TEST_F(RunSequence, FailedVersionStepsKeepTheLegacyFilesAndStampAndSaveAllTheSam
   device.switchRecordsOn();
   versionSteps().answer = false;
   EXPECT_FALSE(migrator.performMigration());
-  EXPECT_EQ(savedVersion(), 12);
+  EXPECT_EQ(savedVersion(), PropertyValue{kCurrentVersion});
   EXPECT_THAT(device.savedIdentifiers(), ElementsAre("E1", "M1"));
   for (const Path& kept : {kLegacyExchangeFile, kLegacyMailFile, kAutoFetchMarker}) {
     EXPECT_TRUE(device.files->exists(kept)) << kept;
@@ -256,7 +255,7 @@ TEST_F(RunSequence, LegacyFilesAreDeletedWhetherOrNotTheSaveWentThrough) {
 
 TEST_F(RunSequence, DirectoryInALegacyFilesPlaceIsFoundConvertedToNothingAndDeleted) {
   device.files->putDirectory(kLegacyMailFile);
-  device.putSettings(12, {account("A")});
+  device.putSettings(kCurrentVersion, {account("A")});
   EXPECT_TRUE(migrator.performMigration());
   EXPECT_THAT(device.console->lines, ElementsAre("Migrating accounts"));
   EXPECT_THAT(device.savedIdentifiers(), ElementsAre("A"));
@@ -270,7 +269,8 @@ TEST_F(RunSequence, LegacyFilesTakePrecedenceSoTheSettingsFilesVersionIsNotAsked
   EXPECT_THAT(device.logMessages(), Contains("Accounts settings needs migration! oldMailAccountsPresent=1, "
                                              "oldDAAccountsPresent=0, migrateNewAccountsInfo=0"));
   EXPECT_THAT(device.logMessages(),
-              Not(Contains("Account Settings Version out of date: savedVersion=3, currentVersion=12")));
+              Not(Contains("Account Settings Version out of date: savedVersion=3, currentVersion=" +
+                           std::to_string(kCurrentVersion))));
 }
 
 TEST_F(RunSequence, NegativeVersionIsNewerThanAnyAndNeedsNoMigration) {
@@ -278,11 +278,11 @@ TEST_F(RunSequence, NegativeVersionIsNewerThanAnyAndNeedsNoMigration) {
   EXPECT_TRUE(migrator.performMigration());
   EXPECT_THAT(device.console->lines, IsEmpty());
   EXPECT_EQ(versionSteps().runs, 0);
-  EXPECT_EQ(savedVersion(), 12);
+  EXPECT_EQ(savedVersion(), PropertyValue{kCurrentVersion});
 }
 
 TEST_F(RunSequence, ReportOfARunThatMigratedNothingIsADirectoryOnly) {
-  device.putSettings(12, {});
+  device.putSettings(kCurrentVersion, {});
   device.switchRecordsOn();
   EXPECT_TRUE(migrator.performMigration());
   EXPECT_TRUE(device.files->exists(kReportDirectory));
@@ -309,7 +309,7 @@ TEST_F(RunSequence, NoReportIsMadeWhileRecordsAreOff) {
 }
 
 TEST_F(RunSequence, AutoFetchMarkerThatCannotBeDeletedIsIgnored) {
-  device.putSettings(12, {});
+  device.putSettings(kCurrentVersion, {});
   device.files->put(kAutoFetchMarker, "");
   device.files->failing.insert("remove " + kAutoFetchMarker.string());
   EXPECT_TRUE(migrator.performMigration());

@@ -12,6 +12,7 @@
 
 namespace tests {
 
+using accountsettings::kCurrentVersion;
 using Account = accountsettings::AccountsManager::Account;
 using Accounts = accountsettings::AccountsManager::Accounts;
 
@@ -37,7 +38,7 @@ class AccountStore : public testing::Test {
   using AccountsManager = accountsettings::AccountsManager;
   using Store = std::shared_ptr<AccountsManager>;
 
-  void putFile(const Array& accounts, const PropertyValue& version = 12) {
+  void putFile(const Array& accounts, const PropertyValue& version = kCurrentVersion) {
     device.put(kSettingsFile, Dictionary{{"Accounts", accounts}, {"Version", version}});
   }
   Store load(const Array& accounts) {

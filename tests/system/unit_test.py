@@ -7,7 +7,7 @@ import subprocess
 import unittest
 from pathlib import Path
 
-from device import SETTINGS, lines, plain_environment
+from device import CURRENT_VERSION, SETTINGS, lines, plain_environment
 from device_case import HOST, DeviceTest
 from failed_saves_test import without_capabilities
 
@@ -95,7 +95,7 @@ class InstalledUnit(DeviceTest):
             self.assertEqual((0, []), (run.status, [line for line in run.errors if "snapshot" in line]))
         status = device.path(SETTINGS).stat()
         self.assertEqual((4711, 4712), (status.st_uid, status.st_gid))
-        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+        self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
 
 
     def allowed_calls(self):

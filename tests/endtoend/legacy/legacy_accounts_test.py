@@ -3,7 +3,7 @@
 import itertools
 import unittest
 
-from device import SETTINGS
+from device import CURRENT_VERSION, SETTINGS
 from legacy_case import (
     CALENDARS,
     CONTACTS,
@@ -79,7 +79,7 @@ class LegacyAccountsTest(LegacyCase):
 
     def test_both_beside_settings_that_are_out_of_date(self):
         device = self.device(
-            mail=mail_file([incoming("M1")]), exchange_=exchange_file(exchange("E1")), version=11
+            mail=mail_file([incoming("M1")]), exchange_=exchange_file(exchange("E1")), version=CURRENT_VERSION - 1
         )
         save = save_of("LDAP", "Exchange", "Mail")
         self.assert_migrated(
@@ -245,7 +245,7 @@ class LegacyAccountsTest(LegacyCase):
         self.assertEqual(MIGRATING, run.console()[1])
         self.assertEqual(7, run.messages().count("Saving all accounts"))
         settings = device.read_plist(SETTINGS)
-        self.assertEqual(12, settings["Version"])
+        self.assertEqual(CURRENT_VERSION, settings["Version"])
         types = [account["Type"] for account in settings["Accounts"]]
         self.assertEqual(["Exchange", "Mail", "OnMyDevice"], types)
 

@@ -5,7 +5,17 @@ import tempfile
 import unittest
 from pathlib import Path
 
-from device import HOME, LEGACY_EXCHANGE, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY, Device, exactly
+from device import (
+    CURRENT_VERSION,
+    HOME,
+    LEGACY_EXCHANGE,
+    LEGACY_MAIL,
+    PREFERENCES,
+    SETTINGS,
+    SETTINGS_COPY,
+    Device,
+    exactly,
+)
 
 HOST = Path(os.environ["MIGRATION_HOST"])
 DEVICE_INFO = "etc/vorlix/device-info.plist"
@@ -121,7 +131,9 @@ class LegacyCase(unittest.TestCase):
         self.scratch = Path(scratch.name).resolve()
         self.devices = 0
 
-    def device(self, mail=None, exchange_=None, version=12, accounts=(STANDING,), info=None, records=False):
+    def device(
+        self, mail=None, exchange_=None, version=CURRENT_VERSION, accounts=(STANDING,), info=None, records=False
+    ):
         """A device with these legacy files (dictionaries, or bytes as they are) beside its settings."""
         self.devices += 1
         device = Device(self.scratch / f"device{self.devices}")
@@ -146,7 +158,7 @@ class LegacyCase(unittest.TestCase):
         self.assertEqual([MAIL_NOTICE], run.told("preferences-changed"))
         self.assertEqual([], run.told("cloud-tabs"))
         self.assert_files(device, files)
-        expected = {"Accounts": list(accounts), "Version": 12}
+        expected = {"Accounts": list(accounts), "Version": CURRENT_VERSION}
         self.assertEqual(exactly(expected), exactly(device.read_plist(SETTINGS)))
 
     def assert_files(self, device, expected):

@@ -5,7 +5,7 @@ import signal
 import subprocess
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TEMPORARY
 from legacy_case import HOST, SENTINEL, STANDING, delivery_record, exchange_record, mail_record
 from mortal_case import MORTAL, MortalCase
 
@@ -72,7 +72,7 @@ class InterruptionTest(MortalCase):
             with self.subTest(before=changes[change - 1]):
                 device = self.interrupted(change)
                 self.assertEqual(0, device.migrate(HOST).status)
-                self.assertEqual({"Accounts": ACCOUNTS, "Version": 12}, device.read_plist(SETTINGS))
+                self.assertEqual({"Accounts": ACCOUNTS, "Version": CURRENT_VERSION}, device.read_plist(SETTINGS))
                 found = {path for path, entry in device.entries().items() if entry.kind != "directory"}
                 left = {path for path in found if path.startswith("var/") and not path.startswith(TEMPORARY)}
                 self.assertEqual({SETTINGS, SETTINGS_COPY}, left)
