@@ -100,7 +100,7 @@ std::shared_ptr<platform::FileKeeper> makeRehearsalKeeper(std::shared_ptr<platfo
 }
 
 void rehearseOn(platform::Platform& platform, const std::filesystem::path& lockDirectory) {
-  platform.files = platform::makeRehearsalFileSystem(platform.files, platform.directories->systemRoot());
+  platform.files = platform::makeRehearsalFileSystem(*platform.directories);
   platform.propertyLists = platform::makeLibplistPropertyListStore(platform.files);
   platform.locks = makeRehearsalLocks(std::move(platform.locks), lockDirectory);
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();

@@ -19,7 +19,7 @@ namespace platform {
 Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   Platform services;
   services.directories = makeBaseDirectories(options);
-  services.files = makeFileSystem(treesOf(*services.directories));
+  services.files = makeFileSystem(*services.directories);
   services.propertyLists = makeLibplistPropertyListStore(services.files);
   const DeviceConfiguration configuration{services.directories, services.propertyLists};
   services.preferences = makePreferencesStore(services.directories, services.propertyLists);

@@ -62,6 +62,15 @@ class Rehearsals(RehearsalTest):
         settings.symlink_to("elsewhere.plist")
         self.assert_foretold(device)
 
+    def test_follow_links_that_mean_something_else_on_this_machine(self):
+        device = self.example("first-generation")
+        device.path("private").mkdir()
+        device.path("var").rename(device.path("private/var"))
+        device.path("var").symlink_to("/private/var")
+        run = self.assert_foretold(device)
+        self.assertNotIn("not saved", "\n".join(run.output).lower())
+        self.assertEqual(12, plistlib.loads(device.read("private/" + SETTINGS))["Version"])
+
     def test_repeat_themselves(self):
         device = self.example("legacy-files")
         first, second = self.rehearsed(device), self.rehearsed(device)
