@@ -8,6 +8,7 @@
 #include "commandline/ending.h"
 #include "commandline/text.h"
 #include "host/explanation_output.h"
+#include "host/migration_lock.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
 #include "host/run_watch.h"
@@ -58,7 +59,7 @@ void silenceNotices(platform::Platform& platform) {
 
 platform::Platform platformFor(const Options& options, const Watchers& watchers) {
   auto platform = platform::makeLinuxPlatform(options.device);
-  if (options.isRehearsal) rehearseOn(platform, options.device.lockDirectory);
+  if (options.isRehearsal) rehearseOn(platform);
   if (platform.directories->systemRoot().lexically_normal() != "/") silenceNotices(platform);
   if (watchers.trace) traceServices(platform, watchers.trace);
   putConsoleInFrontOf(watchers.progress, platform);
@@ -95,8 +96,22 @@ snapshots::RunEnd endOf(const Explanation& explanation, const Outcome& outcome) 
   return end;
 }
 
+// Everything that may keep a run from beginning. Answers the session of its snapshots; null where there is none.
+std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMigrator& migrator,
+                                                    const Options& options) {
+  auto session = beginRunWithSnapshots(options, migrator);
+  const platform::Status held = holdMigrationLock(migrator.footprint().lockName);
+  if (!held.isOk()) {
+    if (session) static_cast<void>(session->end({}, options.snapshots.keep));
+    throw Ending{ExitStatus::refused, held.description() + "; the device was not touched"};
+  }
+  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
+  if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");
+  return session;
+}
+
 ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Watchers& watchers) {
-  const auto session = beginRunWithSnapshots(options, migrator);
+  const auto session = prepare(migrator, options);
   const bool success = migrator.performMigration();
   watchers.progress->clear();
   const Outcome outcome{.dataClass = migrator.dataClassName(), .success = success, .isRehearsal = options.isRehearsal};
@@ -134,11 +149,9 @@ ExitStatus run(const Options& options) {
   }
   const auto migrator = load(options);  // first, so that nothing is touched where there is none
   if (isToBeChanged(options.snapshots)) {
-    changeBySnapshots(options.snapshots, *migrator);
+    changeBySnapshots(options, *migrator);
     return ExitStatus::migrated;
   }
-  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
-  if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");
   return perform(*migrator, options, watchers);
 }
 

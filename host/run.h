@@ -12,7 +12,8 @@ enum class ExitStatus : std::uint8_t {
   wrongUse = 2,
   noPlugin = 3,
   noSnapshot = 5,
-  notSaved = 6
+  notSaved = 6,
+  refused = 8
 };
 
 // What the command line asks for: a run (makes the platform, loads the plug-in, calls it once and reports), or

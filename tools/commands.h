@@ -28,6 +28,7 @@ struct Command {
   std::size_t fewestArguments;
   std::size_t mostArguments;
   Outcome (*run)(Session& session, const Words& arguments, bool asJson);
+  bool changesAccounts = false;
 };
 
 [[nodiscard]] const std::vector<Command>& commands();

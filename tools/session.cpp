@@ -1,6 +1,7 @@
 #include "tools/session.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <exception>
 #include <new>
 #include <optional>
@@ -85,8 +86,22 @@ AccountsManager& Session::accounts() {
   return *_accounts;
 }
 
+// As AccountsManager::waitForMigrationToFinish does, which cannot tell whether it has.
+void Session::waitForMigration() {
+  const auto& services = platform::current();
+  const platform::Path file = accountsettings::kAccountMigrationLockFilename;
+  const auto lock = services.locks->lockNamed(file.filename().native());
+  if (!lock.isOk()) return;
+  const platform::Status held = lock.value()->lock();
+  if (held.isOk()) {
+    lock.value()->unlock();
+  } else if (held.errorNumber() == ETIMEDOUT) {
+    services.console->write("accountctl: " + held.description() + "; what follows is read while a migration may run");
+  }
+}
+
 void Session::loadAccounts() {
-  AccountsManager::waitForMigrationToFinish();
+  waitForMigration();
   const auto path = AccountsManager::fullPathToAccountSettingsPlist();
   const auto& platform = platform::current();
   // The store takes a file that it cannot read for an empty one; saving would then lose what is in it.
@@ -109,7 +124,7 @@ Account Session::accountWithIdentifier(std::string_view identifier) {
 void Session::beginExamination(const std::optional<platform::Path>& file) {
   _saves->keepToYourself();
   if (!file) {
-    AccountsManager::waitForMigrationToFinish();
+    waitForMigration();
     return;
   }
   auto platform = platform::current();

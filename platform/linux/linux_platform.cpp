@@ -6,7 +6,6 @@
 #include "platform/linux/device/linux_localized_strings.h"
 #include "platform/linux/device/linux_preferences_store.h"
 #include "platform/linux/device/linux_unique_identifiers.h"
-#include "platform/linux/files/linux_file_locks.h"
 #include "platform/linux/files/linux_file_system.h"
 #include "platform/linux/linux_base_directories.h"
 #include "platform/linux/linux_module_loader.h"
@@ -16,6 +15,18 @@
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace platform {
+namespace {
+
+// What is said of them goes to the console that the process has by then.
+std::shared_ptr<ExclusiveFileLocks> makeLocks(const LinuxPlatformOptions& options, const BaseDirectories& directories) {
+  return makeFileLocks({.directory = options.lockDirectory.value_or(directories.systemRoot() / "tmp"),
+                        .trees = treesOf(directories),
+                        .manner = options.locks,
+                        .say = [](std::string_view line) { current().console->write(line); }});
+}
+
+}  // namespace
+
 Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   Platform services;
   services.directories = makeBaseDirectories(options);
@@ -26,7 +37,7 @@ Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   const std::shared_ptr<SystemBus> bus = makeSystemBus();
   services.preferencesChanged = makePreferencesChangedNotice(bus);
   services.cloudTabs = makeCloudTabsNotice(bus);
-  services.locks = makeFileLocks(options.lockDirectory);
+  services.locks = makeLocks(options, *services.directories);
   services.systemLog = makeSystemLog(systemLogSinks());
   services.console = makeConsoleLog();
   services.deviceInfo = makeDeviceInfoQuery(configuration);

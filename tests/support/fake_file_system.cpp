@@ -11,7 +11,8 @@ using platform::Status;
 
 void FakeFileSystem::put(const Path& path, Bytes bytes) {
   putDirectory(path.parent_path());
-  nodes[path] = Node{.isDirectory = false, .bytes = std::move(bytes), .owner = {}, .group = {}, .permissions = 0600, .target = {}};
+  nodes[path] = Node{
+      .isDirectory = false, .bytes = std::move(bytes), .owner = {}, .group = {}, .permissions = 0600, .target = {}};
 }
 
 void FakeFileSystem::put(const Path& path, std::string_view bytes) { put(path, Bytes{bytes.begin(), bytes.end()}); }
@@ -21,7 +22,8 @@ void FakeFileSystem::putDirectory(const Path& path) {
   for (const Path& part : path) {
     built /= part;
     if (!nodes.contains(built)) {
-      nodes[built] = Node{.isDirectory = true, .bytes = {}, .owner = {}, .group = {}, .permissions = 0755, .target = {}};
+      nodes[built] =
+          Node{.isDirectory = true, .bytes = {}, .owner = {}, .group = {}, .permissions = 0755, .target = {}};
     }
   }
 }

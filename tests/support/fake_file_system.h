@@ -9,8 +9,8 @@
 
 namespace tests {
 
-// A device's files in memory; directories are moved by no call here. Every link is followed. Every call is recorded as "verb
-// path" (or "verb from to"), and any call can be made to fail: by verb, or by verb and path.
+// A device's files in memory; directories are moved by no call here. Every link is followed. Every call is recorded as
+// "verb path" (or "verb from to"), and any call can be made to fail: by verb, or by verb and path.
 class FakeFileSystem final : public platform::FileSystem {
  public:
   struct Node {

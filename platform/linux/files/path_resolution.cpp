@@ -30,11 +30,11 @@ Descriptor openAsGiven(const path& directory) {
   return Descriptor{::open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC)};
 }
 
-Descriptor copyOf(const Descriptor& descriptor) {
-  return Descriptor{::fcntl(descriptor.number(), F_DUPFD_CLOEXEC, 0)};
-}
+Descriptor copyOf(const Descriptor& descriptor) { return Descriptor{::fcntl(descriptor.number(), F_DUPFD_CLOEXEC, 0)}; }
 
-bool readStatus(Entry& entry) { return entry.descriptor.isOpen() && ::fstat(entry.descriptor.number(), &entry.status) == 0; }
+bool readStatus(Entry& entry) {
+  return entry.descriptor.isOpen() && ::fstat(entry.descriptor.number(), &entry.status) == 0;
+}
 
 // What the bits of a file promise holds everywhere but in the kernel's own views of its processes.
 bool isOfProcesses(const Descriptor& file) {
@@ -116,7 +116,8 @@ class PathWalk {
     }
     entry = {};
     if (Overlay::isMade(directory.status)) return true;
-    entry.descriptor = Descriptor{::openat(directory.descriptor.number(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC)};
+    entry.descriptor =
+        Descriptor{::openat(directory.descriptor.number(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC)};
     return readStatus(entry) || errno == ENOENT;
   }
 

@@ -28,9 +28,7 @@ Planters plantersOf(const struct stat& thing, const struct stat& directory) {
   return planters.mayBeAnybody ? anybody : planters;
 }
 
-bool isReadableFor(uid_t user, const struct stat& file) {
-  return file.st_uid == user || (file.st_mode & S_IROTH) != 0;
-}
+bool isReadableFor(uid_t user, const struct stat& file) { return file.st_uid == user || (file.st_mode & S_IROTH) != 0; }
 
 bool mayBeRead(const struct stat& file, const struct stat& directory) {
   if (file.st_nlink < 2) return true;

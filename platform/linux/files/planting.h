@@ -21,9 +21,9 @@ namespace platform {
 // directories that he owns or everybody may pass; below a link to a directory, that must be his own. What more than one
 // user can have planted is refused: a link with ELOOP, a second name with EMLINK.
 //
-// So a backup tool's second name of a file in its own owner's directory, or in root's, does not keep the file from being
-// read; root's link in a user's directory to that user's files is followed; and neither a link nor a second name makes
-// root read /etc/shadow for the user who planted it.
+// So a backup tool's second name of a file in its own owner's directory, or in root's, does not keep the file from
+// being read; root's link in a user's directory to that user's files is followed; and neither a link nor a second name
+// makes root read /etc/shadow for the user who planted it.
 
 // Root and the process's user.
 [[nodiscard]] bool isOurs(uid_t user);

@@ -202,8 +202,8 @@ class RehearsalFileSystem final : public RehearsedFiles {
     const Result<gid_t> groupNumber = _accounts.group(std::string{group});
     if (!groupNumber.isOk()) return groupNumber.status();
     const std::optional<Spot> spot = _paths.find(path);
-    const bool isGiven = spot && isThere(spot->entry) && isNobodyElses(spot->entry) &&
-                         mayGiveAway(user.value(), groupNumber.value());
+    const bool isGiven =
+        spot && isThere(spot->entry) && isNobodyElses(spot->entry) && mayGiveAway(user.value(), groupNumber.value());
     return isGiven ? Status{} : failure("set the owner of", path);
   }
 
