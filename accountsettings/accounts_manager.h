@@ -53,10 +53,10 @@ class ACCOUNT_EXPORT AccountsManager {
   AccountsManager& operator=(const AccountsManager&) = delete;
   ~AccountsManager();
 
-  // Repairs, merges and writes the file as the current data version, whatever version was loaded. The file is the old one or the
-  // new one, never in between. Success is seen in the log, in whether notifications follow, and in `lastSaveOutcome`;
-  // after a failure the accounts and what they are compared with are as before. Accounts that only the file holds are
-  // dropped from it.
+  // Repairs, merges and writes the file as the current data version, whatever version was loaded. The file is the old
+  // one or the new one, never in between. Success is seen in the log, in whether notifications follow, and in
+  // `lastSaveOutcome`; after a failure the accounts and what they are compared with are as before. Accounts that only
+  // the file holds are dropped from it.
   void saveAllAccounts();
   // Internal: how the store came by its accounts, and how its last save ended.
   [[nodiscard]] const LoadOutcome& loadOutcome() const { return _loadOutcome; }
@@ -157,14 +157,17 @@ class ACCOUNT_EXPORT AccountsManager {
  private:
   ACCOUNT_HIDDEN AccountsManager();
   // Loading. An element that is no dictionary is read as an empty one.
-  [[nodiscard]] ACCOUNT_HIDDEN static std::shared_ptr<AccountsManager> loadedFromFile(std::unique_ptr<ChangeTracker> tracker);
+  [[nodiscard]] ACCOUNT_HIDDEN static std::shared_ptr<AccountsManager> loadedFromFile(
+      std::unique_ptr<ChangeTracker> tracker);
   [[nodiscard]] ACCOUNT_HIDDEN static std::shared_ptr<AccountsManager> loaded(const Array* accounts,
-                                                               std::unique_ptr<ChangeTracker> tracker);
-  [[nodiscard]] ACCOUNT_HIDDEN bool offerLoaded(const Account& account, std::size_t position, const PropertyValue& element);
+                                                                              std::unique_ptr<ChangeTracker> tracker);
+  [[nodiscard]] ACCOUNT_HIDDEN bool offerLoaded(const Account& account, std::size_t position,
+                                                const PropertyValue& element);
   ACCOUNT_HIDDEN void loadAccounts(const Array& accounts);
   [[nodiscard]] ACCOUNT_HIDDEN static Account accountFromElement(const PropertyValue& element);
   ACCOUNT_HIDDEN void registerAccount(const Account& account);
-  ACCOUNT_HIDDEN void loadChild(const PropertyValue& properties, const Account& parent, const std::optional<Text>& parentIdentifier);
+  ACCOUNT_HIDDEN void loadChild(const PropertyValue& properties, const Account& parent,
+                                const std::optional<Text>& parentIdentifier);
 
   ACCOUNT_HIDDEN void leaveOut(std::size_t position, const PropertyValue& element, WhyLeftOut why);
 

@@ -234,7 +234,8 @@ void AccountsManager::writeFile() {
   const Dictionary root{{kPlistAccountsKey, std::move(records)}, {kPlistVersionKey, currentVersion()}};
   _lastSaveOutcome.stage = SaveStage::serializing;
   _lastSaveOutcome = replaceSettingsFile(serialized(root));
-  if (_tracker) _tracker->savedAll(count(), currentVersion(), fullPathToAccountSettingsPlist(), _lastSaveOutcome.status);
+  if (_tracker)
+    _tracker->savedAll(count(), currentVersion(), fullPathToAccountSettingsPlist(), _lastSaveOutcome.status);
 }
 
 bool AccountsManager::fixAccountsForSaving() {

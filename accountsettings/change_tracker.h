@@ -40,7 +40,8 @@ class ChangeTracker {
   void willGo(const BasicAccount& account, records::LossCode code);
   ACCOUNT_EXPORT void willBeFolded(const BasicAccount& account, const BasicAccount& into, std::string_view rule);
   // It is made of this description in the legacy file; `place` says to people where in it.
-  ACCOUNT_EXPORT void comesFrom(const BasicAccount& account, const Dictionary& description, std::string place, std::string file);
+  ACCOUNT_EXPORT void comesFrom(const BasicAccount& account, const Dictionary& description, std::string place,
+                                std::string file);
 
   // Tells what became of the accounts since the last call.
   void look(const Accounts& accounts);

@@ -113,7 +113,7 @@ void checkTrace(const std::string& first, const std::string& second, bool flag) 
     trace->preferencesChanged(first, second);
     trace->cloudTabs(flag);
     trace->result(second, flag, {});
-    require(trace->complete(), "an incomplete trace");
+    require(trace->outcome().isOk(), "an incomplete trace");
   }
   const auto lines = linesOf(path);
   require(lines.size() == 5, "not one line an event");

@@ -3,6 +3,7 @@
 #include <unistd.h>
 
 #include <charconv>
+#include <chrono>
 #include <string_view>
 #include <vector>
 
@@ -25,7 +26,8 @@ constexpr std::string_view kStatuses =
     "\n"
     "Exit status: 0 the migration succeeded, 1 it did not, 2 wrong use,\n"
     "3 the plug-in could not be loaded, 5 a snapshot could not be taken or restored,\n"
-    "6 the accounts were not saved, 7 with --strict: some accounts were lost.\n";
+    "6 the accounts were not saved, 7 with --strict: some accounts were lost,\n"
+    "8 a lock could not be had, and nothing was touched.\n";
 
 constexpr std::size_t kUsualColumns = 80;
 
@@ -33,6 +35,7 @@ constexpr std::size_t kUsualColumns = 80;
 struct Written {
   std::optional<std::string> explain;
   std::optional<std::string> dryRun;
+  std::optional<std::string> lockTimeout;
   std::optional<std::string> keep;
   std::optional<std::string> listing;
   std::optional<std::string> ifNeeded;
@@ -55,6 +58,7 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
        Form{&written.explain, {"text", "json"}}},
       {"--dry-run", "", "rehearse the run: the device stays as it is", Form{&written.dryRun, {}}},
       {"--strict", "", "exit with 7 where accounts were lost", &options.isStrict},
+      {"--lock-timeout", "SECONDS", "give up where another program holds a lock for longer", &written.lockTimeout},
       {"--snapshots", "DIR", "before the run, keep copies in DIR of the files that it may change",
        &options.snapshots.directory},
       {"--keep", "N", "keep the newest N snapshots (default: 5)", &written.keep},
@@ -98,12 +102,29 @@ std::vector<std::string> givenIn(std::span<const char* const> arguments) {
   return given;
 }
 
-std::size_t countIn(const std::string& text) {
-  std::size_t count = 0;
+std::optional<std::size_t> numberIn(const std::string& text) {
+  std::size_t number = 0;
   const char* const end = text.data() + text.size();
-  const auto [stop, error] = std::from_chars(text.data(), end, count);
-  if (error == std::errc{} && stop == end && count > 0) return count;
+  const auto [stop, error] = std::from_chars(text.data(), end, number);
+  return error == std::errc{} && stop == end ? std::optional{number} : std::nullopt;
+}
+
+std::size_t countIn(const std::string& text) {
+  const auto count = numberIn(text);
+  if (count && *count > 0) return *count;
   throw WrongUse{"--keep needs a number of snapshots, at least 1: " + text};
+}
+
+// A rehearsal holds what it looks at together with other rehearsals.
+void settleLocks(const Written& written, Options& options) {
+  constexpr std::size_t kMaxSeconds = 86400;
+  options.device.locks.isShared = options.isRehearsal;
+  if (!written.lockTimeout) return;
+  const auto seconds = numberIn(*written.lockTimeout);
+  if (!seconds || *seconds > kMaxSeconds) {
+    throw WrongUse{"--lock-timeout needs a number of seconds, at most a day: " + *written.lockTimeout};
+  }
+  options.device.locks.timeLimit = std::chrono::seconds{*seconds};
 }
 
 // What is asked for in place of a run, each by its option.
@@ -161,6 +182,7 @@ std::variant<Options, Answer> parseArguments(std::span<const char* const> argume
   options.given = givenIn(arguments);
   settleSnapshots(written, options.snapshots);
   settleRun(written, options);
+  settleLocks(written, options);
   std::error_code ignored;
   if (const auto& root = options.device.systemRoot; root && !std::filesystem::is_directory(*root, ignored)) {
     throw WrongUse{"--root is no directory: " + root->string()};

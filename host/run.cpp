@@ -10,6 +10,7 @@
 #include "commandline/ending.h"
 #include "commandline/program.h"
 #include "host/explanation.h"
+#include "host/migration_lock.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
 #include "host/run_recorder.h"
@@ -65,7 +66,7 @@ void silenceNotices(platform::Platform& platform) {
 
 platform::Platform platformFor(const Options& options, const Onlookers& onlookers) {
   auto platform = platform::makeLinuxPlatform(options.device);
-  if (options.isRehearsal) rehearseOn(platform, options.device.lockDirectory);
+  if (options.isRehearsal) rehearseOn(platform);
   if (platform.directories->systemRoot().lexically_normal() != "/") silenceNotices(platform);
   if (onlookers.trace) traceServices(platform, onlookers.trace);
   putConsoleInFrontOf(onlookers.progress, platform);
@@ -131,6 +132,19 @@ ExitStatus statusOf(const Account& account, bool isStrict) {
   return ExitStatus::notMigrated;
 }
 
+// Everything that may keep a run from beginning. Answers the session of its snapshots; null where there is none.
+std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMigrator& migrator,
+                                                    const Options& options) {
+  auto session = beginRunWithSnapshots(options, migrator);
+  const platform::Status held = holdMigrationLock(migrator.footprint().lockName);
+  if (!held.isOk()) {
+    if (session) static_cast<void>(session->end({}, options.snapshots.keep));
+    throw Ending{ExitStatus::refused, held.description() + "; the device was not touched"};
+  }
+  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
+  return session;
+}
+
 ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Onlookers& onlookers) {
   ExplainedRun run{.dataClass = migrator.dataClassName(),
                    .isRehearsal = options.isRehearsal,
@@ -138,8 +152,7 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
                    .root = platform::current().directories->systemRoot(),
                    .time = now()};
   if (onlookers.trace) onlookers.trace->start(run.version, run.root, options.given, run.time);
-  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
-  const auto session = beginRunWithSnapshots(options, migrator);
+  const auto session = prepare(migrator, options);
   run.success = migrator.performMigration();
   onlookers.progress->clear();
 
@@ -149,7 +162,8 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
   endSession(session.get(), options.snapshots.keep, account);
   if (onlookers.trace) {
     onlookers.trace->result(run.dataClass, run.success, account.verdict);
-    if (!onlookers.trace->complete()) say("the trace is incomplete: not every event could be written");
+    const platform::Status& traced = onlookers.trace->outcome();
+    if (!traced.isOk()) say("the trace is incomplete: not every event could be written: " + traced.reason());
   }
   explain(options.explain, account);
   return statusOf(account, options.isStrict);
@@ -175,7 +189,7 @@ ExitStatus run(const Options& options) {
   }
   const auto migrator = load(options);  // first, so that nothing is touched where there is none
   if (isToBeChanged(options.snapshots)) {
-    changeBySnapshots(options.snapshots, *migrator);
+    changeBySnapshots(options, *migrator);
     return ExitStatus::migrated;
   }
   if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");

@@ -13,7 +13,8 @@ enum class ExitStatus : std::uint8_t {
   noPlugin = 3,
   noSnapshot = 5,
   notSaved = 6,
-  accountsLost = 7  // told so where the command line is strict
+  accountsLost = 7,  // told so where the command line is strict
+  refused = 8
 };
 
 // What the command line asks for: a run (makes the platform, loads the plug-in, calls it once and reports), or

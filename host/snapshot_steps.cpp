@@ -15,6 +15,7 @@ namespace host {
 namespace {
 
 using Listing = SnapshotOptions::Listing;
+using platform::Path;
 using snapshots::Missing;
 using snapshots::Problem;
 using snapshots::SnapshotSession;
@@ -23,18 +24,20 @@ snapshots::Storage storage() {
   return {platform::current().files, platform::makeFileKeeper(*platform::current().directories)};
 }
 
-snapshots::SessionPlace placeFor(const SnapshotOptions& options, platform::MigrationFootprint footprint) {
+snapshots::SessionPlace placeFor(const Options& options, platform::MigrationFootprint footprint) {
+  const Path& directory = *options.snapshots.directory;
   return {.services = platform::current(),
           .keeper = storage().keeper,
-          .locks = platform::makeFileLocks(*options.directory),
-          .directory = *options.directory,
+          .locks = platform::makeFileLocks({.directory = directory,
+                                            .manner = options.device.locks,
+                                            .say = [](std::string_view line) { say(std::string{line}); }}),
+          .directory = directory,
           .footprint = std::move(footprint),
           .release = HOST_VERSION,
           .warn = [](const std::string& line) { say(line); }};
 }
 
 std::unique_ptr<SnapshotSession> rehearse(snapshots::SessionPlace place) {
-  place.locks = makeRehearsalLocks(std::move(place.locks), place.directory);
   place.keeper = makeRehearsalKeeper(std::move(place.keeper), place.services.files);
   SnapshotSession{std::move(place), Missing::isAccepted}.rehearse();
   return nullptr;
@@ -55,7 +58,7 @@ void printExplanation(const SnapshotOptions& options, Explain explain) {
 std::unique_ptr<SnapshotSession> beginRunWithSnapshots(const Options& options,
                                                        const platform::DataClassMigrator& migrator) {
   if (!options.snapshots.directory) return nullptr;
-  snapshots::SessionPlace place = placeFor(options.snapshots, migrator.footprint());
+  snapshots::SessionPlace place = placeFor(options, migrator.footprint());
   if (options.isRehearsal) return rehearse(std::move(place));
   auto session = std::make_unique<SnapshotSession>(std::move(place), Missing::isMade);
   platform::Platform watched = platform::current();
@@ -83,10 +86,11 @@ void printFromSnapshots(const SnapshotOptions& options, Explain explain) {
 
 bool isToBeChanged(const SnapshotOptions& options) { return options.restore || options.isUndo || options.release; }
 
-void changeBySnapshots(const SnapshotOptions& options, const platform::DataClassMigrator& migrator) {
+void changeBySnapshots(const Options& options, const platform::DataClassMigrator& migrator) {
+  const SnapshotOptions& asked = options.snapshots;
   SnapshotSession session{placeFor(options, migrator.footprint()), Missing::isRefused};
-  const std::string id = session.identifierMeantBy(options.release ? options.release : options.restore);
-  if (options.release) {
+  const std::string id = session.identifierMeantBy(asked.release ? asked.release : asked.restore);
+  if (asked.release) {
     session.release(id);
     std::printf("snapshot %s is kept no longer than the others\n", id.c_str());
   } else {

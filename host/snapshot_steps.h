@@ -24,6 +24,6 @@ void printFromSnapshots(const SnapshotOptions& options, Explain explain);
 
 // Whether a snapshot is to be restored or released in place of a run, and that.
 [[nodiscard]] bool isToBeChanged(const SnapshotOptions& options);
-void changeBySnapshots(const SnapshotOptions& options, const platform::DataClassMigrator& migrator);
+void changeBySnapshots(const Options& options, const platform::DataClassMigrator& migrator);
 
 }  // namespace host

@@ -29,6 +29,7 @@ struct Command {
   std::size_t fewestArguments;
   std::size_t mostArguments;
   Outcome (*run)(Session& session, const Words& arguments, const Options& options);
+  bool changesAccounts = false;
 };
 
 [[nodiscard]] const std::vector<Command>& commands();

@@ -21,10 +21,11 @@ const tools::Command& commandOf(const tools::Options& options) {
 }
 
 tools::Outcome perform(std::span<const char* const> arguments) {
-  const auto options = tools::parseArguments(arguments);
+  auto options = tools::parseArguments(arguments);
   if (options.printsHelp) return tools::help(options);
   if (options.printsVersion) return std::string{"accountctl " ACCOUNTCTL_VERSION "\n"};
   const auto& command = commandOf(options);
+  options.device.locks = command.changesAccounts ? tools::kLocksOfWriters : tools::kLocksOfReaders;
   tools::Session session{options};
   try {
     return command.run(session, options.arguments, options);

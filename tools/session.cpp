@@ -1,6 +1,7 @@
 #include "tools/session.h"
 
 #include <algorithm>
+#include <cerrno>
 #include <exception>
 #include <new>
 #include <optional>
@@ -84,8 +85,22 @@ AccountsManager& Session::accounts() {
   return *_accounts;
 }
 
+// As AccountsManager::waitForMigrationToFinish does, which cannot tell whether it has.
+void Session::waitForMigration() {
+  const auto& services = platform::current();
+  const platform::Path file = accountsettings::kAccountMigrationLockFilename;
+  const auto lock = services.locks->lockNamed(file.filename().native());
+  if (!lock.isOk()) return;
+  const platform::Status held = lock.value()->lock();
+  if (held.isOk()) {
+    lock.value()->unlock();
+  } else if (held.errorNumber() == ETIMEDOUT) {
+    services.console->write("accountctl: " + held.description() + "; what follows is read while a migration may run");
+  }
+}
+
 void Session::loadAccounts() {
-  AccountsManager::waitForMigrationToFinish();
+  waitForMigration();
   auto accounts = AccountsManager::init();
   // The store takes a file that it cannot read for an empty one; saving would then lose what is in it.
   if (const auto& outcome = accounts->loadOutcome(); outcome.hasUnreadFile()) {
@@ -101,7 +116,7 @@ void Session::beginExamination(const std::optional<platform::Path>& file) {
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();
   if (file) platform.propertyLists = std::make_shared<SettingsFromElsewhere>(platform.propertyLists, *file);
   platform::setCurrent(std::move(platform));
-  if (!file) AccountsManager::waitForMigrationToFinish();
+  if (!file) waitForMigration();
 }
 
 void Session::beginChanges() {

@@ -15,6 +15,11 @@ using accountsettings::AccountsManager;
 using accountsettings::BasicAccount;
 using Account = AccountsManager::Account;
 
+// A client waits for a migration and holds nobody up, so it makes no lock file. One that only reads never hangs: after
+// a while it goes on, and says what it does.
+inline constexpr platform::LockManner kLocksOfWriters{.isShared = true};
+inline constexpr platform::LockManner kLocksOfReaders{.isShared = true, .timeLimit = std::chrono::seconds{5}};
+
 // The accounts of one device, for one command. Making a session sets the process's platform.
 class Session {
  public:
@@ -22,7 +27,8 @@ class Session {
 
   [[nodiscard]] bool opensModules() const { return _opensModules; }
 
-  // The store, loaded at its first use and once no migration is running. Throws Failure where the file is there but
+  // The store, loaded at its first use and once no migration is running, or the platform's locks are waited for no
+  // longer. Throws Failure where the file is there but
   // cannot be read as account settings.
   [[nodiscard]] AccountsManager& accounts();
 
@@ -45,6 +51,7 @@ class Session {
   void save();
 
  private:
+  static void waitForMigration();
   void loadAccounts();
 
   bool _opensModules;

@@ -15,6 +15,7 @@ class Problem : public commandline::Ending {
   enum class Kind : std::uint8_t {
     wrongUse = 2,  // it should not have been asked
     failed = 5,    // it could not be done
+    locked = 8,    // a lock could not be had in time
   };
 
   Problem(Kind kind, const std::string& text) : Ending{kind, text} {}

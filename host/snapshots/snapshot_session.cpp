@@ -1,6 +1,7 @@
 #include "host/snapshots/snapshot_session.h"
 
 #include <algorithm>
+#include <cerrno>
 
 #include "host/snapshots/problem.h"
 
@@ -34,6 +35,7 @@ SnapshotSession::SnapshotSession(SessionPlace place, Missing missing)
 SnapshotSession::HeldLock SnapshotSession::hold(platform::ExclusiveFileLocks& locks, const std::string& name) {
   platform::Result<HeldLock> lock = locks.lockNamed(name);
   const platform::Status held = lock.isOk() ? lock.value()->lock() : lock.status();
+  if (held.errorNumber() == ETIMEDOUT) throw Problem{Problem::Kind::locked, held.description()};
   if (!held.isOk()) fail("the lock " + name + " cannot be taken: " + held.reason());
   return lock.take();
 }

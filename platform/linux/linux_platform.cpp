@@ -8,17 +8,29 @@
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace platform {
+namespace {
+
+// What is said of them goes to the console that the process has by then.
+std::shared_ptr<ExclusiveFileLocks> makeLocks(const LinuxPlatformOptions& options, const BaseDirectories& directories) {
+  return makeFileLocks({.directory = options.lockDirectory.value_or(directories.systemRoot() / "tmp"),
+                        .trees = treesOf(directories),
+                        .manner = options.locks,
+                        .say = [](std::string_view line) { current().console->write(line); }});
+}
+
+}  // namespace
+
 Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   Platform services;
   services.directories = makeBaseDirectories(options);
-  services.files = makeFileSystem(treesOf(*services.directories));
+  services.files = makeFileSystem(*services.directories);
   services.propertyLists = makeLibplistPropertyListStore(services.files);
   const DeviceConfiguration configuration{services.directories, services.propertyLists};
   services.preferences = makePreferencesStore(configuration);
   const std::shared_ptr<SystemBus> bus = makeSystemBus();
   services.preferencesChanged = makePreferencesChangedNotice(bus);
   services.cloudTabs = makeCloudTabsNotice(bus);
-  services.locks = makeFileLocks(options.lockDirectory);
+  services.locks = makeLocks(options, *services.directories);
   services.systemLog = makeSystemLog(systemLogSinks());
   services.console = makeConsoleLog();
   services.deviceInfo = makeDeviceInfoQuery(configuration);

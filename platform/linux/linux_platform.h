@@ -4,6 +4,7 @@
 #include <optional>
 
 #include "platform/export.h"
+#include "platform/linux/files/linux_file_locks.h"
 #include "platform/platform.h"
 
 namespace platform {
@@ -15,7 +16,8 @@ struct LinuxPlatformOptions {
   std::optional<std::filesystem::path> home = std::nullopt;
   std::optional<std::filesystem::path> sharedResources = std::nullopt;  // default ROOT/var/mobile
   std::optional<std::filesystem::path> resources = std::nullopt;        // default: those installed beside this library
-  std::filesystem::path lockDirectory = "/tmp";                         // only tests set another
+  std::optional<std::filesystem::path> lockDirectory = std::nullopt;    // default ROOT/tmp; only tests set another
+  LockManner locks = {};
 };
 
 // The services of a Linux device. Nothing is opened or connected before its first use.

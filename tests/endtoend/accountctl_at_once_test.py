@@ -10,7 +10,7 @@ import unittest
 from accountctl_case import ACCOUNTCTL, CLOUD, DIRECTORY, HOME_MAIL, MAIL, AccountctlTest, changed
 from device import SETTINGS, plain_environment
 
-MIGRATION_LOCK = "/tmp/AccountMigrationInProgress"
+MIGRATION_LOCK = "tmp/AccountMigrationInProgress"
 PATIENCE = 60
 
 
@@ -89,7 +89,7 @@ class TwoAndAnEditor(AtOnce):
 class ARunningMigration(AtOnce):
     def test_is_waited_for_before_the_accounts_are_read(self):
         self.put(HOME_MAIL)
-        with HeldLock():
+        with HeldLock(self.tree):
             waiting = self.start("list")
             with self.assertRaises(subprocess.TimeoutExpired):
                 waiting.wait(timeout=0.5)
@@ -111,13 +111,14 @@ def opened_gate(pipe, process):
 
 
 class HeldLock:
-    """The migration lock, as another process that migrates holds it."""
+    """The device's migration lock, as another process that migrates holds it."""
+
+    def __init__(self, device):
+        self._path = device.path(MIGRATION_LOCK)
 
     def __enter__(self):
-        try:
-            self._file = os.open(MIGRATION_LOCK, os.O_RDONLY)
-        except FileNotFoundError:
-            self._file = os.open(MIGRATION_LOCK, os.O_RDONLY | os.O_CREAT, 0o644)
+        self._path.parent.mkdir(exist_ok=True)
+        self._file = os.open(self._path, os.O_RDONLY | os.O_CREAT, 0o644)
         fcntl.flock(self._file, fcntl.LOCK_EX)
 
     def __exit__(self, *_):

@@ -7,13 +7,12 @@ import tempfile
 import threading
 import time
 import unittest
-from pathlib import Path
 
 from device import EXAMPLES, LEGACY_MAIL, SETTINGS
 from golden_devices_test import ANSWERS, DEVICES
 from rehearsal_case import REHEARSAL, RehearsalTest, every_detail
 
-LOCK = Path("/tmp/AccountMigrationInProgress")
+LOCK = "tmp/AccountMigrationInProgress"
 
 
 class Rehearsals(RehearsalTest):
@@ -62,6 +61,15 @@ class Rehearsals(RehearsalTest):
         settings.symlink_to("elsewhere.plist")
         self.assert_foretold(device)
 
+    def test_follow_links_that_mean_something_else_on_this_machine(self):
+        device = self.example("first-generation")
+        device.path("private").mkdir()
+        device.path("var").rename(device.path("private/var"))
+        device.path("var").symlink_to("/private/var")
+        run = self.assert_foretold(device)
+        self.assertNotIn("not saved", "\n".join(run.output).lower())
+        self.assertEqual(12, plistlib.loads(device.read("private/" + SETTINGS))["Version"])
+
     def test_repeat_themselves(self):
         device = self.example("legacy-files")
         first, second = self.rehearsed(device), self.rehearsed(device)
@@ -87,16 +95,33 @@ class Rehearsals(RehearsalTest):
 
 
 class Waiting(RehearsalTest):
+    def setUp(self):
+        super().setUp()
+        self.current = self.example("current")
+        self.lock = self.current.path(LOCK)
+        self.lock.parent.mkdir()
+        self.lock.touch()
+
     def test_a_rehearsal_waits_for_a_run_that_is_under_way(self):
-        if not LOCK.exists():
-            self.run_host("--root", self.device().root)
-        with open(LOCK, "rb") as lock:
+        with open(self.lock, "rb") as lock:
             fcntl.flock(lock, fcntl.LOCK_EX)
             release = threading.Timer(0.5, fcntl.flock, [lock, fcntl.LOCK_UN])
             began = time.monotonic()
             release.start()
-            self.rehearsed(self.example("current"))
+            self.rehearsed(self.current)
             self.assertGreater(time.monotonic() - began, 0.4)
+
+    def test_a_rehearsal_does_not_wait_for_another(self):
+        with open(self.lock, "rb") as lock:
+            fcntl.flock(lock, fcntl.LOCK_SH)
+            self.assertEqual(0, self.rehearsed(self.current).status)
+
+    def test_a_rehearsal_that_may_not_wait_any_longer_is_refused(self):
+        with open(self.lock, "rb") as lock:
+            fcntl.flock(lock, fcntl.LOCK_EX)
+            before = every_detail(self.current.root)
+            run = self.run_host("--root", self.current.root, "--dry-run", "--lock-timeout", "0")
+        self.assertEqual((8, before), (run.status, every_detail(self.current.root)))
 
 
 if __name__ == "__main__":

@@ -4,9 +4,7 @@
 
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <filesystem>
-#include <thread>
 
 #include "platform/linux/linux_platform.h"
 #include "tests/support/scratch_directory.h"
@@ -14,44 +12,18 @@
 namespace tests {
 namespace {
 
-constexpr std::string_view kLock = "SomeLock";
-
 class RehearsedPlatform : public testing::Test {
  protected:
   RehearsedPlatform() {
-    const platform::LinuxPlatformOptions options{.systemRoot = scratch.path(), .lockDirectory = scratch.path()};
-    device = platform::makeLinuxPlatform(options);
+    device = platform::makeLinuxPlatform({.systemRoot = scratch.path()});
     rehearsal = device;
-    host::rehearseOn(rehearsal, options.lockDirectory);
+    host::rehearseOn(rehearsal);
   }
 
   ScratchDirectory scratch;
   platform::Platform device;
   platform::Platform rehearsal;
 };
-
-TEST_F(RehearsedPlatform, LeavesNoLockFileWhereThereIsNone) {
-  const auto lock = rehearsal.locks->lockNamed(kLock);
-  ASSERT_NE(lock, nullptr);
-  EXPECT_TRUE(lock.value()->lock().isOk());
-  lock.value()->unlock();
-  EXPECT_FALSE(std::filesystem::exists(scratch / kLock));
-}
-
-TEST_F(RehearsedPlatform, WaitsForWhoeverHoldsTheLock) {
-  using std::chrono::steady_clock;
-  constexpr std::chrono::milliseconds patience{200};
-  const auto held = device.locks->lockNamed(kLock);
-  ASSERT_TRUE(held.value()->lock().isOk());
-  std::thread holder{[&] {
-    std::this_thread::sleep_for(patience);
-    held.value()->unlock();
-  }};
-  const auto began = steady_clock::now();
-  EXPECT_TRUE(rehearsal.locks->lockNamed(kLock).value()->lock().isOk());
-  EXPECT_GE(steady_clock::now() - began, patience / 2);
-  holder.join();
-}
 
 TEST_F(RehearsedPlatform, HasALogThatNobodyReads) { EXPECT_FALSE(rehearsal.systemLog->hasReaders()); }
 

@@ -5,9 +5,11 @@
 #include <sys/time.h>
 #include <unistd.h>
 
+#include <cerrno>
 #include <csignal>
 #include <thread>
 
+#include "platform/linux/files/linux_file_locks.h"
 #include "platform/linux/linux_platform.h"
 #include "tests/support/child_process.h"
 #include "tests/support/fake_platform.h"
@@ -18,6 +20,7 @@ namespace {
 
 namespace fs = std::filesystem;
 using namespace std::chrono_literals;
+using platform::LockManner;
 
 constexpr std::string_view name = "SomethingInProgress";
 constexpr auto aMoment = 150ms;
@@ -75,8 +78,25 @@ class LinuxLocks : public testing::Test {
  protected:
   ScratchDirectory scratch;
   fs::path file = scratch / name;
-  std::shared_ptr<platform::ExclusiveFileLocks> locks =
-      platform::makeLinuxPlatform({.lockDirectory = scratch.path()}).locks;
+  std::vector<std::string> said;
+  std::shared_ptr<platform::ExclusiveFileLocks> locks = locksTaken({});
+
+  // On a device whose root is the scratch directory.
+  [[nodiscard]] std::shared_ptr<platform::ExclusiveFileLocks> locksTaken(const LockManner& manner) {
+    return platform::makeFileLocks({.directory = scratch.path(),
+                                    .trees = {.systemRoot = scratch.path()},
+                                    .manner = manner,
+                                    .say = [this](std::string_view line) { said.emplace_back(line); }});
+  }
+  [[nodiscard]] static bool isTaken(platform::ExclusiveFileLocks& locks) {
+    const auto lock = locks.lockNamed(name);
+    return lock.isOk() && lock.value()->lock().isOk();
+  }
+  [[nodiscard]] static uid_t ownerOf(const fs::path& path) {
+    struct stat status {};
+    EXPECT_EQ(::lstat(path.c_str(), &status), 0) << path;
+    return status.st_uid;
+  }
 
   // Takes the lock in another process, says so, and holds it until it is killed.
   [[nodiscard]] ChildProcess::Task holdForEver() const {
@@ -176,16 +196,15 @@ TEST_F(LinuxLocks, AreOpenedForReadingAndNotInheritedByPrograms) {
   EXPECT_EQ(found, 1);
 }
 
-TEST_F(LinuxLocks, AreSharedBetweenUsersInAStickyDirectory) {
+TEST_F(LinuxLocks, AreSharedWithMobileInAStickyDirectory) {
   if (::getuid() != 0) GTEST_SKIP() << "only root can be two users";
   fs::permissions(scratch.path(), fs::perms{01777});
-  const ChildProcess stranger{[this](const auto& say) {
+  scratch.put("etc/passwd", "mobile:x:" + std::to_string(somebodyElse) + ":0::/:\n");
+  const ChildProcess mobile{[this](const auto& say) {
     if (::setgroups(0, nullptr) == 0 && ::setuid(somebodyElse) == 0) holdForEver()(say);
   }};
-  ASSERT_TRUE(stranger.says(longEnough));
-  struct stat status {};
-  ASSERT_EQ(::stat(file.c_str(), &status), 0);
-  EXPECT_EQ(status.st_uid, somebodyElse);
+  ASSERT_TRUE(mobile.says(longEnough));
+  EXPECT_EQ(ownerOf(file), somebodyElse);
   const ChildProcess root{holdForEver()};
   EXPECT_FALSE(root.says(aMoment));
 }
@@ -203,14 +222,115 @@ TEST_F(LinuxLocks, OfRootKeepOtherUsersWaitingToo) {
   EXPECT_TRUE(stranger.says(longEnough));
 }
 
-TEST_F(LinuxLocks, AreRefusedOnAnythingButAFile) {
-  fs::create_symlink(scratch / "elsewhere", file);
-  EXPECT_EQ(locks->lockNamed(name).cause(), platform::Cause::unsafe);
+// What somebody else put at the lock's name, by how root tells of it.
+struct Planted {
+  const char* flaw;
+  void (*plant)(const fs::path& file);
+};
+
+constexpr Planted kPlanted[] = {
+    {"it was a link", [](const fs::path& file) { fs::create_symlink("elsewhere", file); }},
+    {"it was a directory", [](const fs::path& file) { fs::create_directories(file / "within"); }},
+    {"it was no regular file", [](const fs::path& file) { ::mkfifo(file.c_str(), 0666); }},
+    {"it had a second name",
+     [](const fs::path& file) {
+       fs::create_directory(file.parent_path() / "etc");
+       ::close(::open((file.parent_path() / "etc/file").c_str(), O_CREAT | O_WRONLY, 0600));
+       fs::create_hard_link(file.parent_path() / "etc/file", file);
+     }},
+    {"it belonged to the user 65534",
+     [](const fs::path& file) {
+       ::close(::open(file.c_str(), O_CREAT | O_WRONLY, 0644));
+       ::lchown(file.c_str(), somebodyElse, somebodyElse);
+     }},
+};
+
+TEST_F(LinuxLocks, OfRootTakeThePlaceOfWhatSomebodyPlantedAndSaySo) {
+  if (::getuid() != 0) GTEST_SKIP() << "only root replaces what is another's";
+  for (const Planted& planted : kPlanted) {
+    SCOPED_TRACE(planted.flaw);
+    fs::remove_all(file);
+    said.clear();
+    planted.plant(file);
+    EXPECT_TRUE(isTaken(*locks));
+    EXPECT_TRUE(fs::is_regular_file(fs::symlink_status(file)));
+    EXPECT_EQ(ownerOf(file), 0U);
+    EXPECT_EQ(said,
+              std::vector<std::string>{"the lock file " + file.string() + " was replaced, since " + planted.flaw});
+  }
   EXPECT_FALSE(fs::exists(scratch / "elsewhere"));
+}
+
+TEST_F(LinuxLocks, OfOthersAreRefusedOnAnythingButAFile) {
+  fs::permissions(scratch.path(), fs::perms{01777});
+  fs::create_symlink(scratch / "elsewhere", file);
   ASSERT_EQ(::mkfifo((scratch / "pipe").c_str(), 0666), 0);
-  EXPECT_EQ(locks->lockNamed("pipe").status().errorNumber(), EINVAL);
   fs::create_directory(scratch / "directory");
-  EXPECT_EQ(locks->lockNamed("directory").status().errorNumber(), EISDIR);
+  const ChildProcess user{[this](const auto& say) {
+    if (::getuid() == 0 && (::setgroups(0, nullptr) != 0 || ::setuid(somebodyElse) != 0)) return;
+    for (const std::string_view planted : {name, std::string_view{"pipe"}, std::string_view{"directory"}}) {
+      if (locks->lockNamed(planted).isOk()) return;
+    }
+    say();
+  }};
+  EXPECT_TRUE(user.says(longEnough));
+  EXPECT_FALSE(fs::exists(scratch / "elsewhere"));
+}
+
+TEST_F(LinuxLocks, LeaveTheLockOfAReplacedFileBehind) {
+  ChildProcess holder{holdForEver()};
+  ASSERT_TRUE(holder.says(longEnough));
+  const ChildProcess waiter{[this](const auto& say) {
+    if (isTaken(*locks)) say();
+  }};
+  EXPECT_FALSE(waiter.says(aMoment));
+  fs::remove(file);
+  EXPECT_TRUE(waiter.says(longEnough));
+}
+
+TEST_F(LinuxLocks, AreGivenUpAfterTheTimeThatIsSet) {
+  const ChildProcess holder{holdForEver()};
+  ASSERT_TRUE(holder.says(longEnough));
+  const auto impatient = locksTaken({.timeLimit = aMoment});
+  const auto began = std::chrono::steady_clock::now();
+  EXPECT_EQ(impatient->lockNamed(name).take()->lock().errorNumber(), ETIMEDOUT);
+  EXPECT_GE(std::chrono::steady_clock::now() - began, aMoment);
+  EXPECT_EQ(locksTaken({.timeLimit = 0ms})->lockNamed(name).take()->lock().errorNumber(), ETIMEDOUT);
+}
+
+TEST_F(LinuxLocks, SayOnceAfterASecondForWhomTheyWait) {
+  const ChildProcess holder{holdForEver()};
+  ASSERT_TRUE(holder.says(longEnough));
+  EXPECT_FALSE(isTaken(*locksTaken({.timeLimit = 900ms})));
+  EXPECT_TRUE(said.empty());
+  EXPECT_FALSE(isTaken(*locksTaken({.timeLimit = 2s})));
+  ASSERT_EQ(said.size(), 1U);
+  EXPECT_TRUE(said[0].starts_with("waiting for ")) << said[0];
+  EXPECT_TRUE(said[0].ends_with("process, which holds the lock " + file.string()) ||
+              said[0].ends_with("), which holds the lock " + file.string()))
+      << said[0];
+}
+
+TEST_F(LinuxLocks, ThatAreSharedWaitOnlyForWhoeverHoldsThemAlone) {
+  const LockManner shared{.isShared = true, .timeLimit = aMoment};
+  scratch.put(name, "");
+  const auto first = locksTaken(shared)->lockNamed(name).take();
+  EXPECT_TRUE(first->lock().isOk());
+  EXPECT_TRUE(isTaken(*locksTaken(shared)));
+  EXPECT_FALSE(isTaken(*locksTaken({.timeLimit = aMoment})));
+  first->unlock();
+  const auto alone = locks->lockNamed(name).take();
+  EXPECT_TRUE(alone->lock().isOk());
+  EXPECT_FALSE(isTaken(*locksTaken(shared)));
+}
+
+TEST_F(LinuxLocks, ThatAreSharedMakeAndReplaceNothing) {
+  const auto shared = locksTaken({.isShared = true});
+  EXPECT_TRUE(isTaken(*shared));
+  EXPECT_FALSE(fs::exists(file));
+  fs::create_symlink("elsewhere", file);
+  static_cast<void>(isTaken(*shared));
+  EXPECT_TRUE(fs::is_symlink(file));
 }
 
 TEST_F(LinuxLocks, AreNamedByAPlainFileName) {
@@ -219,9 +339,25 @@ TEST_F(LinuxLocks, AreNamedByAPlainFileName) {
   }
 }
 
-TEST_F(LinuxLocks, CannotBeMadeWithoutTheirDirectory) {
-  const auto elsewhere = platform::makeLinuxPlatform({.lockDirectory = scratch / "nothing"}).locks;
-  EXPECT_EQ(elsewhere->lockNamed(name).cause(), platform::Cause::missing);
+TEST_F(LinuxLocks, LieInTheTemporaryDirectoryOfTheirRootWhichIsMadeForEverybody) {
+  ASSERT_TRUE(isTaken(*platform::makeLinuxPlatform({.systemRoot = scratch.path()}).locks));
+  EXPECT_TRUE(fs::is_regular_file(scratch / "tmp" / name));
+  struct stat status {};
+  ASSERT_EQ(::stat((scratch / "tmp").c_str(), &status), 0);
+  EXPECT_EQ(status.st_mode & 07777U, 01777U);
+}
+
+TEST_F(LinuxLocks, OfOneRootKeepNobodyOfAnotherWaiting) {
+  fs::create_directories(scratch / "one");
+  fs::create_directories(scratch / "two");
+  const auto lock = platform::makeLinuxPlatform({.systemRoot = scratch / "one"}).locks->lockNamed(name).take();
+  ASSERT_TRUE(lock->lock().isOk());
+  EXPECT_TRUE(isTaken(*platform::makeLinuxPlatform({.systemRoot = scratch / "two"}).locks));
+}
+
+TEST_F(LinuxLocks, CannotBeMadeWhereNoDirectoryCan) {
+  scratch.put("file", "");
+  EXPECT_FALSE(platform::makeLinuxPlatform({.lockDirectory = scratch / "file/below"}).locks->lockNamed(name).isOk());
 }
 
 }  // namespace

@@ -27,7 +27,11 @@ struct OfTheTests {
   FakeFileSystem files;
   Path base = "/device";
 
-  OfTheTests() { files.putDirectory(base); }
+  OfTheTests() {
+    files.putDirectory(base);
+    files.root = base;
+  }
+  void link(std::string_view below, const Path& target) { files.putLink(base / below, target); }
   platform::FileSystem& service() { return files; }
   unsigned permissions(const Path& path) { return files.nodes.at(path).permissions; }
   static std::string_view someAccount() { return "mobile"; }
@@ -43,20 +47,27 @@ struct OfTheDevice {
     scratch.put("etc/group", "mobile:x:" + std::to_string(::getgid()) + ":\n");
   }
   platform::FileSystem& service() { return *files; }
+  void link(std::string_view below, const Path& target) const { std::filesystem::create_symlink(target, base / below); }
   static unsigned permissions(const Path& path) { return permissionsOf(path); }
   static std::string_view someAccount() { return "mobile"; }
 };
 
 // A rehearsal on a device, which must stay as it is.
 struct OfARehearsal : OfTheDevice {
-  std::shared_ptr<platform::RehearsedFiles> rehearsed = platform::makeRehearsalFileSystem(files, scratch.path());
+  std::shared_ptr<platform::RehearsedFiles> rehearsed =
+      platform::makeRehearsalFileSystem(*platform::makeLinuxPlatform({.systemRoot = scratch.path()}).directories);
+  std::ptrdiff_t links = 0;  // that the test planted on the device
 
   OfARehearsal() = default;
   OfARehearsal(const OfARehearsal&) = delete;
   OfARehearsal& operator=(const OfARehearsal&) = delete;
   ~OfARehearsal() {
     const std::filesystem::recursive_directory_iterator entries{scratch.path()};
-    EXPECT_EQ(std::distance(begin(entries), end(entries)), 3) << "etc, passwd and group";
+    EXPECT_EQ(std::distance(begin(entries), end(entries)), 3 + links) << "etc, passwd, group and links";
+  }
+  void link(std::string_view below, const Path& target) {
+    OfTheDevice::link(below, target);
+    ++links;
   }
   platform::FileSystem& service() { return *rehearsed; }
   [[nodiscard]] unsigned permissions(const Path& path) const { return rehearsed->permissionsAt(path).value_or(0); }
@@ -227,6 +238,103 @@ TYPED_TEST(FileSystemContract, MovesNothingThatIsMissingNorOntoADirectory) {
   EXPECT_EQ(this->files.rename(this->at("from"), this->at("nothing/to")).errorNumber(), ENOENT);
   EXPECT_EQ(this->files.rename(this->at("from"), this->at("directory")).errorNumber(), EISDIR);
   EXPECT_EQ(this->textAt("from"), "new");
+}
+
+// Every subject has a directory with a file, and a link to either by each way of writing it.
+template <typename Subject>
+class LinksContract : public FileSystemContract<Subject> {
+ protected:
+  LinksContract() {
+    EXPECT_TRUE(this->files.createDirectories(this->at("directory/below"), 0755).isOk());
+    this->put("directory/file", "text");
+  }
+  void expectTextThrough(std::string_view below) { EXPECT_EQ(this->textAt(below), "text") << below; }
+};
+TYPED_TEST_SUITE(LinksContract, Subjects);
+
+TYPED_TEST(LinksContract, AreFollowedAtTheEndOfAPath) {
+  this->subject.link("relative", "directory/file");
+  this->subject.link("absolute", "/directory/file");
+  this->subject.link("chain", "absolute");
+  for (const char* const link : {"relative", "absolute", "chain"}) {
+    this->expectTextThrough(link);
+    EXPECT_EQ(this->files.kindOf(this->at(link)), FileKind::file) << link;
+  }
+}
+
+TYPED_TEST(LinksContract, AreFollowedInTheMiddleOfAPath) {
+  this->subject.link("relative", "directory");
+  this->subject.link("absolute", "/directory");
+  this->subject.link("up", "relative/below/..");
+  for (const char* const link : {"relative", "absolute", "up"}) {
+    this->expectTextThrough(std::string{link} + "/file");
+    EXPECT_EQ(this->files.kindOf(this->at(link)), FileKind::directory) << link;
+  }
+}
+
+TYPED_TEST(LinksContract, LeadNewFilesAndDirectoriesIntoWhatTheyLeadTo) {
+  this->subject.link("link", "/directory");
+  this->put("link/new", "new");
+  ASSERT_TRUE(this->files.createDirectories(this->at("link/a/b"), 0755).isOk());
+  ASSERT_TRUE(this->files.rename(this->at("link/file"), this->at("moved")).isOk());
+  EXPECT_EQ(this->textAt("directory/new"), "new");
+  EXPECT_EQ(this->files.kindOf(this->at("directory/a/b")), FileKind::directory);
+  EXPECT_EQ(this->files.kindOf(this->at("directory/file")).cause(), platform::Cause::missing);
+  this->expectTextThrough("moved");
+}
+
+TYPED_TEST(LinksContract, ThatDangleLeadToNothing) {
+  this->subject.link("link", "/nothing");
+  EXPECT_EQ(this->files.kindOf(this->at("link")).cause(), platform::Cause::missing);
+  EXPECT_EQ(this->files.read(this->at("link"), anySize).status().errorNumber(), ENOENT);
+  EXPECT_EQ(this->files.create(this->at("link"), bytes("new")).errorNumber(), EEXIST);
+  EXPECT_EQ(this->files.create(this->at("link/new"), bytes("new")).errorNumber(), ENOENT);
+  EXPECT_EQ(this->files.kindOf(this->at("nothing")).cause(), platform::Cause::missing);
+}
+
+TYPED_TEST(LinksContract, InACircleAreRefused) {
+  this->subject.link("one", "two");
+  this->subject.link("two", "one");
+  EXPECT_EQ(this->files.kindOf(this->at("one")), FileKind::other);
+  EXPECT_EQ(this->files.read(this->at("one"), anySize).status().errorNumber(), ELOOP);
+  EXPECT_EQ(this->files.read(this->at("one/file"), anySize).status().errorNumber(), ELOOP);
+}
+
+TYPED_TEST(LinksContract, AreReplacedThemselves) {
+  this->subject.link("link", "directory/file");
+  ASSERT_TRUE(this->files.replace(this->at("link"), bytes("new")).isOk());
+  EXPECT_EQ(this->textAt("link"), "new");
+  this->expectTextThrough("directory/file");
+}
+
+TYPED_TEST(LinksContract, AreRemovedThemselves) {
+  this->subject.link("link", "directory");
+  ASSERT_TRUE(this->files.remove(this->at("link")).isOk());
+  EXPECT_EQ(this->files.kindOf(this->at("link")).cause(), platform::Cause::missing);
+  this->expectTextThrough("directory/file");
+}
+
+TYPED_TEST(LinksContract, AreMovedThemselves) {
+  this->subject.link("link", "/directory/file");
+  ASSERT_TRUE(this->files.rename(this->at("link"), this->at("directory/moved")).isOk());
+  EXPECT_EQ(this->files.kindOf(this->at("link")).cause(), platform::Cause::missing);
+  this->expectTextThrough("directory/moved");
+  ASSERT_TRUE(this->files.replace(this->at("directory/file"), bytes("new")).isOk());
+  EXPECT_EQ(this->textAt("directory/moved"), "new");
+}
+
+TYPED_TEST(LinksContract, AreCopiedAsWhatTheyLeadTo) {
+  this->subject.link("link", "/directory/file");
+  ASSERT_TRUE(this->files.copy(this->at("link"), this->at("copy")).isOk());
+  EXPECT_EQ(this->textAt("copy"), "text");
+  EXPECT_EQ(this->files.copy(this->at("directory/file"), this->at("link")).errorNumber(), EEXIST);
+}
+
+TYPED_TEST(LinksContract, AreNeitherGivenAwayNorTakenForDirectories) {
+  const std::string_view account = this->subject.someAccount();
+  this->subject.link("link", "directory");
+  EXPECT_EQ(this->files.setOwner(this->at("link"), account, account).errorNumber(), ELOOP);
+  EXPECT_EQ(this->files.createDirectories(this->at("link"), 0755).errorNumber(), ENOTDIR);
 }
 
 TYPED_TEST(FileSystemContract, NamesWhatFailed) {

@@ -72,9 +72,8 @@ TEST_F(LinuxFiles, ReplaceALinkItselfAndNotItsTarget) {
   EXPECT_FALSE(fs::is_symlink(scratch / "link"));
 }
 
-TEST_F(LinuxFiles, AreNotCopiedFromOrToALink) {
+TEST_F(LinuxFiles, AreNotCopiedToALink) {
   scratch.put("file", "text");
-  EXPECT_EQ(files->copy(plantLink("from", scratch / "file"), scratch / "copy").errorNumber(), ELOOP);
   EXPECT_EQ(files->copy(scratch / "file", plantLink("to", scratch / "elsewhere")).errorNumber(), EEXIST);
   EXPECT_FALSE(fs::exists(scratch / "elsewhere"));
 }
@@ -255,6 +254,29 @@ TEST_F(LinuxFiles, TakeTheirTemporaryNamesFromTheTemporaryDirectory) {
   EXPECT_EQ(first.value().parent_path(), scratch.path());
   ASSERT_TRUE(files->create(first.value(), someBytes).isOk());
   EXPECT_NE(files->temporaryName(), first.value());
+}
+
+TEST_F(LinuxFiles, KeepTheirTemporaryDirectoryBehindALinkThatOnlyTheDeviceKnows) {
+  fs::create_directories(scratch / "private/tmp");
+  plantLink("var", "/private");
+  ::setenv("TMPDIR", (scratch / "var/tmp").c_str(), 1);
+  const auto name = files->temporaryName();
+  ASSERT_TRUE(name.isOk());
+  EXPECT_EQ(name.value().parent_path(), scratch / "var/tmp");
+  EXPECT_TRUE(files->create(name.value(), someBytes).isOk());
+  EXPECT_EQ(entries("private/tmp"), 1);
+}
+
+TEST_F(LinuxFiles, AreGivenAwayOnlyAsMadeAlsoWhenManyOthersWereMadeBefore) {
+  nameTheCaller("mobile");
+  for (char letter = 'b'; letter < 'q'; ++letter) {
+    ASSERT_TRUE(files->create(scratch / std::string(1, letter), someBytes).isOk());
+  }
+  ASSERT_TRUE(files->create(scratch / "a", someBytes).isOk());
+  ASSERT_TRUE(files->create(scratch / "q", someBytes).isOk());
+  fs::rename(scratch / "a", scratch / "away");
+  scratch.put("a", "something else");
+  EXPECT_EQ(files->setOwner(scratch / "a", "mobile", "mobile").errorNumber(), ESTALE);
 }
 
 TEST_F(LinuxFiles, LeaveNoDescriptorOpen) {

@@ -1,6 +1,7 @@
 // Which links the device's file system follows on the way to a path, with and without the kernel's own help.
 
 #include <fcntl.h>
+#include <grp.h>
 #include <gtest/gtest.h>
 #include <linux/filter.h>
 #include <linux/seccomp.h>
@@ -13,6 +14,7 @@
 #include <cerrno>
 
 #include "platform/linux/linux_platform.h"
+#include "tests/support/child_process.h"
 #include "tests/support/scratch_directory.h"
 
 namespace tests {
@@ -161,6 +163,7 @@ class ResolutionAsRoot : public Resolution {
       fs::create_directory(scratch / directory);
     scratch.put("root/his/own/file", "his");
     scratch.put("root/secret/file", "secret");
+    fs::permissions(root / "secret/file", fs::perms{0600});
     for (const char* const owned : {"root/his", "root/his/own", "root/his/own/file"}) give(owned, somebody);
   }
   void plant(std::string_view below, const Path& target, uid_t owner) const {
@@ -202,20 +205,110 @@ TEST_P(ResolutionAsRoot, RefusesAUsersWayThroughWhatIsClosedToThatUser) {
   EXPECT_EQ(text(root / "his/way/file"), "his, and out of reach");
 }
 
-TEST_P(ResolutionAsRoot, RefusesLinksThatWereMovedOrPlantedInOthersDirectories) {
-  plant("root/his/roots", "own/file", 0);
-  plant("root/his/others", "own/file", somebodyElse);
+TEST_P(ResolutionAsRoot, FollowsRootsLinkInAUsersDirectoryToWhatIsThatUsers) {
+  plant("root/his/link", "own/file", 0);
+  plant("root/his/way", "/his/own", 0);
+  EXPECT_EQ(text(root / "his/link"), "his");
+  EXPECT_EQ(text(root / "his/way/file"), "his");
+  EXPECT_TRUE(files()->create(root / "his/way/new", {}).isOk());
+}
+
+TEST_P(ResolutionAsRoot, FollowsAUsersLinkInRootsDirectoryToWhatIsThatUsers) {
   plant("root/data/his", "/his/own/file", somebody);
-  for (const char* const path : {"his/roots", "his/others", "data/his"}) {
-    EXPECT_EQ(text(root / path), error(ELOOP)) << path;
+  plant("root/data/secret", "/secret/file", somebody);
+  EXPECT_EQ(text(root / "data/his"), "his");
+  EXPECT_EQ(text(root / "data/secret"), error(ELOOP));
+}
+
+TEST_P(ResolutionAsRoot, RefusesRootsLinkThatAUserMayHaveMovedToWhatTheUserCannotRead) {
+  plant("root/his/link", "/secret/file", 0);
+  plant("root/his/way", "/secret", 0);
+  EXPECT_EQ(text(root / "his/link"), error(ELOOP));
+  EXPECT_EQ(text(root / "his/way/file"), error(ELOOP));
+  EXPECT_EQ(files()->copy(root / "his/link", root / "copy").errorNumber(), ELOOP);
+  EXPECT_EQ(files()->create(root / "his/way/new", {}).errorNumber(), ELOOP);
+}
+
+TEST_P(ResolutionAsRoot, ReadsForAUserWhatEverybodyMayReadButWritesNothingThere) {
+  fs::permissions(root / "secret/file", fs::perms{0644});
+  plant("root/his/link", "/secret/file", 0);
+  plant("root/his/way", "/secret", 0);
+  EXPECT_EQ(text(root / "his/link"), "secret");
+  EXPECT_EQ(files()->create(root / "his/way/new", {}).errorNumber(), ELOOP);
+  fs::permissions(root / "secret", fs::perms{0700});
+  EXPECT_EQ(text(root / "his/link"), error(ELOOP));
+}
+
+TEST_P(ResolutionAsRoot, ReadsNoProcesssFileForAUser) {
+  root = "/";
+  plant("root/his/link", "/proc/self/maps", somebody);
+  EXPECT_EQ(text(scratch / "root/his/link"), error(ELOOP));
+}
+
+TEST_P(ResolutionAsRoot, RefusesALinkThatOneUserMadeInAnothersDirectory) {
+  plant("root/his/others", "own/file", somebodyElse);
+  EXPECT_EQ(text(root / "his/others"), error(ELOOP));
+}
+
+TEST_P(ResolutionAsRoot, RefusesAWayOfTwoUsersLinks) {
+  fs::create_directory(root / "others");
+  give("root/others", somebodyElse);
+  plant("root/others/link", "/his/own/file", somebodyElse);
+  plant("root/his/link", "/others/link", somebody);
+  EXPECT_EQ(text(root / "his/link"), error(ELOOP));
+}
+
+struct SecondName {
+  const char* what;
+  uid_t directoryOwner;
+  unsigned directoryMode;
+  uid_t fileOwner;
+  unsigned fileMode;
+  int error;  // 0 where it is read
+};
+
+constexpr SecondName kSecondNames[] = {
+    {"root's in root's", 0, 0755, 0, 0600, 0},
+    {"a user's in root's", 0, 0755, somebody, 0600, 0},
+    {"a user's in his own", somebody, 0755, somebody, 0600, 0},
+    {"root's in a user's", somebody, 0700, 0, 0600, EMLINK},
+    {"root's in a user's, for all to read", somebody, 0700, 0, 0644, 0},
+    {"another user's in a user's", somebody, 0755, somebodyElse, 0600, EMLINK},
+    {"another user's in a user's, for all to read", somebody, 0755, somebodyElse, 0644, 0},
+    {"root's where a group writes", 0, 0775, 0, 0600, EMLINK},
+    {"root's where others write", 0, 0777, 0, 0600, EMLINK},
+    {"root's in a sticky directory", 0, 01777, 0, 0600, EMLINK},
+    {"a user's in a sticky directory", 0, 01777, somebody, 0600, EMLINK},
+};
+
+TEST_P(ResolutionAsRoot, ReadsASecondNameUnlessItMayBeSomebodysWhoCannotReadTheFile) {
+  for (const SecondName& row : kSecondNames) {
+    SCOPED_TRACE(row.what);
+    fs::remove_all(root / "place");
+    scratch.put("root/place/file", "text");
+    fs::remove(root / "first name");
+    fs::create_hard_link(root / "place/file", root / "first name");
+    fs::permissions(root / "place/file", fs::perms{row.fileMode});
+    fs::permissions(root / "place", fs::perms{row.directoryMode});
+    give("root/place/file", row.fileOwner);
+    give("root/place", row.directoryOwner);
+    EXPECT_EQ(text(root / "place/file"), row.error == 0 ? "text" : error(row.error));
+    EXPECT_EQ(files()->copy(root / "place/file", root / "copy").errorNumber(), row.error);
+    fs::remove(root / "copy");
   }
 }
 
-TEST_P(ResolutionAsRoot, RefusesAHardLinkToWhatIsNotTheDirectorysOwners) {
-  fs::create_hard_link(root / "secret/file", root / "his/planted");
-  fs::create_hard_link(root / "his/own/file", root / "his/second");
-  EXPECT_EQ(text(root / "his/planted"), error(EMLINK));
-  EXPECT_EQ(text(root / "his/second"), "his");
+TEST_P(ResolutionAsRoot, ReadsNothingThatAUserPlantedToSeeIt) {
+  fs::permissions(scratch.path(), fs::perms{0755});
+  plant("root/his/roots", "/secret/file", 0);
+  const ChildProcess user{[this](const auto& say) {
+    if (::setgroups(0, nullptr) != 0 || ::setuid(somebody) != 0) return;
+    if (::symlink("/secret/file", (root / "his/link").c_str()) != 0) return;
+    if (::rename((root / "his/roots").c_str(), (root / "his/moved").c_str()) != 0) return;
+    say();
+  }};
+  ASSERT_TRUE(user.says(std::chrono::seconds{10}));
+  for (const char* const planted : {"his/link", "his/moved"}) EXPECT_EQ(text(root / planted), error(ELOOP)) << planted;
 }
 
 TEST_P(ResolutionAsRoot, GivesNothingAwayThatTookThePlaceOfWhatWasMade) {

@@ -38,8 +38,8 @@ class Rehearsal : public testing::Test {
   }
 
   ScratchDirectory scratch;
-  std::shared_ptr<platform::FileSystem> device = platform::makeLinuxPlatform({.systemRoot = scratch.path()}).files;
-  std::shared_ptr<platform::RehearsedFiles> files = platform::makeRehearsalFileSystem(device, scratch.path());
+  platform::Platform services = platform::makeLinuxPlatform({.systemRoot = scratch.path()});
+  std::shared_ptr<platform::RehearsedFiles> files = platform::makeRehearsalFileSystem(*services.directories);
 };
 
 TEST_F(Rehearsal, ReadsWhatLiesOnTheDevice) {
@@ -89,10 +89,26 @@ TEST_F(Rehearsal, ReplacesALinkAndNotWhatItLeadsTo) {
   EXPECT_EQ(files->copy(scratch / "directory/link", scratch / "copy").isOk(), true);
 }
 
-TEST_F(Rehearsal, CopiesAndGivesAwayNoLinks) {
-  std::filesystem::create_symlink("file", scratch / "directory/link");
-  EXPECT_EQ(files->copy(scratch / "directory/link", scratch / "copy").errorNumber(), ELOOP);
-  EXPECT_EQ(files->setOwner(scratch / "directory/link", "mobile", "mobile").errorNumber(), ELOOP);
+TEST_F(Rehearsal, FollowsALinkThatItMovedAndWhatOtherLinksLeadTo) {
+  std::filesystem::create_symlink("../directory/file", scratch / "directory/link");
+  ASSERT_TRUE(files->createDirectories(scratch / "made/here", 0755).isOk());
+  ASSERT_TRUE(files->rename(scratch / "directory/link", scratch / "made/link").isOk());
+  ASSERT_TRUE(files->create(scratch / "made/here/file", bytes("new")).isOk());
+  EXPECT_EQ(textAt("made/link"), "as it is");
+  EXPECT_EQ(textAt("made/here/../../directory/file"), "as it is");
+}
+
+TEST_F(Rehearsal, RefusesWhatMayBePlantedAsTheDeviceDoes) {
+  std::filesystem::create_directory(scratch / "open");
+  std::filesystem::create_hard_link(scratch / "directory/file", scratch / "open/second");
+  std::filesystem::create_symlink("../directory/file", scratch / "open/link");
+  std::filesystem::permissions(scratch / "open", std::filesystem::perms{0777});
+  for (const char* const path : {"open/second", "open/link"}) {
+    const int cause = services.files->read(scratch / path, SIZE_MAX).status().errorNumber();
+    EXPECT_NE(cause, 0) << path;
+    EXPECT_EQ(files->read(scratch / path, SIZE_MAX).status().errorNumber(), cause) << path;
+    EXPECT_EQ(files->copy(scratch / path, scratch / "copy").errorNumber(), cause) << path;
+  }
 }
 
 TEST_F(Rehearsal, GivesAwayNoFileWithASecondName) {

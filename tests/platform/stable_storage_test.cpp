@@ -109,6 +109,45 @@ TEST_F(StableStorage, HoldsTheEntryOfEveryDirectoryThatWasMade) {
   expectSynced({scratch.path(), scratch / "a"});
 }
 
+// Others than the process's, so that something changes; only root gives files away.
+class StableOwners : public StableStorage {
+ protected:
+  void SetUp() override {
+    if (::getuid() != 0) GTEST_SKIP() << "only root gives files away";
+    scratch.put("etc/passwd", "mobile:x:501:501::/:\n");
+    scratch.put("etc/group", "mobile:x:501:\n");
+    StableStorage::SetUp();
+  }
+  [[nodiscard]] int giveAway(const Path& path) const { return files->setOwner(path, "mobile", "mobile").errorNumber(); }
+};
+
+TEST_F(StableOwners, AreHeldAfterTheFileAndItsEntry) {
+  ASSERT_TRUE(files->create(scratch / "file", someBytes).isOk());
+  ASSERT_EQ(giveAway(scratch / "file"), 0);
+  expectSynced({scratch / "file", scratch.path(), scratch / "file"});
+}
+
+TEST_F(StableOwners, AreHeldOfDirectoriesAndOfWhatWasThereBefore) {
+  scratch.put("file", "text");
+  ASSERT_EQ(giveAway(scratch / "file"), 0);
+  ASSERT_TRUE(files->createDirectories(scratch / "directory", 0700).isOk());
+  ASSERT_EQ(giveAway(scratch / "directory"), 0);
+  expectSynced({scratch / "file", scratch.path(), scratch / "directory"});
+}
+
+TEST_F(StableOwners, AreNotSyncedWhereNothingChanges) {
+  scratch.put("file", "text");
+  ASSERT_EQ(giveAway(scratch / "file"), 0);
+  ASSERT_EQ(giveAway(scratch / "file"), 0);
+  expectSynced({scratch / "file"});
+}
+
+TEST_F(StableOwners, ThatAreNotHeldAreAFailure) {
+  scratch.put("file", "text");
+  failAt(1);
+  EXPECT_EQ(giveAway(scratch / "file"), EIO);
+}
+
 TEST_F(StableStorage, IsTriedAgainAfterAnInterruption) {
   syncs.interruptions = 3;
   EXPECT_TRUE(files->create(scratch / "file", someBytes).isOk());

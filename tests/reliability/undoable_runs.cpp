@@ -65,7 +65,7 @@ Child childOn(const std::filesystem::path& root, const Mishap& mishap) {
       .files = files,
       .place = {.services = services,
                 .keeper = std::make_shared<MishapFileKeeper>(platform::makeFileKeeper(*services.directories), files),
-                .locks = platform::makeFileLocks(root / "snapshots"),
+                .locks = platform::makeFileLocks({.directory = root / "snapshots"}),
                 .directory = root / "snapshots",
                 .footprint = {},
                 .release = "1",

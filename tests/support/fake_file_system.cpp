@@ -11,7 +11,8 @@ using platform::Status;
 
 void FakeFileSystem::put(const Path& path, Bytes bytes) {
   putDirectory(path.parent_path());
-  nodes[path] = Node{.isDirectory = false, .bytes = std::move(bytes), .owner = {}, .group = {}, .permissions = 0600};
+  nodes[path] = Node{
+      .isDirectory = false, .bytes = std::move(bytes), .owner = {}, .group = {}, .permissions = 0600, .target = {}};
 }
 
 void FakeFileSystem::put(const Path& path, std::string_view bytes) { put(path, Bytes{bytes.begin(), bytes.end()}); }
@@ -21,7 +22,8 @@ void FakeFileSystem::putDirectory(const Path& path) {
   for (const Path& part : path) {
     built /= part;
     if (!nodes.contains(built)) {
-      nodes[built] = Node{.isDirectory = true, .bytes = {}, .owner = {}, .group = {}, .permissions = 0755};
+      nodes[built] =
+          Node{.isDirectory = true, .bytes = {}, .owner = {}, .group = {}, .permissions = 0755, .target = {}};
     }
   }
 }
@@ -29,6 +31,33 @@ void FakeFileSystem::putDirectory(const Path& path) {
 std::string FakeFileSystem::contents(const Path& path) const {
   const auto node = nodes.find(path);
   return node == nodes.end() ? std::string{} : std::string{node->second.bytes.begin(), node->second.bytes.end()};
+}
+
+void FakeFileSystem::putLink(const Path& path, const Path& target) {
+  put(path, Bytes{});
+  nodes[path].target = target;
+}
+
+Path FakeFileSystem::followed(const Path& path, bool followsLast, int& links) const {
+  constexpr int kMaxLinks = 40;
+  if (!path.has_relative_path()) return path;
+  Path place = followed(path.parent_path(), true, links) / path.filename();
+  const auto node = nodes.find(place);
+  if (!followsLast || node == nodes.end() || node->second.target.empty() || ++links > kMaxLinks) return place;
+  const Path& target = node->second.target;
+  Path next = target.is_absolute() ? root / target.relative_path() : place.parent_path() / target;
+  next = next.lexically_normal();
+  return followed(next.has_filename() ? next : next.parent_path(), true, links);
+}
+
+Path FakeFileSystem::placeOf(const Path& path) const {
+  int links = 0;
+  return followed(path, false, links);
+}
+
+Path FakeFileSystem::targetOf(const Path& path) const {
+  int links = 0;
+  return followed(path, true, links);
 }
 
 Status FakeFileSystem::begin(const std::string& verb, const Path& path, const std::string& rest) {
@@ -40,24 +69,32 @@ Status FakeFileSystem::begin(const std::string& verb, const Path& path, const st
 }
 
 platform::Result<FileKind> FakeFileSystem::kindOf(const Path& path) {
-  const auto node = nodes.find(path);
+  const auto node = nodes.find(targetOf(path));
   if (node == nodes.end()) return Status::failure(ENOENT, "look at " + path.string());
+  if (!node->second.target.empty()) return FileKind::other;
   return node->second.isDirectory ? FileKind::directory : FileKind::file;
+}
+
+int FakeFileSystem::obstacleToReading(const Path& path) const {
+  const auto node = nodes.find(path);
+  if (node == nodes.end()) return obstacleAbove(path) == 0 ? ENOENT : obstacleAbove(path);
+  if (node->second.isDirectory) return EISDIR;
+  return node->second.target.empty() ? 0 : ELOOP;
 }
 
 platform::Result<Bytes> FakeFileSystem::read(const Path& path, std::size_t sizeLimit) {
   const Status begun = begin("read", path);
   if (!begun.isOk()) return begun;
-  const auto node = nodes.find(path);
-  if (node == nodes.end()) return Status::failure(ENOENT, "read " + path.string());
-  if (node->second.isDirectory) return Status::failure(EISDIR, "read " + path.string());
-  if (node->second.bytes.size() > sizeLimit) return Status::failure(EFBIG, "read " + path.string());
-  return node->second.bytes;
+  const Path place = targetOf(path);
+  if (const int cause = obstacleToReading(place)) return Status::failure(cause, "read " + path.string());
+  const Bytes& bytes = nodes.at(place).bytes;
+  return bytes.size() > sizeLimit ? platform::Result<Bytes>{Status::failure(EFBIG, "read " + path.string())} : bytes;
 }
 
 int FakeFileSystem::obstacleAbove(const Path& path) const {
   const auto above = nodes.find(path.parent_path());
   if (above == nodes.end()) return ENOENT;
+  if (!above->second.target.empty()) return ELOOP;
   return above->second.isDirectory ? 0 : ENOTDIR;
 }
 
@@ -73,61 +110,68 @@ int FakeFileSystem::obstacleToReplacing(const Path& path) const {
 Status FakeFileSystem::create(const Path& path, std::span<const std::uint8_t> bytes) {
   const Status begun = begin("create", path);
   if (!begun.isOk()) return begun;
-  if (const int cause = obstacleToMaking(path)) return Status::failure(cause, "create " + path.string());
-  put(path, Bytes{bytes.begin(), bytes.end()});
+  const Path place = placeOf(path);
+  if (const int cause = obstacleToMaking(place)) return Status::failure(cause, "create " + path.string());
+  put(place, Bytes{bytes.begin(), bytes.end()});
   return {};
 }
 
 Status FakeFileSystem::replace(const Path& path, std::span<const std::uint8_t> bytes) {
   const Status begun = begin("replace", path);
   if (!begun.isOk()) return begun;
-  if (const int cause = obstacleToReplacing(path)) return Status::failure(cause, "replace " + path.string());
-  put(path, Bytes{bytes.begin(), bytes.end()});
+  const Path place = placeOf(path);
+  if (const int cause = obstacleToReplacing(place)) return Status::failure(cause, "replace " + path.string());
+  put(place, Bytes{bytes.begin(), bytes.end()});
   return {};
 }
 
 Status FakeFileSystem::copy(const Path& from, const Path& to) {
   const Status begun = begin("copy", from, " " + to.string());
   if (!begun.isOk()) return begun;
-  const auto node = nodes.find(from);
-  if (node == nodes.end()) return Status::failure(ENOENT, "copy " + from.string());
-  if (node->second.isDirectory) return Status::failure(EISDIR, "copy " + from.string());
-  if (const int cause = obstacleToMaking(to)) return Status::failure(cause, "copy to " + to.string());
-  put(to, node->second.bytes);
+  const Path source = targetOf(from);
+  const Path place = placeOf(to);
+  if (const int cause = obstacleToReading(source)) return Status::failure(cause, "copy " + from.string());
+  if (const int cause = obstacleToMaking(place)) return Status::failure(cause, "copy to " + to.string());
+  put(place, Bytes{nodes.at(source).bytes});
   return {};
 }
 
 Status FakeFileSystem::remove(const Path& path) {
   const Status begun = begin("remove", path);
   if (!begun.isOk()) return begun;
-  if (!nodes.contains(path)) return Status::failure(ENOENT, "remove " + path.string());
-  const std::string below = path.string() + "/";
-  std::erase_if(nodes, [&](const auto& node) { return node.first == path || node.first.string().starts_with(below); });
+  const Path place = placeOf(path);
+  if (!nodes.contains(place)) return Status::failure(ENOENT, "remove " + path.string());
+  const std::string below = place.string() + "/";
+  std::erase_if(nodes, [&](const auto& node) { return node.first == place || node.first.string().starts_with(below); });
   return {};
 }
 
 Status FakeFileSystem::createDirectories(const Path& path, unsigned permissions) {
   const Status begun = begin("createDirectories", path);
   if (!begun.isOk()) return begun;
-  for (Path above = path; above.has_relative_path(); above = above.parent_path()) {
+  const Path place = placeOf(path);
+  for (Path above = place; above.has_relative_path(); above = above.parent_path()) {
     if (nodes.contains(above) && !nodes[above].isDirectory) {
       return Status::failure(ENOTDIR, "create the directory " + path.string());
     }
   }
-  if (nodes.contains(path)) return {};
-  putDirectory(path);
-  nodes[path].permissions = permissions;
+  if (nodes.contains(place)) return {};
+  putDirectory(place);
+  nodes[place].permissions = permissions;
   return {};
 }
 
 Status FakeFileSystem::setOwner(const Path& path, std::string_view owner, std::string_view group) {
   const Status begun = begin("setOwner", path);
   if (!begun.isOk()) return begun;
-  if (!accounts.contains(std::string{owner}) || !accounts.contains(std::string{group}) || !nodes.contains(path)) {
+  const Path place = placeOf(path);
+  if (!accounts.contains(std::string{owner}) || !accounts.contains(std::string{group}) || !nodes.contains(place)) {
     return Status::failure(ENOENT, "set the owner of " + path.string());
   }
-  nodes[path].owner = owner;
-  nodes[path].group = group;
+  Node& node = nodes[place];
+  if (!node.target.empty()) return Status::failure(ELOOP, "set the owner of " + path.string());
+  node.owner = owner;
+  node.group = group;
   return {};
 }
 
@@ -140,11 +184,12 @@ platform::Result<Path> FakeFileSystem::temporaryName() {
 Status FakeFileSystem::rename(const Path& from, const Path& to) {
   const Status begun = begin("rename", from, " " + to.string());
   if (!begun.isOk()) return begun;
-  const auto node = nodes.find(from);
+  const auto node = nodes.find(placeOf(from));
+  const Path place = placeOf(to);
   if (node == nodes.end()) return Status::failure(ENOENT, "rename " + from.string());
-  if (const int cause = obstacleToReplacing(to)) return Status::failure(cause, "rename to " + to.string());
-  nodes[to] = node->second;
-  nodes.erase(from);
+  if (const int cause = obstacleToReplacing(place)) return Status::failure(cause, "rename to " + to.string());
+  nodes[place] = node->second;
+  nodes.erase(node);
   return {};
 }
 

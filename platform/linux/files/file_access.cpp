@@ -4,6 +4,8 @@
 
 #include <cerrno>
 
+#include "platform/linux/files/planting.h"
+
 namespace platform {
 namespace {
 
@@ -39,8 +41,7 @@ Descriptor openOwnFile(const Place& place) {
   struct stat status {};
   struct stat holder {};
   if (!file.isOpen() || ::fstat(file.number(), &status) != 0 || ::fstat(place.parent.number(), &holder) != 0) return {};
-  const bool mayBePlanted = status.st_uid != holder.st_uid || (holder.st_mode & S_IWOTH) != 0;
-  if (refuse(status.st_nlink > 1 && mayBePlanted ? EMLINK : 0)) return {};
+  if (refuse(mayBeRead(status, holder) ? 0 : EMLINK)) return {};
   return file;
 }
 
@@ -80,8 +81,7 @@ ssize_t readSome(int descriptor, void* buffer, std::size_t size) {
 bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
   struct stat status {};
   if (::fstat(file, &status) != 0) return false;
-  errno = EFBIG;
-  if (static_cast<std::uintmax_t>(status.st_size) > limit) return false;
+  if (static_cast<std::uintmax_t>(status.st_size) > limit) return !refuse(EFBIG);
   // One byte more than expected shows whether the file ends where it said.
   bytes.resize(static_cast<std::size_t>(status.st_size) + 1);
   std::size_t filled = 0;
@@ -89,8 +89,7 @@ bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
     const ssize_t count = readSome(file, bytes.data() + filled, bytes.size() - filled);
     if (count < 0) return false;
     filled += static_cast<std::size_t>(count);
-    errno = EFBIG;
-    if (filled > limit) return false;
+    if (filled > limit) return !refuse(EFBIG);
     if (filled < bytes.size()) break;
     bytes.resize(bytes.size() * 2);
   }

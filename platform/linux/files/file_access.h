@@ -27,8 +27,8 @@ struct Place {
 // ELOOP or EINVAL), unopened where that can be told before, and nothing waits for the other side of a pipe or a device.
 [[nodiscard]] Descriptor openRegularFile(const Place& place);
 
-// The same for a file whose contents are to be used. One with a second name elsewhere is refused (EMLINK) where
-// somebody may have given it this one: a file that others cannot read would be read for them.
+// The same for a file whose contents are to be used. One with a second name elsewhere is refused (EMLINK) as planting.h
+// has it.
 [[nodiscard]] Descriptor openOwnFile(const Place& place);
 
 // Makes a new file, mode 0600 whatever the umask, open for writing.

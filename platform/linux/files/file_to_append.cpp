@@ -6,6 +6,7 @@
 #include <ctime>
 
 #include "platform/linux/files/path_resolution.h"
+#include "platform/linux/files/planting.h"
 
 namespace platform {
 namespace {
@@ -15,12 +16,6 @@ constexpr mode_t ownerOnly = 0600;
 constexpr int attempts = 100;
 constexpr int flags = O_WRONLY | O_APPEND | O_NOFOLLOW | O_CLOEXEC | O_NOCTTY | O_NONBLOCK;
 
-bool isOurs(uid_t owner) { return owner == 0 || owner == ::geteuid(); }
-
-bool isClosed(const struct stat& directory) {
-  return isOurs(directory.st_uid) && (directory.st_mode & (S_IWGRP | S_IWOTH)) == 0;
-}
-
 int obstacle(const struct stat& thing, const struct stat& holder) {
   if (S_ISLNK(thing.st_mode)) return ELOOP;
   if (S_ISDIR(thing.st_mode)) return EISDIR;
@@ -28,7 +23,7 @@ int obstacle(const struct stat& thing, const struct stat& holder) {
   if (thing.st_nlink > 1) return EMLINK;
   if (S_ISREG(thing.st_mode)) return 0;
   const bool isStream = S_ISFIFO(thing.st_mode) || S_ISCHR(thing.st_mode);
-  return isStream && isClosed(holder) ? 0 : EINVAL;
+  return isStream && isOurs(holder.st_uid) && isClosed(holder) ? 0 : EINVAL;
 }
 
 bool isUsable(int asked, const struct stat& thing, const Place& place) {

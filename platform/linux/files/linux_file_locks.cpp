@@ -2,103 +2,240 @@
 
 #include <fcntl.h>
 #include <sys/file.h>
+#include <sys/sysmacros.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
+#include <cstdio>
+#include <fstream>
+#include <sstream>
+#include <thread>
 
-#include "platform/linux/files/path_resolution.h"
+#include "platform/linux/files/account_names.h"
+#include "platform/linux/files/directory_trees.h"
 
 namespace platform {
 namespace {
 
-constexpr mode_t readableByAll = 0644;
+using std::chrono::milliseconds;
+using std::chrono::steady_clock;
+
+constexpr mode_t kReadableByAll = 0644;
+constexpr unsigned kOpenToAll = 01777;
+constexpr milliseconds kLongWait{1000};
+constexpr milliseconds kBetweenTries{10};
 // The file may come and go between two steps only if somebody plays with it; then there is no lock to be had.
-constexpr int attempts = 100;
+constexpr int kAttempts = 100;
+
+Status failure(const std::string& attempt, const std::filesystem::path& path) {
+  const int cause = errno;
+  return Status::failure(cause, attempt + " " + path.string());
+}
 
 Descriptor makeLockFile(const Place& place) {
   constexpr int flags = O_RDONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags, readableByAll)};
-  if (file.isOpen()) ::fchmod(file.number(), readableByAll);
+  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags, kReadableByAll)};
+  if (file.isOpen()) ::fchmod(file.number(), kReadableByAll);
   return file;
 }
 
-// An existing file is opened without O_CREAT: in a sticky directory the kernel may refuse that flag for a file of
-// another owner.
-Descriptor openLockFile(const Place& place) {
-  for (int attempt = 0; place.parent.isOpen() && attempt < attempts; ++attempt) {
-    Descriptor file = openRegularFile(place);
-    if (file.isOpen() || errno != ENOENT) return file;
-    file = makeLockFile(place);
-    if (file.isOpen() || errno != EEXIST) return file;
+// As the kernel names it in its list of locks.
+std::string deviceAndNode(const struct stat& file) {
+  std::array<char, 64> text{};
+  std::snprintf(text.data(), text.size(), "%02x:%02x:%ju", ::major(file.st_dev), ::minor(file.st_dev),
+                static_cast<std::uintmax_t>(file.st_ino));
+  return text.data();
+}
+
+std::string nameOfProcess(const std::string& process) {
+  std::ifstream file{"/proc/" + process + "/comm"};
+  std::string name;
+  std::getline(file, name);
+  return name.empty() ? name : " (" + name + ")";
+}
+
+// Who holds the lock of the file, as far as the kernel tells it to this process.
+std::string holderOf(const Descriptor& file) {
+  struct stat status {};
+  if (::fstat(file.number(), &status) != 0) return "another process";
+  std::ifstream locks{"/proc/locks"};
+  std::string line;
+  while (std::getline(locks, line)) {
+    std::istringstream words{line};
+    std::string number;
+    std::string kind;
+    std::string manner;
+    std::string access;
+    std::string process;
+    std::string node;
+    words >> number >> kind >> manner >> access >> process >> node;
+    if (kind == "FLOCK" && node == deviceAndNode(status)) return "process " + process + nameOfProcess(process);
   }
-  return {};
+  return "another process";
 }
 
-Status failure(const char* attempt, const std::filesystem::path& path) {
-  const int cause = errno;
-  return Status::failure(cause, std::string{attempt} + " " + path.string());
-}
+// The file at the lock's name: found, made, or put in the place of what somebody else may have put there.
+class LockFile {
+ public:
+  LockFile(const FileLockOptions& options, std::string_view name)
+      : _options{options}, _path{options.directory / name}, _paths{options.trees} {}
 
-bool isFileAt(const Place& place, const Descriptor& file) {
-  struct stat opened {};
-  struct stat present {};
-  return ::fstat(file.number(), &opened) == 0 &&
-         ::fstatat(place.parent.number(), place.leaf.c_str(), &present, AT_SYMLINK_NOFOLLOW) == 0 &&
-         opened.st_dev == present.st_dev && opened.st_ino == present.st_ino;
-}
+  [[nodiscard]] const std::filesystem::path& path() const { return _path; }
+  [[nodiscard]] const Descriptor& descriptor() const { return _file; }
+  // Where it is not open without a failure, there is none, and none is to be made.
+  [[nodiscard]] bool isOpen() const { return _file.isOpen(); }
 
-bool waitForLock(const Descriptor& file) {
-  while (::flock(file.number(), LOCK_EX) != 0) {
-    if (errno != EINTR) return false;
+  bool open() {
+    _file = {};
+    _place = _paths.openParent(_path);
+    if (!_place.parent.isOpen() && errno == ENOENT) {
+      if (isShared()) return true;
+      if (!makeDirectories(_paths, _options.directory, kOpenToAll)) return false;
+      _place = _paths.openParent(_path);
+    }
+    for (int attempt = 0; _place.parent.isOpen() && attempt < kAttempts; ++attempt) {
+      if (tryToOpen()) return true;
+      if (errno != EAGAIN) return false;
+    }
+    return false;
   }
-  return true;
-}
+
+  // Whether the file that was opened still stands at the name.
+  [[nodiscard]] bool isAtItsPlace() const {
+    struct stat opened {};
+    struct stat present {};
+    return ::fstat(_file.number(), &opened) == 0 &&
+           ::fstatat(_place.parent.number(), _place.leaf.c_str(), &present, AT_SYMLINK_NOFOLLOW) == 0 &&
+           opened.st_dev == present.st_dev && opened.st_ino == present.st_ino;
+  }
+
+  [[nodiscard]] bool isShared() const { return _options.manner.isShared; }
+  [[nodiscard]] const std::optional<milliseconds>& timeLimit() const { return _options.manner.timeLimit; }
+  void say(const std::string& line) const { _options.say(line); }
+
+ private:
+  // Answers false with errno EAGAIN where somebody was quicker. An existing file is opened without O_CREAT: in a sticky
+  // directory the kernel may refuse that flag for a file of another owner.
+  bool tryToOpen() {
+    struct stat status {};
+    if (::fstatat(_place.parent.number(), _place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) {
+      if (errno != ENOENT) return false;
+      if (isShared()) return true;
+      _file = makeLockFile(_place);
+      return _file.isOpen() || isToBeTriedAgain(errno == EEXIST);
+    }
+    const std::string flaw = ::geteuid() == 0 ? flawOf(status) : std::string{};
+    if (!flaw.empty()) return isShared() || (replace(flaw) && isToBeTriedAgain(true));
+    _file = openRegularFile(_place);
+    if (!_file.isOpen()) return isToBeTriedAgain(errno == ENOENT);
+    if (::fstat(_file.number(), &status) != 0) return false;
+    return ::geteuid() != 0 || flawOf(status).empty() || isToBeTriedAgain(true);
+  }
+
+  static bool isToBeTriedAgain(bool isSo) {
+    if (isSo) errno = EAGAIN;
+    return false;
+  }
+
+  // Why somebody else may have put it there.
+  [[nodiscard]] std::string flawOf(const struct stat& status) const {
+    if (S_ISLNK(status.st_mode)) return "it was a link";
+    if (S_ISDIR(status.st_mode)) return "it was a directory";
+    if (!S_ISREG(status.st_mode)) return "it was no regular file";
+    if (status.st_nlink > 1) return "it had a second name";
+    if (status.st_uid == 0) return {};
+    const Result<uid_t> mobile = AccountNames{_options.trees.systemRoot}.user("mobile");
+    if (mobile.isOk() && mobile.value() == status.st_uid) return {};
+    return "it belonged to the user " + std::to_string(status.st_uid);
+  }
+
+  bool replace(const std::string& flaw) {
+    if (!removeTree(_place) && errno != ENOENT) return false;
+    if (!std::exchange(_hasSaidReplacement, true)) {
+      say("the lock file " + _path.string() + " was replaced, since " + flaw);
+    }
+    return true;
+  }
+
+  FileLockOptions _options;
+  std::filesystem::path _path;
+  PathResolver _paths;
+  Place _place;
+  Descriptor _file;
+  bool _hasSaidReplacement = false;
+};
 
 class LinuxFileLock final : public ExclusiveFileLock {
  public:
-  LinuxFileLock(std::string path, Place place, Descriptor file)
-      : _path{std::move(path)}, _place{std::move(place)}, _file{std::move(file)} {}
+  explicit LinuxFileLock(LockFile file) : _file{std::move(file)} {}
 
-  // A file that was removed meanwhile locks nobody out, so the one that now stands there is tried.
+  // A file that was removed or replaced meanwhile locks nobody out, so the one that now stands there is tried.
   Status lock() override {
-    for (int attempt = 0; attempt < attempts; ++attempt) {
-      if (!_file.isOpen() || !waitForLock(_file)) return failure("take the lock", _path);
-      if (isFileAt(_place, _file)) return {};
-      _file = openLockFile(_place);
+    const auto began = steady_clock::now();
+    bool hasSaid = false;
+    for (int replaced = 0; replaced < kAttempts;) {
+      if (!_file.isOpen()) return {};
+      const bool isTaken = tryToTake();
+      if (!isTaken && errno != EWOULDBLOCK && errno != EINTR) return failure("take the lock", _file.path());
+      if (!_file.isAtItsPlace()) {
+        ++replaced;
+        if (!_file.open()) return failure("open the lock file", _file.path());
+        continue;
+      }
+      if (isTaken) return {};
+      const auto waited = steady_clock::now() - began;
+      if (_file.timeLimit() && waited >= *_file.timeLimit()) return timedOut();
+      if (waited >= kLongWait && !std::exchange(hasSaid, true)) _file.say("waiting for " + holder());
+      std::this_thread::sleep_for(pause(waited));
     }
-    return Status::failure(EAGAIN, "take the lock " + _path);
+    return Status::failure(EAGAIN, "take the lock " + _file.path().string());
   }
 
-  void unlock() override { ::flock(_file.number(), LOCK_UN); }
+  void unlock() override {
+    if (_file.isOpen()) ::flock(_file.descriptor().number(), LOCK_UN);
+  }
 
  private:
-  std::string _path;
-  Place _place;
-  Descriptor _file;
+  [[nodiscard]] bool tryToTake() const {
+    return ::flock(_file.descriptor().number(), (_file.isShared() ? LOCK_SH : LOCK_EX) | LOCK_NB) == 0;
+  }
+
+  [[nodiscard]] std::string holder() const {
+    return holderOf(_file.descriptor()) + ", which holds the lock " + _file.path().string();
+  }
+
+  [[nodiscard]] Status timedOut() const { return Status::failure(ETIMEDOUT, "wait any longer for " + holder()); }
+
+  [[nodiscard]] steady_clock::duration pause(steady_clock::duration waited) const {
+    if (!_file.timeLimit()) return kBetweenTries;
+    return std::min<steady_clock::duration>(kBetweenTries, *_file.timeLimit() - waited);
+  }
+
+  LockFile _file;
 };
 
 class LinuxFileLocks final : public ExclusiveFileLocks {
  public:
-  explicit LinuxFileLocks(std::filesystem::path directory) : _directory{std::move(directory)} {}
+  explicit LinuxFileLocks(FileLockOptions options) : _options{std::move(options)} {}
 
   Result<std::unique_ptr<ExclusiveFileLock>> lockNamed(std::string_view name) override {
-    const std::filesystem::path path = _directory / name;
+    LockFile file{_options, name};
     if (!isEntryName(std::string{name}) || name.find('/') != std::string_view::npos) {
-      return Status::failure(EINVAL, "open the lock file " + path.string());
+      return Status::failure(EINVAL, "open the lock file " + file.path().string());
     }
-    Place place = PathResolver{}.openParent(path);
-    Descriptor file = openLockFile(place);
-    if (!file.isOpen()) return failure("open the lock file", path);
-    return std::make_unique<LinuxFileLock>(path.string(), std::move(place), std::move(file));
+    if (!file.open()) return failure("open the lock file", file.path());
+    return std::make_unique<LinuxFileLock>(std::move(file));
   }
 
  private:
-  std::filesystem::path _directory;
+  FileLockOptions _options;
 };
 
 }  // namespace
 
-std::shared_ptr<ExclusiveFileLocks> makeFileLocks(std::filesystem::path directory) {
-  return std::make_shared<LinuxFileLocks>(std::move(directory));
+std::shared_ptr<ExclusiveFileLocks> makeFileLocks(FileLockOptions options) {
+  return std::make_shared<LinuxFileLocks>(std::move(options));
 }
 
 }  // namespace platform

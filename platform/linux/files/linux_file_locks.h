@@ -1,16 +1,40 @@
 #pragma once
 
+#include <chrono>
 #include <filesystem>
+#include <functional>
 #include <memory>
+#include <optional>
+#include <string_view>
 
 #include "platform/exclusive_file_lock.h"
 #include "platform/export.h"
+#include "platform/linux/files/path_resolution.h"
 
 namespace platform {
 
+// How locks are taken.
+struct LockManner {
+  // Held together with all who share it, and only where its file stands; where there is none, nobody holds the lock.
+  // Nothing is made and nothing replaced: for who only looks.
+  bool isShared = false;
+  // Lock() fails with ETIMEDOUT when it is over; 0 waits for nobody. Default: it waits as long as it takes.
+  std::optional<std::chrono::milliseconds> timeLimit = std::nullopt;
+};
+
+struct FileLockOptions {
+  std::filesystem::path directory;  // made where it is missing, mode 1777
+  FileTrees trees = {};             // of the device whose lock it is; its user mobile is one whose files are trusted
+  LockManner manner = {};
+  std::function<void(std::string_view line)> say = [](std::string_view) {};  // for people
+};
+
 // Locks on the files DIRECTORY/NAME. A missing file is made, readable by everybody, since waiting takes no more than
-// reading; it stays when the lock is given back. The directory may be sticky and writable by everybody, and the file
-// anybody's: it is opened, never followed where it is a link, and refused where it is no regular file.
-[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<ExclusiveFileLocks> makeFileLocks(std::filesystem::path directory);
+// reading; it stays when the lock is given back. The directory may be sticky and writable by everybody: no link there
+// is followed, nothing waits for the other side of a pipe, and a lock counts only while its file still stands at the
+// name. Root replaces what somebody else may have put there, and says so: everything but a regular file of root's or
+// mobile's with this one name. Who is not root takes any regular file, and fails with ELOOP, EISDIR or EINVAL on
+// anything else. Who waits says after one second, once, for which process.
+[[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<ExclusiveFileLocks> makeFileLocks(FileLockOptions options);
 
 }  // namespace platform

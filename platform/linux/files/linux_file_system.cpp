@@ -1,17 +1,19 @@
 #include "platform/linux/files/linux_file_system.h"
 
 #include <fcntl.h>
+#include <sys/random.h>
 
+#include <algorithm>
+#include <array>
 #include <cerrno>
 #include <cstdio>
 #include <cstdlib>
+#include <deque>
+#include <mutex>
 #include <random>
 
 #include "platform/linux/files/account_names.h"
-#include "platform/linux/files/directory_creation.h"
-#include "platform/linux/files/file_making.h"
-#include "platform/linux/files/made_things.h"
-#include "platform/linux/files/tree_removal.h"
+#include "platform/linux/files/directory_trees.h"
 
 namespace platform {
 namespace {
@@ -31,25 +33,139 @@ bool isThere(const Place& place, struct stat& status) {
   return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
 }
 
-Descriptor openAnything(const Place& place) {
-  return Descriptor{::openat(place.parent.number(), place.leaf.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC)};
+Descriptor openAt(const Place& place, int flags) {
+  return Descriptor{::openat(place.parent.number(), place.leaf.c_str(), flags | O_NOFOLLOW | O_CLOEXEC)};
 }
 
-// Gives away the very thing that is open, and only a file that has no second name elsewhere.
-bool giveAway(const Descriptor& thing, uid_t user, gid_t group) {
+void unlinkKeepingCause(const Place& place) {
+  const int cause = errno;
+  ::unlinkat(place.parent.number(), place.leaf.c_str(), 0);
+  errno = cause;
+}
+
+// Makes a file, mode 0600 whatever the umask, whose contents the writer writes to its descriptor; bytes and entry are
+// on stable storage, or nothing remains.
+template <typename Writer>
+Descriptor makeSyncedFile(const Place& place, const Writer& write) {
+  Descriptor file;
+  const auto makeAndWrite = [&] {
+    file = makeFile(place);
+    return file.isOpen() && write(file.number()) && sync(file);
+  };
+  if (changeEntries(place.parent, makeAndWrite)) return file;
+  if (file.isOpen()) unlinkKeepingCause(place);
+  return {};
+}
+
+Descriptor makeFileOf(const Place& place, std::span<const std::uint8_t> bytes) {
+  return makeSyncedFile(place, [bytes](int file) { return writeAll(file, bytes.data(), bytes.size()); });
+}
+
+bool copyBytes(int from, int to) {
+  std::array<char, std::size_t{1} << 16> buffer;  // no allocation: one that failed would leave half of a copy
+  while (true) {
+    const ssize_t count = readSome(from, buffer.data(), buffer.size());
+    if (count <= 0) return count == 0;
+    if (!writeAll(to, buffer.data(), static_cast<std::size_t>(count))) return false;
+  }
+}
+
+std::string randomName() {
+  std::array<unsigned char, 8> noise{};
+  if (::getrandom(noise.data(), noise.size(), 0) != static_cast<ssize_t>(noise.size())) return {};
+  std::string name = ".new-";
+  for (const unsigned char byte : noise) {
+    name += "0123456789abcdef"[byte >> 4U];
+    name += "0123456789abcdef"[byte & 15U];
+  }
+  return name;
+}
+
+// Only a failed sync can leave the file moved and yet a failure.
+bool moveFile(const Place& from, const Place& to) {
+  return changeEntries(to.parent, [&] {
+    return ::renameat(from.parent.number(), from.leaf.c_str(), to.parent.number(), to.leaf.c_str()) == 0;
+  });
+}
+
+bool replaceFile(const Place& place, std::span<const std::uint8_t> bytes) {
+  const Place beside{Descriptor{::openat(place.parent.number(), ".", O_PATH | O_DIRECTORY | O_CLOEXEC)}, randomName()};
+  if (!beside.parent.isOpen() || !makeFileOf(beside, bytes).isOpen()) return false;
+  if (moveFile(beside, place)) return true;
+  unlinkKeepingCause(beside);
+  return false;
+}
+
+bool isSame(const Descriptor& one, const Descriptor& other) {
+  struct stat first {};
+  struct stat second {};
+  return ::fstat(one.number(), &first) == 0 && ::fstat(other.number(), &second) == 0 && first.st_dev == second.st_dev &&
+         first.st_ino == second.st_ino;
+}
+
+// The thing opened so that it can be synced; it is the one that was looked at before, or not open.
+Descriptor openAgain(const Place& place, const Descriptor& thing) {
+  Descriptor again = openAt(place, O_RDONLY | O_NONBLOCK | O_NOCTTY);
+  if (!again.isOpen() || isSame(again, thing)) return again;
+  errno = ESTALE;
+  return {};
+}
+
+// Gives away the very thing that is open, and only a file that has no second name elsewhere, and brings its new owner
+// to stable storage. `made` is the thing where this process made it, not open where it did not.
+bool giveAway(const Place& place, const Descriptor& thing, Descriptor made, uid_t user, gid_t group) {
   struct stat status {};
   if (!thing.isOpen() || ::fstat(thing.number(), &status) != 0) return false;
+  if (made.isOpen() && !isSame(thing, made)) return refuse(ESTALE);
   if (S_ISLNK(status.st_mode)) return refuse(ELOOP);
   if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return refuse(EMLINK);
-  return ::fchownat(thing.number(), "", user, group, AT_EMPTY_PATH) == 0;
+  const bool isTheirs = status.st_uid == user && status.st_gid == group;
+  if (isTheirs || (!S_ISDIR(status.st_mode) && !S_ISREG(status.st_mode))) {
+    return ::fchownat(thing.number(), "", user, group, AT_EMPTY_PATH) == 0;
+  }
+  if (!made.isOpen()) made = openAgain(place, thing);
+  return made.isOpen() && ::fchown(made.number(), user, group) == 0 && sync(made);
 }
 
-// As the C library chooses it: a program with more rights than its user has does not follow the environment.
-Path temporaryDirectory() {
-  const char* const chosen = ::secure_getenv("TMPDIR");
-  std::error_code unused;
-  return chosen != nullptr && std::filesystem::is_directory(chosen, unused) ? chosen : P_tmpdir;
-}
+// The files and directories that were made and may still be given away, kept open: somebody who writes in their
+// directory may put something else in their place meanwhile, which would then be given away. Of those that nobody asks
+// for, the newest stay open. For any number of threads.
+class MadeThings {
+ public:
+  // Takes the memory to remember a thing, so that remembering it once it is made cannot fail.
+  void makeRoomFor(const Path& path) {
+    const std::scoped_lock lock{_guard};
+    static_cast<void>(takeOut(path));
+    if (_things.size() >= kMaxKept) _things.pop_front();
+    _things.emplace_back(path, Descriptor{});
+  }
+  void remember(const Path& path, Descriptor thing) {
+    const std::scoped_lock lock{_guard};
+    const auto room = std::ranges::find(_things, path, &Thing::first);
+    if (room != _things.end()) room->second = std::move(thing);
+  }
+  // What was made at the path and not asked for yet; not open where nothing was.
+  [[nodiscard]] Descriptor take(const Path& path) {
+    const std::scoped_lock lock{_guard};
+    return takeOut(path);
+  }
+  void forget(const Path& path) { static_cast<void>(take(path)); }
+
+ private:
+  using Thing = std::pair<Path, Descriptor>;
+  static constexpr std::size_t kMaxKept = 16;
+
+  Descriptor takeOut(const Path& path) {
+    const auto found = std::ranges::find(_things, path, &Thing::first);
+    if (found == _things.end()) return {};
+    Descriptor thing = std::move(found->second);
+    _things.erase(found);
+    return thing;
+  }
+
+  std::mutex _guard;
+  std::deque<Thing> _things;  // the oldest first
+};
 
 std::string randomLetters() {
   constexpr std::string_view kLetters = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789";
@@ -76,8 +192,7 @@ class LinuxFileSystem final : public FileSystem {
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
     Bytes bytes;
-    const Place place = _paths.openParentOfTarget(path);
-    const Descriptor file = place.parent.isOpen() ? openOwnFile(place) : Descriptor{};
+    const Descriptor file = openToRead(path);
     if (!file.isOpen() || !readUpTo(file.number(), sizeLimit, bytes)) return failure("read", path);
     return bytes;
   }
@@ -97,13 +212,11 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status copy(const Path& from, const Path& to) override {
-    Descriptor source;
-    Status opened = at(from, "copy", [&](const Place& place) {
-      source = openOwnFile(place);
-      return source.isOpen();
+    const Descriptor source = openToRead(from);
+    if (!source.isOpen()) return failure("copy", from);
+    return at(to, "copy to", [&](const Place& place) {
+      return makeSyncedFile(place, [&](int file) { return copyBytes(source.number(), file); }).isOpen();
     });
-    if (!opened.isOk()) return opened;
-    return at(to, "copy to", [&](const Place& place) { return makeCopyOf(place, source).isOpen(); });
   }
 
   Status remove(const Path& path) override {
@@ -115,7 +228,9 @@ class LinuxFileSystem final : public FileSystem {
   Status createDirectories(const Path& path, unsigned permissions) override {
     std::optional<Descriptor> directory = makeDirectories(_paths, path, permissions);
     if (!directory) return failure("create the directory", path);
-    if (directory->isOpen()) _made.remember(path, *std::move(directory));
+    if (!directory->isOpen()) return {};
+    _made.makeRoomFor(path);
+    _made.remember(path, *std::move(directory));
     return {};
   }
 
@@ -125,21 +240,18 @@ class LinuxFileSystem final : public FileSystem {
     const Result<gid_t> groupNumber = _accounts.group(std::string{group});
     if (!groupNumber.isOk()) return groupNumber.status();
     return at(path, "set the owner of", [&](const Place& place) {
-      const Descriptor thing = openAnything(place);
-      const Descriptor made = _made.take(path);
-      if (!thing.isOpen()) return false;
-      if (!made.isOpen() || isSame(thing, made)) return giveAway(thing, user.value(), groupNumber.value());
-      return refuse(ESTALE);
+      return giveAway(place, openAt(place, O_PATH), _made.take(path), user.value(), groupNumber.value());
     });
   }
 
   Result<Path> temporaryName() override {
     constexpr int kAttempts = 1000;
-    const Path directory = temporaryDirectory();
+    const Path directory = temporaryDirectory(*this);
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
       Path name = directory / ("file" + randomLetters());
+      const Place place = _paths.openParent(name);
       struct stat status {};
-      if (::lstat(name.c_str(), &status) == 0) continue;
+      if (place.parent.isOpen() && isThere(place, status)) continue;
       return errno == ENOENT ? Result<Path>{std::move(name)} : failure("find a temporary name in", directory);
     }
     return Status::failure(EEXIST, "find a temporary name in " + directory.string());
@@ -155,6 +267,11 @@ class LinuxFileSystem final : public FileSystem {
   }
 
  private:
+  [[nodiscard]] Descriptor openToRead(const Path& path) const {
+    const Place place = _paths.openParentOfTarget(path);
+    return place.parent.isOpen() ? openOwnFile(place) : Descriptor{};
+  }
+
   // Runs the action at the path's place; the action answers false, with errno set, where it fails.
   template <typename Action>
   Status at(const Path& path, const char* verb, const Action& action) {
@@ -169,6 +286,13 @@ class LinuxFileSystem final : public FileSystem {
 
 }  // namespace
 
-std::shared_ptr<FileSystem> makeFileSystem(const FileTrees& trees) { return std::make_shared<LinuxFileSystem>(trees); }
+std::shared_ptr<FileSystem> makeFileSystem(const BaseDirectories& directories) {
+  return std::make_shared<LinuxFileSystem>(treesOf(directories));
+}
+
+Path temporaryDirectory(FileSystem& files) {
+  const char* const chosen = ::secure_getenv("TMPDIR");
+  return chosen != nullptr && files.kindOf(chosen) == FileKind::directory ? chosen : P_tmpdir;
+}
 
 }  // namespace platform

@@ -2,45 +2,51 @@
 
 #include <sys/stat.h>
 
-#include <filesystem>
 #include <map>
-#include <optional>
+#include <string>
+#include <tuple>
 
 #include "platform/property_value.h"
 
 namespace platform {
 
-// What a rehearsal changed, by path: files and directories that were made, and places where nothing stands any more.
-// Everything else is as on the device. Paths are absolute, and canonical but for their last part, which is no link.
+// The names that a rehearsal changed, each in its directory, whichever path leads there. Everything else is as on the
+// device.
 class Overlay {
  public:
+  // What stands at a name now: nothing where the mode is 0.
   struct Node {
-    mode_t mode;  // kind and permission bits; 0 where nothing stands
-    Bytes bytes{};
+    struct stat status {};
+    Bytes bytes{};  // of a file; of a link, where it leads
   };
 
-  // Where the path leads: its parent with links followed, and the last part as it is. Nothing, with errno set, where
-  // its parent is no directory that can be entered.
-  [[nodiscard]] std::optional<std::filesystem::path> placeOf(const std::filesystem::path& path) const;
-  // The same with a link at the place followed.
-  [[nodiscard]] std::filesystem::path followed(const std::filesystem::path& place) const;
+  // Null where the name is as on the device.
+  [[nodiscard]] const Node* find(const struct stat& directory, const std::string& name) const {
+    const auto found = _nodes.find(keyOf(directory, name));
+    return found == _nodes.end() ? nullptr : &found->second;
+  }
 
-  // What the rehearsal made of this very place; null where that is the device's to say.
-  [[nodiscard]] const Node* nodeAt(const std::filesystem::path& place) const;
-  // The kind and the permission bits of what would stand at the place; 0 where nothing would. No link there is
-  // followed.
-  [[nodiscard]] mode_t modeAt(const std::filesystem::path& place) const;
-  // The innermost directory of the device above the place.
-  [[nodiscard]] std::filesystem::path deviceDirectoryAbove(const std::filesystem::path& place) const;
+  void put(const struct stat& directory, const std::string& name, Node node) {
+    node.status.st_dev = kNoDevice;
+    node.status.st_ino = ++_made;
+    node.status.st_nlink = 1;
+    _nodes.insert_or_assign(keyOf(directory, name), std::move(node));
+  }
 
-  void putFile(const std::filesystem::path& place, Bytes bytes);  // mode 0600
-  void putDirectory(const std::filesystem::path& place, mode_t permissions);
-  void remove(const std::filesystem::path& place);  // with all below it
+  // Whether the directory was made here, so that only what was made here stands in it.
+  [[nodiscard]] static bool isMade(const struct stat& directory) { return directory.st_dev == kNoDevice; }
 
  private:
-  [[nodiscard]] bool isEnterable(const std::filesystem::path& directory) const;
+  using Key = std::tuple<dev_t, ino_t, std::string>;
 
-  std::map<std::filesystem::path, Node> _nodes;
+  static constexpr dev_t kNoDevice = 0;
+
+  [[nodiscard]] static Key keyOf(const struct stat& directory, const std::string& name) {
+    return {directory.st_dev, directory.st_ino, name};
+  }
+
+  std::map<Key, Node> _nodes;
+  ino_t _made = 0;  // numbers that tell what was made here apart
 };
 
 }  // namespace platform

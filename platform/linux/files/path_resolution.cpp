@@ -1,22 +1,204 @@
 #include "platform/linux/files/path_resolution.h"
 
 #include <fcntl.h>
+#include <linux/magic.h>
 #include <linux/openat2.h>
 #include <sys/syscall.h>
+#include <sys/vfs.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
+#include <climits>
+
+#include "platform/linux/files/planting.h"
 
 namespace platform {
 namespace {
 
 using std::filesystem::path;
+using Base = PathResolver::Base;
+
+constexpr int kMaxLinks = 40;
+
+bool fail(int cause) {
+  errno = cause;
+  return false;
+}
+
+Descriptor openAsGiven(const path& directory) {
+  return Descriptor{::open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC)};
+}
+
+Descriptor copyOf(const Descriptor& descriptor) { return Descriptor{::fcntl(descriptor.number(), F_DUPFD_CLOEXEC, 0)}; }
+
+bool readStatus(Entry& entry) {
+  return entry.descriptor.isOpen() && ::fstat(entry.descriptor.number(), &entry.status) == 0;
+}
+
+// What the bits of a file promise holds everywhere but in the kernel's own views of its processes.
+bool isOfProcesses(const Descriptor& file) {
+  struct statfs volume {};
+  return ::fstatfs(file.number(), &volume) != 0 || volume.f_type == PROC_SUPER_MAGIC;
+}
+
+// One way down from a base, a name at a time, on opened directories: nothing that is moved or replaced meanwhile
+// changes what was judged. Everything fails with errno set.
+class PathWalk {
+ public:
+  PathWalk(const Base& base, const Overlay* overlay) : _base{base}, _overlay{overlay} {}
+
+  // Goes to what the path, relative to the base, leads to, which is no link; nothing need stand there.
+  bool toTarget(const path& below) {
+    _isUnderRoot = _base.path == _base.root;
+    putAhead(below);
+    if (!startAt(_base.path)) return false;
+    for (bool isAtEnd = _ahead.empty(); !isAtEnd;) {
+      if (!step(isAtEnd)) return false;
+    }
+    return givesPlanterNothing() || fail(ELOOP);
+  }
+
+  bool toDirectory(const path& below) {
+    if (!toTarget(below)) return false;
+    if (_leaf == ".") return true;
+    if (!_target.isThere()) return fail(ENOENT);
+    return enter(std::exchange(_target, {}));
+  }
+
+  // Goes to the path's parent and looks at what stands at its last name.
+  bool toEntry(const path& below) {
+    if (!toDirectory(below.parent_path())) return false;
+    _leaf = below.empty() ? "." : below.filename().string();
+    if (isEntryName(_leaf)) return look(_leaf, _target);
+    return true;
+  }
+
+  Descriptor takeDirectory() { return std::move(_directories.back().descriptor); }
+  const std::string& leaf() const { return _leaf; }
+
+  std::optional<Spot> takeSpot() {
+    if (!isEntryName(_leaf)) {
+      const Entry& directory = _directories.back();
+      _target = {copyOf(directory.descriptor), directory.status, directory.node};
+    }
+    return Spot{std::move(_directories.back()), _leaf, std::move(_target)};
+  }
+
+ private:
+  bool step(bool& isAtEnd) {
+    const std::string name = std::move(_ahead.back());
+    _ahead.pop_back();
+    isAtEnd = _ahead.empty();
+    _leaf.assign(1, '.');
+    if (name == ".") return true;
+    if (name == "..") return goUp();
+    Entry entry;
+    if (!look(name, entry)) return false;
+    if (!entry.isThere() && !isAtEnd) return fail(ENOENT);
+    if (S_ISLNK(entry.status.st_mode)) {
+      if (!follow(entry)) return false;
+      isAtEnd = _ahead.empty();
+      return true;
+    }
+    if (!isAtEnd) return enter(std::move(entry));
+    _leaf = name;
+    _target = std::move(entry);
+    return true;
+  }
+
+  bool look(const std::string& name, Entry& entry) const {
+    const Entry& directory = _directories.back();
+    const Overlay::Node* const node = _overlay == nullptr ? nullptr : _overlay->find(directory.status, name);
+    if (node != nullptr) {
+      entry = {copyOf(directory.descriptor), node->status, node};
+      return entry.descriptor.isOpen();
+    }
+    entry = {};
+    if (Overlay::isMade(directory.status)) return true;
+    entry.descriptor =
+        Descriptor{::openat(directory.descriptor.number(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC)};
+    return readStatus(entry) || errno == ENOENT;
+  }
+
+  bool enter(Entry entry) {
+    if (!S_ISDIR(entry.status.st_mode)) return fail(ENOTDIR);
+    const bool isOpenToAll = (entry.status.st_mode & S_IXOTH) != 0;
+    if (_planter && entry.status.st_uid != *_planter && !isOpenToAll) return fail(ELOOP);
+    _directories.push_back(std::move(entry));
+    return true;
+  }
+
+  bool goUp() {
+    if (_directories.size() == 1) return _isUnderRoot || fail(EXDEV);
+    _directories.pop_back();
+    return true;
+  }
+
+  bool follow(const Entry& link) {
+    if (++_links > kMaxLinks || !mayFollow(link.status)) return fail(ELOOP);
+    path target;
+    if (!readLink(link, target)) return false;
+    putAhead(target.relative_path());
+    if (!target.is_absolute()) return true;
+    _isUnderRoot = true;
+    return startAt(_base.root);
+  }
+
+  static bool readLink(const Entry& link, path& target) {
+    if (link.node != nullptr) {
+      target = std::string{link.node->bytes.begin(), link.node->bytes.end()};
+      return true;
+    }
+    std::array<char, PATH_MAX> text{};
+    const ssize_t size = ::readlinkat(link.descriptor.number(), "", text.data(), text.size());
+    if (size <= 0) return size < 0 ? false : fail(ENOENT);
+    target = std::string{text.data(), static_cast<std::size_t>(size)};
+    return true;
+  }
+
+  bool startAt(const path& directory) {
+    _directories.clear();
+    _directories.push_back({.descriptor = openAsGiven(directory)});
+    return readStatus(_directories.back());
+  }
+
+  void putAhead(const path& names) {
+    const std::vector<path> all{names.begin(), names.end()};
+    for (auto name = all.rbegin(); name != all.rend(); ++name) _ahead.push_back(name->empty() ? "." : name->string());
+  }
+
+  bool mayFollow(const struct stat& link) {
+    const Planters planters = plantersOf(link, _directories.back().status);
+    if (planters.mayBeAnybody || (_planter && planters.user && *_planter != *planters.user)) return false;
+    if (planters.user) _planter = planters.user;
+    return true;
+  }
+
+  // What is not there yet would be made in the directory, which then is what must be the planter's.
+  [[nodiscard]] bool givesPlanterNothing() const {
+    if (!_planter) return true;
+    const Entry& end = _leaf != "." && _target.isThere() ? _target : _directories.back();
+    if (end.status.st_uid == *_planter) return true;
+    return S_ISREG(end.status.st_mode) && isReadableFor(*_planter, end.status) && !isOfProcesses(end.descriptor);
+  }
+
+  const Base& _base;
+  const Overlay* _overlay;
+  std::vector<Entry> _directories;  // from the beginning down
+  std::vector<std::string> _ahead;  // the names still to come, the next one last
+  bool _isUnderRoot = false;        // ".." of the first directory is itself
+  std::string _leaf = ".";          // the end of the walk in the last directory, "." for that itself
+  Entry _target;                    // what stands there
+  std::optional<uid_t> _planter;    // the one user who can have planted a link that was followed
+  int _links = 0;
+};
 
 bool isBelow(const path& inner, const path& outer) {
   return std::mismatch(outer.begin(), outer.end(), inner.begin(), inner.end()).first == outer.end();
 }
 
-path relativeTo(const WalkBase& base, const path& whole) {
+path relativeTo(const Base& base, const path& whole) {
   path below;
   auto name = std::next(whole.begin(), std::distance(base.path.begin(), base.path.end()));
   for (; name != whole.end(); ++name) below /= *name;
@@ -26,10 +208,6 @@ path relativeTo(const WalkBase& base, const path& whole) {
 path wholePath(const path& given) {
   const path whole = given.is_absolute() ? given : std::filesystem::current_path() / given;
   return whole.has_filename() ? whole : whole.parent_path();
-}
-
-Descriptor openAsGiven(const path& directory) {
-  return Descriptor{::open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC)};
 }
 
 // In one call of the kernel where no link stands in the way; errno tells whether that could be known.
@@ -46,12 +224,13 @@ bool needsWalk(int cause) {
   return std::ranges::find(causes, cause) != std::end(causes);
 }
 
-Descriptor openBelow(const WalkBase& base, const path& below) {
+Descriptor openBelow(const Base& base, const path& below) {
   const Descriptor start = openAsGiven(base.path);
   if (!start.isOpen()) return {};
   Descriptor directory = openWithoutLinks(start, below.empty() ? "." : below);
   if (directory.isOpen() || !needsWalk(errno)) return directory;
-  return PathWalk{base}.openDirectory(below);
+  PathWalk walk{base, nullptr};
+  return walk.toDirectory(below) ? walk.takeDirectory() : Descriptor{};
 }
 
 bool isLink(const Place& place) {
@@ -63,7 +242,7 @@ bool isLink(const Place& place) {
 
 }  // namespace
 
-PathResolver::PathResolver(const FileTrees& trees) {
+PathResolver::PathResolver(const FileTrees& trees, const Overlay* overlay) : _overlay{overlay} {
   const path& root = trees.systemRoot;
   _bases.push_back({root, root});
   for (const path& directory : trees.ofDevice) {
@@ -71,14 +250,14 @@ PathResolver::PathResolver(const FileTrees& trees) {
   }
   for (const path& directory : trees.ofMachine) _bases.push_back({directory, "/"});
   _bases.push_back({"/", "/"});
-  const auto isLonger = [](const WalkBase& one, const WalkBase& other) {
+  const auto isLonger = [](const Base& one, const Base& other) {
     return one.path.native().size() > other.path.native().size();
   };
   std::ranges::stable_sort(_bases, isLonger);
 }
 
-const WalkBase& PathResolver::baseOf(const path& path) const {
-  return *std::ranges::find_if(_bases, [&](const WalkBase& base) { return isBelow(path, base.path); });
+const Base& PathResolver::baseOf(const path& path) const {
+  return *std::ranges::find_if(_bases, [&](const Base& base) { return isBelow(path, base.path); });
 }
 
 Place PathResolver::openParent(const path& path) const {
@@ -87,7 +266,7 @@ Place PathResolver::openParent(const path& path) const {
     return {};
   }
   const std::filesystem::path whole = wholePath(path);
-  const WalkBase& base = baseOf(whole);
+  const Base& base = baseOf(whole);
   const std::filesystem::path below = relativeTo(base, whole);
   return {openBelow(base, below.parent_path()), below.empty() ? "." : below.filename().string()};
 }
@@ -96,8 +275,27 @@ Place PathResolver::openParentOfTarget(const path& path) const {
   Place place = openParent(path);
   if (!isLink(place)) return place;
   const std::filesystem::path whole = wholePath(path);
-  const WalkBase& base = baseOf(whole);
-  return PathWalk{base}.openParentOfTarget(relativeTo(base, whole));
+  PathWalk walk{baseOf(whole), nullptr};
+  if (!walk.toTarget(relativeTo(baseOf(whole), whole))) return {};
+  return {walk.takeDirectory(), walk.leaf()};
+}
+
+std::optional<Spot> PathResolver::find(const path& path) const {
+  if (path.empty()) {
+    errno = ENOENT;
+    return std::nullopt;
+  }
+  const std::filesystem::path whole = wholePath(path);
+  PathWalk walk{baseOf(whole), _overlay};
+  return walk.toEntry(relativeTo(baseOf(whole), whole)) ? walk.takeSpot() : std::nullopt;
+}
+
+std::optional<Spot> PathResolver::findTarget(const path& path) const {
+  std::optional<Spot> spot = find(path);
+  if (!spot || !S_ISLNK(spot->entry.status.st_mode)) return spot;
+  const std::filesystem::path whole = wholePath(path);
+  PathWalk walk{baseOf(whole), _overlay};
+  return walk.toTarget(relativeTo(baseOf(whole), whole)) ? walk.takeSpot() : std::nullopt;
 }
 
 }  // namespace platform

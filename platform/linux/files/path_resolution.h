@@ -1,42 +1,79 @@
 #pragma once
 
 #include <filesystem>
+#include <optional>
 #include <vector>
 
+#include "platform/base_directories.h"
 #include "platform/linux/files/file_access.h"
-#include "platform/linux/files/file_trees.h"
-#include "platform/linux/files/path_walk.h"
+#include "platform/linux/files/overlay.h"
 
 namespace platform {
 
-// Finds the directories that a path names: the one place where it is decided which links on the way are followed.
-//
-// A run may be root in directories in which others write, and whoever plants a link there must not lead it to what is
-// not theirs. A symbolic link is followed where
-// - its owner is root or the process's user, it lies in a directory of one of these, and nobody else can write there (a
-//   sticky directory counts as one in which nobody else does); or
-// - its owner also owns the directory, nobody else can write there, and it leads to what the same owner owns, through
-//   directories that are that owner's or open to everybody.
-// Every other link is refused (ELOOP), and where it leads is not looked at.
+// Where a device's files lie. Paths outside of them are taken from the file system's root on.
+struct FileTrees {
+  std::filesystem::path systemRoot = "/";
+  std::vector<std::filesystem::path> ofDevice = {};   // directories of the device that may lie outside of its root
+  std::vector<std::filesystem::path> ofMachine = {};  // directories of the system that the program runs on
+};
+
+[[nodiscard]] inline FileTrees treesOf(const BaseDirectories& directories) {
+  return {.systemRoot = directories.systemRoot(),
+          .ofDevice = {directories.home(), directories.sharedResources()},
+          .ofMachine = {directories.resources()}};
+}
+
+// What stands at a name: nothing where its mode is 0.
+struct Entry {
+  Descriptor
+      descriptor{};  // good for the *at calls; of what only a rehearsal has, the innermost device directory above
+  struct stat status {};
+  const Overlay::Node* node = nullptr;  // set where a rehearsal says what stands there
+
+  [[nodiscard]] bool isThere() const { return status.st_mode != 0; }
+};
+
+// Where a path leads: a directory, a name in it ("." for the directory itself), and what stands there.
+struct Spot {
+  Entry directory;
+  std::string leaf;
+  Entry entry;
+};
+
+// Finds the directories that a path names: the one place where links on the way are followed, by the rule of
+// planting.h. What that refuses is ELOOP, and where it leads is not looked at.
 //
 // A path begins at a base: the device's root, a directory that the caller named outside of it, or else the file
-// system's root. Below the device's root an absolute link and ".." mean what they mean on the device, and never leave
-// it. Another base is never left by ".." (EXDEV); absolute links in a directory of the device begin at the device's
-// root.
+// system's root; how the base itself is reached is the caller's own word. Below the device's root an absolute link and
+// ".." mean what they mean on the device, and never leave it. Another base is never left by ".." (EXDEV); absolute
+// links in a directory of the device begin at the device's root.
+//
+// A rehearsal's overlay stands in front of the device at every step of the way.
 class PathResolver {
  public:
-  explicit PathResolver(const FileTrees& trees = {});
+  explicit PathResolver(const FileTrees& trees = {}, const Overlay* overlay = nullptr);
 
-  // The path's place, its parent directory opened; what stands at the path itself is not looked at.
+  // The path's place on the device, its parent directory opened; what stands at the path itself is not looked at.
   [[nodiscard]] Place openParent(const std::filesystem::path& path) const;
 
   // The same for what the path leads to where a link stands at it.
   [[nodiscard]] Place openParentOfTarget(const std::filesystem::path& path) const;
 
- private:
-  [[nodiscard]] const WalkBase& baseOf(const std::filesystem::path& path) const;
+  // Where the path leads, with a link at its end taken as itself, or followed; nothing, with errno set, where its
+  // parent cannot be entered. Where nothing stands, the entry is not there, and that is no failure.
+  [[nodiscard]] std::optional<Spot> find(const std::filesystem::path& path) const;
+  [[nodiscard]] std::optional<Spot> findTarget(const std::filesystem::path& path) const;
 
-  std::vector<WalkBase> _bases;
+  struct Base {
+    std::filesystem::path path;
+    std::filesystem::path root;  // where absolute links begin
+  };
+
+ private:
+  [[nodiscard]] const Base& baseOf(const std::filesystem::path& path) const;
+
+  std::vector<Base> _bases;
+  const Overlay* _overlay;
 };
 
 }  // namespace platform

@@ -7,15 +7,15 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <array>
 #include <cerrno>
+#include <climits>
 #include <cstdint>
-#include <cstdlib>
 #include <utility>
 
 #include "platform/linux/files/account_names.h"
-#include "platform/linux/files/descriptor.h"
-#include "platform/linux/files/file_access.h"
-#include "platform/linux/files/overlay.h"
+#include "platform/linux/files/linux_file_system.h"
+#include "platform/linux/files/path_resolution.h"
 
 namespace platform {
 namespace {
@@ -30,26 +30,68 @@ Status failure(const char* verb, const Path& path) {
   return Status::failure(cause, std::string{verb} + " " + path.string());
 }
 
-bool mayChangeEntriesOf(const Path& directory) {
-  return ::faccessat(AT_FDCWD, directory.c_str(), R_OK | W_OK | X_OK, AT_EACCESS) == 0;
+bool isDirectory(const Entry& entry) { return S_ISDIR(entry.status.st_mode); }
+
+bool isThere(const Entry& entry) { return entry.isThere() || refuse(ENOENT); }
+
+bool isFree(const Entry& entry) { return !entry.isThere() || refuse(EEXIST); }
+
+bool isFile(const Entry& entry) {
+  if (S_ISREG(entry.status.st_mode)) return true;
+  if (!entry.isThere()) return refuse(ENOENT);
+  if (isDirectory(entry)) return refuse(EISDIR);
+  return refuse(S_ISLNK(entry.status.st_mode) ? ELOOP : EINVAL);
 }
+
+bool mayBeCovered(const Entry& entry) { return !isDirectory(entry) || refuse(EISDIR); }
 
 // In a sticky directory, only the owner of an entry or of the directory takes the entry away.
-bool mayTakeFrom(const Path& directory, const Path& place) {
-  struct stat above {};
-  struct stat entry {};
-  const bool isSticky = ::stat(directory.c_str(), &above) == 0 && (above.st_mode & S_ISVTX) != 0;
-  if (!isSticky || ::geteuid() == 0 || ::lstat(place.c_str(), &entry) != 0) return true;
-  return entry.st_uid == ::geteuid() || above.st_uid == ::geteuid() || refuse(EPERM);
+bool mayBeTaken(const Entry& entry, const struct stat& directory) {
+  const uid_t user = ::geteuid();
+  const bool isSticky = (directory.st_mode & S_ISVTX) != 0;
+  if (!isSticky || user == 0 || !entry.isThere()) return true;
+  return entry.status.st_uid == user || directory.st_uid == user || refuse(EPERM);
 }
 
-bool isThereRoomFor(std::size_t size, const Path& directory) {
+bool mayBeChanged(const Spot& spot) {
+  if (Overlay::isMade(spot.directory.status)) return true;
+  return ::faccessat(spot.directory.descriptor.number(), ".", R_OK | W_OK | X_OK, AT_EACCESS) == 0 &&
+         mayBeTaken(spot.entry, spot.directory.status);
+}
+
+bool isThereRoomFor(std::size_t size, const Descriptor& directory) {
   rlimit limit{};
   if (::getrlimit(RLIMIT_FSIZE, &limit) == 0 && size > limit.rlim_cur) return refuse(EFBIG);
   struct statvfs volume {};
-  if (::statvfs(directory.c_str(), &volume) != 0 || volume.f_blocks == 0) return true;
+  if (::fstatvfs(directory.number(), &volume) != 0 || volume.f_blocks == 0) return true;
   const std::uintmax_t blocks = ::geteuid() == 0 ? volume.f_bfree : volume.f_bavail;
   return size <= blocks * volume.f_frsize || refuse(ENOSPC);
+}
+
+bool mayBePut(const Spot& spot, std::size_t size) {
+  return mayBeChanged(spot) && isThereRoomFor(size, spot.directory.descriptor);
+}
+
+bool isOnOneVolume(const Spot& left, const Spot& right) {
+  struct stat first {};
+  struct stat second {};
+  if (::fstat(left.directory.descriptor.number(), &first) != 0) return false;
+  if (::fstat(right.directory.descriptor.number(), &second) != 0) return false;
+  return first.st_dev == second.st_dev || refuse(EXDEV);
+}
+
+bool mayBeMoved(const Spot& source, const Spot& target) {
+  if (!isThere(source.entry) || !isOnOneVolume(source, target)) return false;
+  if (isDirectory(source.entry)) return refuse(ENOTSUP);
+  return mayBeCovered(target.entry) && mayBeChanged(source) && mayBeChanged(target);
+}
+
+// What the rehearsal made has one name and belongs to this process.
+bool isNobodyElses(const Entry& entry) {
+  if (S_ISLNK(entry.status.st_mode)) return refuse(ELOOP);
+  if (entry.node != nullptr) return true;
+  if (!isDirectory(entry) && entry.status.st_nlink > 1) return refuse(EMLINK);
+  return ::geteuid() == 0 || entry.status.st_uid == ::geteuid() || refuse(EPERM);
 }
 
 // Asks the kernel whether a file of this process could be given away, with a file that lies nowhere.
@@ -58,69 +100,93 @@ bool mayGiveAway(uid_t user, gid_t group) {
   return file.isOpen() && ::fchown(file.number(), user, group) == 0;
 }
 
-bool isOnOneVolume(const Path& left, const Path& right) {
-  struct stat first {};
-  struct stat second {};
-  if (::stat(left.c_str(), &first) != 0 || ::stat(right.c_str(), &second) != 0) return false;
-  return first.st_dev == second.st_dev || refuse(EXDEV);
+Place placeOf(const Spot& spot) {
+  return {Descriptor{::fcntl(spot.directory.descriptor.number(), F_DUPFD_CLOEXEC, 0)}, spot.leaf};
+}
+
+bool readDeviceFile(const Descriptor& file, std::size_t sizeLimit, Bytes& bytes) {
+  return file.isOpen() && readUpTo(file.number(), sizeLimit, bytes);
+}
+
+bool readContents(const Spot& spot, std::size_t sizeLimit, Bytes& bytes) {
+  if (!isFile(spot.entry)) return false;
+  if (spot.entry.node == nullptr) return readDeviceFile(openOwnFile(placeOf(spot)), sizeLimit, bytes);
+  if (spot.entry.node->bytes.size() > sizeLimit) return refuse(EFBIG);
+  bytes = spot.entry.node->bytes;
+  return true;
+}
+
+// What a move takes along, whoever's it is: the bytes of a file, or where a link leads.
+bool takeContents(const Spot& spot, Bytes& bytes) {
+  if (spot.entry.node != nullptr) {
+    bytes = spot.entry.node->bytes;
+    return true;
+  }
+  if (!S_ISLNK(spot.entry.status.st_mode)) return readDeviceFile(openRegularFile(placeOf(spot)), SIZE_MAX, bytes);
+  std::array<char, PATH_MAX> text{};
+  const ssize_t size = ::readlinkat(spot.entry.descriptor.number(), "", text.data(), text.size());
+  if (size < 0) return false;
+  bytes.assign(text.begin(), text.begin() + size);
+  return true;
+}
+
+Overlay::Node nodeOf(mode_t mode, Bytes bytes = {}) {
+  Overlay::Node node{.bytes = std::move(bytes)};
+  node.status.st_mode = mode;
+  node.status.st_uid = ::geteuid();
+  node.status.st_gid = ::getegid();
+  return node;
 }
 
 class RehearsalFileSystem final : public RehearsedFiles {
  public:
-  RehearsalFileSystem(std::shared_ptr<FileSystem> inner, Path systemRoot)
-      : _inner{std::move(inner)}, _accounts{std::move(systemRoot)} {}
+  explicit RehearsalFileSystem(const BaseDirectories& directories)
+      : _accounts{directories.systemRoot()}, _paths{treesOf(directories), &_overlay} {}
 
   Result<FileKind> kindOf(const Path& path) override {
-    const auto place = _overlay.placeOf(path);
-    if (!place) return failure("look at", path);
-    const Path target = _overlay.followed(*place);
-    const Overlay::Node* const node = _overlay.nodeAt(target);
-    if (node == nullptr) return _inner->kindOf(target);
-    if (node->mode == 0) return Status::failure(ENOENT, "look at " + path.string());
-    return S_ISDIR(node->mode) ? FileKind::directory : FileKind::file;
+    std::optional<Spot> spot = _paths.findTarget(path);
+    if (!spot && errno == ELOOP) spot = _paths.find(path);
+    if (!spot || !isThere(spot->entry)) return failure("look at", path);
+    if (S_ISREG(spot->entry.status.st_mode)) return FileKind::file;
+    return isDirectory(spot->entry) ? FileKind::directory : FileKind::other;
   }
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
-    const auto place = _overlay.placeOf(path);
-    if (!place) return failure("read", path);
-    const Path target = _overlay.followed(*place);
-    const Overlay::Node* const node = _overlay.nodeAt(target);
-    if (node == nullptr) return _inner->read(path, sizeLimit);
-    if (!isFile(target)) return failure("read", path);
-    if (node->bytes.size() <= sizeLimit) return node->bytes;
-    return Status::failure(EFBIG, "read " + path.string());
+    Bytes bytes;
+    const std::optional<Spot> spot = _paths.findTarget(path);
+    if (!spot || !readContents(*spot, sizeLimit, bytes)) return failure("read", path);
+    return bytes;
   }
 
   Status create(const Path& path, std::span<const std::uint8_t> bytes) override {
-    const auto place = _overlay.placeOf(path);
-    if (!place || !isFree(*place) || !mayPut(*place, bytes.size())) return failure("create", path);
-    _overlay.putFile(*place, {bytes.begin(), bytes.end()});
+    const std::optional<Spot> spot = _paths.find(path);
+    if (!spot || !isFree(spot->entry) || !mayBePut(*spot, bytes.size())) return failure("create", path);
+    putFile(*spot, {bytes.begin(), bytes.end()});
     return {};
   }
 
   Status replace(const Path& path, std::span<const std::uint8_t> bytes) override {
-    const auto place = _overlay.placeOf(path);
-    if (!place || !mayPut(*place, bytes.size()) || !mayBeCovered(*place)) return failure("replace", path);
-    _overlay.putFile(*place, {bytes.begin(), bytes.end()});
+    const std::optional<Spot> spot = _paths.find(path);
+    if (!spot || !mayBePut(*spot, bytes.size()) || !mayBeCovered(spot->entry)) return failure("replace", path);
+    putFile(*spot, {bytes.begin(), bytes.end()});
     return {};
   }
 
   Status copy(const Path& from, const Path& to) override {
-    const auto source = _overlay.placeOf(from);
-    if (!source || !isFile(*source)) return failure("copy", from);
-    Result<Bytes> bytes = read(*source, SIZE_MAX);
-    if (!bytes.isOk()) return Status::failure(bytes.status().errorNumber(), "copy " + from.string());
-    const auto place = _overlay.placeOf(to);
-    if (!place || !isFree(*place) || !mayPut(*place, bytes.value().size())) return failure("copy to", to);
-    _overlay.putFile(*place, bytes.take());
+    Bytes bytes;
+    const std::optional<Spot> source = _paths.findTarget(from);
+    if (!source || !readContents(*source, SIZE_MAX, bytes)) return failure("copy", from);
+    const std::optional<Spot> target = _paths.find(to);
+    if (!target || !isFree(target->entry) || !mayBePut(*target, bytes.size())) return failure("copy to", to);
+    putFile(*target, std::move(bytes));
     return {};
   }
 
   Status remove(const Path& path) override {
-    const auto place = _overlay.placeOf(path);
-    if (!place || !isThere(*place) || !mayChangeAt(*place)) return failure("remove", path);
-    if (!isEntryName(path.filename().string())) return Status::failure(EINVAL, "remove " + path.string());
-    _overlay.remove(*place);
+    const std::optional<Spot> spot = _paths.find(path);
+    if (!spot || !isThere(spot->entry) || !mayBeChanged(*spot)) return failure("remove", path);
+    if (!isEntryName(spot->leaf)) return Status::failure(EINVAL, "remove " + path.string());
+    _overlay.put(spot->directory.status, spot->leaf, {});
     return {};
   }
 
@@ -135,15 +201,14 @@ class RehearsalFileSystem final : public RehearsedFiles {
     if (!user.isOk()) return user.status();
     const Result<gid_t> groupNumber = _accounts.group(std::string{group});
     if (!groupNumber.isOk()) return groupNumber.status();
-    const auto place = _overlay.placeOf(path);
-    if (place && isThere(*place) && isNobodyElses(*place) && mayGiveAway(user.value(), groupNumber.value())) return {};
-    return failure("set the owner of", path);
+    const std::optional<Spot> spot = _paths.find(path);
+    const bool isGiven =
+        spot && isThere(spot->entry) && isNobodyElses(spot->entry) && mayGiveAway(user.value(), groupNumber.value());
+    return isGiven ? Status{} : failure("set the owner of", path);
   }
 
   Result<Path> temporaryName() override {
-    const char* const chosen = ::secure_getenv("TMPDIR");
-    const bool isUsable = chosen != nullptr && kindOf(chosen) == FileKind::directory;
-    const Path directory = isUsable ? chosen : P_tmpdir;
+    const Path directory = temporaryDirectory(*this);
     for (unsigned attempt = 0; attempt < 1'000'000; ++attempt) {
       const std::string number = std::to_string(++_temporaryNames);
       Path name = directory / ("file" + std::string(6 - std::min<std::size_t>(number.size(), 6), '0') + number);
@@ -153,19 +218,19 @@ class RehearsalFileSystem final : public RehearsedFiles {
   }
 
   [[nodiscard]] std::optional<unsigned> permissionsAt(const Path& path) override {
-    const auto place = _overlay.placeOf(path);
-    const mode_t mode = place ? _overlay.modeAt(*place) : 0;
-    return mode == 0 ? std::nullopt : std::optional{mode & 07777U};
+    const std::optional<Spot> spot = _paths.find(path);
+    if (!spot || !spot->entry.isThere()) return std::nullopt;
+    return spot->entry.status.st_mode & 07777U;
   }
 
   Status rename(const Path& from, const Path& to) override {
-    const auto source = _overlay.placeOf(from);
-    const auto target = source ? _overlay.placeOf(to) : std::nullopt;
-    if (target && mayMove(*source, *target)) {
-      Result<Bytes> bytes = read(*source, SIZE_MAX);
-      if (!bytes.isOk()) return bytes.status();
-      _overlay.remove(*source);
-      _overlay.putFile(*target, bytes.take());
+    const std::optional<Spot> source = _paths.find(from);
+    const std::optional<Spot> target = source ? _paths.find(to) : std::nullopt;
+    Bytes bytes;
+    if (target && mayBeMoved(*source, *target) && takeContents(*source, bytes)) {
+      Overlay::Node moved = nodeOf(source->entry.status.st_mode, std::move(bytes));
+      _overlay.put(source->directory.status, source->leaf, {});
+      _overlay.put(target->directory.status, target->leaf, std::move(moved));
       return {};
     }
     const int cause = errno;
@@ -173,65 +238,33 @@ class RehearsalFileSystem final : public RehearsedFiles {
   }
 
  private:
-  // Each answers false with errno set.
-  [[nodiscard]] bool isThere(const Path& place) const { return _overlay.modeAt(place) != 0 || refuse(ENOENT); }
-  [[nodiscard]] bool isFree(const Path& place) const { return _overlay.modeAt(place) == 0 || refuse(EEXIST); }
-  [[nodiscard]] bool isFile(const Path& place) const {
-    const mode_t mode = _overlay.modeAt(place);
-    if (S_ISREG(mode)) return true;
-    if (mode == 0) return refuse(ENOENT);
-    if (S_ISDIR(mode)) return refuse(EISDIR);
-    return refuse(S_ISLNK(mode) ? ELOOP : EINVAL);
+  void putFile(const Spot& spot, Bytes bytes) {
+    _overlay.put(spot.directory.status, spot.leaf, nodeOf(S_IFREG | S_IRUSR | S_IWUSR, std::move(bytes)));
   }
-  [[nodiscard]] bool mayBeCovered(const Path& place) const {
-    return !S_ISDIR(_overlay.modeAt(place)) || refuse(EISDIR);
-  }
-  [[nodiscard]] bool mayChangeAt(const Path& place) const {
-    if (_overlay.nodeAt(place.parent_path()) != nullptr) return true;
-    return mayChangeEntriesOf(place.parent_path()) && mayTakeFrom(place.parent_path(), place);
-  }
-  [[nodiscard]] bool mayPut(const Path& place, std::size_t size) const {
-    return mayChangeAt(place) && isThereRoomFor(size, _overlay.deviceDirectoryAbove(place));
-  }
-  [[nodiscard]] bool mayMove(const Path& source, const Path& target) const {
-    if (!isThere(source) ||
-        !isOnOneVolume(_overlay.deviceDirectoryAbove(source), _overlay.deviceDirectoryAbove(target)))
-      return false;
-    if (S_ISDIR(_overlay.modeAt(source))) return refuse(ENOTSUP);
-    return mayBeCovered(target) && mayChangeAt(source) && mayChangeAt(target);
-  }
-  // What the rehearsal made has one name and belongs to this process.
-  [[nodiscard]] bool isNobodyElses(const Path& place) const {
-    struct stat status {};
-    if (_overlay.nodeAt(place) != nullptr) return true;
-    if (::lstat(place.c_str(), &status) != 0) return false;
-    if (S_ISLNK(status.st_mode)) return refuse(ELOOP);
-    if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return refuse(EMLINK);
-    return ::geteuid() == 0 || status.st_uid == ::geteuid() || refuse(EPERM);
-  }
+
   [[nodiscard]] bool makeDirectories(const Path& path, mode_t permissions) {
-    if (!_overlay.placeOf(path)) {
+    std::optional<Spot> spot = _paths.find(path);
+    if (!spot) {
       if (errno != ENOENT || !path.has_relative_path() || !makeDirectories(path.parent_path(), 0755)) return false;
+      spot = _paths.find(path);
     }
-    const auto place = _overlay.placeOf(path);
-    if (!place) return false;
-    const mode_t mode = _overlay.modeAt(*place);
-    if (mode != 0) return S_ISDIR(mode) || refuse(ENOTDIR);
-    if (!mayChangeAt(*place)) return false;
-    _overlay.putDirectory(*place, permissions);
+    if (!spot) return false;
+    if (spot->entry.isThere()) return isDirectory(spot->entry) || refuse(ENOTDIR);
+    if (!mayBeChanged(*spot)) return false;
+    _overlay.put(spot->directory.status, spot->leaf, nodeOf(S_IFDIR | permissions));
     return true;
   }
 
-  std::shared_ptr<FileSystem> _inner;
   AccountNames _accounts;
   Overlay _overlay;
+  PathResolver _paths;
   unsigned _temporaryNames = 0;
 };
 
 }  // namespace
 
-std::shared_ptr<RehearsedFiles> makeRehearsalFileSystem(std::shared_ptr<FileSystem> inner, Path systemRoot) {
-  return std::make_shared<RehearsalFileSystem>(std::move(inner), std::move(systemRoot));
+std::shared_ptr<RehearsedFiles> makeRehearsalFileSystem(const BaseDirectories& directories) {
+  return std::make_shared<RehearsalFileSystem>(directories);
 }
 
 }  // namespace platform

@@ -14,4 +14,9 @@ namespace platform {
 [[nodiscard]] std::optional<Descriptor> makeDirectories(const PathResolver& paths, const std::filesystem::path& path,
                                                         unsigned permissions);
 
+// Removes what stands at the place: a directory with all below it, anything else as itself, links unfollowed. Takes two
+// descriptors and no stack, however deep the tree is. A directory that somebody moves away meanwhile is left (EAGAIN),
+// and so is another volume that is mounted in it (EXDEV). Answers false, with errno set, where something remains.
+[[nodiscard]] bool removeTree(const Place& place);
+
 }  // namespace platform
