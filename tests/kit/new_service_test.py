@@ -34,7 +34,7 @@ class LinuxDeviceColourQuery final : public DeviceColourQuery {
   explicit LinuxDeviceColourQuery(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
 
   [[nodiscard]] std::optional<Text> colour() const override {
-    const Dictionary info = _configuration.ofSystem("device-info.plist").value_or(Dictionary{});
+    const Dictionary info = _configuration.ofSystem("device-info.plist").valueOr({});
     const Text* const colour = info.text("Colour");
     return colour == nullptr ? std::nullopt : std::optional{*colour};
   }
