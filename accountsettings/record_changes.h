@@ -24,7 +24,7 @@ struct Difference {
   bool isReplacement = false;  // another object in the place of the one with its identifier; perhaps nothing else
 };
 
-[[nodiscard]] records::Name nameOf(const Dictionary& properties, std::string_view parent = {});
+[[nodiscard]] ACCOUNT_EXPORT records::Name nameOf(const Dictionary& properties, std::string_view parent = {});
 
 // The keys that differ, in the order of `after`, then those that went. Children that can be told apart are records of
 // their own, so "ChildAccounts" is a key like others only where it holds something else.
