@@ -150,7 +150,7 @@ class ACCOUNT_EXPORT BasicAccount : public std::enable_shared_from_this<BasicAcc
 
  private:
   // Answers whether the record may be used.
-  [[nodiscard]] ACCOUNT_HIDDEN bool acceptProperties(const Dictionary& properties);
+  [[nodiscard]] ACCOUNT_EXPORT bool acceptProperties(const Dictionary& properties);
   [[nodiscard]] ACCOUNT_HIDDEN std::optional<Text> textForKey(std::string_view key) const;
   // The supported data classes of a type in the canonical order; an empty list for an unknown type.
   [[nodiscard]] ACCOUNT_HIDDEN static const Dataclasses& orderedSupportedDataclassesForAccountType(

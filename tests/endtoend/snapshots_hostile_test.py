@@ -5,7 +5,7 @@ import json
 import os
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS
 from device_case import HOST
 from snapshots_case import AUTO_FETCH, SENTINEL, SnapshotsTest
 
@@ -94,7 +94,7 @@ class OddFiles(SnapshotsTest):
         put(place)
         run = self.migrate(device)
         self.assertEqual(0, run.status, run.errors)
-        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+        self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
         return device, run
 
     def test_of_any_kind_hinder_no_migration_and_are_said(self):

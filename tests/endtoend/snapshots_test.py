@@ -3,7 +3,7 @@
 import os
 import unittest
 
-from device import LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY
 from device_case import HOST
 from snapshots_case import UNDOABLE, SnapshotsTest
 
@@ -136,7 +136,7 @@ class FailedSaves(SnapshotsTest):
         device, _, _ = self.failed_run()
         device.set_mobile(os.getuid(), os.getgid())
         self.assertEqual(0, self.migrate(device).status)
-        self.assertEqual(12, device.read_plist(SETTINGS)["Version"])
+        self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
         self.assertFalse(device.path(LEGACY_MAIL).exists())
 
 
