@@ -32,10 +32,11 @@ TEST_F(WatchedStore, TellsHowManyAccountsOfWhichVersionWereLoaded) {
 TEST_F(WatchedStore, TellsOfAFileThatStandsThereAndCannotBeRead) {
   device.files->put(kSettingsFile, "no property list");
   AccountsManager::initInsideOfMigration();
-  ASSERT_EQ(recorder->facts.size(), 2U);
-  EXPECT_EQ(
-      recorder->facts[0],
-      (RunFact{.kind = RunFact::Kind::unread, .reason = "it is no property list", .path = kSettingsFile.string()}));
+  ASSERT_FALSE(recorder->facts.empty());
+  const auto* const lost = std::get_if<records::Lost>(recorder->facts.data());
+  ASSERT_NE(lost, nullptr);
+  EXPECT_EQ(lost->code, records::LossCode::unreadableSettingsFile);
+  EXPECT_EQ(lost->detail, "it is no property list");
 }
 
 TEST_F(WatchedStore, TellsNoSuchThingWhereThereIsNoFile) {

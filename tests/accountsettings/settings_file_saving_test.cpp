@@ -318,26 +318,6 @@ TEST_F(SavingAccounts, ThatEndsInAnExceptionHasFailedUnlessTheFileWasWritten) {
   EXPECT_TRUE(store->lastSaveOutcome().isSaved());
 }
 
-class SaveListener final : public platform::RunObserver {
- public:
-  std::vector<std::string> heard;
-  void stageBegan(std::string_view) override {}
-  void stageEnded(std::string_view) override {}
-  void saveBegan() override { heard.emplace_back("began"); }
-  void saveEnded(const platform::Status& status) override { heard.push_back("ended " + status.reason()); }
-};
-
-TEST_F(SavingAccounts, TellsTheObserverOfTheRunHowItEnds) {
-  const auto listener = std::make_shared<SaveListener>();
-  device.setObserver(listener);
-  AccountsManager::_setShouldSkipNotifications(true);
-  const Store store = load({properties("a")});
-  store->saveAllAccounts();
-  device.propertyLists->serializeError = "out of ink";
-  store->saveAllAccounts();
-  EXPECT_EQ(listener->heard, (Lines{"began", "ended ", "began", "ended out of ink"}));
-}
-
 TEST_F(SavingAccounts, SucceedsAfterAFailure) {
   const Store store = load({properties("a")});
   store->insertAccount(account("b"));

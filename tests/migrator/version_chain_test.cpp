@@ -69,9 +69,9 @@ TEST_F(VersionChain, AnswersWhatTheLastStepAnswers) {
 }
 
 TEST(LeadingTo, AVersionTakesAStepForEachBeforeItInOrder) {
-  const Step none{0, "", nullptr};
-  const Step first{1, "", nullptr};
-  const Step second{2, "", nullptr};
+  const Step none{0, "", "", nullptr};
+  const Step first{1, "", "", nullptr};
+  const Step second{2, "", "", nullptr};
   EXPECT_TRUE(leadsTo(3, std::array{none, first, second}));
   EXPECT_FALSE(leadsTo(2, std::array{none, first, second}));
   EXPECT_FALSE(leadsTo(4, std::array{none, first, second}));

@@ -18,6 +18,7 @@
 #include "platform/linux/files/linux_file_locks.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
+#include "records/fact_observer.h"
 #include "tests/support/fake_platform.h"
 #include "tests/support/mishap_file_keeper.h"
 
