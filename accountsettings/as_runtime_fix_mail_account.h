@@ -29,7 +29,7 @@ class ACCOUNT_EXPORT ASRuntimeFixMailAccount final : public RuntimeFixer {
   bool _cleanupAccountClass(BasicAccount& account);
 
  private:
-  ASRuntimeFixMailAccount();
+  ACCOUNT_HIDDEN ASRuntimeFixMailAccount();
 
   std::unordered_set<std::string_view> _supportedMailClasses;
   bool _shouldNotifyMobileMail = false;

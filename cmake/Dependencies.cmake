@@ -15,5 +15,7 @@ find_package(nlohmann_json REQUIRED)
 if(ACCOUNTS_TESTS)
   find_package(GTest REQUIRED)
   find_package(rapidcheck REQUIRED)
+  # The system's own, which has the modules that its packages bring, before another one on the path.
+  find_program(Python3_EXECUTABLE python3 PATHS /usr/bin NO_DEFAULT_PATH)
   find_package(Python3 REQUIRED COMPONENTS Interpreter)
 endif()

@@ -73,7 +73,7 @@ Json membersOf(const Lost& lost) {
   return json;
 }
 
-Json ofAccount(const Name& account, Json members = Json::object()) {
+Json ofAccount(const Name& account, const Json& members = Json::object()) {
   Json json{{"account", jsonOfName(account)}};
   json.update(members);
   return json;

@@ -31,21 +31,19 @@ struct MessageReleaser {
 };
 using Message = std::unique_ptr<sd_bus_message, MessageReleaser>;
 
-Message newMessage(int result, sd_bus_message* made) { return Message{result < 0 ? nullptr : made}; }
-
 Message newSignal(sd_bus& bus, const char* name) {
-  sd_bus_message* made = nullptr;
-  return newMessage(::sd_bus_message_new_signal(&bus, &made, kPath, kInterface, name), made);
+  sd_bus_message* made = nullptr;  // and stays so where none can be made
+  ::sd_bus_message_new_signal(&bus, &made, kPath, kInterface, name);
+  return Message{made};
 }
 
 // Returns once the bus has taken everything that was sent before, so that signals keep their order whoever sends the
 // next one, and none is lost when the process ends.
 void waitForBus(sd_bus& bus) {
   sd_bus_message* made = nullptr;
-  const auto question =
-      newMessage(::sd_bus_message_new_method_call(&bus, &made, "org.freedesktop.DBus", "/org/freedesktop/DBus",
-                                                  "org.freedesktop.DBus", "GetId"),
-                 made);
+  ::sd_bus_message_new_method_call(&bus, &made, "org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus",
+                                   "GetId");
+  const Message question{made};
   if (question == nullptr) return;
   sd_bus_message* reply = nullptr;
   ::sd_bus_call(&bus, question.get(), static_cast<std::uint64_t>(kPatience.count()), nullptr, &reply);

@@ -24,6 +24,7 @@ SETTINGS_COPY = HOME + "/Library/Logs/CrashReporter/com.vorlix.accountsettings.p
 LEGACY_MAIL = HOME + "/Library/Mail/Accounts.plist"
 LEGACY_EXCHANGE = PREFERENCES + "/com.vorlix.DataAccess.plist"
 TEMPORARY = HOME + "/tmp"
+LOCK = ("tmp", "tmp/AccountMigrationInProgress")
 
 # A device has them from its first start on, and version control cannot hold them while they are empty.
 STANDING_DIRECTORIES = [PREFERENCES, HOME + "/Library/Mail", HOME + "/Library/Logs/CrashReporter"]
@@ -111,9 +112,10 @@ class Device:
         self.write("etc/passwd", f"root:*:0:0::/var/root:/bin/sh\nmobile:*:{user}:{group}::/var/mobile:/bin/sh\n")
         self.write("etc/group", f"wheel:*:0:root\nmobile:*:{group}:\n")
 
-    def entries(self):
-        """Everything below the root, by path."""
-        return {str(path.relative_to(self.root)): _entry(path) for path in sorted(self.root.rglob("*"))}
+    def entries(self, with_lock=False):
+        """Everything below the root, by path; the lock, which is made by who comes first, where it is asked for."""
+        everything = {str(path.relative_to(self.root)): _entry(path) for path in sorted(self.root.rglob("*"))}
+        return everything if with_lock else {path: each for path, each in everything.items() if path not in LOCK}
 
     def migrate(self, host, *options, environment=None, prepare=None, timeout=60):
         """Runs the host on this device, with a trace; `prepare` is called in the new process before it starts."""

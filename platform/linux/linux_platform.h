@@ -4,7 +4,7 @@
 #include <optional>
 
 #include "platform/export.h"
-#include "platform/linux/files/linux_file_locks.h"
+#include "platform/lock_manner.h"
 #include "platform/platform.h"
 
 namespace platform {

@@ -43,7 +43,7 @@ class Machines(ExplainTest):
         stages = [stage["stage"] for stage in document["stages"] if stage["stage"] != "save"]
         self.assertEqual(["copy aside", "load"], stages[:2])
         self.assertEqual(sorted(stages[2:], key=in_order_of_releases), stages[2:])
-        counts = {"kept": 1, "changed": 7, "added": 2, "converted": 0, "moved": 2, "folded": 1, "dropped": 0, "lost": 0}
+        counts = {"kept": 0, "changed": 8, "added": 2, "converted": 0, "moved": 2, "folded": 1, "dropped": 0, "lost": 0}
         self.assertEqual({"dataClass": "accounts", "success": True, "verdict": "kept", "storedVersion": 0,
                           "accounts": 10, "version": CURRENT_VERSION, "counts": counts}, document["result"])
 

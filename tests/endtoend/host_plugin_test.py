@@ -20,11 +20,11 @@ class Results(DeviceTest):
 class UnusablePlugins(DeviceTest):
     def assert_refused(self, pattern, plugin, direction=""):
         root = self.device(Version=3, Accounts=[]).root
-        before = Device(root).entries()
+        before = Device(root).entries(with_lock=True)
         run = self.run_host("--root", root, "--plugin", plugin, environment={"TEST_PLUGIN": direction})
         self.assertEqual((3, [], 1), (run.status, run.output, len(run.errors)), run.errors)
         self.assertRegex(run.errors[0], pattern)
-        self.assertEqual(before, Device(root).entries())
+        self.assertEqual(before, Device(root).entries(with_lock=True))
 
     def test_a_missing_file(self):
         self.assert_refused(r"^migration-host: cannot load the plug-in: .*nowhere\.so", self.scratch / "nowhere.so")

@@ -65,7 +65,7 @@ class Verdicts(LossesTest):
     """Of each kind of loss: that the verdict names it, and where the data still are."""
 
     def test_name_each_record_that_is_left_out(self):
-        device = self.device(Version=12, Accounts=[KEPT, UNFIXABLE, {"Identifier": "NO TYPE", "Class": "C"}, 7])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[KEPT, UNFIXABLE, {"Identifier": "NO TYPE", "Class": "C"}, 7])
         copy = str(device.path(SETTINGS_COPY))
         self.assertEqual(
             [("dropped-unknown-class", "UNFIXABLE", copy), ("dropped-no-type", "NO TYPE", copy),
@@ -73,7 +73,7 @@ class Verdicts(LossesTest):
             self.losses(device))
 
     def test_name_a_record_that_another_one_of_its_identifier_replaces(self):
-        device = self.device(Version=12, Accounts=[{**KEPT, "Host": "first"}, {**KEPT, "Host": "second"}])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[{**KEPT, "Host": "first"}, {**KEPT, "Host": "second"}])
         self.assertEqual([("replaced-duplicate", "KEPT", str(device.path(SETTINGS_COPY)))], self.losses(device))
 
     def test_name_every_account_of_a_legacy_file_of_which_one_is_refused(self):
@@ -90,11 +90,11 @@ class Verdicts(LossesTest):
 
     def test_name_a_settings_file_that_cannot_be_read(self):
         device = self.device()
-        device.write(SETTINGS, plistlib.dumps({"Version": 12, "Accounts": [KEPT]}, fmt=plistlib.FMT_BINARY)[:-20])
+        device.write(SETTINGS, plistlib.dumps({"Version": CURRENT_VERSION, "Accounts": [KEPT]}, fmt=plistlib.FMT_BINARY)[:-20])
         self.assertEqual([("unreadable-settings-file", None, str(device.path(SETTINGS_COPY)))], self.losses(device))
 
     def test_name_a_converted_account_that_its_parents_record_replaces(self):
-        device = self.device(Version=12, Accounts=[PARENT])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[PARENT])
         device.write_plist(LEGACY_MAIL, {"MailAccounts": [{"AccountType": "NimbraAccount", "uniqueId": "LEGACY"}]})
         self.assertEqual([("replaced-duplicate", "LEGACY", None)], self.losses(device))
 
@@ -103,14 +103,14 @@ class Verdicts(LossesTest):
         self.assertEqual([("newer-settings-file", None, str(device.path(SETTINGS_COPY)))], self.losses(device))
 
     def test_say_that_a_snapshot_has_the_data(self):
-        device = self.device(Version=12, Accounts=[UNFIXABLE])
+        device = self.device(Version=CURRENT_VERSION, Accounts=[UNFIXABLE])
         snapshots = self.scratch / "snapshots"
         [(_, _, where)] = self.losses(device, "--snapshots", snapshots)
         self.assertEqual([where], [str(path) for path in snapshots.iterdir() if path.is_dir()])
 
     def test_are_an_exit_status_where_the_command_line_is_strict(self):
         for accounts, status in (([KEPT], 0), ([UNFIXABLE], 7)):
-            self.assertEqual(status, self.device(Version=12, Accounts=accounts).migrate(HOST, "--strict").status)
+            self.assertEqual(status, self.device(Version=CURRENT_VERSION, Accounts=accounts).migrate(HOST, "--strict").status)
 
     def test_name_each_account_that_went_with_its_file_and_was_not_saved(self):
         device = self.device()

@@ -5,7 +5,7 @@ import os
 import plistlib
 import unittest
 
-from device import HOME, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY
+from device import CURRENT_VERSION, HOME, LEGACY_MAIL, PREFERENCES, SETTINGS, SETTINGS_COPY
 from device_case import HOST, DeviceTest
 
 MOBILE = 501
@@ -35,7 +35,7 @@ class Links(DeviceTest):
         run = self.device_.migrate(HOST)
         self.assertEqual((0, []), (run.status, [line for line in run.errors if "Could not" in line]))
         migrated = self.device_.read_plist(SETTINGS)
-        self.assertEqual(12, migrated["Version"])
+        self.assertEqual(CURRENT_VERSION, migrated["Version"])
         self.assertLessEqual(set(identifiers), {each["Identifier"] for each in migrated["Accounts"]})
         self.assertEqual(self.mobile, self.settings.stat().st_uid)
         self.assertEqual(content, self.device_.read(SETTINGS_COPY))

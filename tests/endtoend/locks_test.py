@@ -7,7 +7,7 @@ import time
 import unittest
 
 from accountctl_case import ACCOUNTCTL
-from device import SETTINGS, plain_environment
+from device import CURRENT_VERSION, SETTINGS, plain_environment
 from device_case import HOST, DeviceTest
 
 LOCK = "tmp/AccountMigrationInProgress"
@@ -32,18 +32,18 @@ class HeldLocks(DeviceTest):
         )
 
     def test_a_run_gives_up_after_its_time_and_touches_nothing(self):
-        before = self.held.entries()
+        before = self.held.entries(with_lock=True)
         run = self.held.migrate(HOST, "--lock-timeout", "1")
-        self.assertEqual((REFUSED, before), (run.status, self.held.entries()))
+        self.assertEqual((REFUSED, before), (run.status, self.held.entries(with_lock=True)))
         self.assertIn(LOCK, run.errors[-1])
         self.assertEqual([], run.told("result"))
 
     def test_a_run_with_snapshots_gives_up_for_either_lock(self):
         snapshots = self.scratch / "snapshots"
         for _ in range(2):
-            before = self.held.entries()
+            before = self.held.entries(with_lock=True)
             run = self.held.migrate(HOST, "--snapshots", snapshots, "--lock-timeout", "0")
-            self.assertEqual((REFUSED, before), (run.status, self.held.entries()))
+            self.assertEqual((REFUSED, before), (run.status, self.held.entries(with_lock=True)))
             fcntl.flock(self.lock, fcntl.LOCK_UN)
             self.lock.close()
             self.lock = open(snapshots / "lock", "rb")
@@ -54,7 +54,7 @@ class HeldLocks(DeviceTest):
         self.assertTrue(host.stderr.readline().startswith("waiting for "))
         fcntl.flock(self.lock, fcntl.LOCK_UN)
         host.communicate(timeout=LONG)
-        self.assertEqual((0, 12), (host.returncode, self.held.read_plist(SETTINGS)["Version"]))
+        self.assertEqual((0, CURRENT_VERSION), (host.returncode, self.held.read_plist(SETTINGS)["Version"]))
 
     def test_other_devices_do_not_wait(self):
         began = time.monotonic()

@@ -8,7 +8,7 @@ import threading
 import time
 import unittest
 
-from device import EXAMPLES, LEGACY_MAIL, SETTINGS
+from device import CURRENT_VERSION, EXAMPLES, LEGACY_MAIL, SETTINGS
 from golden_devices_test import ANSWERS, DEVICES
 from rehearsal_case import REHEARSAL, RehearsalTest, every_detail
 
@@ -68,7 +68,7 @@ class Rehearsals(RehearsalTest):
         device.path("var").symlink_to("/private/var")
         run = self.assert_foretold(device)
         self.assertNotIn("not saved", "\n".join(run.output).lower())
-        self.assertEqual(12, plistlib.loads(device.read("private/" + SETTINGS))["Version"])
+        self.assertEqual(CURRENT_VERSION, plistlib.loads(device.read("private/" + SETTINGS))["Version"])
 
     def test_repeat_themselves(self):
         device = self.example("legacy-files")

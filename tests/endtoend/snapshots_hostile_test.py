@@ -131,6 +131,7 @@ class OddFiles(SnapshotsTest):
         device = self.old_device()
         secret = self.scratch / "secret"
         secret.write_text("nobody else's")
+        secret.chmod(0o600)
         place = device.path(COMPANION)
         place.unlink()
         os.chown(place.parent, STRANGER, STRANGER)

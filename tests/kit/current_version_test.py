@@ -11,7 +11,7 @@ SOURCES_OF_TEXT = ("*.h", "*.cpp", "*.py", "*.md", "*.sh", "*.1", "*.8", "tools/
 NUMBER = rf"(?<![\w.])(?<!\[:){CURRENT_VERSION}U?(?![\w.]|-byte)"
 AFTER_IT = rf"(?<![\w.]){CURRENT_VERSION + 1}U?(?![\w.])"
 SAYS = re.compile(
-    rf"(?i)version.*{NUMBER}|{NUMBER}.*version|(?:putSettings|load|check|migrated)\(.*{NUMBER}"
+    rf"(?i)version(?!_id).*{NUMBER}|{NUMBER}.*version|(?:putSettings|load|check|migrated)\(.*{NUMBER}"
     rf"|(?:range|below)\((?:0, )?{AFTER_IT}\)|version.*% {AFTER_IT}|DeviceForm\{{{NUMBER}"
 )
 # The files in which it may stand, and as what.
@@ -21,7 +21,7 @@ PLACES = {
     "tests/migrator/*step*_test.cpp": r"",  # what one step reads and stamps
     "README.md": rf"data version (?:\d+ -> )?{NUMBER}",
     "docs/FORMAT.md": rf"^Version {NUMBER} is current",
-    "docs/EXPLAIN.md": rf"data version {NUMBER}|\"version\": ?{NUMBER}",
+    "docs/EXPLAIN.md": rf"data version {NUMBER}|as version {NUMBER}|\"(?:v|storedV)ersion\": ?{NUMBER}",
     # What was measured on a device of that version.
     "docs/PERFORMANCE.md": r"",
     "docs/RELIABILITY.md": r"",

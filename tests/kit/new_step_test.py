@@ -27,7 +27,8 @@ class NewStep(KitTest):
         return int(re.search(r"kCurrentVersion = (\d+);", self.read("accountsettings/accounts_manager.h"))[1])
 
     def rows(self):
-        return re.findall(r"^    \{(\d+), \"(\w+):\", &AccountsDataMigrator::(\w+)\},$", self.read(CHAIN), re.MULTILINE)
+        row = r"^    \{(\d+), \"(\w+):\", \".*\",\s+&AccountsDataMigrator::(\w+)\},$"
+        return re.findall(row, self.read(CHAIN), re.MULTILINE)
 
     def add(self, release):
         added = self.new_step(release)

@@ -1,26 +1,16 @@
 #pragma once
 
-#include <chrono>
 #include <filesystem>
 #include <functional>
 #include <memory>
-#include <optional>
 #include <string_view>
 
 #include "platform/exclusive_file_lock.h"
 #include "platform/export.h"
 #include "platform/linux/files/path_resolution.h"
+#include "platform/lock_manner.h"
 
 namespace platform {
-
-// How locks are taken.
-struct LockManner {
-  // Held together with all who share it, and only where its file stands; where there is none, nobody holds the lock.
-  // Nothing is made and nothing replaced: for who only looks.
-  bool isShared = false;
-  // Lock() fails with ETIMEDOUT when it is over; 0 waits for nobody. Default: it waits as long as it takes.
-  std::optional<std::chrono::milliseconds> timeLimit = std::nullopt;
-};
 
 struct FileLockOptions {
   std::filesystem::path directory;  // made where it is missing, mode 1777
