@@ -27,7 +27,7 @@ constexpr std::string_view kStatuses =
     "Exit status: 0 the migration succeeded, 1 it did not, 2 wrong use,\n"
     "3 the plug-in could not be loaded, 5 a snapshot could not be taken or restored,\n"
     "6 the accounts were not saved, 7 with --strict: some accounts were lost,\n"
-    "8 a lock could not be had, and nothing was touched.\n";
+    "8 refused, and nothing was touched: a lock could not be had, or a file may be planted.\n";
 
 constexpr std::size_t kUsualColumns = 80;
 

@@ -132,9 +132,22 @@ ExitStatus statusOf(const Account& account, bool isStrict) {
   return ExitStatus::notMigrated;
 }
 
+// To the plug-in such a file counts as missing: what is in it would be gone.
+void refusePlantedFiles(const platform::MigrationFootprint& footprint) {
+  for (const platform::MigrationFile& file : footprint.files) {
+    if (file.part == platform::MigrationFile::Part::other) continue;
+    const platform::Status read = platform::current().propertyLists->readDictionary(file.path).status();
+    if (read.cause() != platform::Cause::unsafe) continue;
+    throw Ending{ExitStatus::refused,
+                 file.path.string() + " may have been planted (" + read.reason() +
+                     "); put the file itself there, with no second name, and run again; the device was not touched"};
+  }
+}
+
 // Everything that may keep a run from beginning. Answers the session of its snapshots; null where there is none.
 std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMigrator& migrator,
                                                     const Options& options) {
+  refusePlantedFiles(migrator.footprint());
   auto session = beginRunWithSnapshots(options, migrator);
   const platform::Status held = holdMigrationLock(migrator.footprint().lockName);
   if (!held.isOk()) {

@@ -71,6 +71,16 @@ class LinksForRoot(Links):
         os.link(self.settings, self.elsewhere)
         self.assert_migrated(self.settings.read_bytes())
 
+    def test_a_second_name_that_mobile_may_have_given_a_secret_refuses_the_run_and_nothing_is_touched(self):
+        self.settings.rename(self.elsewhere)
+        os.chown(self.elsewhere, 0, 0)
+        self.elsewhere.chmod(0o600)
+        os.link(self.elsewhere, self.settings)
+        before = self.device_.entries(with_lock=True)
+        run = self.device_.migrate(HOST)
+        self.assertEqual((8, before), (run.status, self.device_.entries(with_lock=True)), run.errors)
+        self.assertIn(f"{self.settings} may have been planted", run.errors[-1])
+
 
 if __name__ == "__main__":
     unittest.main()
