@@ -91,7 +91,8 @@ class LockFile {
     _place = _paths.openParent(_path);
     if (!_place.parent.isOpen() && errno == ENOENT) {
       if (isShared()) return true;
-      if (!makeDirectories(_paths, _options.directory, kOpenToAll)) return false;
+      const bool isThere = makeDirectories(_paths, _options.directory, kOpenToAll).has_value();
+      if (!isThere && errno != EEXIST) return false;  // somebody else may have made it meanwhile
       _place = _paths.openParent(_path);
     }
     for (int attempt = 0; _place.parent.isOpen() && attempt < kAttempts; ++attempt) {
