@@ -21,9 +21,9 @@ enum class FileKind : std::uint8_t { file, directory, other };
 // where nobody can have planted them. A failed call names its cause and leaves
 // nothing half made that it made itself.
 //
-// A call that makes, replaces, moves, removes or gives away something brings its bytes, entry and owner to stable storage;
-// where that fails, the call failed. What was moved or removed by then stays so: only then may the new state be there
-// after a failed call.
+// A call that makes, replaces, moves, removes or gives away something brings its bytes, entry and owner to stable
+// storage; where that fails, the call failed. What was moved or removed by then stays so: only then may the new state
+// be there after a failed call.
 class FileSystem {
  public:
   virtual ~FileSystem() = default;
