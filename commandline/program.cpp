@@ -8,6 +8,7 @@
 #include <string>
 
 #include "commandline/ending.h"
+#include "commandline/progress_line.h"
 #include "commandline/text.h"
 
 namespace commandline {
@@ -30,6 +31,7 @@ int told(std::string_view program, const Ending& ending) {
 void say(std::string_view program, std::string_view line) noexcept {
   try {
     const std::string text = std::string{program} + ": " + printable(line) + "\n";
+    const auto hidden = progressLine().hide();
     std::fwrite(text.data(), 1, text.size(), stderr);
   } catch (...) {
     std::fwrite(program.data(), 1, program.size(), stderr);

@@ -7,7 +7,7 @@
 namespace commandline {
 
 // Says one line of the program's own on standard error, "NAME: " in front of it, in printable text. Out of memory even
-// for that, it says so.
+// for that, it says so. A progress line gives way to it.
 void say(std::string_view program, std::string_view line) noexcept;
 
 // Prints the text, whole lines, on standard output; answers whether all of it was written.

@@ -1,7 +1,6 @@
 #include "host/run.h"
 
-#include <unistd.h>
-
+#include <algorithm>
 #include <array>
 #include <ctime>
 #include <memory>
@@ -9,6 +8,7 @@
 
 #include "commandline/ending.h"
 #include "commandline/program.h"
+#include "commandline/progress_line.h"
 #include "host/explanation.h"
 #include "host/migration_lock.h"
 #include "host/plugin.h"
@@ -29,7 +29,6 @@ using commandline::Ending;
 // What looks on at a run from outside; the trace is null where none is asked for.
 struct Onlookers {
   std::shared_ptr<Trace> trace;
-  std::shared_ptr<ProgressLine> progress;
   std::shared_ptr<RunRecorder> recorder;
 };
 
@@ -51,10 +50,9 @@ std::shared_ptr<Trace> openTrace(const Options& options) {
 }
 
 Onlookers onlookersFor(const Options& options) {
-  Onlookers onlookers{
-      .trace = openTrace(options), .progress = std::make_shared<ProgressLine>(STDERR_FILENO), .recorder = {}};
+  Onlookers onlookers{.trace = openTrace(options), .recorder = {}};
   const bool isExplained = options.explain != Explain::notAsked;
-  onlookers.recorder = std::make_shared<RunRecorder>(isExplained ? onlookers.trace : nullptr, onlookers.progress);
+  onlookers.recorder = std::make_shared<RunRecorder>(isExplained ? onlookers.trace : nullptr);
   return onlookers;
 }
 
@@ -69,7 +67,7 @@ platform::Platform platformFor(const Options& options, const Onlookers& onlooker
   if (options.isRehearsal) rehearseOn(platform);
   if (platform.directories->systemRoot().lexically_normal() != "/") silenceNotices(platform);
   if (onlookers.trace) traceServices(platform, onlookers.trace);
-  putConsoleInFrontOf(onlookers.progress, platform);
+  putConsoleAroundProgress(platform);
   platform.observer = onlookers.recorder;
   return platform;
 }
@@ -133,21 +131,35 @@ ExitStatus statusOf(const Account& account, bool isStrict) {
 }
 
 // To the plug-in such a file counts as missing: what is in it would be gone.
-void refusePlantedFiles(const platform::MigrationFootprint& footprint) {
+void refusePlanted(const platform::Path& file, const platform::Status& read) {
+  if (read.cause() != platform::Cause::unsafe) return;
+  throw Ending{ExitStatus::refused,
+               file.string() + " may have been planted (" + read.reason() +
+                   "); put the file itself there, with no second name, and run again; the device was not touched"};
+}
+
+// Reads the files that the run will work on. Answers how many version steps it has ahead, as its progress needs them.
+std::size_t stepsAhead(const platform::MigrationFootprint& footprint) {
+  using Part = platform::MigrationFile::Part;
+  std::int64_t stored = footprint.currentVersion;
   for (const platform::MigrationFile& file : footprint.files) {
-    if (file.part == platform::MigrationFile::Part::other) continue;
-    const platform::Status read = platform::current().propertyLists->readDictionary(file.path).status();
-    if (read.cause() != platform::Cause::unsafe) continue;
-    throw Ending{ExitStatus::refused,
-                 file.path.string() + " may have been planted (" + read.reason() +
-                     "); put the file itself there, with no second name, and run again; the device was not touched"};
+    if (file.part == Part::other) continue;
+    const auto read = platform::current().propertyLists->readDictionary(file.path);
+    refusePlanted(file.path, read.status());
+    if (file.part == Part::legacy && read.isOk()) stored = std::min<std::int64_t>(stored, 0);
+    if (file.part != Part::settings || !read.isOk()) continue;
+    const auto* const version = read.value().find(footprint.versionKey);
+    stored = version == nullptr ? stored : version->integerValue().value_or(stored);
   }
+  return static_cast<std::size_t>(
+      std::clamp<std::int64_t>(footprint.currentVersion - stored, 0, footprint.currentVersion));
 }
 
 // Everything that may keep a run from beginning. Answers the session of its snapshots; null where there is none.
-std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMigrator& migrator,
-                                                    const Options& options) {
-  refusePlantedFiles(migrator.footprint());
+std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMigrator& migrator, const Options& options,
+                                                    RunRecorder& recorder) {
+  commandline::progressLine().show({"the device's files are looked at"});
+  recorder.expect(stepsAhead(migrator.footprint()));
   auto session = beginRunWithSnapshots(options, migrator);
   const platform::Status held = holdMigrationLock(migrator.footprint().lockName);
   if (!held.isOk()) {
@@ -165,9 +177,9 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
                    .root = platform::current().directories->systemRoot(),
                    .time = now()};
   if (onlookers.trace) onlookers.trace->start(run.version, run.root, options.given, run.time);
-  const auto session = prepare(migrator, options);
+  const auto session = prepare(migrator, options, *onlookers.recorder);
   run.success = migrator.performMigration();
-  onlookers.progress->clear();
+  commandline::progressLine().end();
 
   const Explanation& explanation = onlookers.recorder->explanation();
   if (!explanation.isComplete()) say("memory ran out while the run was watched: what is said of it may be incomplete");

@@ -1,6 +1,6 @@
 #include "host/run_recorder.h"
 
-#include <string>
+#include "commandline/progress_line.h"
 
 namespace host {
 
@@ -16,12 +16,16 @@ void RunRecorder::attempt(const Action& action) noexcept {
 void RunRecorder::stageBegan(std::string_view stage, std::string_view words) {
   attempt([&] {
     _explanation.began(stage, words);
-    _progress->show(words.empty() ? stage : words);
+    _shares.stageBegan(stage, words);
+    commandline::progressLine().show(_shares.progress());
   });
 }
 
 void RunRecorder::stageEnded(std::string_view /*stage*/) {
-  attempt([&] { _explanation.ended(); });
+  attempt([&] {
+    _explanation.ended();
+    _shares.stageEnded();
+  });
 }
 
 void RunRecorder::told(const records::Fact& fact) {
@@ -33,8 +37,8 @@ void RunRecorder::told(const records::Fact& fact) {
 
 void RunRecorder::progressed(std::size_t done, std::size_t total) {
   attempt([&] {
-    _progress->show(std::string{_explanation.stage()} + ": " + std::to_string(done) + " of " + std::to_string(total) +
-                    " accounts");
+    _shares.progressed(done, total);
+    commandline::progressLine().show(_shares.progress());
   });
 }
 

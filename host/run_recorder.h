@@ -3,7 +3,7 @@
 #include <memory>
 
 #include "host/explanation.h"
-#include "host/progress_line.h"
+#include "host/run_shares.h"
 #include "host/trace.h"
 #include "records/fact_observer.h"
 
@@ -14,8 +14,9 @@ namespace host {
 class RunRecorder final : public records::FactObserver {
  public:
   // Facts are traced, too, where `trace` is not null.
-  RunRecorder(std::shared_ptr<Trace> trace, std::shared_ptr<ProgressLine> progress)
-      : _trace{std::move(trace)}, _progress{std::move(progress)} {}
+  explicit RunRecorder(std::shared_ptr<Trace> trace) : _trace{std::move(trace)} {}
+  // How many version steps the run has to take, for its progress.
+  void expect(std::size_t steps) { _shares.expect(steps); }
 
   void stageBegan(std::string_view stage, std::string_view words) override;
   void stageEnded(std::string_view stage) override;
@@ -30,7 +31,7 @@ class RunRecorder final : public records::FactObserver {
   void attempt(const Action& action) noexcept;
 
   std::shared_ptr<Trace> _trace;
-  std::shared_ptr<ProgressLine> _progress;
+  RunShares _shares;
   Explanation _explanation;
 };
 

@@ -3,6 +3,7 @@
 #include <cstdio>
 #include <utility>
 
+#include "commandline/progress_line.h"
 #include "commandline/text.h"
 #include "host/rehearsal.h"
 #include "host/say.h"
@@ -34,7 +35,11 @@ snapshots::SessionPlace placeFor(const Options& options, platform::MigrationFoot
           .directory = directory,
           .footprint = std::move(footprint),
           .release = HOST_VERSION,
-          .warn = [](const std::string& line) { say(line); }};
+          .warn = [](const std::string& line) { say(line); },
+          .progressed =
+              [](const char* what, double share, double upTo) {
+                commandline::progressLine().show({what, share, upTo});
+              }};
 }
 
 std::unique_ptr<SnapshotSession> rehearse(snapshots::SessionPlace place) {
@@ -95,6 +100,7 @@ void changeBySnapshots(const Options& options, const platform::DataClassMigrator
     std::printf("snapshot %s is kept no longer than the others\n", id.c_str());
   } else {
     const std::string before = session.restore(id);
+    commandline::progressLine().end();
     std::printf("restored snapshot %s; the state before it is snapshot %s\n", id.c_str(), before.c_str());
   }
 }

@@ -139,11 +139,14 @@ std::string SnapshotSession::restore(const std::string& id) {
   } catch (const Problem& problem) {
     _place.warn(std::string{"what died before is not taken back first: "} + problem.what());
   }
+  _place.progressed("the snapshot's copies are verified", 0.1, 0.3);
   for (const KeptFile& file : target.files) {
     if (file.hasCopy()) static_cast<void>(_store.copyOf(target, file));
   }
+  _place.progressed("the present state is kept", 0.3, 0.6);
   Manifest before = snapshotFor(description(Manifest::kRestore));
   _journal.begin(before.id, id);
+  _place.progressed("the files are brought back", 0.6, 1);
   replaceBy(target, before);
   before.outcome = kRestored;
   finish(before);

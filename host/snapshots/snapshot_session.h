@@ -22,6 +22,8 @@ struct SessionPlace {
   platform::MigrationFootprint footprint;               // of the plug-in: nothing else is restored
   std::string release;                                  // of the host
   std::function<void(const std::string&)> warn;         // a line for people, on standard error
+  // How far a restore is: what it does, the share of it that is done, and the one at which that ends.
+  std::function<void(const char*, double, double)> progressed = [](const char*, double, double) {};
 };
 
 // How a run ended, as the host knows it.

@@ -1,18 +1,12 @@
 """What people see who sit at a terminal: lines that fit it, emphasis, counts and hints; and whom they may mean by a word."""
 
-import fcntl
-import os
-import pty
-import struct
-import termios
 import unicodedata
 import unittest
 
 from accountctl_case import ACCOUNTCTL, CLOUD, DIRECTORY, HOME_MAIL, AccountctlTest, changed
-from device import plain_environment
+from terminal import LANGUAGES, on_terminal
 
 LONG = "A name that nobody would give to an account who has ever seen it in a list of accounts of other people"
-LANGUAGES = ("C", "de_DE.UTF-8", "ja_JP.UTF-8")
 WORK = changed(HOME_MAIL, Identifier="0B6C-4F1C", DisplayName="Büro", Username="ines.kern", Hostname="mail.example.org")
 
 
@@ -24,20 +18,9 @@ def columns_of(line):
 class TerminalTest(AccountctlTest):
     def on_terminal(self, *words, columns=80, environment=None):
         """The status, and the lines that are seen."""
-        child, terminal = pty.fork()
-        if child == 0:
-            fcntl.ioctl(0, termios.TIOCSWINSZ, struct.pack("HHHH", 24, columns, 0, 0))
-            arguments = [str(ACCOUNTCTL), "--root", str(self.tree.root), *words]
-            os.execve(arguments[0], arguments, {**plain_environment(), "TERM": "xterm", **(environment or {})})
-        shown = b""
-        while True:
-            try:
-                shown += os.read(terminal, 65536)
-            except OSError:
-                break
-        os.close(terminal)
-        status = os.waitstatus_to_exitcode(os.waitpid(child, 0)[1])
-        return status, shown.decode().replace("\r\n", "\n").splitlines()
+        command = [ACCOUNTCTL, "--root", self.tree.root, *words]
+        status, shown = on_terminal(*command, columns=columns, environment=environment)
+        return status, shown.splitlines()
 
 
 class Lists(TerminalTest):

@@ -36,7 +36,7 @@ void workSlowly() {
   if (!observer) return;
   for (const std::string_view stage : {"quick", "slow"}) {
     observer->stageBegan(stage, {});
-    if (stage == "slow") std::this_thread::sleep_for(std::chrono::milliseconds{1100});
+    if (stage == "slow") std::this_thread::sleep_for(std::chrono::milliseconds{1600});
     observer->progressed(256, 1000);
     observer->stageEnded(stage);
   }
