@@ -2,6 +2,7 @@
 
 #include "commandline/program.h"
 #include "host/options.h"
+#include "host/rehearsal_server.h"
 #include "host/run.h"
 #include "host/say.h"
 
@@ -17,7 +18,9 @@ void hideMemory() {
 
 host::ExitStatus obey(std::span<const char* const> arguments) {
   const auto asked = host::parseArguments(arguments);
-  if (const auto* const options = std::get_if<host::Options>(&asked)) return host::run(*options);
+  if (const auto* const options = std::get_if<host::Options>(&asked)) {
+    return options->isServer ? host::serveRehearsals(*options) : host::run(*options);
+  }
   static_cast<void>(commandline::print(std::get<host::Answer>(asked).text));
   return host::ExitStatus::migrated;
 }

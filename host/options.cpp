@@ -2,6 +2,7 @@
 
 #include <unistd.h>
 
+#include <array>
 #include <charconv>
 #include <chrono>
 #include <string_view>
@@ -57,6 +58,8 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--explain", "", "print what the run did to which account; =json for machines",
        Form{&written.explain, {"text", "json"}}},
       {"--dry-run", "", "rehearse the run: the device stays as it is", Form{&written.dryRun, {}}},
+      {"--serve-rehearsals", "", "in place of a run, rehearse the devices that standard input names, each in a child",
+       &options.isServer},
       {"--strict", "", "exit with 7 where accounts were lost", &options.isStrict},
       {"--lock-timeout", "SECONDS", "give up where another program holds a lock for longer", &written.lockTimeout},
       {"--snapshots", "DIR", "before the run, keep copies in DIR of the files that it may change",
@@ -169,6 +172,28 @@ void settleRun(const Written& written, Options& options) {
   options.explain = *written.explain == "json" ? Explain::json : Explain::text;
 }
 
+// A server's options are those of each of its rehearsals, which have no root of their own and nothing to keep.
+void settleServer(const Written& written, const Options& options) {
+  if (!options.isServer) return;
+  const std::array<std::pair<bool, const char*>, 7> excluded{
+      {{options.device.systemRoot.has_value(), "--root"},
+       {options.device.home.has_value(), "--home"},
+       {options.trace.has_value(), "--trace"},
+       {written.explain.has_value(), "--explain"},
+       {options.isRehearsal, "--dry-run"},
+       {options.isStrict, "--strict"},
+       {options.snapshots.directory.has_value(), "--snapshots"}}};
+  for (const auto& [isGiven, name] : excluded) {
+    if (isGiven) throw WrongUse{"--serve-rehearsals and " + std::string{name} + " exclude each other"};
+  }
+}
+
+void requireDirectory(const std::optional<std::filesystem::path>& root) {
+  std::error_code ignored;
+  if (!root || std::filesystem::is_directory(*root, ignored)) return;
+  throw WrongUse{"--root is no directory: " + root->string()};
+}
+
 }  // namespace
 
 std::variant<Options, Answer> parseArguments(std::span<const char* const> arguments) {
@@ -182,11 +207,20 @@ std::variant<Options, Answer> parseArguments(std::span<const char* const> argume
   options.given = givenIn(arguments);
   settleSnapshots(written, options.snapshots);
   settleRun(written, options);
+  settleServer(written, options);
   settleLocks(written, options);
-  std::error_code ignored;
-  if (const auto& root = options.device.systemRoot; root && !std::filesystem::is_directory(*root, ignored)) {
-    throw WrongUse{"--root is no directory: " + root->string()};
-  }
+  requireDirectory(options.device.systemRoot);
+  return options;
+}
+
+Options rehearsalBelow(const std::filesystem::path& root, const Options& server) {
+  Options options = server;
+  options.isServer = false;
+  options.device.systemRoot = std::filesystem::absolute(root);
+  options.device.locks.isShared = true;
+  options.isRehearsal = true;
+  options.explain = Explain::json;
+  requireDirectory(options.device.systemRoot);
   return options;
 }
 

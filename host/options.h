@@ -37,6 +37,7 @@ struct Options {
   std::optional<std::filesystem::path> trace;
   Explain explain = Explain::notAsked;
   bool isRehearsal = false;
+  bool isServer = false;  // of rehearsals, in place of a run
   bool isStrict = false;  // accounts that are lost have an exit status of their own
   SnapshotOptions snapshots;
   std::vector<std::string> given{};  // the options as they were given, each as --name or --name=VALUE
@@ -51,5 +52,9 @@ struct Answer {
 // what is said there, for an argument that is no option, for a root that is no directory, and for options that
 // contradict each other or lack the one that they need.
 [[nodiscard]] std::variant<Options, Answer> parseArguments(std::span<const char* const> arguments);
+
+// What `--root ROOT --dry-run --explain=json` together with a server's options asks for. Throws commandline::WrongUse
+// for a root that is no directory.
+[[nodiscard]] Options rehearsalBelow(const std::filesystem::path& root, const Options& server);
 
 }  // namespace host

@@ -63,6 +63,28 @@ class RehearsalKeeper final : public platform::FileKeeper {
   std::map<Path, std::optional<FileAttributes>> _changed;  // nothing where nothing stands any more
 };
 
+using KeptLists = std::map<Path, platform::Dictionary>;
+
+// Null where nothing is kept.
+std::shared_ptr<const KeptLists> keptLists;
+
+class KeepingPropertyListStore final : public platform::PropertyListStore {
+ public:
+  explicit KeepingPropertyListStore(std::shared_ptr<platform::PropertyListStore> others) : _others{std::move(others)} {}
+
+  Result<platform::Dictionary> readDictionary(const Path& path) override {
+    const auto kept = keptLists->find(path);
+    return kept == keptLists->end() ? _others->readDictionary(path) : kept->second;
+  }
+
+  Result<std::shared_ptr<const platform::Bytes>> serialize(const platform::Dictionary& dictionary) override {
+    return _others->serialize(dictionary);
+  }
+
+ private:
+  std::shared_ptr<platform::PropertyListStore> _others;
+};
+
 }  // namespace
 
 std::shared_ptr<platform::FileKeeper> makeRehearsalKeeper(std::shared_ptr<platform::FileKeeper> inner,
@@ -73,9 +95,21 @@ std::shared_ptr<platform::FileKeeper> makeRehearsalKeeper(std::shared_ptr<platfo
 void rehearseOn(platform::Platform& platform) {
   platform.files = platform::makeRehearsalFileSystem(*platform.directories);
   platform.propertyLists = platform::makeLibplistPropertyListStore(platform.files);
+  if (keptLists) platform.propertyLists = std::make_shared<KeepingPropertyListStore>(platform.propertyLists);
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();
   platform.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
   platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();
+}
+
+void keepResources(const platform::Platform& platform) {
+  auto lists = std::make_shared<KeptLists>();
+  std::error_code none;
+  for (const auto& entry : std::filesystem::directory_iterator{platform.directories->resources(), none}) {
+    if (entry.path().extension() != ".plist") continue;
+    auto read = platform.propertyLists->readDictionary(entry.path());
+    if (read.isOk()) lists->emplace(entry.path(), read.take());
+  }
+  keptLists = std::move(lists);
 }
 
 }  // namespace host

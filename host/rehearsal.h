@@ -10,6 +10,10 @@ namespace host {
 // its options say. What modules do by themselves, without the platform's services, is not held back.
 void rehearseOn(platform::Platform& platform);
 
+// Reads the product's own property lists, which are in the platform's resources and the same for every device, once for
+// all platforms that are made to rehearse from now on. Whoever replaces one of them is not heeded then.
+void keepResources(const platform::Platform& platform);
+
 // Looks at the device through `inner`, and changes nothing but the rehearsed files. What it restored is as it was
 // restored.
 [[nodiscard]] std::shared_ptr<platform::FileKeeper> makeRehearsalKeeper(std::shared_ptr<platform::FileKeeper> inner,

@@ -33,7 +33,7 @@ PROGRAMS = re.compile(
 # Whatever device a command names, it is the test's own that it gets.
 WRAPPER = """#!/bin/sh
 case " $* " in
-  *" --root "* | *" --help "* | *" --version "*) exec "{program}" "$@" ;;
+  *" --root "* | *" --help "* | *" --version "* | *" --serve-rehearsals "*) exec "{program}" "$@" ;;
   *) exec "{program}" --root "{root}" "$@" ;;
 esac
 """

@@ -9,6 +9,7 @@ complete -c migration-host -l plugin -r -F
 complete -c migration-host -l trace -r -F
 complete -c migration-host -l explain -a 'text json'
 complete -c migration-host -l dry-run
+complete -c migration-host -l serve-rehearsals
 complete -c migration-host -l strict
 complete -c migration-host -l lock-timeout -x
 complete -c migration-host -l snapshots -r -a '(__fish_complete_directories)'

@@ -1,7 +1,13 @@
-// A migrator plug-in that does what TEST_PLUGIN says: what the host does with a plug-in is tried on it.
+// A migrator plug-in that does what TEST_PLUGIN says, or else the device's etc/direction: what the host does with a
+// plug-in is tried on it.
+
+#include <unistd.h>
 
 #include <chrono>
+#include <csignal>
+#include <cstdio>
 #include <cstdlib>
+#include <fstream>
 #include <functional>
 #include <memory>
 #include <stdexcept>
@@ -14,8 +20,41 @@
 namespace {
 
 std::string direction() {
-  const char* const given = std::getenv("TEST_PLUGIN");
-  return given == nullptr ? "" : given;
+  if (const char* const given = std::getenv("TEST_PLUGIN")) return given;
+  std::string line;
+  std::ifstream file{platform::current().directories->systemRoot() / "etc/direction"};
+  std::getline(file, line);
+  return line;
+}
+
+[[noreturn]] void waitForEver() {
+  while (true) ::pause();
+}
+
+[[noreturn]] void eatMemory() {
+  while (true) new std::string(std::size_t{1} << 24, 'x');
+}
+
+[[noreturn]] void talkForEver() {
+  while (true) platform::current().console->write(std::string(1000, 'x'));
+}
+
+[[noreturn]] void printForEver() {
+  while (true) std::puts("x");
+}
+
+// What a device that breaks its run might bring about.
+void doHarm(const std::string& direction) {
+  if (direction == "hang") waitForEver();
+  if (direction == "spin") {
+    for (volatile bool isOn = true; isOn;) continue;
+  }
+  if (direction == "crash") ::raise(SIGSEGV);
+  if (direction == "eat") eatMemory();
+  if (direction == "talk") talkForEver();
+  if (direction == "print") printForEver();
+  if (direction == "leave" && ::fork() == 0) waitForEver();
+  if (direction == "murder") ::kill(::getppid(), SIGKILL);
 }
 
 void tellEverything() {
@@ -47,6 +86,7 @@ class DirectedMigrator final : public platform::DataClassMigrator {
  public:
   [[nodiscard]] std::string_view dataClassName() const override { return "directed"; }
   bool performMigration() override {
+    doHarm(direction());
     if (direction() == "throw") throw std::runtime_error{"thrown on purpose"};
     if (direction() == "directories")
       platform::current().console->write(platform::current().directories->home().c_str());
