@@ -55,10 +55,16 @@ class Host(NamedTuple):
     resources: str = ""
 
     def command(self, root):
-        options = ["--root", root, "--dry-run", "--explain=json"]
-        options += ["--plugin", self.plugin] if self.plugin else []
-        options += ["--resources", self.resources] if self.resources else []
-        return [self.program, *options]
+        """That rehearses the one image."""
+        return [self.program, "--root", root, "--dry-run", "--explain=json", *self._options()]
+
+    def serving(self):
+        """That rehearses image after image; see serving.py."""
+        return [self.program, "--serve-rehearsals", *self._options()]
+
+    def _options(self):
+        options = ["--plugin", self.plugin] if self.plugin else []
+        return options + (["--resources", self.resources] if self.resources else [])
 
     def found(self):
         """The same by absolute paths, so that it is found from wherever a worker runs. Raises HostUnusable."""

@@ -11,7 +11,7 @@ import tempfile
 import zlib
 from typing import NamedTuple
 
-from migration_rehearse import explained, footprint, host, unpacking
+from migration_rehearse import explained, footprint, host, serving, unpacking
 from migration_rehearse.faults import Fault
 
 DIRECTORY, ARCHIVE = "directory", "archive"
@@ -137,7 +137,10 @@ def digest_here(program):
 
 
 def _rehearse_tree(task, root, identifiers):
-    ended = host.run([*host.as_mobile(root), *task.host.command(root)], task.limits)
+    try:
+        ended = serving.rehearse(task.host, root, task.limits)
+    except serving.ServerLost as lost:
+        return unrehearsed("worker-died", str(lost))
     measured = {"status": ended.status, "seconds": ended.seconds, "processor_seconds": ended.processor_seconds,
                 "peak_memory": ended.peak_memory}
     errors = explained.lasting(ended.errors.decode(errors="replace"), root, identifiers)

@@ -2,7 +2,11 @@
 
 import unittest
 
-from rehearse_case import RehearseTest
+from device_case import HOST as REAL_HOST
+from device_case import PLUGINS
+from rehearse_case import KEPT, RehearseTest
+
+from migration_rehearse import host, serving
 
 # What a run of this host does is said by a file of the device.
 HOST = """#!/usr/bin/python3
@@ -36,6 +40,42 @@ if what == "quote":
     print(sys.argv[sys.argv.index("--root") + 1], os.environ); sys.exit(0)
 print('{"stages": [], "result": {"success": true, "verdict": "kept", "lost": []}}')
 """
+
+
+class HostileImages(RehearseTest):
+    """A host that serves, with a plug-in that does what a file of the device says."""
+
+    def rehearsing(self, *kinds, status=3):
+        images = []
+        for kind in kinds:
+            images.append(self.image(kind, [{**KEPT, "Identifier": kind}]))
+            (images[-1] / "etc/direction").write_text(kind)
+        self.rehearse("--plugin", PLUGINS / "directed_migrator.so", "--timeout", 2, "--memory", "300M", "--max-output",
+                      "1M", "--workers", 2, *images, status=status)
+        return {name: " ".join(each).strip() for name, each in self.verdicts().items()}
+
+    def test_are_one_row_each_with_the_reason(self):
+        self.assertEqual(
+            {"hang": "unrehearsed timeout", "spin": "unrehearsed timeout", "crash": "unrehearsed crashed",
+             "eat": "unrehearsed memory", "print": "unrehearsed too-much-output", "leave": "unrehearsed timeout",
+             "fail": "failed", "fine": "kept"},
+            self.rehearsing("hang", "spin", "crash", "eat", "print", "leave", "fail", "fine"))
+
+    def test_that_take_the_host_with_them_take_nobody_elses_results(self):
+        others = [f"other{number}" for number in range(12)]
+        found = self.rehearsing("murder", *others)
+        self.assertEqual("unrehearsed worker-died", found.pop("murder"))
+        self.assertEqual(dict.fromkeys(others, "kept"), found)
+
+    def test_lose_nothing_to_a_host_that_dies_once(self):
+        root = self.image("one")
+        program = host.Host(str(REAL_HOST))
+        limits = host.Limits()
+        self.addCleanup(serving.close)
+        before = serving.rehearse(program, str(root), limits)
+        serving._kept.server._process.kill()
+        after = serving.rehearse(program, str(root), limits)
+        self.assertEqual((0, before.errors), (after.status, after.errors))
 
 
 class HostileHosts(RehearseTest):

@@ -173,6 +173,15 @@ def is_alive(process):
         return False
 
 
+class Hosts(RehearseTest):
+    def test_that_serve_and_hosts_that_are_started_for_each_image_come_to_the_same(self):
+        images = [*self.fleet(20), self.legacy_image("legacy"), self.image("empty", [])]
+        self.rehearse(*images, status=1)
+        other = self.scratch / "other"
+        self.rehearse(*images, *self.host_alone(), status=1, results=other)
+        self.assertEqual(self.told(other), self.told())
+
+
 class Workers(RehearseTest):
     def test_however_many_come_to_the_same(self):
         images = self.fleet(20)
@@ -190,9 +199,10 @@ class Workers(RehearseTest):
 
 class Telling(RehearseTest):
     def test_of_progress_is_for_a_terminal(self):
-        images = self.fleet(60)
-        shown = self.on_terminal([REHEARSE, "--results", self.file, "--workers", "1", *images])
-        self.assertRegex(shown, r"\r\x1b\[K\d+ of 60 \(\d+ %\), \d+ a second, \d+ s left, \d+ with losses")
+        images = self.fleet(30)
+        shown = self.on_terminal([REHEARSE, "--results", self.file, "--workers", "1", *self.host_alone("sleep 0.1"),
+                                  *images])
+        self.assertRegex(shown, r"\r\x1b\[K\d+ of 30 \(\d+ %\), \d+ a second, \d+ s left, \d+ with losses")
 
     def on_terminal(self, command):
         ours, theirs = pty.openpty()

@@ -79,6 +79,16 @@ class RehearseTest(DeviceTest):
                  f" WHERE path = '{path}'")
         return json.loads(zlib.decompress(self.rows(query)[0][0]))
 
+    def host_alone(self, first="true"):
+        """Options for the real host as one that does not serve, and that does this first for each image."""
+        program = self.scratch / "host-alone"
+        program.write_text(f'#!/bin/sh\n[ "$1" = --serve-rehearsals ] && exit 2\n[ "$1" = --version ] || {first}\n'
+                           f'exec {HOST} "$@"\n')
+        program.chmod(0o755)
+        (plugin,) = HOST.parent.parent.glob("lib*/**/accounts-migrator.so")
+        resources = HOST.parent.parent / os.environ["DATA_DIRECTORY"] / "account-settings"
+        return ["--host", program, "--plugin", plugin, "--resources", resources]
+
     def rehearsed(self, path, **bounds):
         """One image, rehearsed in this process."""
         (identified,) = rehearsal.identify([rehearsal.Image(str(path))])
