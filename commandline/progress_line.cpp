@@ -26,10 +26,10 @@ void put(int descriptor, std::string_view text) {
 
 }  // namespace
 
-ProgressLine::ProgressLine(int descriptor) : _descriptor{descriptor}, _isOnTerminal{::isatty(descriptor) == 1} {}
+ProgressLine::ProgressLine(int descriptor) : _descriptor{descriptor} {}
 
 void ProgressLine::show(Progress progress) noexcept {
-  if (!_isOnTerminal) return;
+  if (!_drawing.joinable() && ::isatty(_descriptor) != 1) return;
   try {
     const std::unique_lock lock{_mutex};
     const auto now = Clock::now();
@@ -42,7 +42,6 @@ void ProgressLine::show(Progress progress) noexcept {
 }
 
 void ProgressLine::end() noexcept {
-  if (!_isOnTerminal) return;
   _drawing.request_stop();
   if (_drawing.joinable()) _drawing.join();
   wipe();

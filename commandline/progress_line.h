@@ -30,7 +30,6 @@ class ProgressLine {
   void wipe() noexcept;
 
   int _descriptor;
-  bool _isOnTerminal;
   std::mutex _mutex;  // of all below, and of the terminal's last line
   bool _isShown = false;
   std::optional<ProgressEstimate> _estimate;  // none before the first call
