@@ -6,8 +6,8 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/class_registry.h"
 #include "platform/export.h"
+#include "platform/modules.h"
 #include "platform/property_value.h"
 
 // What loadable account modules provide: the objects behind an account record, and the classes that make them or want

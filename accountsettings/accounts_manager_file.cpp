@@ -7,7 +7,7 @@
 #include "accountsettings/log_handle.h"
 #include "accountsettings/product_values.h"
 #include "platform/platform.h"
-#include "platform/run_stage.h"
+#include "platform/run_observer.h"
 #include "records/description.h"
 
 namespace accountsettings {

@@ -7,7 +7,7 @@
 
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/vocabulary.h"
-#include "platform/run_stage.h"
+#include "platform/run_observer.h"
 #include "records/description.h"
 
 namespace accountsettings {

@@ -4,7 +4,7 @@
 #include <array>
 
 #include "platform/characters.h"
-#include "platform/class_registry.h"
+#include "platform/modules.h"
 #include "platform/platform.h"
 
 namespace accountsettings {

@@ -7,7 +7,7 @@
 #include <string_view>
 
 #include "platform/export.h"
-#include "platform/system_log.h"
+#include "platform/logs_and_notices.h"
 #include "records/message.h"
 
 namespace accountsettings {

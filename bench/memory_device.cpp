@@ -3,7 +3,7 @@
 #include "bench/silence.h"
 #include "bench/unchanging_files.h"
 #include "platform/linux/linux_platform.h"
-#include "platform/silent_services.h"
+#include "platform/logs_and_notices.h"
 
 namespace bench {
 namespace {

@@ -2,8 +2,8 @@
 
 #include <memory>
 
+#include "platform/logs_and_notices.h"
 #include "platform/platform.h"
-#include "platform/silent_services.h"
 
 namespace bench {
 

@@ -6,9 +6,9 @@
 #include <optional>
 #include <utility>
 
-#include "platform/linux/files/rehearsal_file_system.h"
+#include "platform/linux/files/file_services.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
-#include "platform/silent_services.h"
+#include "platform/logs_and_notices.h"
 
 namespace host {
 namespace {

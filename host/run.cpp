@@ -18,8 +18,8 @@
 #include "host/snapshot_steps.h"
 #include "host/trace.h"
 #include "host/verdict.h"
-#include "platform/silent_services.h"
-#include "platform/temporary_directory.h"
+#include "platform/base_directories.h"
+#include "platform/logs_and_notices.h"
 
 namespace host {
 namespace {

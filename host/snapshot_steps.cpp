@@ -9,8 +9,7 @@
 #include "host/say.h"
 #include "host/snapshots/listing.h"
 #include "host/snapshots/problem.h"
-#include "platform/linux/files/linux_file_keeper.h"
-#include "platform/linux/files/linux_file_locks.h"
+#include "platform/linux/files/file_services.h"
 
 namespace host {
 namespace {

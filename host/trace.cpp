@@ -6,7 +6,7 @@
 #include <nlohmann/json.hpp>
 #include <utility>
 
-#include "platform/linux/files/file_to_append.h"
+#include "platform/linux/files/file_services.h"
 
 #include "host/fact_json.h"
 

@@ -9,9 +9,9 @@
 #include "accountsettings/product_values.h"
 #include "migrator/legacy_conversion.h"
 #include "migrator/telling.h"
-#include "platform/class_registry.h"
+#include "platform/modules.h"
 #include "platform/platform.h"
-#include "platform/run_stage.h"
+#include "platform/run_observer.h"
 
 namespace migrator {
 namespace {

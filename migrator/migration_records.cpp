@@ -4,7 +4,7 @@
 #include "migrator/stored_names.h"
 #include "migrator/telling.h"
 #include "platform/platform.h"
-#include "platform/run_stage.h"
+#include "platform/run_observer.h"
 #include "records/fact_observer.h"
 #include "records/message.h"
 

@@ -6,7 +6,7 @@
 #include "accountsettings/accounts_manager.h"
 #include "platform/file_system.h"
 #include "platform/platform.h"
-#include "platform/run_stage.h"
+#include "platform/run_observer.h"
 #include "records/message.h"
 
 // How the plug-in tells what it does: people by the console, the run's observer by stages and facts.

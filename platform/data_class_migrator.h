@@ -8,8 +8,8 @@
 #include <string_view>
 #include <vector>
 
-#include "platform/class_registry.h"
 #include "platform/export.h"
+#include "platform/modules.h"
 
 namespace platform {
 

@@ -1,6 +1,8 @@
 #pragma once
 
+#include <chrono>
 #include <memory>
+#include <optional>
 #include <string_view>
 
 #include "platform/status.h"
@@ -24,6 +26,15 @@ class ExclusiveFileLocks {
   virtual ~ExclusiveFileLocks() = default;
   // A lock object, not yet held; never null.
   virtual Result<std::unique_ptr<ExclusiveFileLock>> lockNamed(std::string_view name) = 0;
+};
+
+// How locks are taken.
+struct LockManner {
+  // Held together with all who share it, and only where its file stands; where there is none, nobody holds the lock.
+  // Nothing is made and nothing replaced: for who only looks.
+  bool isShared = false;
+  // `lock` fails with ETIMEDOUT when it is over; 0 waits for nobody. Default: it waits as long as it takes.
+  std::optional<std::chrono::milliseconds> timeLimit = std::nullopt;
 };
 
 }  // namespace platform

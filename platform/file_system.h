@@ -18,8 +18,7 @@ enum class FileKind : std::uint8_t { file, directory, other };
 
 // The device's files. Paths are absolute. Every call works relative to the opened parent directory of its path and
 // never follows a link at the path itself, except where a call says so; links above it, and those, are followed only
-// where nobody can have planted them. A failed call names its cause and leaves
-// nothing half made that it made itself.
+// where nobody can have planted them. A failed call names its cause and leaves nothing half made that it made itself.
 //
 // A call that makes, replaces, moves, removes or gives away something brings its bytes, entry and owner to stable
 // storage; where that fails, the call failed. What was moved or removed by then stays so: only then may the new state

@@ -3,28 +3,18 @@
 #include <memory>
 
 #include "platform/base_directories.h"
-#include "platform/class_registry.h"
-#include "platform/clock.h"
-#include "platform/cloud_tabs_notice.h"
-#include "platform/console_log.h"
-#include "platform/device_info_query.h"
+#include "platform/device_answers.h"
 #include "platform/exclusive_file_lock.h"
 #include "platform/export.h"
-#include "platform/external_sources_query.h"
 #include "platform/file_system.h"
-#include "platform/localized_strings.h"
-#include "platform/module_loader.h"
-#include "platform/preferences_changed_notice.h"
-#include "platform/preferences_store.h"
-#include "platform/profile_restrictions.h"
+#include "platform/language_and_time.h"
+#include "platform/logs_and_notices.h"
+#include "platform/modules.h"
 #include "platform/property_list_store.h"
-#include "platform/run_observer.h"
-#include "platform/system_account_query.h"
-#include "platform/system_log.h"
-#include "platform/tethered_sync_query.h"
-#include "platform/unique_identifiers.h"
 
 namespace platform {
+
+class RunObserver;
 
 // The services of the operating system, as one process uses them. Every member but the observer is set.
 struct Platform {

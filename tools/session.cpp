@@ -7,9 +7,9 @@
 #include <optional>
 #include <utility>
 
+#include "platform/base_directories.h"
 #include "platform/linux/linux_platform.h"
-#include "platform/silent_services.h"
-#include "platform/temporary_directory.h"
+#include "platform/logs_and_notices.h"
 
 namespace tools {
 namespace {

@@ -5,7 +5,7 @@
 
 #include <accountsettings/accounts_manager.h>
 #include <platform/linux/linux_platform.h>
-#include <platform/temporary_directory.h>
+#include <platform/platform.h>
 
 #include <exception>
 #include <iostream>

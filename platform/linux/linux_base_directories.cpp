@@ -6,7 +6,7 @@
 #include <cstdlib>
 #include <vector>
 
-#include "platform/linux/files/own_directory.h"
+#include "platform/linux/files/file_services.h"
 
 namespace platform {
 namespace {

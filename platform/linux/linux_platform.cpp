@@ -1,8 +1,7 @@
 #include "platform/linux/linux_platform.h"
 
 #include "platform/linux/device/device_services.h"
-#include "platform/linux/files/linux_file_locks.h"
-#include "platform/linux/files/linux_file_system.h"
+#include "platform/linux/files/file_services.h"
 #include "platform/linux/linux_services.h"
 #include "platform/linux/logs/logs_and_notices.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"

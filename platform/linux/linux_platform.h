@@ -3,8 +3,8 @@
 #include <filesystem>
 #include <optional>
 
+#include "platform/exclusive_file_lock.h"
 #include "platform/export.h"
-#include "platform/lock_manner.h"
 #include "platform/platform.h"
 
 namespace platform {

@@ -4,7 +4,7 @@
 
 #include "platform/base_directories.h"
 #include "platform/linux/linux_platform.h"
-#include "platform/module_loader.h"
+#include "platform/modules.h"
 
 namespace platform {
 

@@ -2,6 +2,7 @@
 
 #include <stdexcept>
 
+#include "platform/run_observer.h"
 #include "tests/support/account_store.h"
 #include "tests/support/fact_recorder.h"
 

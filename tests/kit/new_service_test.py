@@ -91,7 +91,7 @@ class NewService(KitTest):
         self.write("platform/device_colour_query.h", SERVICE)
         aggregate, header = "platform/platform.h", "platform/linux/device/device_services.h"
         for name in (aggregate, header):
-            self.insert(name, '#include "platform/device_info_query.h"', '#include "platform/device_colour_query.h"\n')
+            self.insert(name, '#include "platform/device_answers.h"', '#include "platform/device_colour_query.h"\n')
         member = "  std::shared_ptr<DeviceColourQuery> deviceColour;\n"
         self.insert(aggregate, "  std::shared_ptr<DeviceInfoQuery>", member)
         self.insert(

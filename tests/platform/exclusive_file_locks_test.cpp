@@ -9,7 +9,7 @@
 #include <csignal>
 #include <thread>
 
-#include "platform/linux/files/linux_file_locks.h"
+#include "platform/linux/files/file_services.h"
 #include "platform/linux/linux_platform.h"
 #include "tests/support/child_process.h"
 #include "tests/support/fake_platform.h"

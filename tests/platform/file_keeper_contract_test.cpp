@@ -10,7 +10,7 @@
 #include <cstdio>
 #include <thread>
 
-#include "platform/linux/files/linux_file_keeper.h"
+#include "platform/linux/files/file_services.h"
 #include "platform/linux/linux_platform.h"
 #include "tests/support/fake_file_keeper.h"
 #include "tests/support/scratch_directory.h"

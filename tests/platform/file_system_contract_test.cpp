@@ -6,7 +6,7 @@
 #include <filesystem>
 #include <iterator>
 
-#include "platform/linux/files/rehearsal_file_system.h"
+#include "platform/linux/files/file_services.h"
 #include "platform/linux/linux_platform.h"
 #include "tests/support/fake_file_system.h"
 #include "tests/support/scratch_directory.h"

@@ -2,7 +2,7 @@
 
 #include <cstdlib>
 
-#include "platform/temporary_directory.h"
+#include "platform/base_directories.h"
 #include "tests/support/fake_platform.h"
 #include "tests/support/real_device.h"
 

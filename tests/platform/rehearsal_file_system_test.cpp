@@ -1,6 +1,6 @@
 // What a rehearsal's files are beyond those of any file system: the device's, with what was changed in memory.
 
-#include "platform/linux/files/rehearsal_file_system.h"
+#include "platform/linux/files/file_services.h"
 
 #include <gtest/gtest.h>
 #include <sys/resource.h>

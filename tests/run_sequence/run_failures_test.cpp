@@ -7,6 +7,7 @@
 
 #include "accountsettings/assertion_failure.h"
 #include "migrator/accounts_data_migrator.h"
+#include "platform/run_observer.h"
 #include "tests/run_sequence/scripted_version_steps.h"
 #include "tests/support/migration_device.h"
 

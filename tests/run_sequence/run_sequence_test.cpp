@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include "migrator/accounts_data_migrator.h"
+#include "platform/run_observer.h"
 #include "tests/run_sequence/scripted_version_steps.h"
 #include "tests/support/migration_device.h"
 

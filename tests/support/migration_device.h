@@ -5,6 +5,7 @@
 #include <string_view>
 #include <vector>
 
+#include "platform/run_observer.h"
 #include "tests/support/fake_platform.h"
 
 namespace tests {

@@ -5,17 +5,10 @@
 #include <memory>
 
 #include "platform/base_directories.h"
-#include "platform/clock.h"
-#include "platform/device_info_query.h"
+#include "platform/device_answers.h"
 #include "platform/export.h"
-#include "platform/external_sources_query.h"
-#include "platform/localized_strings.h"
-#include "platform/preferences_store.h"
-#include "platform/profile_restrictions.h"
+#include "platform/language_and_time.h"
 #include "platform/property_list_store.h"
-#include "platform/system_account_query.h"
-#include "platform/tethered_sync_query.h"
-#include "platform/unique_identifiers.h"
 
 namespace platform {
 

@@ -8,7 +8,7 @@
 
 #include "platform/linux/device/device_services.h"
 #include "platform/linux/device/icu/icu_functions.h"
-#include "platform/linux/files/own_directory.h"
+#include "platform/linux/files/file_services.h"
 
 namespace platform {
 namespace {

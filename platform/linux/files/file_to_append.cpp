@@ -1,4 +1,4 @@
-#include "platform/linux/files/file_to_append.h"
+#include "platform/linux/files/file_services.h"
 
 #include <fcntl.h>
 

@@ -1,4 +1,4 @@
-#include "platform/linux/files/linux_file_keeper.h"
+#include "platform/linux/files/file_services.h"
 
 #include <dirent.h>
 #include <fcntl.h>

@@ -1,4 +1,4 @@
-#include "platform/linux/files/linux_file_system.h"
+#include "platform/linux/files/file_services.h"
 
 #include <fcntl.h>
 #include <sys/random.h>

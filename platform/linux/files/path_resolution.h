@@ -25,8 +25,7 @@ struct FileTrees {
 
 // What stands at a name: nothing where its mode is 0.
 struct Entry {
-  Descriptor
-      descriptor{};  // good for the *at calls; of what only a rehearsal has, the innermost device directory above
+  Descriptor descriptor{};  // for the *at calls; of what only a rehearsal has, the innermost device directory above
   struct stat status {};
   const Overlay::Node* node = nullptr;  // set where a rehearsal says what stands there
 

@@ -1,4 +1,4 @@
-#include "platform/linux/files/rehearsal_file_system.h"
+#include "platform/linux/files/file_services.h"
 
 #include <fcntl.h>
 #include <sys/mman.h>
@@ -14,7 +14,6 @@
 #include <utility>
 
 #include "platform/linux/files/account_names.h"
-#include "platform/linux/files/linux_file_system.h"
 #include "platform/linux/files/path_resolution.h"
 
 namespace platform {

@@ -5,11 +5,8 @@
 #include <string>
 #include <vector>
 
-#include "platform/cloud_tabs_notice.h"
-#include "platform/console_log.h"
 #include "platform/export.h"
-#include "platform/preferences_changed_notice.h"
-#include "platform/system_log.h"
+#include "platform/logs_and_notices.h"
 
 namespace platform {
 

@@ -16,6 +16,7 @@
 
 #include "platform/data_class_migrator.h"
 #include "platform/platform.h"
+#include "platform/run_observer.h"
 
 namespace {
 

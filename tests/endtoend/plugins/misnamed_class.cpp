@@ -2,7 +2,7 @@
 
 #include <memory>
 
-#include "platform/class_registry.h"
+#include "platform/modules.h"
 
 namespace {
 

@@ -1,6 +1,6 @@
 // A module that makes one class known.
 
-#include "platform/class_registry.h"
+#include "platform/modules.h"
 
 namespace {
 

@@ -5,6 +5,7 @@
 #include <string_view>
 
 #include "platform/export.h"
+#include "platform/status.h"
 
 namespace platform {
 
@@ -50,5 +51,13 @@ class ACCOUNT_EXPORT ClassRegistration {
 
 // The registry over the process's one table.
 [[nodiscard]] ACCOUNT_EXPORT std::unique_ptr<ClassRegistry> makeProcessClassRegistry();
+
+// Opens loadable modules. A module stays open for the life of the process; opening it again is cheap and does nothing.
+class ModuleLoader {
+ public:
+  virtual ~ModuleLoader() = default;
+  // Opens the module at the path with all its symbols resolved at once. The reason of a failure names the path.
+  virtual Status open(const std::string& path) = 0;
+};
 
 }  // namespace platform

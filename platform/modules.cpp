@@ -1,9 +1,10 @@
-#include "platform/class_registry.h"
+#include "platform/modules.h"
 
 #include <algorithm>
 #include <mutex>
 #include <vector>
 
+#include "platform/data_class_migrator.h"
 #include "platform/kept_for_life.h"
 
 namespace platform {
@@ -33,7 +34,11 @@ class ProcessClassRegistry final : public ClassRegistry {
 
 }  // namespace
 
+// Defined here, so that the types have one home and are the same for the host, every plug-in and every module.
 ClassInfo::~ClassInfo() = default;
+DataClassMigrator::~DataClassMigrator() = default;
+DataClassMigratorClass::~DataClassMigratorClass() = default;
+MigrationFootprint DataClassMigrator::footprint() const { return {}; }
 
 ClassRegistration::ClassRegistration(std::shared_ptr<const ClassInfo> info) : _info{std::move(info)} {
   const std::scoped_lock lock{table().guard};
