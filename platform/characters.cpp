@@ -42,33 +42,14 @@ bool isUnsafe(Code code) {
   return code < 0x20 || isWithin(code, 0x7F, 0x9F) || isWithin(code, 0x2028, 0x202E) || isWithin(code, 0x2066, 0x2069);
 }
 
-std::string spelt(const Character& character) {
-  if (character.code == '\n') return "\\n";
-  if (character.code == '\r') return "\\r";
-  const bool isByte = character.code == kNoCharacter;
-  const auto number =
-      isByte ? static_cast<unsigned char>(character.bytes.front()) : static_cast<unsigned>(character.code);
-  std::array<char, 16> text{};
-  std::snprintf(text.data(), text.size(), number < 0x100 ? "\\x%02x" : "\\u%04x", number);
-  return text.data();
-}
-
-// The part that is ASCII and safe whatever follows it.
-std::size_t plainLength(std::string_view text) {
-  const auto* const end = std::ranges::find_if(text, [](char letter) {
-    const auto byte = static_cast<unsigned char>(letter);
-    return byte < 0x20 || byte >= 0x7F;
-  });
-  return static_cast<std::size_t>(end - text.begin());
-}
-
 // The text with what `shownFor` answers in place of each character that is unsafe.
 template <typename ShownFor>
 std::string madeSafe(std::string_view text, const ShownFor& shownFor) {
   std::string safe;
   safe.reserve(text.size());
+  const auto isPlain = [](unsigned char byte) { return byte >= 0x20 && byte < 0x7F; };  // safe whatever follows it
   while (!text.empty()) {
-    const std::size_t plain = plainLength(text);
+    const auto plain = static_cast<std::size_t>(std::ranges::find_if_not(text, isPlain) - text.begin());
     safe += text.substr(0, plain);
     text.remove_prefix(plain);
     if (text.empty()) break;
@@ -105,7 +86,17 @@ struct Freed {
 }  // namespace
 
 std::string singleLine(std::string_view text) {
-  return madeSafe(text, [](const Character& character) { return character.code == '\t' ? "\t" : spelt(character); });
+  return madeSafe(text, [](const Character& character) -> std::string {
+    if (character.code == '\t') return "\t";
+    if (character.code == '\n') return "\\n";
+    if (character.code == '\r') return "\\r";
+    const bool isByte = character.code == kNoCharacter;
+    const auto number =
+        isByte ? static_cast<unsigned char>(character.bytes.front()) : static_cast<unsigned>(character.code);
+    std::array<char, 16> spelt{};
+    std::snprintf(spelt.data(), spelt.size(), number < 0x100 ? "\\x%02x" : "\\u%04x", number);
+    return spelt.data();
+  });
 }
 
 std::string printable(std::string_view text) {

@@ -10,8 +10,8 @@
 namespace platform {
 namespace {
 
-constexpr std::int64_t kSmallest = std::numeric_limits<std::int64_t>::min();
-constexpr std::int64_t kLargest = std::numeric_limits<std::int64_t>::max();
+constexpr std::int64_t kMinInteger = std::numeric_limits<std::int64_t>::min();
+constexpr std::int64_t kMaxInteger = std::numeric_limits<std::int64_t>::max();
 
 bool sameReal(double left, double right) {
   return std::bit_cast<std::uint64_t>(left) == std::bit_cast<std::uint64_t>(right) ||
@@ -21,8 +21,8 @@ bool sameReal(double left, double right) {
 std::int64_t truncated(double real) {
   constexpr double kLimit = 9223372036854775808.0;  // 2^63
   if (std::isnan(real)) return 0;
-  if (real >= kLimit) return kLargest;
-  if (real < -kLimit) return kSmallest;
+  if (real >= kLimit) return kMaxInteger;
+  if (real < -kLimit) return kMinInteger;
   return static_cast<std::int64_t>(real);
 }
 
@@ -34,7 +34,7 @@ std::int64_t leadingInteger(std::string_view text) {
   }
   std::int64_t integer = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), integer);
-  if (error == std::errc::result_out_of_range) return negative ? kSmallest : kLargest;
+  if (error == std::errc::result_out_of_range) return negative ? kMinInteger : kMaxInteger;
   return integer;
 }
 
@@ -44,15 +44,10 @@ bool equalIgnoringCase(std::string_view text, std::string_view lowerCase) {
   });
 }
 
-template <typename Shared>
-bool sameShared(const std::shared_ptr<const Shared>& left, const std::shared_ptr<const Shared>& right) {
-  return left == right || *left == *right;
-}
-
 }  // namespace
 
 PropertyValue::PropertyValue(std::uint64_t value) : _storage{value} {
-  if (value <= static_cast<std::uint64_t>(kLargest)) _storage = static_cast<std::int64_t>(value);
+  if (value <= static_cast<std::uint64_t>(kMaxInteger)) _storage = static_cast<std::int64_t>(value);
 }
 PropertyValue::PropertyValue(Bytes value) : _storage{std::make_shared<const Bytes>(std::move(value))} {}
 PropertyValue::PropertyValue(Array value) : _storage{std::make_shared<const Array>(std::move(value))} {}
@@ -108,7 +103,7 @@ bool operator==(const PropertyValue& left, const PropertyValue& right) {
         } else if constexpr (std::is_same_v<Value, Date>) {
           return sameReal(value.secondsSince2001, other.secondsSince2001);
         } else if constexpr (requires { value.use_count(); }) {
-          return sameShared(value, other);
+          return value == other || *value == *other;
         } else {
           return value == other;
         }

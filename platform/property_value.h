@@ -145,7 +145,7 @@ class ACCOUNT_EXPORT PropertyValue {
   // booleans included.
   [[nodiscard]] std::optional<std::int64_t> integerValue() const;
 
-  // The truth that a boolean, a number (not zero) or a text gives: "yes" or "true" in any case, or a leading decimal
+  // The boolean that a boolean, a number (not zero) or a text gives: "yes" or "true" in any case, or a leading decimal
   // integer that is not zero, are true, every other text is false. Nothing for any other kind.
   [[nodiscard]] std::optional<bool> booleanValue() const;
 

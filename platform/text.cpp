@@ -10,13 +10,6 @@ namespace {
 
 constexpr std::string_view kReplacementCharacter = "\xEF\xBF\xBD";
 
-// Whether eight bytes are all ASCII and none of them is NUL.
-bool arePlain(std::uint64_t bytes) {
-  constexpr std::uint64_t kOnes = 0x0101010101010101U;
-  constexpr std::uint64_t kHighBits = 0x8080808080808080U;
-  return ((bytes | (bytes - kOnes)) & kHighBits) == 0;
-}
-
 // Adds the bytes, none of which is NUL, with U+FFFD for each byte that is part of no character.
 void appendRepaired(std::string& text, std::string_view bytes) {
   while (true) {
@@ -50,10 +43,13 @@ std::shared_ptr<const char> copyOf(std::string_view bytes) {
 }  // namespace
 
 std::size_t plainPrefix(std::string_view bytes) {
+  constexpr std::uint64_t kOnes = 0x0101010101010101U;
+  constexpr std::uint64_t kHighBits = 0x8080808080808080U;
   std::size_t length = 0;
   for (std::uint64_t eight = 0; bytes.size() - length >= sizeof eight; length += sizeof eight) {
     std::memcpy(&eight, bytes.data() + length, sizeof eight);
-    if (!arePlain(eight)) break;
+    const bool arePlain = ((eight | (eight - kOnes)) & kHighBits) == 0;
+    if (!arePlain) break;
   }
   while (length < bytes.size() && bytes[length] > 0) ++length;
   return length;

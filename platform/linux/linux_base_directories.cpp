@@ -19,26 +19,15 @@ path wholePath(const path& given) {
   return whole.has_filename() || whole == "/" ? whole : whole.parent_path();
 }
 
-path homeOfProcess() {
-  const char* const named = std::getenv("HOME");
-  if (named != nullptr && *named == '/') return wholePath(named);
-  std::vector<char> buffer(std::size_t{1} << 16);
-  passwd entry{};
-  passwd* found = nullptr;
-  ::getpwuid_r(::getuid(), &entry, buffer.data(), buffer.size(), &found);
-  return found != nullptr && *found->pw_dir == '/' ? wholePath(found->pw_dir) : path{"/"};
-}
-
 // The build gives the way from the library's directory to the resources; it is the same built and installed.
-path besideThisLibrary() { return wholePath(ownDirectory() / ACCOUNT_RESOURCES_FROM_LIBRARY); }
-
 class LinuxBaseDirectories final : public BaseDirectories {
  public:
   explicit LinuxBaseDirectories(const LinuxPlatformOptions& options)
       : _root{wholePath(options.systemRoot.value_or("/"))},
         _home{homeFor(options, _root)},
         _sharedResources{options.sharedResources ? wholePath(*options.sharedResources) : _root / "var/mobile"},
-        _resources{options.resources ? wholePath(*options.resources) : besideThisLibrary()} {}
+        _resources{
+            wholePath(options.resources ? *options.resources : ownDirectory() / ACCOUNT_RESOURCES_FROM_LIBRARY)} {}
 
   [[nodiscard]] path systemRoot() const override { return _root; }
   [[nodiscard]] path home() const override { return _home; }
@@ -49,7 +38,14 @@ class LinuxBaseDirectories final : public BaseDirectories {
  private:
   static path homeFor(const LinuxPlatformOptions& options, const path& root) {
     if (options.home) return wholePath(*options.home);
-    return options.systemRoot ? root / "var/mobile" : homeOfProcess();
+    if (options.systemRoot) return root / "var/mobile";
+    const char* const named = std::getenv("HOME");
+    if (named != nullptr && *named == '/') return wholePath(named);
+    std::vector<char> buffer(std::size_t{1} << 16);
+    passwd entry{};
+    passwd* found = nullptr;
+    ::getpwuid_r(::getuid(), &entry, buffer.data(), buffer.size(), &found);
+    return found != nullptr && *found->pw_dir == '/' ? wholePath(found->pw_dir) : path{"/"};
   }
 
   path _root;

@@ -7,18 +7,6 @@
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace platform {
-namespace {
-
-// What is said of them goes to the console that the process has by then.
-std::shared_ptr<ExclusiveFileLocks> makeLocks(const LinuxPlatformOptions& options, const BaseDirectories& directories) {
-  return makeFileLocks({.directory = options.lockDirectory.value_or(directories.systemRoot() / "tmp"),
-                        .trees = treesOf(directories),
-                        .manner = options.locks,
-                        .say = [](std::string_view line) { current().console->write(line); }});
-}
-
-}  // namespace
-
 Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   Platform services;
   services.directories = makeBaseDirectories(options);
@@ -29,7 +17,12 @@ Platform makeLinuxPlatform(const LinuxPlatformOptions& options) {
   const std::shared_ptr<SystemBus> bus = makeSystemBus();
   services.preferencesChanged = makePreferencesChangedNotice(bus);
   services.cloudTabs = makeCloudTabsNotice(bus);
-  services.locks = makeLocks(options, *services.directories);
+  // What is said of locks goes to the console that the process has by then.
+  services.locks =
+      makeFileLocks({.directory = options.lockDirectory.value_or(services.directories->systemRoot() / "tmp"),
+                     .trees = treesOf(*services.directories),
+                     .manner = options.locks,
+                     .say = [](std::string_view line) { current().console->write(line); }});
   services.systemLog = makeSystemLog(systemLogSinks());
   services.console = makeConsoleLog();
   services.deviceInfo = makeDeviceInfoQuery(configuration);

@@ -1,9 +1,7 @@
 #include <sys/utsname.h>
 #include <uuid/uuid.h>
 
-#include <algorithm>
 #include <array>
-#include <iterator>
 #include <map>
 #include <string>
 
@@ -34,30 +32,20 @@ std::optional<PropertyValue> machineArchitecture() {
   return machine == "armv6l" ? "armv6" : machine;
 }
 
-std::optional<PropertyValue> textIn(const PropertyValue& value) {
-  return value.asText() == nullptr ? std::nullopt : std::optional{value};
-}
-
-std::optional<PropertyValue> booleanIn(const PropertyValue& value) {
-  const std::optional<bool> boolean = value.booleanValue();
-  return boolean ? std::optional<PropertyValue>{*boolean} : std::nullopt;
-}
-
-std::optional<PropertyValue> answerIn(const Dictionary& info, std::string_view key) {
-  const PropertyValue* const value = info.find(key);
-  if (value == nullptr) return std::nullopt;
-  if (key == "RegionalBehaviorGoogleMail") return booleanIn(*value);
-  return key == kArchitectureKey || key == "DeviceClass" ? textIn(*value) : std::nullopt;
-}
-
 class LinuxDeviceInfoQuery final : public Configured<DeviceInfoQuery> {
  public:
   using Configured::Configured;
 
   [[nodiscard]] std::optional<PropertyValue> answer(std::string_view key) const override {
     const Dictionary info = _configuration.ofSystem("device-info.plist").valueOr({});
-    std::optional<PropertyValue> answer = answerIn(info, key);
-    return !answer && key == kArchitectureKey ? machineArchitecture() : answer;
+    if (key == "RegionalBehaviorGoogleMail") {
+      const PropertyValue* const value = info.find(key);
+      const std::optional<bool> isSo = value == nullptr ? std::nullopt : value->booleanValue();
+      return isSo ? std::optional<PropertyValue>{*isSo} : std::nullopt;
+    }
+    if (key != kArchitectureKey && key != "DeviceClass") return std::nullopt;
+    if (const Text* const text = info.text(key)) return *text;
+    return key == kArchitectureKey ? machineArchitecture() : std::nullopt;
   }
 };
 
@@ -74,13 +62,6 @@ std::string_view keyOf(ManagedFeature feature) {
   return {};
 }
 
-Restriction restrictionIn(const Dictionary& profiles, ManagedFeature feature) {
-  const PropertyValue* const value = profiles.find(keyOf(feature));
-  const std::optional<bool> isAllowed = value == nullptr ? std::nullopt : value->booleanValue();
-  if (!isAllowed) return Restriction::notSet;
-  return *isAllowed ? Restriction::allowed : Restriction::notAllowed;
-}
-
 class LinuxProfileRestrictions final : public Configured<ProfileRestrictions> {
  public:
   using Configured::Configured;
@@ -88,8 +69,12 @@ class LinuxProfileRestrictions final : public Configured<ProfileRestrictions> {
   [[nodiscard]] std::vector<Restriction> restrictions(std::span<const ManagedFeature> features) const override {
     const Dictionary profiles = _configuration.ofSystem("profile-restrictions.plist").valueOr({});
     std::vector<Restriction> answers;
-    std::ranges::transform(features, std::back_inserter(answers),
-                           [&profiles](ManagedFeature feature) { return restrictionIn(profiles, feature); });
+    for (const ManagedFeature feature : features) {
+      const PropertyValue* const value = profiles.find(keyOf(feature));
+      const std::optional<bool> isAllowed = value == nullptr ? std::nullopt : value->booleanValue();
+      const Restriction ifSet = isAllowed.value_or(false) ? Restriction::allowed : Restriction::notAllowed;
+      answers.push_back(isAllowed ? ifSet : Restriction::notSet);
+    }
     return answers;
   }
 };
@@ -136,13 +121,6 @@ std::string_view keyOf(SyncDataType type) {
   return {};
 }
 
-ExternalSources sourcesWithin(const Dictionary& entry) {
-  ExternalSources answer;
-  if (const Array* const sources = entry.array("Sources")) answer.sources = *sources;
-  if (const Text* const error = entry.text("Error")) answer.error = error->string();
-  return answer;
-}
-
 class LinuxExternalSourcesQuery final : public Configured<ExternalSourcesQuery> {
  public:
   using Configured::Configured;
@@ -150,8 +128,12 @@ class LinuxExternalSourcesQuery final : public Configured<ExternalSourcesQuery> 
   [[nodiscard]] ExternalSources enabledSources(SyncDataType type) const override {
     const Dictionary entries = _configuration.ofUser("com.vorlix.external-sources.plist").valueOr({});
     if (const Array* const sources = entries.array(keyOf(type))) return {*sources, std::nullopt};
-    if (const Dictionary* const entry = entries.dictionary(keyOf(type))) return sourcesWithin(*entry);
-    return {};
+    const Dictionary* const entry = entries.dictionary(keyOf(type));
+    if (entry == nullptr) return {};
+    ExternalSources answer;
+    if (const Array* const sources = entry->array("Sources")) answer.sources = *sources;
+    if (const Text* const error = entry->text("Error")) answer.error = error->string();
+    return answer;
   }
 };
 

@@ -32,10 +32,15 @@ const IcuFunctions* icuFunctions() {
 
 constexpr const char* kBaseLanguage = "en";
 
+// The user's locale as the environment names it. None where it is that without user and language, in which a device
+// starts: no ICU is needed to know that.
 std::string localeOfEnvironment() {
   for (const char* const variable : {"LC_ALL", "LC_MESSAGES", "LANG"}) {
     const char* const value = std::getenv(variable);
-    if (value != nullptr && *value != '\0') return value;
+    if (value == nullptr || *value == '\0') continue;
+    const std::string locale = value;
+    const std::string name = locale.substr(0, locale.find('.'));
+    return name.empty() || name == "C" || name == "POSIX" ? std::string{} : locale;
   }
   return {};
 }
@@ -48,16 +53,10 @@ bool isLanguageName(std::string_view name) {
   });
 }
 
-// The locale in which there is no user and no language. A device starts in it, and ICU is not needed to know that.
-bool isOfNobody(std::string_view locale) {
-  const std::string_view name = locale.substr(0, locale.find('.'));
-  return name.empty() || name == "C" || name == "POSIX";
-}
-
 // The user's language and the more general ones, then English.
 std::vector<std::string> languages() {
   const std::string environment = localeOfEnvironment();
-  const IcuFunctions* const icu = isOfNobody(environment) ? nullptr : icuFunctions();
+  const IcuFunctions* const icu = environment.empty() ? nullptr : icuFunctions();
   std::vector<std::string> names = icu == nullptr ? std::vector<std::string>{} : icu->localeNames(environment);
   names.erase(std::ranges::find_if_not(names, isLanguageName), names.end());
   names.emplace_back(kBaseLanguage);
@@ -94,8 +93,6 @@ class LinuxLocalizedStrings final : public LocalizedStrings {
 
 // --- The time of day ---
 
-Instant systemInstant() { return std::chrono::floor<std::chrono::milliseconds>(std::chrono::system_clock::now()); }
-
 class LinuxClock final : public Clock {
  public:
   explicit LinuxClock(std::function<Instant()> now) : _now{std::move(now)} {}
@@ -120,7 +117,10 @@ std::shared_ptr<LocalizedStrings> makeLocalizedStrings(DeviceConfiguration confi
 }
 
 std::shared_ptr<Clock> makeClock(std::function<Instant()> now) {
-  return std::make_shared<LinuxClock>(now ? std::move(now) : &systemInstant);
+  const auto systemInstant = [] {
+    return std::chrono::floor<std::chrono::milliseconds>(std::chrono::system_clock::now());
+  };
+  return std::make_shared<LinuxClock>(now ? std::move(now) : systemInstant);
 }
 
 }  // namespace platform

@@ -34,6 +34,11 @@ bool isDirectoryAt(int parent, const char* name) {
   return ::fstatat(parent, name, &status, AT_SYMLINK_NOFOLLOW) == 0 && S_ISDIR(status.st_mode);
 }
 
+Descriptor openDirectory(const Descriptor& parent, const std::string& name, int access) {
+  const int flags = access | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
+  return Descriptor{::openat(parent.number(), name.c_str(), flags)};
+}
+
 // Removes all that is no directory up to the first directory, and answers that one's name: empty where none is left.
 std::optional<std::string> clearUpToDirectory(const Descriptor& directory) {
   const Stream stream = streamOf(directory);
@@ -55,13 +60,10 @@ class Walk {
 
   // Goes down into the directory of that name.
   bool enter(const Descriptor& from, const std::string& name) {
-    Descriptor below{::openat(from.number(), name.c_str(), O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC)};
+    Descriptor below = openDirectory(from, name, O_PATH);
     struct stat status {};
     if (!below.isOpen() || ::fstat(below.number(), &status) != 0) return false;
-    if (status.st_dev != _volume) {
-      errno = EXDEV;
-      return false;
-    }
+    if (status.st_dev != _volume) return failWith(EXDEV);
     _levels.push_back({name, status.st_dev, status.st_ino});
     _current = std::move(below);
     return true;
@@ -89,10 +91,7 @@ class Walk {
     Descriptor above{::openat(_current.number(), "..", O_PATH | O_DIRECTORY | O_CLOEXEC)};
     struct stat status {};
     if (!above.isOpen() || ::fstat(above.number(), &status) != 0) return false;
-    if (status.st_dev != _levels.back().device || status.st_ino != _levels.back().inode) {
-      errno = EAGAIN;
-      return false;
-    }
+    if (status.st_dev != _levels.back().device || status.st_ino != _levels.back().inode) return failWith(EAGAIN);
     _current = std::move(above);
     return ::unlinkat(_current.number(), name.c_str(), AT_REMOVEDIR) == 0;
   }
@@ -101,14 +100,6 @@ class Walk {
   Descriptor _current;
   std::vector<Level> _levels;
 };
-
-bool isEmpty(const Descriptor& directory) {
-  const Stream stream = streamOf(directory);
-  while (const dirent* const entry = stream ? ::readdir(stream.get()) : nullptr) {
-    if (isEntryName(static_cast<const char*>(entry->d_name))) return false;
-  }
-  return stream != nullptr;
-}
 
 // Directories that were made, removed again from the innermost on unless they are kept.
 class Made {
@@ -133,21 +124,23 @@ class Made {
 // Somebody who writes in the parent may have put another directory at the name meanwhile; its bits are not ours to set.
 bool isNew(const Descriptor& directory) {
   struct stat status {};
-  return ::fstat(directory.number(), &status) == 0 && status.st_uid == ::geteuid() && isEmpty(directory);
+  if (::fstat(directory.number(), &status) != 0 || status.st_uid != ::geteuid()) return false;
+  const Stream stream = streamOf(directory);
+  while (const dirent* const entry = stream ? ::readdir(stream.get()) : nullptr) {
+    if (isEntryName(static_cast<const char*>(entry->d_name))) return false;
+  }
+  return stream != nullptr;
 }
 
 // The permission bits whatever the umask. A directory that its own bits keep us from opening is changed by name, which
 // follows no link either; only who has no rights over others' directories is kept from opening an own one.
 bool setPermissions(const Place& place, unsigned permissions, Descriptor& directory) {
-  const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-  directory = Descriptor{::openat(place.parent.number(), place.leaf.c_str(), flags)};
+  directory = openDirectory(place.parent, place.leaf, O_RDONLY);
   if (!directory.isOpen()) {
     return errno == EACCES &&
            ::fchmodat(place.parent.number(), place.leaf.c_str(), permissions, AT_SYMLINK_NOFOLLOW) == 0;
   }
-  if (isNew(directory)) return ::fchmod(directory.number(), permissions) == 0;
-  errno = EEXIST;
-  return false;
+  return isNew(directory) ? ::fchmod(directory.number(), permissions) == 0 : failWith(EEXIST);
 }
 
 // Leaves `directory` unopened where it was there already.
@@ -160,11 +153,6 @@ bool makeDirectory(Place place, unsigned permissions, Made& made, Descriptor& di
   return entries.isOpen() && sync(entries);
 }
 
-bool isDirectory(const Place& place) {
-  const int flags = O_PATH | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-  return Descriptor{::openat(place.parent.number(), place.leaf.c_str(), flags)}.isOpen();
-}
-
 // The directory and those above it that are missing, from the innermost on; none where that cannot be told.
 std::vector<std::filesystem::path> missingDirectories(const PathResolver& paths, const std::filesystem::path& path) {
   std::vector<std::filesystem::path> missing{path.has_filename() ? path : path.parent_path()};
@@ -175,34 +163,27 @@ std::vector<std::filesystem::path> missingDirectories(const PathResolver& paths,
   return missing;
 }
 
-bool makeMissing(const PathResolver& paths, std::vector<std::filesystem::path> missing, unsigned permissions,
-                 Made& made, Descriptor& innermost) {
-  if (missing.empty()) return false;
-  for (; !missing.empty(); missing.pop_back()) {
-    Place place = paths.openParent(missing.back());
-    const unsigned bits = missing.size() == 1 ? permissions : kPermissionsAbove;
-    if (!place.parent.isOpen() || !makeDirectory(std::move(place), bits, made, innermost)) return false;
-    if (!isDirectory(paths.openParent(missing.back()))) return false;
-  }
-  return true;
-}
-
 }  // namespace
 
 std::optional<Descriptor> makeDirectories(const PathResolver& paths, const std::filesystem::path& path,
                                           unsigned permissions) {
+  std::vector<std::filesystem::path> missing = missingDirectories(paths, path);
+  if (missing.empty()) return std::nullopt;
   Made made;
   Descriptor innermost;
-  if (!makeMissing(paths, missingDirectories(paths, path), permissions, made, innermost)) return std::nullopt;
+  for (; !missing.empty(); missing.pop_back()) {
+    const unsigned bits = missing.size() == 1 ? permissions : kPermissionsAbove;
+    Place place = paths.openParent(missing.back());
+    if (!place.parent.isOpen() || !makeDirectory(std::move(place), bits, made, innermost)) return std::nullopt;
+    place = paths.openParent(missing.back());
+    if (!openDirectory(place.parent, place.leaf, O_PATH).isOpen()) return std::nullopt;
+  }
   made.keep();
   return innermost;
 }
 
 bool removeTree(const Place& place) {
-  if (!isEntryName(place.leaf)) {
-    errno = EINVAL;
-    return false;
-  }
+  if (!isEntryName(place.leaf)) return failWith(EINVAL);
   if (!isDirectoryAt(place.parent.number(), place.leaf.c_str())) {
     return ::unlinkat(place.parent.number(), place.leaf.c_str(), 0) == 0;
   }

@@ -9,30 +9,33 @@
 namespace platform {
 namespace {
 
-int errorForKind(mode_t mode) {
-  if (S_ISREG(mode)) return 0;
-  if (S_ISDIR(mode)) return EISDIR;
-  return S_ISLNK(mode) ? ELOOP : EINVAL;
-}
-
-bool refuse(int errorNumber) {
-  if (errorNumber == 0) return false;
-  errno = errorNumber;
-  return true;
+bool isRegular(mode_t mode) {
+  if (S_ISREG(mode)) return true;
+  if (S_ISDIR(mode)) return failWith(EISDIR);
+  return failWith(S_ISLNK(mode) ? ELOOP : EINVAL);
 }
 
 }  // namespace
+
+Status failureOf(std::string_view attempt, const Path& path) {
+  const int cause = errno;
+  return Status::failure(cause, std::string{attempt} + " " + path.string());
+}
+
+FileKind kindOf(mode_t mode) {
+  if (S_ISREG(mode)) return FileKind::file;
+  return S_ISDIR(mode) ? FileKind::directory : FileKind::other;
+}
 
 bool isEntryName(const std::string& leaf) { return !leaf.empty() && leaf != "." && leaf != ".."; }
 
 Descriptor openRegularFile(const Place& place) {
   struct stat status {};
   if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return {};
-  if (refuse(errorForKind(status.st_mode))) return {};
-  constexpr int flags = O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW;
-  Descriptor file{retried([&] { return ::openat(place.parent.number(), place.leaf.c_str(), flags); })};
-  if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return {};
-  if (refuse(errorForKind(status.st_mode))) return {};
+  if (!isRegular(status.st_mode)) return {};
+  constexpr int kFlags = O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW;
+  Descriptor file{retried([&] { return ::openat(place.parent.number(), place.leaf.c_str(), kFlags); })};
+  if (!file.isOpen() || ::fstat(file.number(), &status) != 0 || !isRegular(status.st_mode)) return {};
   return file;
 }
 
@@ -41,13 +44,12 @@ Descriptor openOwnFile(const Place& place) {
   struct stat status {};
   struct stat holder {};
   if (!file.isOpen() || ::fstat(file.number(), &status) != 0 || ::fstat(place.parent.number(), &holder) != 0) return {};
-  if (refuse(mayBeRead(status, holder) ? 0 : EMLINK)) return {};
-  return file;
+  return mayBeRead(status, holder) || failWith(EMLINK) ? std::move(file) : Descriptor{};
 }
 
 Descriptor makeFile(const Place& place) {
-  constexpr int flags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags, 0600)};
+  constexpr int kFlags = O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), kFlags, 0600)};
   if (!file.isOpen() || ::fchmod(file.number(), 0600) == 0) return file;
   const int cause = errno;
   ::unlinkat(place.parent.number(), place.leaf.c_str(), 0);
@@ -81,7 +83,7 @@ ssize_t readSome(int descriptor, void* buffer, std::size_t size) {
 bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
   struct stat status {};
   if (::fstat(file, &status) != 0) return false;
-  if (static_cast<std::uintmax_t>(status.st_size) > limit) return !refuse(EFBIG);
+  if (static_cast<std::uintmax_t>(status.st_size) > limit) return failWith(EFBIG);
   // One byte more than expected shows whether the file ends where it said.
   bytes.resize(static_cast<std::size_t>(status.st_size) + 1);
   std::size_t filled = 0;
@@ -89,7 +91,7 @@ bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
     const ssize_t count = readSome(file, bytes.data() + filled, bytes.size() - filled);
     if (count < 0) return false;
     filled += static_cast<std::size_t>(count);
-    if (filled > limit) return !refuse(EFBIG);
+    if (filled > limit) return failWith(EFBIG);
     if (filled < bytes.size()) break;
     bytes.resize(bytes.size() * 2);
   }
@@ -102,8 +104,8 @@ bool sync(const Descriptor& file) {
 }
 
 Descriptor openForSync(const Descriptor& directory) {
-  constexpr int flags = O_RDONLY | O_DIRECTORY | O_CLOEXEC;
-  return Descriptor{retried([&] { return ::openat(directory.number(), ".", flags); })};
+  constexpr int kFlags = O_RDONLY | O_DIRECTORY | O_CLOEXEC;
+  return Descriptor{retried([&] { return ::openat(directory.number(), ".", kFlags); })};
 }
 
 }  // namespace platform

@@ -3,22 +3,33 @@
 #include <sys/stat.h>
 
 #include <cerrno>
-#include <filesystem>
 #include <string>
+#include <string_view>
 
+#include "platform/file_system.h"
 #include "platform/linux/files/descriptor.h"
-#include "platform/property_value.h"
 
 namespace platform {
 
 // The steps that the calls of the file system are made of. All set errno and answer false, or a descriptor that is not
 // open, where they fail.
 
+// Why a step fails, where no call of the system has set errno. Answers false.
+inline bool failWith(int errorNumber) {
+  errno = errorNumber;
+  return false;
+}
+
+// The failure of a call on the path whose last step has just failed: its cause is errno.
+[[nodiscard]] Status failureOf(std::string_view attempt, const Path& path);
+
 // A path taken apart: its opened parent directory and the name below it.
 struct Place {
   Descriptor parent;  // good for the *at calls only
   std::string leaf;   // "." for a root directory
 };
+
+[[nodiscard]] FileKind kindOf(mode_t mode);
 
 // Whether the name can be made, moved or removed: neither empty nor "." nor "..".
 [[nodiscard]] bool isEntryName(const std::string& leaf);
@@ -37,9 +48,9 @@ struct Place {
 // Calls again what a signal interrupted, a good many times; a call that is interrupted for ever fails with EINTR.
 template <typename Call>
 auto retried(const Call& call) {
-  constexpr int attempts = 100;
+  constexpr int kAttempts = 100;
   auto answer = call();
-  for (int attempt = 1; answer < 0 && errno == EINTR && attempt < attempts; ++attempt) answer = call();
+  for (int attempt = 1; answer < 0 && errno == EINTR && attempt < kAttempts; ++attempt) answer = call();
   return answer;
 }
 

@@ -16,11 +16,6 @@ namespace {
 constexpr mode_t kAllPermissions = 07777;
 constexpr mode_t kOrdinaryPermissions = 0777;
 
-FileKind kindOf(mode_t mode) {
-  if (S_ISREG(mode)) return FileKind::file;
-  return S_ISDIR(mode) ? FileKind::directory : FileKind::other;
-}
-
 FileAttributes attributesFrom(const struct stat& status) {
   return {.kind = kindOf(status.st_mode),
           .size = static_cast<std::uint64_t>(status.st_size),
@@ -31,30 +26,8 @@ FileAttributes attributesFrom(const struct stat& status) {
           .modifiedNanoseconds = status.st_mtim.tv_nsec};
 }
 
-// What is no regular file is looked at only.
-bool readFile(const Place& place, std::size_t sizeLimit, FileCopy& copy) {
-  struct stat status {};
-  if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return false;
-  copy.attributes = attributesFrom(status);
-  if (copy.attributes.kind != FileKind::file) return true;
-  const Descriptor file = openOwnFile(place);
-  if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return false;
-  copy.attributes = attributesFrom(status);
-  return readUpTo(file.number(), sizeLimit, copy.bytes);
-}
-
-bool appendToFile(const Place& place, std::span<const std::uint8_t> bytes) {
-  const int flags = O_WRONLY | O_APPEND | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
-  const Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags)};
-  struct stat before {};
-  if (!file.isOpen() || ::fstat(file.number(), &before) != 0) return false;
-  errno = EINVAL;
-  if (!S_ISREG(before.st_mode)) return false;
-  if (writeAll(file.number(), bytes.data(), bytes.size()) && sync(file)) return true;
-  const int cause = errno;
-  if (retried([&] { return ::ftruncate(file.number(), before.st_size); }) == 0) static_cast<void>(sync(file));
-  errno = cause;
-  return false;
+bool lookAt(const Place& place, struct stat& status) {
+  return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
 }
 
 // The owner comes before the permissions, of which a change of owner takes some away.
@@ -70,12 +43,6 @@ bool makeAsBefore(int file, const FileAttributes& attributes) {
   return ::futimens(file, times.data()) == 0;
 }
 
-bool isDirectory(const Place& place) {
-  struct stat status {};
-  return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
-         S_ISDIR(status.st_mode);
-}
-
 bool putInPlace(const Place& place, const std::string& beside, std::span<const std::uint8_t> bytes,
                 const FileAttributes& attributes) {
   const int parent = place.parent.number();
@@ -86,76 +53,87 @@ bool putInPlace(const Place& place, const std::string& beside, std::span<const s
          });
 }
 
-bool restoreFile(const Place& place, std::span<const std::uint8_t> bytes, const FileAttributes& attributes) {
-  errno = EISDIR;
-  if (isDirectory(place)) return false;
-  const std::string beside = ".restoring-" + place.leaf;
-  if (::unlinkat(place.parent.number(), beside.c_str(), 0) != 0 && errno != ENOENT) return false;
-  if (putInPlace(place, beside, bytes, attributes)) return true;
-  const int cause = errno;
-  ::unlinkat(place.parent.number(), beside.c_str(), 0);
-  errno = cause;
-  return false;
-}
-
-bool removeAndSync(const Place& place) {
-  return changeEntries(place.parent, [&place] {
-    return ::unlinkat(place.parent.number(), place.leaf.c_str(), 0) == 0 || errno == ENOENT;
-  });
-}
-
-bool readEntries(const Place& place, std::vector<std::string>& names) {
-  const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
-  const int directory = ::openat(place.parent.number(), place.leaf.c_str(), flags);
-  if (directory < 0) return false;
-  const std::unique_ptr<DIR, int (*)(DIR*)> stream{::fdopendir(directory), &::closedir};
-  if (!stream) return false;
-  errno = 0;
-  while (const dirent* const entry = ::readdir(stream.get())) {
-    if (isEntryName(entry->d_name)) names.emplace_back(entry->d_name);
-  }
-  std::ranges::sort(names);
-  return errno == 0;
-}
-
 class LinuxFileKeeper final : public FileKeeper {
  public:
   explicit LinuxFileKeeper(const FileTrees& trees) : _paths{trees} {}
 
   Result<FileAttributes> attributesOf(const Path& path) override {
     struct stat status {};
-    Status outcome = at(path, "look at", [&](const Place& place) {
-      return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
-    });
+    Status outcome = at(path, "look at", [&status](const Place& place) { return lookAt(place, status); });
     if (!outcome.isOk()) return outcome;
     return attributesFrom(status);
   }
 
+  // What is no regular file is looked at only.
   Result<FileCopy> read(const Path& path, std::size_t sizeLimit) override {
     FileCopy copy;
-    Status outcome = at(path, "read", [&](const Place& place) { return readFile(place, sizeLimit, copy); });
+    Status outcome = at(path, "read", [&](const Place& place) {
+      struct stat status {};
+      if (!lookAt(place, status)) return false;
+      copy.attributes = attributesFrom(status);
+      if (copy.attributes.kind != FileKind::file) return true;
+      const Descriptor file = openOwnFile(place);
+      if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return false;
+      copy.attributes = attributesFrom(status);
+      return readUpTo(file.number(), sizeLimit, copy.bytes);
+    });
     if (!outcome.isOk()) return outcome;
     return copy;
   }
 
   Result<std::vector<std::string>> entriesOf(const Path& directory) override {
     std::vector<std::string> names;
-    Status outcome = at(directory, "list", [&](const Place& place) { return readEntries(place, names); });
+    Status outcome = at(directory, "list", [&names](const Place& place) {
+      const int flags = O_RDONLY | O_DIRECTORY | O_NOFOLLOW | O_CLOEXEC;
+      const int opened = ::openat(place.parent.number(), place.leaf.c_str(), flags);
+      if (opened < 0) return false;
+      const std::unique_ptr<DIR, int (*)(DIR*)> stream{::fdopendir(opened), &::closedir};
+      if (!stream) return false;
+      errno = 0;
+      while (const dirent* const entry = ::readdir(stream.get())) {
+        if (isEntryName(entry->d_name)) names.emplace_back(entry->d_name);
+      }
+      return errno == 0;
+    });
     if (!outcome.isOk()) return outcome;
+    std::ranges::sort(names);
     return names;
   }
 
   Status append(const Path& path, std::span<const std::uint8_t> bytes) override {
-    return at(path, "add to", [bytes](const Place& place) { return appendToFile(place, bytes); });
+    return at(path, "add to", [bytes](const Place& place) {
+      const int flags = O_WRONLY | O_APPEND | O_NOFOLLOW | O_NONBLOCK | O_CLOEXEC;
+      const Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags)};
+      struct stat before {};
+      if (!file.isOpen() || ::fstat(file.number(), &before) != 0) return false;
+      if (!S_ISREG(before.st_mode)) return failWith(EINVAL);
+      if (writeAll(file.number(), bytes.data(), bytes.size()) && sync(file)) return true;
+      const int cause = errno;
+      if (retried([&] { return ::ftruncate(file.number(), before.st_size); }) == 0) static_cast<void>(sync(file));
+      return failWith(cause);
+    });
   }
 
   Status restore(const Path& path, std::span<const std::uint8_t> bytes, const FileAttributes& attributes) override {
-    return at(path, "restore", [&](const Place& place) { return restoreFile(place, bytes, attributes); });
+    return at(path, "restore", [&](const Place& place) {
+      struct stat status {};
+      if (lookAt(place, status) && S_ISDIR(status.st_mode)) return failWith(EISDIR);
+      const std::string beside = ".restoring-" + place.leaf;
+      if (::unlinkat(place.parent.number(), beside.c_str(), 0) != 0 && errno != ENOENT) return false;
+      if (putInPlace(place, beside, bytes, attributes)) return true;
+      const int cause = errno;
+      ::unlinkat(place.parent.number(), beside.c_str(), 0);
+      return failWith(cause);
+    });
   }
 
   // Nothing stands in a directory that is missing.
   Status removeFile(const Path& path) override {
-    Status removed = at(path, "remove", &removeAndSync);
+    Status removed = at(path, "remove", [](const Place& place) {
+      return changeEntries(place.parent, [&place] {
+        return ::unlinkat(place.parent.number(), place.leaf.c_str(), 0) == 0 || errno == ENOENT;
+      });
+    });
     return removed.errorNumber() == ENOENT ? Status{} : removed;
   }
 
@@ -163,9 +141,7 @@ class LinuxFileKeeper final : public FileKeeper {
   template <typename Action>
   Status at(const Path& path, const char* verb, const Action& action) {
     const Place place = _paths.openParent(path);
-    if (place.parent.isOpen() && action(place)) return {};
-    const int cause = errno;
-    return Status::failure(cause, std::string{verb} + " " + path.string());
+    return place.parent.isOpen() && action(place) ? Status{} : failureOf(verb, path);
   }
 
   PathResolver _paths;

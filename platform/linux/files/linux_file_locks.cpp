@@ -28,14 +28,9 @@ constexpr milliseconds kBetweenTries{10};
 // The file may come and go between two steps only if somebody plays with it; then there is no lock to be had.
 constexpr int kAttempts = 100;
 
-Status failure(const std::string& attempt, const std::filesystem::path& path) {
-  const int cause = errno;
-  return Status::failure(cause, attempt + " " + path.string());
-}
-
 Descriptor makeLockFile(const Place& place) {
-  constexpr int flags = O_RDONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
-  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), flags, kReadableByAll)};
+  constexpr int kFlags = O_RDONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC;
+  Descriptor file{::openat(place.parent.number(), place.leaf.c_str(), kFlags, kReadableByAll)};
   if (file.isOpen()) ::fchmod(file.number(), kReadableByAll);
   return file;
 }
@@ -46,13 +41,6 @@ std::string deviceAndNode(const struct stat& file) {
   std::snprintf(text.data(), text.size(), "%02x:%02x:%ju", ::major(file.st_dev), ::minor(file.st_dev),
                 static_cast<std::uintmax_t>(file.st_ino));
   return text.data();
-}
-
-std::string nameOfProcess(const std::string& process) {
-  std::ifstream file{"/proc/" + process + "/comm"};
-  std::string name;
-  std::getline(file, name);
-  return name.empty() ? name : " (" + name + ")";
 }
 
 // Who holds the lock of the file, as far as the kernel tells it to this process.
@@ -70,7 +58,11 @@ std::string holderOf(const Descriptor& file) {
     std::string process;
     std::string node;
     words >> number >> kind >> manner >> access >> process >> node;
-    if (kind == "FLOCK" && node == deviceAndNode(status)) return "process " + process + nameOfProcess(process);
+    if (kind != "FLOCK" || node != deviceAndNode(status)) continue;
+    std::ifstream names{"/proc/" + process + "/comm"};
+    std::string name;
+    std::getline(names, name);
+    return "process " + process + (name.empty() ? name : " (" + name + ")");
   }
   return "another process";
 }
@@ -134,10 +126,7 @@ class LockFile {
     return ::geteuid() != 0 || flawOf(status).empty() || isToBeTriedAgain(true);
   }
 
-  static bool isToBeTriedAgain(bool isSo) {
-    if (isSo) errno = EAGAIN;
-    return false;
-  }
+  static bool isToBeTriedAgain(bool isSo) { return isSo && failWith(EAGAIN); }
 
   // Why somebody else may have put it there.
   [[nodiscard]] std::string flawOf(const struct stat& status) const {
@@ -178,10 +167,10 @@ class LinuxFileLock final : public ExclusiveFileLock {
     for (int replaced = 0; replaced < kAttempts;) {
       if (!_file.isOpen()) return {};
       const bool isTaken = tryToTake();
-      if (!isTaken && errno != EWOULDBLOCK && errno != EINTR) return failure("take the lock", _file.path());
+      if (!isTaken && errno != EWOULDBLOCK && errno != EINTR) return failureOf("take the lock", _file.path());
       if (!_file.isAtItsPlace()) {
         ++replaced;
-        if (!_file.open()) return failure("open the lock file", _file.path());
+        if (!_file.open()) return failureOf("open the lock file", _file.path());
         continue;
       }
       if (isTaken) return {};
@@ -225,7 +214,7 @@ class LinuxFileLocks final : public ExclusiveFileLocks {
     if (!isEntryName(std::string{name}) || name.find('/') != std::string_view::npos) {
       return Status::failure(EINVAL, "open the lock file " + file.path().string());
     }
-    if (!file.open()) return failure("open the lock file", file.path());
+    if (!file.open()) return failureOf("open the lock file", file.path());
     return std::make_unique<LinuxFileLock>(std::move(file));
   }
 

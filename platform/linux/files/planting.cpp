@@ -18,14 +18,14 @@ bool isOurs(uid_t user) { return user == 0 || user == ::geteuid(); }
 bool isClosed(const struct stat& directory) { return (directory.st_mode & (S_IWGRP | S_IWOTH)) == 0; }
 
 Planters plantersOf(const struct stat& thing, const struct stat& directory) {
-  constexpr Planters anybody{.mayBeAnybody = true};
+  constexpr Planters kAnybody{.mayBeAnybody = true};
   const bool isSticky = (directory.st_mode & S_ISVTX) != 0;
   const bool hasSecondName = !S_ISDIR(thing.st_mode) && thing.st_nlink > 1;
-  if (!isClosed(directory) && (!isSticky || hasSecondName)) return anybody;
+  if (!isClosed(directory) && (!isSticky || hasSecondName)) return kAnybody;
   Planters planters;
   add(directory.st_uid, planters);
   if (S_ISLNK(thing.st_mode)) add(thing.st_uid, planters);
-  return planters.mayBeAnybody ? anybody : planters;
+  return planters.mayBeAnybody ? kAnybody : planters;
 }
 
 bool isReadableFor(uid_t user, const struct stat& file) { return file.st_uid == user || (file.st_mode & S_IROTH) != 0; }

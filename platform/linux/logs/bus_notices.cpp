@@ -8,8 +8,8 @@
 namespace platform {
 namespace {
 
-constexpr const char* noticesPath = "/com/vorlix/Notices";
-constexpr const char* noticesInterface = "com.vorlix.Notices1";
+constexpr const char* kNoticesPath = "/com/vorlix/Notices";
+constexpr const char* kNoticesInterface = "com.vorlix.Notices1";
 
 }  // namespace
 
@@ -30,7 +30,7 @@ class SystemBus {
     if (_connection == nullptr) _connection = openSystemBus();
     if (_connection == nullptr) return false;
     const int sent =
-        ::sd_bus_emit_signal(_connection.get(), noticesPath, noticesInterface, member, types, arguments...);
+        ::sd_bus_emit_signal(_connection.get(), kNoticesPath, kNoticesInterface, member, types, arguments...);
     if (sent < 0) _connection.reset();
     return sent >= 0;
   }

@@ -16,7 +16,7 @@
 namespace platform {
 namespace {
 
-constexpr int defaultLevel = LOG_NOTICE;
+constexpr int kDefaultLevel = LOG_NOTICE;
 
 void sendFields(const std::vector<std::string>& fields) {
   std::vector<iovec> vectors;
@@ -30,16 +30,6 @@ std::string field(const char* name, std::string_view value) {
   text += '=';
   text += value;
   return text;
-}
-
-std::vector<std::string> journalFields(const LogRecord& record) {
-  return {field("MESSAGE", record.text()),      field("PRIORITY", std::to_string(defaultLevel)),
-          field("SUBSYSTEM", record.subsystem), field("CATEGORY", record.category),
-          field("CODE_FUNC", record.method),    field("CODE_LINE", std::to_string(record.line))};
-}
-
-std::string syslogLine(const LogRecord& record) {
-  return singleLine("[" + std::string{record.subsystem} + ":" + std::string{record.category} + "] " + record.text());
 }
 
 // Whether something stands at a path. Asked for every message, so what was found counts for a tenth of a second.
@@ -88,9 +78,12 @@ class LinuxSystemLog final : public SystemLog {
   void write(const LogRecord& record) noexcept override {
     try {
       if (_sinks.hasJournal()) {
-        _sinks.sendToJournal(journalFields(record));
+        _sinks.sendToJournal({field("MESSAGE", record.text()), field("PRIORITY", std::to_string(kDefaultLevel)),
+                              field("SUBSYSTEM", record.subsystem), field("CATEGORY", record.category),
+                              field("CODE_FUNC", record.method), field("CODE_LINE", std::to_string(record.line))});
       } else if (_sinks.hasSyslog()) {
-        _sinks.sendToSyslog(syslogLine(record));
+        const std::string origin = std::string{record.subsystem} + ":" + std::string{record.category};
+        _sinks.sendToSyslog(singleLine("[" + origin + "] " + record.text()));
       }
     } catch (const std::exception&) {
       return;
@@ -107,7 +100,7 @@ LogSinks systemLogSinks() {
   return {.hasJournal = &hasJournal,
           .sendToJournal = &sendFields,
           .hasSyslog = &hasSyslog,
-          .sendToSyslog = [](const std::string& line) { ::syslog(LOG_USER | defaultLevel, "%s", line.c_str()); }};
+          .sendToSyslog = [](const std::string& line) { ::syslog(LOG_USER | kDefaultLevel, "%s", line.c_str()); }};
 }
 
 std::shared_ptr<SystemLog> makeSystemLog(LogSinks sinks) { return std::make_shared<LinuxSystemLog>(std::move(sinks)); }

@@ -15,17 +15,11 @@ icu::UnicodeString unicode(std::string_view text) {
   return icu::UnicodeString::fromUTF8({text.data(), static_cast<std::int32_t>(text.size())});
 }
 
-// The Gregorian calendar at all times, also before it was introduced.
-std::unique_ptr<icu::Calendar> prolepticCalendar(const icu::Locale& locale, UErrorCode& error) {
-  auto calendar = std::make_unique<icu::GregorianCalendar>(icu::TimeZone::detectHostTimeZone(), locale, error);
-  if (U_SUCCESS(error) != 0) calendar->setGregorianChange(U_DATE_MIN, error);
-  return calendar;
-}
-
 std::optional<std::string> localTime(std::int64_t millisecondsSince1970, std::string_view pattern) {
   const icu::Locale locale{"en", "US", "POSIX"};
   UErrorCode error = U_ZERO_ERROR;
-  auto calendar = prolepticCalendar(locale, error);
+  auto calendar = std::make_unique<icu::GregorianCalendar>(icu::TimeZone::detectHostTimeZone(), locale, error);
+  if (U_SUCCESS(error) != 0) calendar->setGregorianChange(U_DATE_MIN, error);  // also before it was introduced
   icu::SimpleDateFormat format{unicode(pattern), locale, error};
   if (U_FAILURE(error) != 0) return std::nullopt;
   format.adoptCalendar(calendar.release());
@@ -37,17 +31,16 @@ std::optional<std::string> localTime(std::int64_t millisecondsSince1970, std::st
   return text.toUTF8String(utf8);
 }
 
-std::string moreGeneral(const std::string& name) {
-  std::array<char, ULOC_FULLNAME_CAPACITY> parent{};
-  UErrorCode error = U_ZERO_ERROR;
-  ::uloc_getParent(name.c_str(), parent.data(), static_cast<std::int32_t>(parent.size()), &error);
-  return U_SUCCESS(error) != 0 ? parent.data() : "";
-}
-
 std::vector<std::string> localeNames(const std::string& environmentLocale) {
   std::vector<std::string> names;
   std::string name = icu::Locale::createCanonical(environmentLocale.c_str()).getBaseName();
-  for (; !name.empty(); name = moreGeneral(name)) names.push_back(name);
+  while (!name.empty()) {
+    names.push_back(name);
+    std::array<char, ULOC_FULLNAME_CAPACITY> parent{};
+    UErrorCode error = U_ZERO_ERROR;
+    ::uloc_getParent(name.c_str(), parent.data(), static_cast<std::int32_t>(parent.size()), &error);
+    name = U_SUCCESS(error) != 0 ? parent.data() : "";
+  }
   return names;
 }
 
