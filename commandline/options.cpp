@@ -19,17 +19,6 @@ std::string longName(const Option& option) { return option.names.substr(0, optio
 // The names without what follows an equals sign.
 std::string nameIn(const std::string& argument) { return argument.substr(0, argument.find('=')); }
 
-bool takesNextWord(const Option& option) {
-  return std::holds_alternative<Word>(option.target) || std::holds_alternative<PathWord>(option.target);
-}
-
-std::string formsOf(const Form& form) {
-  if (form.forms.empty()) return " takes no value";
-  std::string text = " is followed by nothing";
-  for (const std::string& each : form.forms) text += (&each == &form.forms.back() ? " or =" : ", =") + each;
-  return text;
-}
-
 // --- One option's values, as they were given in their order ---
 
 using Values = std::vector<std::string>;
@@ -55,7 +44,10 @@ void leave(const Option& option, const Form& form, const Values& values) {
   if (values.size() > 1) throw WrongUse{longName(option) + " is given twice"};
   const bool isBare = values.front() == kNoValue;
   if (!isBare && std::ranges::find(form.forms, values.front()) == form.forms.end()) {
-    throw WrongUse{longName(option) + formsOf(form)};
+    if (form.forms.empty()) throw WrongUse{longName(option) + " takes no value"};
+    std::string allowed;
+    for (const std::string& each : form.forms) allowed += (&each == &form.forms.back() ? " or =" : ", =") + each;
+    throw WrongUse{longName(option) + " is followed by nothing" + allowed};
   }
   *form.place = isBare ? std::string{} : values.front();
 }
@@ -63,7 +55,9 @@ void leave(const Option& option, const Form& form, const Values& values) {
 // --- The parser ---
 
 CLI::Option* declare(CLI::App& parser, const Option& option) {
-  if (takesNextWord(option)) {
+  const bool takesNextWord =
+      std::holds_alternative<Word>(option.target) || std::holds_alternative<PathWord>(option.target);
+  if (takesNextWord) {
     auto* const declared = parser.add_option(option.names)->expected(0, 1)->default_str(kNoValue);
     return declared->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
   }
@@ -74,22 +68,12 @@ CLI::Option* declare(CLI::App& parser, const Option& option) {
   return parser.add_flag(names)->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
 }
 
-// Counted on as many as can be: of words beyond the expected ones the parser would take those in brackets apart.
-CLI::Option* declareWords(CLI::App& parser) {
-  auto* const words = parser.add_option("words")->expected(kAnyNumber, kAnyNumber);
-  return words->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
-}
-
-std::vector<std::string> namesOf(std::span<const Option> options) {
+void refuseUnknown(const CLI::App& parser, std::span<const Option> options) {
   std::vector<std::string> names;
   for (const Option& option : options) names.push_back(longName(option));
-  return names;
-}
-
-void refuseUnknown(const CLI::App& parser, std::span<const Option> options) {
   for (const std::string& argument : parser.remaining()) {
     if (argument == "--") continue;
-    throw WrongUse{"unknown option: " + nameIn(argument), hintFor(nameIn(argument), namesOf(options))};
+    throw WrongUse{"unknown option: " + nameIn(argument), hintFor(nameIn(argument), names)};
   }
 }
 
@@ -113,7 +97,9 @@ std::vector<std::string> readOptions(std::span<const Option> options, std::span<
   parser.allow_extras();
   std::vector<CLI::Option*> declared;
   for (const Option& option : options) declared.push_back(declare(parser, option));
-  const auto* const words = declareWords(parser);
+  // Counted on as many as can be: of words beyond the expected ones the parser would take those in brackets apart.
+  auto* const words = parser.add_option("words")->expected(kAnyNumber, kAnyNumber);
+  words->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
   parser.parse(std::vector<std::string>{arguments.rbegin(), arguments.rend()});
   refuseUnknown(parser, options);
   for (std::size_t index = 0; index < declared.size(); ++index) {

@@ -12,22 +12,6 @@
 #include "commandline/text.h"
 
 namespace commandline {
-namespace {
-
-// A reader that went away and a file that may not grow.
-void surviveFailedWrites() {
-  std::signal(SIGPIPE, SIG_IGN);
-  std::signal(SIGXFSZ, SIG_IGN);
-}
-
-int told(std::string_view program, const Ending& ending) {
-  say(program, ending.what());
-  if (!ending.hint().empty() && ::isatty(STDERR_FILENO) == 1) say(program, ending.hint());
-  return ending.status();
-}
-
-}  // namespace
-
 void say(std::string_view program, std::string_view line) noexcept {
   try {
     const std::string text = std::string{program} + ": " + printable(line) + "\n";
@@ -46,12 +30,15 @@ bool print(std::string_view text) {
 
 int runProgram(std::string_view program, std::span<char* const> arguments, int failed,
                const std::function<int(std::span<const char* const>)>& work) {
-  surviveFailedWrites();
+  std::signal(SIGPIPE, SIG_IGN);  // a reader that went away
+  std::signal(SIGXFSZ, SIG_IGN);  // a file that may not grow
   try {
     const std::span<const char* const> all{arguments.data(), arguments.size()};
     return work(all.subspan(all.empty() ? 0 : 1));
   } catch (const Ending& ending) {
-    return told(program, ending);
+    say(program, ending.what());
+    if (!ending.hint().empty() && ::isatty(STDERR_FILENO) == 1) say(program, ending.hint());
+    return ending.status();
   } catch (const std::exception& thrown) {
     say(program, thrown.what());
   } catch (...) {

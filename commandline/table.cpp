@@ -18,11 +18,6 @@ constexpr std::size_t kNarrowestCell = 8;  // what a column keeps of its cells o
 constexpr std::size_t kNarrowestMeaning = 20;
 constexpr std::size_t kUnlimited = std::numeric_limits<std::size_t>::max();
 
-std::vector<Row> printableRows(std::vector<Row> rows) {
-  for (Row& row : rows) std::ranges::transform(row.cells, row.cells.begin(), printable);
-  return rows;
-}
-
 Widths widestCells(const std::vector<Row>& rows) {
   Widths widths;
   for (const Row& row : rows) {
@@ -34,13 +29,11 @@ Widths widestCells(const std::vector<Row>& rows) {
   return widths;
 }
 
-std::size_t sum(const Widths& widths) { return std::accumulate(widths.begin(), widths.end(), std::size_t{0}); }
-
 // The widest columns give way, one column of the page at a time.
 Widths fittedTo(Widths widths, const Page& page) {
   if (!page.columns || widths.empty()) return widths;
   const std::size_t gaps = kGap * (widths.size() - 1);
-  while (sum(widths) + gaps > *page.columns) {
+  while (std::accumulate(widths.begin(), widths.end(), gaps) > *page.columns) {
     const auto widest = std::ranges::max_element(widths);
     if (*widest <= kNarrowestCell) break;
     --*widest;
@@ -67,7 +60,8 @@ std::string emphasised(std::string_view text, Emphasis emphasis, const Page& pag
 }
 
 std::string table(const std::vector<Row>& rows, const Page& page) {
-  const auto shown = printableRows(rows);
+  std::vector<Row> shown = rows;
+  for (Row& row : shown) std::ranges::transform(row.cells, row.cells.begin(), printable);
   const Widths widths = fittedTo(widestCells(shown), page);
   std::string lines;
   for (const Row& row : shown) lines += emphasised(lineOf(row, widths), row.emphasis, page) + "\n";

@@ -27,15 +27,14 @@ std::size_t columnsOfTerminal(int descriptor) {
   return kUsualColumns;
 }
 
-bool isEmphasisWelcome() { return environment("NO_COLOR").empty() && environment("TERM") != "dumb"; }
-
 }  // namespace
 
 Page pageOn(int descriptor, Colour wish) {
   const bool isTerminal = ::isatty(descriptor) == 1;
   Page page;
   if (isTerminal) page.columns = columnsOfTerminal(descriptor);
-  page.isEmphasised = wish == Colour::always || (wish == Colour::automatic && isTerminal && isEmphasisWelcome());
+  const bool isWelcome = isTerminal && environment("NO_COLOR").empty() && environment("TERM") != "dumb";
+  page.isEmphasised = wish == Colour::always || (wish == Colour::automatic && isWelcome);
   return page;
 }
 

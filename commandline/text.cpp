@@ -8,6 +8,7 @@
 #include <numeric>
 #include <ranges>
 #include <span>
+#include <utility>
 
 namespace commandline {
 namespace {
@@ -24,17 +25,14 @@ struct Cluster {
   std::size_t columns;
 };
 
-bool isPicture(Code code) {
-  const auto kind = ::utf8proc_get_property(code)->boundclass;
-  return kind == UTF8PROC_BOUNDCLASS_EXTENDED_PICTOGRAPHIC || kind == UTF8PROC_BOUNDCLASS_REGIONAL_INDICATOR;
-}
-
 // Adds up the columns of a cluster's characters. Pictures that are joined take the place of one.
 class Measure {
  public:
   void add(Code code) {
-    if (_isFirst) _isPicture = isPicture(code);
-    _isFirst = false;
+    if (std::exchange(_isFirst, false)) {
+      const auto kind = ::utf8proc_get_property(code)->boundclass;
+      _isPicture = kind == UTF8PROC_BOUNDCLASS_EXTENDED_PICTOGRAPHIC || kind == UTF8PROC_BOUNDCLASS_REGIONAL_INDICATOR;
+    }
     _isEmoji = _isEmoji || code == kEmojiSelector;
     _columns += static_cast<std::size_t>(std::max(::utf8proc_charwidth(code), 0));
   }

@@ -31,12 +31,6 @@ struct MessageReleaser {
 };
 using Message = std::unique_ptr<sd_bus_message, MessageReleaser>;
 
-Message newSignal(sd_bus& bus, const char* name) {
-  sd_bus_message* made = nullptr;  // and stays so where none can be made
-  ::sd_bus_message_new_signal(&bus, &made, kPath, kInterface, name);
-  return Message{made};
-}
-
 // Returns once the bus has taken everything that was sent before, so that signals keep their order whoever sends the
 // next one, and none is lost when the process ends.
 void waitForBus(sd_bus& bus) {
@@ -72,12 +66,15 @@ class Arguments {
   bool _areComplete = true;
 };
 
-// Without a bus nothing happens. A connection of its own for each
-// signal asks nothing of the process: no event loop, no thread, nothing to carry over a fork or a restart of the bus.
+// Without a bus nothing happens. A connection of its own for each signal asks nothing of the process: no event loop, no
+// thread, nothing to carry over a fork or a restart of the bus.
 template <typename Fill>
 void announce(const char* name, const Fill& fill) try {
   const auto bus = platform::openSystemBus();
-  const auto signal = bus == nullptr ? nullptr : newSignal(*bus, name);
+  if (bus == nullptr) return;
+  sd_bus_message* made = nullptr;  // and stays so where none can be made
+  ::sd_bus_message_new_signal(bus.get(), &made, kPath, kInterface, name);
+  const Message signal{made};
   if (signal == nullptr) return;
   Arguments arguments{*signal};
   fill(arguments);
@@ -111,28 +108,18 @@ void addVariant(Arguments& arguments, const char* kind, const Value& value) {
   arguments.close();
 }
 
-// Whether the value has a type that the interface promises; nothing else is passed on.
-bool isPassedOn(const PropertyValue& value) {
-  return value.asText() != nullptr || value.asArray() != nullptr || value.asInteger().has_value();
-}
-
-void addValue(Arguments& arguments, const PropertyValue& value) {
-  if (const auto* const text = value.asText()) {
-    addVariant(arguments, "s", text->string());
-  } else if (const auto* const array = value.asArray()) {
-    addTexts(arguments, *array);
-  } else {
-    addVariant(arguments, "i", static_cast<std::int32_t>(value.integerValue().value_or(0)));
-  }
-}
-
+// Values of other types than the interface promises are not passed on.
 void addEntry(Arguments& arguments, const Dictionary& change) {
   arguments.open(SD_BUS_TYPE_ARRAY, "{sv}");
   for (const auto& [key, value] : change) {
-    if (!isPassedOn(value)) continue;
+    const auto* const text = value.asText();
+    const auto* const array = value.asArray();
+    if (text == nullptr && array == nullptr && !value.asInteger()) continue;
     arguments.open(SD_BUS_TYPE_DICT_ENTRY, "sv");
     arguments.add(key.string());
-    addValue(arguments, value);
+    if (text != nullptr) addVariant(arguments, "s", text->string());
+    if (array != nullptr) addTexts(arguments, *array);
+    if (const auto integer = value.asInteger()) addVariant(arguments, "i", static_cast<std::int32_t>(integer->bits));
     arguments.close();
   }
   arguments.close();

@@ -6,16 +6,8 @@
 #include <utility>
 
 namespace modules {
-namespace {
 
 using accountsettings::RefreshRequest;
-
-bool asksForTheSame(const RefreshRequest& left, const RefreshRequest& right) {
-  return std::tie(left.scope, left.dataclass, left.containerIdentifier) ==
-         std::tie(right.scope, right.dataclass, right.containerIdentifier);
-}
-
-}  // namespace
 
 bool RefreshQueue::refreshContainerWithIdentifier_forDataclass_isUserRequested(std::string_view identifier,
                                                                                std::string_view dataclass,
@@ -37,13 +29,15 @@ std::vector<RefreshRequest> RefreshQueue::takeRequests() { return std::exchange(
 bool RefreshQueue::begin(RefreshRequest request) {
   const auto account = _account.lock();
   if (account == nullptr || !account->isEnabledForDataclass(request.dataclass)) return false;
-  const auto pending =
-      std::ranges::find_if(_requests, [&](const RefreshRequest& other) { return asksForTheSame(other, request); });
+  const auto whatIsAsked = [](const RefreshRequest& each) {
+    return std::tie(each.scope, each.dataclass, each.containerIdentifier);
+  };
+  const auto pending = std::ranges::find(_requests, whatIsAsked(request), whatIsAsked);
   if (pending != _requests.end()) {
     pending->isUserRequested = pending->isUserRequested || request.isUserRequested;
     return true;
   }
-  if (_requests.size() == kMostRequests) return false;
+  if (_requests.size() == kMaxRequests) return false;
   _requests.push_back(std::move(request));
   return true;
 }

@@ -15,7 +15,7 @@ namespace modules {
 class RefreshQueue final : public accountsettings::RefreshQueueObject {
  public:
   // More requests than anybody can have meant are refused.
-  static constexpr std::size_t kMostRequests = 1024;
+  static constexpr std::size_t kMaxRequests = 1024;
 
   explicit RefreshQueue(const std::shared_ptr<accountsettings::BasicAccount>& account) : _account{account} {}
 

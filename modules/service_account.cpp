@@ -8,11 +8,6 @@ std::string textOf(const std::optional<PropertyValue>& value) {
   return text == nullptr ? std::string{} : text->string();
 }
 
-std::uint16_t portOf(const std::optional<PropertyValue>& value, std::uint16_t otherwise) {
-  const auto number = value ? value->integerValue().value_or(0) : 0;
-  return number > 0 && number <= UINT16_MAX ? static_cast<std::uint16_t>(number) : otherwise;
-}
-
 }  // namespace
 
 std::optional<PropertyValue> ServiceAccount::value(std::string_view key) const {
@@ -47,7 +42,10 @@ std::optional<accountsettings::ServiceAddress> ServiceAccount::service() const {
   if (name.empty()) return std::nullopt;
   const auto secureValue = value(kSecureKey);
   const bool isSecure = !secureValue || secureValue->booleanValue().value_or(true);
-  const auto port = portOf(value(kPortKey), isSecure ? _kind.securePort : _kind.plainPort);
+  const auto portValue = value(kPortKey);
+  const auto given = portValue ? portValue->integerValue().value_or(0) : 0;
+  const auto usual = isSecure ? _kind.securePort : _kind.plainPort;
+  const auto port = given > 0 && given <= UINT16_MAX ? static_cast<std::uint16_t>(given) : usual;
   return accountsettings::ServiceAddress{std::move(name), port, isSecure};
 }
 

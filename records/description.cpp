@@ -31,25 +31,15 @@ constexpr std::array<std::string_view, 3> kPlainKeys{"loginkey", "caldavserverke
 
 constexpr std::string_view kHidden = "<hidden>";
 
-bool isUpper(char character) { return std::isupper(static_cast<unsigned char>(character)) != 0; }
 bool isLower(char character) { return std::islower(static_cast<unsigned char>(character)) != 0; }
 bool isAlphabetic(char character) { return std::isalpha(static_cast<unsigned char>(character)) != 0; }
 char lower(char character) { return static_cast<char>(std::tolower(static_cast<unsigned char>(character))); }
-
-std::string foldedKey(std::string_view key) {
-  std::string folded;
-  folded.reserve(key.size());
-  for (const char character : key) {
-    if (character != ' ' && character != '-' && character != '_') folded.push_back(lower(character));
-  }
-  return folded;
-}
 
 // Whether a new word begins at the place: "userPass", "IMAPPass", "user_pass".
 bool beginsWord(std::string_view key, std::size_t place) {
   if (!isAlphabetic(key[place])) return false;
   if (place == 0 || !isAlphabetic(key[place - 1])) return true;
-  if (!isUpper(key[place])) return false;
+  if (std::isupper(static_cast<unsigned char>(key[place])) == 0) return false;
   return isLower(key[place - 1]) || (place + 1 < key.size() && isLower(key[place + 1]));
 }
 
@@ -161,20 +151,6 @@ class Writer {
   std::string _text;
 };
 
-PropertyValue presentableArray(const Array& array) {
-  Array shown;
-  shown.reserve(array.size());
-  for (const PropertyValue& element : array) shown.push_back(presentable({}, element));
-  return shown;
-}
-
-PropertyValue presentableDictionary(const Dictionary& dictionary) {
-  Dictionary shown;
-  shown.reserve(dictionary.size());
-  for (const auto& [key, value] : dictionary) shown.set(key, presentable(key, value));
-  return shown;
-}
-
 }  // namespace
 
 std::string withoutUserParts(std::string_view text) {
@@ -193,7 +169,11 @@ std::string withoutUserParts(std::string_view text) {
 }
 
 bool namesCredential(std::string_view key) {
-  const std::string folded = foldedKey(key);
+  std::string folded;
+  folded.reserve(key.size());
+  for (const char character : key) {
+    if (character != ' ' && character != '-' && character != '_') folded.push_back(lower(character));
+  }
   if (std::ranges::find(kPlainKeys, folded) != kPlainKeys.end()) return false;
   const auto isPart = [&folded](std::string_view word) { return folded.find(word) != std::string::npos; };
   return std::ranges::any_of(kCredentialWords, isPart) || hasShortCredentialWord(key);
@@ -211,9 +191,19 @@ std::string descriptionUnder(std::string_view key, const PropertyValue& value) {
 
 PropertyValue presentable(std::string_view key, const PropertyValue& value) {
   if (namesCredential(key)) return kHidden;
+  if (const Array* const array = value.asArray()) {
+    Array shown;
+    shown.reserve(array->size());
+    for (const PropertyValue& element : *array) shown.push_back(presentable({}, element));
+    return shown;
+  }
+  if (const Dictionary* const dictionary = value.asDictionary()) {
+    Dictionary shown;
+    shown.reserve(dictionary->size());
+    for (const auto& [name, part] : *dictionary) shown.set(name, presentable(name, part));
+    return shown;
+  }
   switch (value.kind()) {
-    case PropertyValue::Kind::array: return presentableArray(*value.asArray());
-    case PropertyValue::Kind::dictionary: return presentableDictionary(*value.asDictionary());
     case PropertyValue::Kind::data:
     case PropertyValue::Kind::date:
     case PropertyValue::Kind::uid: return description(value);
