@@ -67,9 +67,9 @@ class ACCOUNT_EXPORT AccountsManager {
   using RuntimeFixers = std::vector<std::shared_ptr<RuntimeFixer>>;
   [[nodiscard]] RuntimeFixers _createRuntimeFixers() const;
   // Internal: what follows the accounts for a run's observer; null where none wants to know.
-  [[nodiscard]] ChangeTracker* _changeTracker() const { return _tracker.get(); }
+  [[nodiscard]] ChangeTracker* changeTracker() const { return _tracker.get(); }
   // Internal: tells the run's observer, if there is one, what became of the accounts since it last was told.
-  void _tellChanges() const;
+  void tellChanges() const;
 
   // --- Migration support (accounts_manager_migration_support.cpp) ---
 

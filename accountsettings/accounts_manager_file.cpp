@@ -204,12 +204,12 @@ void AccountsManager::_setOriginalAccountDictionaries() {
   }
 }
 
-void AccountsManager::_tellChanges() const {
+void AccountsManager::tellChanges() const {
   if (_tracker) _tracker->look(_orderedTopLevelAccounts);
 }
 
 void AccountsManager::saveAllAccounts() {
-  _tellChanges();
+  tellChanges();
   const platform::RunStage stage{"save"};
   _ASLogSystem().log(kSave, "Saving all accounts");
   const bool isFixed = fixAccountsForSaving();
@@ -227,7 +227,7 @@ void AccountsManager::saveAllAccounts() {
 }
 
 void AccountsManager::writeFile() {
-  _tellChanges();
+  tellChanges();
   _lastSaveOutcome = {SaveStage::merging};
   Array records = mergedRecords();
   if (_tracker) _tracker->written(_orderedTopLevelAccounts, records);

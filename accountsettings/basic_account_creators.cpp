@@ -4,6 +4,7 @@
 #include "accountsettings/basic_account.h"
 #include "accountsettings/file_paths.h"
 #include "accountsettings/log_handle.h"
+#include "accountsettings/service_objects.h"
 #include "platform/platform.h"
 
 namespace accountsettings {
@@ -12,6 +13,13 @@ namespace {
 constexpr std::string_view kFullAccount = "FullAccount";
 constexpr std::string_view kSyncAccount = "SyncAccount";
 constexpr int kCredentialsNotRenewed = 3;
+
+constexpr std::string_view kNoDescription =
+    "Malformed AccountCreators information. Could not find the description for the %@ with type %@";
+constexpr std::string_view kNoFramework =
+    "Malformed AccountCreators information. Could not find the path to the framework for the %@ with type %@";
+constexpr std::string_view kNoClass =
+    "Malformed AccountCreators information. Could not find the name of the class that creates %@ with the type %@";
 
 // What is looked for: the creator of one kind for one account type.
 struct Search {
@@ -34,39 +42,10 @@ const Array& creatorEntries(std::optional<std::string_view> type) {
   return *entries;
 }
 
-bool isCreatorOfType(const PropertyValue& entry, std::string_view creatorType) {
-  const Dictionary* const dictionary = entry.asDictionary();
-  const Text* const type = dictionary == nullptr ? nullptr : dictionary->text("Type");
-  return type != nullptr && *type == creatorType;
-}
-
-const Dictionary& descriptionIn(const PropertyValue& entry, const Search& search) {
-  const Dictionary* const description = entry.asDictionary()->dictionary("Description");
-  if (description == nullptr) {
-    failLookup("Malformed AccountCreators information. Could not find the description for the %@ with type %@",
-               search.creatorType, search.type);
-  }
-  return *description;
-}
-
-const Text& frameworkIn(const Dictionary& description, const Search& search) {
-  const Text* const framework = description.text("Framework");
-  if (framework == nullptr) {
-    failLookup(
-        "Malformed AccountCreators information. Could not find the path to the framework for the %@ with type %@",
-        search.creatorType, search.type);
-  }
-  return *framework;
-}
-
-const Text& classNameIn(const Dictionary& description, const Search& search) {
-  const Text* const name = description.text("Class");
-  if (name == nullptr || name->empty()) {
-    failLookup(
-        "Malformed AccountCreators information. Could not find the name of the class that creates %@ with the type %@",
-        search.creatorType, search.type);
-  }
-  return *name;
+template <typename Found>
+const Found& required(const Found* found, std::string_view whatIsMissing, const Search& search) {
+  if (found == nullptr) failLookup(whatIsMissing, search.creatorType, search.type);
+  return *found;
 }
 
 void openModule(const std::string& path) {
@@ -98,14 +77,14 @@ std::shared_ptr<FullAccountObject> makeFullAccount(const platform::ClassInfo& in
   return creator->accountWithBasicAccount ? creator->accountWithBasicAccount(account) : nullptr;
 }
 
-std::shared_ptr<SyncAccountObject> makeSyncAccount(const platform::ClassInfo& info,
-                                                   const std::shared_ptr<BasicAccount>& account) {
-  const auto* const creator = dynamic_cast<const AccountClassInfo*>(&info);
-  const bool answers = creator != nullptr && creator->accountToRefreshForBasicAccount;
-  return answers ? creator->accountToRefreshForBasicAccount(account) : nullptr;
-}
-
 }  // namespace
+
+// Defined here, so that the types have one home and are the same in the library and in every module.
+FullAccountObject::~FullAccountObject() = default;
+SyncAccountObject::~SyncAccountObject() = default;
+AccountClassInfo::~AccountClassInfo() = default;
+ServiceAccountObject::~ServiceAccountObject() = default;
+RefreshQueueObject::~RefreshQueueObject() = default;
 
 std::optional<std::string> BasicAccount::_creatorClassNameForAccountType_creatorType_loader(
     std::optional<std::string_view> type, std::string_view creatorType, const AccountClassInfo* loader) const {
@@ -113,10 +92,15 @@ std::optional<std::string> BasicAccount::_creatorClassNameForAccountType_creator
   std::optional<std::string> className;
   // Every matching entry's module is opened; the last one's class counts.
   for (const PropertyValue& entry : creatorEntries(type)) {
-    if (!isCreatorOfType(entry, creatorType)) continue;
-    const Dictionary& description = descriptionIn(entry, search);
-    if (!isLoadedBy(loader, search, _properties)) openModule(modulePath(frameworkIn(description, search)));
-    className = classNameIn(description, search).string();
+    const Dictionary* const creator = entry.asDictionary();
+    const Text* const kind = creator == nullptr ? nullptr : creator->text("Type");
+    if (kind == nullptr || *kind != creatorType) continue;
+    const Dictionary& description = required(creator->dictionary("Description"), kNoDescription, search);
+    if (!isLoadedBy(loader, search, _properties)) {
+      openModule(modulePath(required(description.text("Framework"), kNoFramework, search)));
+    }
+    const Text* const name = description.text("Class");
+    className = required(name == nullptr || name->empty() ? nullptr : name, kNoClass, search).string();
   }
   return className;
 }
@@ -164,7 +148,9 @@ std::shared_ptr<SyncAccountObject> BasicAccount::_cachedSyncAccount() {
                        *className, _properties);
     return nullptr;
   }
-  _syncAccount = makeSyncAccount(*info, shared_from_this());
+  const auto* const creator = dynamic_cast<const AccountClassInfo*>(info);
+  const bool answers = creator != nullptr && creator->accountToRefreshForBasicAccount;
+  _syncAccount = answers ? creator->accountToRefreshForBasicAccount(shared_from_this()) : nullptr;
   if (_syncAccount == nullptr) {
     _ASLogSystem().log(kMethod, "ERROR: Could not create the account with class %@ and id %@", *className,
                        identifier());

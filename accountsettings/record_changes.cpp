@@ -33,14 +33,10 @@ bool isToldByKey(std::string_view key, const Dictionary& before, const Dictionar
   return key != kAccountChildAccounts || !holdsRecordsOnly(before.find(key)) || !holdsRecordsOnly(after.find(key));
 }
 
-bool isTellingText(const PropertyValue& value) {
-  const Text* const text = value.asText();
-  return text != nullptr && !text->empty();
-}
-
 // The key that went and whose text now stands under the changed one; taken out of those that went.
 std::string takeOldKey(const PropertyValue& value, std::vector<Change>& gone) {
-  if (!isTellingText(value)) return {};
+  const Text* const text = value.asText();
+  if (text == nullptr || text->empty()) return {};
   const auto found = std::ranges::find_if(gone, [&value](const Change& each) { return each.from == value; });
   if (found == gone.end()) return {};
   std::string key = std::move(found->key);
@@ -232,10 +228,6 @@ class Comparison {
   std::vector<Difference> _differences;
 };
 
-bool isUnchanged(const RecordState& before, const RecordState& after) {
-  return before.account == after.account && before.properties.isIdenticalTo(after.properties);
-}
-
 }  // namespace
 
 Name nameOf(const Dictionary& properties, std::string_view parent) {
@@ -259,7 +251,10 @@ std::vector<Change> changesOf(const Dictionary& before, const Dictionary& after)
 }
 
 std::vector<Difference> differencesBetween(const StoreState& before, const StoreState& after) {
-  if (std::ranges::equal(before, after, &isUnchanged)) return {};
+  const auto isUnchanged = [](const RecordState& one, const RecordState& other) {
+    return one.account == other.account && one.properties.isIdenticalTo(other.properties);
+  };
+  if (std::ranges::equal(before, after, isUnchanged)) return {};
   return Comparison{before, after}.differences();
 }
 

@@ -42,16 +42,6 @@ void reportCurrentException() noexcept {
   }
 }
 
-using HeldLock = std::unique_ptr<platform::ExclusiveFileLock>;
-
-void release(HeldLock lock) noexcept {
-  try {
-    AccountsManager::releaseMigrationLock(std::move(lock));
-  } catch (...) {
-    reportCurrentException();
-  }
-}
-
 struct Decision {
   bool mail = false;
   bool exchange = false;
@@ -132,7 +122,7 @@ platform::MigrationFootprint AccountsDataMigrator::footprint() const {
 }
 
 bool AccountsDataMigrator::performMigration() {
-  HeldLock lock;
+  std::unique_ptr<platform::ExclusiveFileLock> lock;
   bool hasSucceeded = false;
   try {
     lock = AccountsManager::createAndLockMigrationLock();
@@ -141,7 +131,11 @@ bool AccountsDataMigrator::performMigration() {
     reportCurrentException();
     AccountsManager::_setShouldSkipNotifications(false);
   }
-  release(std::move(lock));
+  try {
+    AccountsManager::releaseMigrationLock(std::move(lock));
+  } catch (...) {
+    reportCurrentException();
+  }
   return hasSucceeded;
 }
 

@@ -25,12 +25,6 @@ std::optional<Text> unlessEmpty(std::optional<Text> text) {
   return text && !text->empty() ? std::move(text) : std::nullopt;
 }
 
-void keepIdentifierForSync(BasicAccount& account) {
-  if (const auto identifier = unlessEmpty(textForKey(account, kAccountIdentifier))) {
-    account.setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
-  }
-}
-
 void settleIdentifier(BasicAccount& account) {
   // Read from the account's own properties: a unique id names this very record and is never a parent's.
   const Text* const uniqueId = account.properties().text(kUniqueIdKey);
@@ -67,26 +61,7 @@ bool isKeptOnDevice(const DataclassSources& kind) {
          BasicAccount::multipleStoresSupportedByDataclass(kind.dataclass);
 }
 
-// --- Mail and CalDAV ---
-
-void enableMailAndNotes(BasicAccount& account) {
-  if (!hasClassAmong(account, {kIMAPAccountClass, kGmailAccountClass, kYahooAccountClass, kAOLAccountClass,
-                               kNimbraAccountClass})) {
-    return;
-  }
-  if (!isActiveUnlessSaidOtherwise(account)) return;
-  account.setEnabled_forDataclass(true, kAccountDataclassMail);
-  account.setEnabled_forDataclass(true, kAccountDataclassNotes);
-}
-
-void giveOwnTypeToGmailAndYahoo(BasicAccount& account) {
-  if (hasClassAmong(account, {kGmailAccountClass})) {
-    account._forcedSetAccountProperty_forKey(kGmailAccountType, kAccountType);
-  }
-  if (hasClassAmong(account, {kYahooAccountClass})) {
-    account._forcedSetAccountProperty_forKey(kYahooAccountType, kAccountType);
-  }
-}
+// --- CalDAV ---
 
 // The calendar accounts of a store, found by the name that they log in with.
 class CalDAVAccounts {
@@ -146,7 +121,9 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A150(AccountsManager& store) {
   Accounts incoming = store.basicAccountsWithTypes({kNimbraAccountType, kMailAccountType});
   std::ranges::copy(store.basicAccountsWithTypes({kExchangeAccountType}), std::back_inserter(incoming));
   for (const AccountsManager::Account& account : incoming) {
-    keepIdentifierForSync(*account);
+    if (const auto identifier = unlessEmpty(textForKey(*account, kAccountIdentifier))) {
+      account->setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
+    }
     settleIdentifier(*account);
   }
   // Outgoing servers have no data to sync, and so no sync identifier to keep.
@@ -196,9 +173,19 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A242(AccountsManager& store) {
   const CalDAVAccounts candidates{store};
   Accounts folded;
   for (const AccountsManager::Account& account : store.allBasicAccounts()) {
-    enableMailAndNotes(*account);
-    giveOwnTypeToGmailAndYahoo(*account);
-    foldPartnersInto(*account, candidates, folded, store._changeTracker());
+    const bool isMail = hasClassAmong(
+        *account, {kIMAPAccountClass, kGmailAccountClass, kYahooAccountClass, kAOLAccountClass, kNimbraAccountClass});
+    if (isMail && isActiveUnlessSaidOtherwise(*account)) {
+      account->setEnabled_forDataclass(true, kAccountDataclassMail);
+      account->setEnabled_forDataclass(true, kAccountDataclassNotes);
+    }
+    if (hasClassAmong(*account, {kGmailAccountClass})) {
+      account->_forcedSetAccountProperty_forKey(kGmailAccountType, kAccountType);
+    }
+    if (hasClassAmong(*account, {kYahooAccountClass})) {
+      account->_forcedSetAccountProperty_forKey(kYahooAccountType, kAccountType);
+    }
+    foldPartnersInto(*account, candidates, folded, store.changeTracker());
   }
   for (const AccountsManager::Account& account : folded) store.deleteAccount(account);
   store.setDataVersion(5);

@@ -66,7 +66,7 @@ void tellRefused(const LegacySource& source, std::size_t refused) {
 }  // namespace
 
 void noteOrigins(AccountsManager& store, const LegacySource& source, const AccountsManager::Accounts& accounts) {
-  accountsettings::ChangeTracker* const tracker = store._changeTracker();
+  accountsettings::ChangeTracker* const tracker = store.changeTracker();
   const Array* const descriptions = source.contents.array(source.key);
   if (tracker == nullptr || descriptions == nullptr) return;
   for (std::size_t index = 0; index < accounts.size(); ++index) {

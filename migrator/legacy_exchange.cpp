@@ -24,7 +24,10 @@ constexpr std::array kSwitches{Switch{"DAAccountEnabledForCalendar", kAccountDat
                                Switch{"DAAccountEnabledForEmail", kAccountDataclassMail},
                                Switch{"DAAccountEnabledForContactsSearch", kAccountDataclassContactsSearch}};
 
-Array takeEnabledDataclasses(Dictionary& record) {
+}  // namespace
+
+std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertExchangeAccountDescription(const Dictionary& description) {
+  Dictionary record = renamed(description, kRenames);
   Array enabled;
   for (const Switch& each : kSwitches) {
     // Switches that were never set, or that hold what is no switch, are on.
@@ -32,14 +35,6 @@ Array takeEnabledDataclasses(Dictionary& record) {
     const bool isOn = !value || value->booleanValue().value_or(true);
     if (isOn) enabled.emplace_back(each.dataclass);
   }
-  return enabled;
-}
-
-}  // namespace
-
-std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertExchangeAccountDescription(const Dictionary& description) {
-  Dictionary record = renamed(description, kRenames);
-  Array enabled = takeEnabledDataclasses(record);
   record.set(kAccountEnabledDataclasses, std::move(enabled));
   record.set(kAccountType, kExchangeAccountType);
   record.set(kAccountTypeString, "Exchange");

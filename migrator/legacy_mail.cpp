@@ -61,34 +61,10 @@ void cutHostedUsername(Dictionary& record) {
   if (at != std::string_view::npos) record.set(kAccountUsername, Text{username->view().substr(0, at)});
 }
 
-void setSyncIdentifier(BasicAccount& account, const Dictionary& record) {
-  if (const Text* const identifier = record.text(kAccountIdentifier)) {
-    account.setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
-  } else if (const auto made = platform::current().identifiers->makeUuid(); made.isOk()) {
-    account.setAccountProperty_forKey(made.value(), kAccountSyncIdentifier);
-  }
-}
-
 Conversion conversionOfType(std::string_view initialType) {
   return [initialType](const Dictionary& description) {
     return AccountsDataMigrator::_convertMailAccountDescription_type(description, initialType);
   };
-}
-
-struct ConvertedMail {
-  AccountsManager::Accounts delivery;
-  AccountsManager::Accounts incoming;
-};
-
-// Every account of the file, or nothing where one of them is refused.
-std::optional<ConvertedMail> convertedMail(const LegacySource& outgoingServers, const LegacySource& mailAccounts) {
-  auto delivery = convertedAccounts(outgoingServers, conversionOfType(kSMTPAccountType), kMethod,
-                                    "%s. Could not convert the description for the delivery account %@");
-  if (!delivery) return std::nullopt;
-  auto incoming = convertedAccounts(mailAccounts, conversionOfType(kMailAccountType), kMethod,
-                                    "%s. Could not convert the description for the incoming account %@");
-  if (!incoming) return std::nullopt;
-  return ConvertedMail{*std::move(delivery), *std::move(incoming)};
 }
 
 }  // namespace
@@ -118,7 +94,11 @@ std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertMailAccountDescripti
   cutHostedUsername(record);
   std::shared_ptr<BasicAccount> account = BasicAccount::initWithProperties(record);
   if (!account) return nullptr;
-  setSyncIdentifier(*account, record);
+  if (const Text* const identifier = record.text(kAccountIdentifier)) {
+    account->setAccountProperty_forKey(*identifier, kAccountSyncIdentifier);
+  } else if (const auto made = platform::current().identifiers->makeUuid(); made.isOk()) {
+    account->setAccountProperty_forKey(made.value(), kAccountSyncIdentifier);
+  }
   if (account->accountClass() == Text{kGenericMailClass}) {
     reportMailAccountClassFound(account->properties(), "During account migration");
   }
@@ -129,21 +109,28 @@ bool AccountsDataMigrator::_migrateMailAccounts(AccountsManager& store) {
   const std::string path = mailAccountsPath();
   const Dictionary legacyFile = readLegacyFile(path);
   if (!legacyFile.empty()) _foundOldMailAccountsToMigrate = true;
-  if (_saveMigrationInformation() && _collatedMigrationData)
+  if (_saveMigrationInformation() && _collatedMigrationData) {
     _collatedMigrationData->set(kOldMailAccountsKey, legacyFile);
-
-  const LegacySource delivery{path, legacyFile, "DeliveryAccounts", kRenames, "MailAccounts"};
-  const LegacySource incoming{path, legacyFile, "MailAccounts", kRenames, "DeliveryAccounts"};
-  const std::optional<ConvertedMail> accounts = convertedMail(delivery, incoming);
-  if (accounts) {
-    noteOrigins(store, delivery, accounts->delivery);
-    noteOrigins(store, incoming, accounts->incoming);
+  }
+  const LegacySource outgoingServers{path, legacyFile, "DeliveryAccounts", kRenames, "MailAccounts"};
+  const LegacySource mailAccounts{path, legacyFile, "MailAccounts", kRenames, "DeliveryAccounts"};
+  // All or nothing: where one description is refused, none of either kind is stored.
+  const auto delivery = convertedAccounts(outgoingServers, conversionOfType(kSMTPAccountType), kMethod,
+                                          "%s. Could not convert the description for the delivery account %@");
+  auto incoming = std::optional<AccountsManager::Accounts>{};
+  if (delivery) {
+    incoming = convertedAccounts(mailAccounts, conversionOfType(kMailAccountType), kMethod,
+                                 "%s. Could not convert the description for the incoming account %@");
+  }
+  if (incoming) {
+    noteOrigins(store, outgoingServers, *delivery);
+    noteOrigins(store, mailAccounts, *incoming);
     // Only "SMTP" and "Mail" accounts make room, although the class table may have given the new ones other types.
-    store.replaceAccountsWithTypes_withAccounts({kSMTPAccountType}, accounts->delivery);
-    store.replaceAccountsWithTypes_withAccounts({kMailAccountType}, accounts->incoming);
+    store.replaceAccountsWithTypes_withAccounts({kSMTPAccountType}, *delivery);
+    store.replaceAccountsWithTypes_withAccounts({kMailAccountType}, *incoming);
   }
   removeOriginalCompanion(path);
-  return accounts.has_value();
+  return incoming.has_value();
 }
 
 }  // namespace migrator

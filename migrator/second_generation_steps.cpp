@@ -17,17 +17,6 @@ using namespace accountsettings;  // the vocabulary
 using Account = AccountsManager::Account;
 using Accounts = AccountsManager::Accounts;
 
-// --- Notes on small devices ---
-
-// Forced both ways: on such a device notes are no supported data class of any account.
-void keepNotesOnDeviceOnly(BasicAccount& account) {
-  if (account.type() == kOnMyDeviceAccountType) {
-    account._forcedSetEnabled_forDataclass(true, kAccountDataclassNotes);
-  } else if (account.isEnabledForDataclass(kAccountDataclassNotes)) {
-    account._forcedSetEnabled_forDataclass(false, kAccountDataclassNotes);
-  }
-}
-
 // --- Parents for hosted mail ---
 
 bool isHostedMail(const BasicAccount& account) {
@@ -83,25 +72,19 @@ void wrapInParent(AccountsManager& store, const Account& mail) {
 
 // --- Children of cloud accounts, and mail ---
 
-// The child without its display name, which is its parent's to say; nothing for a child that stays as it is.
-std::optional<Dictionary> cleanedChild(const Dictionary& child) {
-  const Account record = BasicAccount::accountWithProperties(child);
-  if (record == nullptr || !isHostedMail(*record) || !record->displayName()) return std::nullopt;
-  record->removeAccountPropertyForKey(kAccountDisplayName);
-  return record->properties();
-}
-
+// Takes the display name of a child that is hosted mail away: it is its parent's to say.
 void cleanChildrenOf(BasicAccount& cloudAccount) {
   const std::optional<Array> children = arrayForKey(cloudAccount, kAccountChildAccounts);
   if (!children) return;
   Array cleaned = *children;
   for (const PropertyValue& child : *children) {
     const Dictionary* const properties = child.asDictionary();
-    const std::optional<Dictionary> replacement = cleanedChild(properties != nullptr ? *properties : Dictionary{});
-    if (!replacement) continue;
+    const Account record = BasicAccount::accountWithProperties(properties != nullptr ? *properties : Dictionary{});
+    if (record == nullptr || !isHostedMail(*record) || !record->displayName()) continue;
+    record->removeAccountPropertyForKey(kAccountDisplayName);
     // The place is that of the first equal child, so of two equal ones only the first is ever cleaned.
     const auto place = std::ranges::find(*children, child) - children->begin();
-    cleaned[static_cast<std::size_t>(place)] = *replacement;
+    cleaned[static_cast<std::size_t>(place)] = record->properties();
   }
   cloudAccount.setAccountProperty_forKey(std::move(cleaned), kAccountChildAccounts);
 }
@@ -110,7 +93,14 @@ void cleanChildrenOf(BasicAccount& cloudAccount) {
 
 bool AccountsDataMigrator::_migrateAccountsFrom8A293(AccountsManager& store) {
   if (platform::current().deviceInfo->answer("CPUArchitecture") == PropertyValue{"armv6"}) {
-    for (const Account& account : store.allBasicAccounts()) keepNotesOnDeviceOnly(*account);
+    // Forced both ways: on such a device notes are no supported data class of any account.
+    for (const Account& account : store.allBasicAccounts()) {
+      if (account->type() == kOnMyDeviceAccountType) {
+        account->_forcedSetEnabled_forDataclass(true, kAccountDataclassNotes);
+      } else if (account->isEnabledForDataclass(kAccountDataclassNotes)) {
+        account->_forcedSetEnabled_forDataclass(false, kAccountDataclassNotes);
+      }
+    }
   }
   store.setDataVersion(6);
   return true;

@@ -25,7 +25,7 @@ class AccountStage {
       : _stage{name, words}, _store{store} {}
   AccountStage(const AccountStage&) = delete;
   AccountStage& operator=(const AccountStage&) = delete;
-  ~AccountStage() { _store._tellChanges(); }
+  ~AccountStage() { _store.tellChanges(); }
 
  private:
   platform::RunStage _stage;

@@ -58,13 +58,6 @@ void makePrimary(BasicAccount& account) {
   account.setEnabled_forDataclass(true, kAccountDataclassKeyValue);
 }
 
-void letRemindersFollowCalendars(BasicAccount& account) {
-  if (contains(account.supportedDataclasses(), kAccountDataclassReminders) &&
-      account.isEnabledForDataclass(kAccountDataclassCalendars)) {
-    account.setEnabled_forDataclass(true, kAccountDataclassReminders);
-  }
-}
-
 // Answers whether the account became the primary one.
 bool settleSeparateAccount(BasicAccount& account) {
   const Text typeString = platform::current().systemAccount->systemAccountTypeString();
@@ -92,25 +85,7 @@ bool settleCloudAccount(BasicAccount& account) {
   return settleSeparateAccount(account);
 }
 
-void makeFirstSeparateAccountPrimary(const AccountsManager& store) {
-  const Accounts accounts = store.basicAccountsWithTypes({kVorlixAccountType});
-  const auto first = std::ranges::find_if(
-      accounts, [](const Account& account) { return hostedServiceStatus(*account) == kSeparateStatus; });
-  if (first != accounts.end()) makePrimary(**first);
-}
-
-// --- Secondary accounts and provisioning ---
-
-void takeDocumentsFromSecondary(BasicAccount& account) {
-  if (isPrimary(account)) return;
-  if (!account.isEnabledForDataclass(kAccountDataclassQuorvel) &&
-      !account.isEnabledForDataclass(kAccountDataclassKeyValue)) {
-    return;
-  }
-  writeToConsole("AccountsDataMigrator: Fixing secondary account with quorvel and keyvalue enabled");
-  account.setEnabled_forDataclass(false, kAccountDataclassQuorvel);
-  account.setEnabled_forDataclass(false, kAccountDataclassKeyValue);
-}
+// --- Provisioning ---
 
 void letProvisioningFollowChildren(BasicAccount& account) {
   if (hostedServiceStatus(account) == kSeparateStatus &&
@@ -124,7 +99,7 @@ void letProvisioningFollowChildren(BasicAccount& account) {
       kAccountDataclassCalendars, account, kCalDAVAccountType);
 }
 
-// --- Passes and cloud tabs ---
+// --- Passes ---
 
 void letPassesFollowDocuments(BasicAccount& account) {
   const BasicAccount::Dataclasses provisioned = account.provisionedDataclasses();
@@ -144,10 +119,18 @@ void letPassesFollowDocuments(BasicAccount& account) {
 bool AccountsDataMigrator::_migrateAccountsFrom9A182(AccountsManager& store) {
   bool hasPrimary = false;
   for (const Account& account : store.allBasicSyncableAccounts()) {
-    letRemindersFollowCalendars(*account);
+    if (contains(account->supportedDataclasses(), kAccountDataclassReminders) &&
+        account->isEnabledForDataclass(kAccountDataclassCalendars)) {
+      account->setEnabled_forDataclass(true, kAccountDataclassReminders);
+    }
     if (isCloudAccount(*account) && settleCloudAccount(*account)) hasPrimary = true;
   }
-  if (!hasPrimary) makeFirstSeparateAccountPrimary(store);
+  if (!hasPrimary) {
+    const Accounts accounts = store.basicAccountsWithTypes({kVorlixAccountType});
+    const auto first = std::ranges::find(accounts, kSeparateStatus,
+                                         [](const Account& account) { return hostedServiceStatus(*account); });
+    if (first != accounts.end()) makePrimary(**first);
+  }
   store.setDataVersion(10);
   store.saveAllAccounts();
   return true;
@@ -155,7 +138,12 @@ bool AccountsDataMigrator::_migrateAccountsFrom9A182(AccountsManager& store) {
 
 bool AccountsDataMigrator::_migrateAccountsFrom9A334(AccountsManager& store) {
   for (const Account& account : cloudAndHostedAccountsOf(store)) {
-    takeDocumentsFromSecondary(*account);
+    if (!isPrimary(*account) && (account->isEnabledForDataclass(kAccountDataclassQuorvel) ||
+                                 account->isEnabledForDataclass(kAccountDataclassKeyValue))) {
+      writeToConsole("AccountsDataMigrator: Fixing secondary account with quorvel and keyvalue enabled");
+      account->setEnabled_forDataclass(false, kAccountDataclassQuorvel);
+      account->setEnabled_forDataclass(false, kAccountDataclassKeyValue);
+    }
     if (isCloudAccount(*account)) letProvisioningFollowChildren(*account);
   }
   store.setDataVersion(11);

@@ -39,12 +39,6 @@ constexpr auto kSteps = std::to_array<Step>({
 });
 static_assert(leadsTo(accountsettings::kCurrentVersion, kSteps));
 
-// The same reading as the store's: whatever gives no integer is version 0.
-std::uint64_t versionOf(const Dictionary& settings) {
-  const PropertyValue* const version = settings.find(accountsettings::kPlistVersionKey);
-  return static_cast<std::uint64_t>(version != nullptr ? version->integerValue().value_or(0) : 0);
-}
-
 Dictionary settingsFile() {
   return platform::current()
       .propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist())
@@ -54,7 +48,10 @@ Dictionary settingsFile() {
 }  // namespace
 
 bool AccountsDataMigrator::_migrateNewAccountsInfo(AccountsManager& store) {
-  const std::uint64_t storedVersion = versionOf(settingsFile());
+  // The same reading as the store's: whatever gives no integer is version 0.
+  const Dictionary settings = settingsFile();
+  const PropertyValue* const version = settings.find(accountsettings::kPlistVersionKey);
+  const auto storedVersion = static_cast<std::uint64_t>(version != nullptr ? version->integerValue().value_or(0) : 0);
   // The report keeps a copy of its own, read before any step can save the file.
   const Dictionary settingsBeforeSteps = settingsFile();
   if (_saveMigrationInformation() && _collatedMigrationData) {

@@ -70,15 +70,15 @@ TEST_F(WatchedStore, TellsWhatBecameOfTheAccountsWhenItIsLookedAt) {
   store->accountWithIdentifier("a")->setAccountProperty_forKey(2, "Port");
   store->deleteAccountWithIdentifier("b");
   store->insertAccount(account("c"));
-  store->_tellChanges();
-  store->_tellChanges();
+  store->tellChanges();
+  store->tellChanges();
   EXPECT_EQ(recorder->lines(), (Lines{"changed a: +Port 2", "added c", "lost b (deleted)"}));
 }
 
 TEST_F(WatchedStore, TellsWhyAccountsOfAReplacedTypeWent) {
   const Store store = loadOutdated({properties("a", {}, "SMTP"), properties("b", {}, "SMTP")});
   store->replaceAccountsWithTypes_withAccounts({"SMTP"}, {account("b", {{"Port", 2}}, "SMTP")});
-  store->_tellChanges();
+  store->tellChanges();
   EXPECT_EQ(recorder->lines(), (Lines{"changed b: +Port 2", "lost a (replaced-with-type)"}));
 }
 
@@ -86,19 +86,19 @@ TEST_F(WatchedStore, TellsIntoWhichAccountsOneWasFolded) {
   const Store store = loadOutdated({properties("a"), properties("b"), properties("c")});
   const Account folded = store->accountWithIdentifier("a");
   for (const std::string_view into : {"b", "c"}) {
-    store->_changeTracker()->willBeFolded(*folded, *store->accountWithIdentifier(into), "the same user");
+    store->changeTracker()->willBeFolded(*folded, *store->accountWithIdentifier(into), "the same user");
   }
   store->deleteAccount(folded);
-  store->_tellChanges();
+  store->tellChanges();
   EXPECT_EQ(recorder->lines(), Lines{"folded a into b into c (the same user)"});
 }
 
 TEST_F(WatchedStore, TellsFromWhatAnAccountWasConverted) {
   const Store store = loadOutdated({});
   const Account made = account("a");
-  store->_changeTracker()->comesFrom(*made, {{"uniqueId", "a"}, {"Class", "TestAccount"}}, "MailAccounts[0]", "/mail");
+  store->changeTracker()->comesFrom(*made, {{"uniqueId", "a"}, {"Class", "TestAccount"}}, "MailAccounts[0]", "/mail");
   store->insertAccount(made);
-  store->_tellChanges();
+  store->tellChanges();
   EXPECT_EQ(recorder->lines(), Lines{"converted a: uniqueId now Identifier \"a\", +Type \"CalDAV\" (MailAccounts[0])"});
 }
 
@@ -176,7 +176,7 @@ TEST_F(WatchedStore, IsWatchedByNobodyWhereNobodyWantsFacts) {
     const Store store = loadOutdated({properties("a")});
     store->insertAccount(account("b"));
     store->saveAllAccounts();
-    EXPECT_EQ(store->_changeTracker(), nullptr);
+    EXPECT_EQ(store->changeTracker(), nullptr);
   }
   EXPECT_EQ(ChangeTracker::statesTaken(), before);
 }

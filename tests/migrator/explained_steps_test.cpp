@@ -35,7 +35,7 @@ class ExplainedSteps : public tests::StepTest {
 TEST_F(ExplainedSteps, TellWhatTheyChangedUnderTheirOwnNames) {
   load({account("Nimbra", "NimbraAccount", "N")}, 3);
   store->allBasicAccounts()[0]->setAccountProperty_forKey(tests::dataclasses({"Mail", "Notes"}), "Enabled Dataclasses");
-  store->_tellChanges();
+  store->tellChanges();
   ASSERT_TRUE(migrator._migrateNewAccountsInfo(*store));
   EXPECT_THAT(
       told("_migrateAccountsFrom7A241:"),
