@@ -87,13 +87,17 @@ class OddFiles(SnapshotsTest):
 
     host = HOST
 
-    def migrated_with(self, path, put):
+    def run_with(self, path, put):
         device = self.old_device()
         place = device.path(path)
         place.unlink(missing_ok=True)
         put(place)
         run = self.migrate(device)
         self.assertEqual(0, run.status, run.errors)
+        return device, run
+
+    def migrated_with(self, path, put):
+        device, run = self.run_with(path, put)
         self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
         return device, run
 
@@ -101,13 +105,8 @@ class OddFiles(SnapshotsTest):
         for path, kinds in {AUTO_FETCH: KINDS[:-1], COMPANION: KINDS, SENTINEL: KINDS[-1:]}.items():
             for put in kinds:
                 with self.subTest(path=path, put=put):
-                    device = self.old_device()
-                    place = device.path(path)
-                    place.unlink(missing_ok=True)
-                    put(place)
-                    run = self.migrate(device)
-                    self.assertEqual(0, run.status, run.errors)
-                    self.assertIn(f"migration-host: {place} has no copy: ", "\n".join(run.errors))
+                    device, run = self.run_with(path, put)
+                    self.assertIn(f"migration-host: {device.path(path)} has no copy: ", "\n".join(run.errors))
 
     def test_of_a_sparse_marker_no_byte_is_copied(self):
         device, run = self.migrated_with(AUTO_FETCH, make_huge)
