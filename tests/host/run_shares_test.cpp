@@ -25,7 +25,7 @@ TEST_F(SharesOfARun, GrowFromStageToStageUpToTheWhole) {
   const auto grows = [&] { return std::exchange(before, shares.progress().share) < shares.progress().share; };
   load();
   stage("version steps");
-  for (const char* const words : {"version 10 to 11: one", "version 11 to 12: two"}) {
+  for (const char* const words : {"version 1 to 2: one", "version 2 to 3: two"}) {
     stage("_step:", words);
     EXPECT_TRUE(grows()) << words;
     shares.stageEnded();
@@ -47,13 +47,13 @@ TEST_F(SharesOfARun, GrowWithTheAccountsThatAreCountedAndStayWithinTheStage) {
 
 TEST_F(SharesOfARun, SayInWordsWhatTheRunIsAt) {
   stage("version steps");
-  stage("_step:", "version 11 to 12: two");
-  EXPECT_EQ(shares.progress().what, "version 11 to 12: two");
+  stage("_step:", "version 2 to 3: two");
+  EXPECT_EQ(shares.progress().what, "version 2 to 3: two");
   stage("save");
   shares.progressed(256, 1000);
-  EXPECT_EQ(shares.progress().what, "save within version 11 to 12: two, 256 of 1000 accounts");
+  EXPECT_EQ(shares.progress().what, "save within version 2 to 3: two, 256 of 1000 accounts");
   shares.stageEnded();
-  EXPECT_EQ(shares.progress().what, "version 11 to 12: two");
+  EXPECT_EQ(shares.progress().what, "version 2 to 3: two");
 }
 
 TEST_F(SharesOfARun, TellTheAccountsAloneOnceAllOfThemAreCounted) {
