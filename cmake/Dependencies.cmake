@@ -11,6 +11,7 @@ find_package(utf8cpp REQUIRED)
 find_package(CLI11 REQUIRED)
 find_package(ICU REQUIRED COMPONENTS i18n uc)
 find_package(nlohmann_json REQUIRED)
+find_package(ZLIB REQUIRED)
 
 if(ACCOUNTS_TESTS)
   find_package(GTest REQUIRED)

@@ -40,12 +40,6 @@ Json jsonOfName(const Name& name) {
   return json;
 }
 
-Json jsonOfNames(const std::vector<Name>& names) {
-  Json json = Json::array();
-  for (const Name& name : names) json.push_back(jsonOfName(name));
-  return json;
-}
-
 Json jsonOfChanges(const std::vector<Change>& changes) {
   Json all = Json::array();
   for (const Change& change : changes) {
@@ -87,7 +81,7 @@ Json ofConversion(const Converted& converted) {
 }
 
 Json ofMove(const Moved& moved) {
-  return ofAccount(moved.account, moved.into ? Json{{"into", jsonOfNames({*moved.into})}} : Json::object());
+  return ofAccount(moved.account, moved.into ? Json{{"into", Json::array({jsonOfName(*moved.into)})}} : Json::object());
 }
 
 Json membersOf(const Fact& fact) {
@@ -105,7 +99,7 @@ Json membersOf(const Fact& fact) {
               },
               [](const Moved& it) { return ofMove(it); },
               [](const Folded& it) {
-                return ofAccount(it.account, {{"into", jsonOfNames(it.into)}, {"reason", it.reason}});
+                return ofAccount(it.account, {{"into", jsonOf(it.into)}, {"reason", it.reason}});
               },
               [](const Lost& it) { return membersOf(it); }, [](const Repeated& it) { return ofAccount(it.account); },
               [](const Unrepaired& it) {
@@ -139,6 +133,12 @@ Json jsonOfLoss(const Lost& lost) {
 
 std::string_view keyForShowing(const Change& change) {
   return namesCredential(change.oldKey) ? change.oldKey : change.key;
+}
+
+nlohmann::ordered_json jsonOf(const std::vector<Name>& accounts) {
+  Json json = Json::array();
+  for (const Name& account : accounts) json.push_back(jsonOfName(account));
+  return json;
 }
 
 nlohmann::ordered_json jsonOf(const Fact& fact) {

@@ -55,8 +55,8 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--resources", "DIR", "the plug-in's resources, in place of the installed ones", &options.device.resources},
       {"--plugin", "FILE", "the plug-in to load, in place of the installed one", &options.plugin},
       {"--trace", "FILE", "append the run's events to this file, one JSON object a line", &options.trace},
-      {"--explain", "", "print what the run did to which account; =json for machines",
-       Form{&written.explain, {"text", "json"}}},
+      {"--explain", "", "print what the run did to which account; =json for machines, =html as a page for a browser",
+       Form{&written.explain, {"text", "json", "html"}}},
       {"--dry-run", "", "rehearse the run: the device stays as it is", Form{&written.dryRun, {}}},
       {"--serve-rehearsals", "", "in place of a run, rehearse the devices that standard input names, each in a child",
        &options.isServer},
@@ -160,6 +160,16 @@ void settleSnapshots(const Written& written, SnapshotOptions& snapshots) {
   if (written.keep) snapshots.keep = countIn(*written.keep);
 }
 
+// A page is of no use on a terminal, and the run would be over before anybody saw that.
+Explain explainIn(const std::string& form) {
+  if (form == "json") return Explain::json;
+  if (form != "html") return Explain::text;
+  if (::isatty(STDOUT_FILENO) != 0) {
+    throw WrongUse{"--explain=html makes a page for a browser: send it to a file, as in --explain=html > page.html"};
+  }
+  return Explain::html;
+}
+
 // What is done in place of a run is no run to rehearse or to explain, but for what a snapshot has of one.
 void settleRun(const Written& written, Options& options) {
   const bool isRun = insteadOfARun(options.snapshots).empty();
@@ -169,7 +179,7 @@ void settleRun(const Written& written, Options& options) {
   if (options.isStrict && !isRun) throw WrongUse{"--strict is for a run, and this is none"};
   if (!written.explain) return;
   if (!isRun && !options.snapshots.explained) throw WrongUse{"--explain is for a run, and this is none"};
-  options.explain = *written.explain == "json" ? Explain::json : Explain::text;
+  options.explain = explainIn(*written.explain);
 }
 
 // A server's options are those of each of its rehearsals, which have no root of their own and nothing to keep.

@@ -28,7 +28,7 @@ struct SnapshotOptions {
 };
 
 // How a run is explained after it, on standard output; see docs/EXPLAIN.md.
-enum class Explain : std::uint8_t { notAsked, text, json };
+enum class Explain : std::uint8_t { notAsked, text, json, html };
 
 // What the command line asks for. Every path is absolute.
 struct Options {

@@ -10,6 +10,7 @@
 #include "commandline/program.h"
 #include "commandline/progress_line.h"
 #include "host/explanation.h"
+#include "host/explanation_page.h"
 #include "host/migration_lock.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
@@ -113,11 +114,24 @@ void endSession(snapshots::SnapshotSession* session, std::size_t keep, Account& 
   account.verdict.lost.clear();
 }
 
-void explain(Explain how, const Account& account) {
-  if (how == Explain::notAsked) return;
-  if (!commandline::print(how == Explain::json ? account.asJson() : account.asText())) {
-    say("the explanation could not be written to standard output");
+// The accounts that stand in the settings file now; where it cannot be read, none.
+std::vector<records::Name> presentAccounts(const platform::MigrationFootprint& footprint) {
+  std::vector<records::Name> accounts;
+  for (const platform::MigrationFile& file : footprint.files) {
+    if (file.part != platform::MigrationFile::Part::settings) continue;
+    accounts = accountsIn(platform::current().propertyLists->readDictionary(file.path).valueOr({}));
   }
+  return accounts;
+}
+
+std::string explanationOf(Explain how, const Account& account, const platform::MigrationFootprint& footprint) {
+  switch (how) {
+    case Explain::notAsked: return {};
+    case Explain::text: return account.asText();
+    case Explain::json: return account.asJson();
+    case Explain::html: return pageOf(account.asJson(), presentAccounts(footprint));
+  }
+  return {};
 }
 
 ExitStatus statusOf(const Account& account, bool isStrict) {
@@ -190,7 +204,10 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
     const platform::Status& traced = onlookers.trace->outcome();
     if (!traced.isOk()) say("the trace is incomplete: not every event could be written: " + traced.reason());
   }
-  explain(options.explain, account);
+  if (options.explain != Explain::notAsked &&
+      !commandline::print(explanationOf(options.explain, account, migrator.footprint()))) {
+    say("the explanation could not be written to standard output");
+  }
   return statusOf(account, options.isStrict);
 }
 

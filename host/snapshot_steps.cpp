@@ -5,6 +5,7 @@
 
 #include "commandline/progress_line.h"
 #include "commandline/text.h"
+#include "host/explanation_page.h"
 #include "host/rehearsal.h"
 #include "host/say.h"
 #include "host/snapshots/listing.h"
@@ -52,9 +53,11 @@ void printExplanation(const SnapshotOptions& options, Explain explain) {
   const snapshots::SnapshotStore store{storage(), *options.directory};
   const std::string id = store.identifierMeantBy(*options.explained);
   const auto text =
-      store.record(id, explain == Explain::json ? snapshots::kExplanationAsJson : snapshots::kExplanation);
+      store.record(id, explain == Explain::text ? snapshots::kExplanation : snapshots::kExplanationAsJson);
   if (!text) throw Problem{Problem::Kind::wrongUse, "snapshot " + id + " has no explanation"};
-  static_cast<void>(commandline::print(explain == Explain::json ? *text : commandline::printableLines(*text)));
+  static_cast<void>(commandline::print(explain == Explain::json   ? *text
+                                       : explain == Explain::html ? pageOf(*text, {})
+                                                                  : commandline::printableLines(*text)));
 }
 
 }  // namespace

@@ -7,12 +7,21 @@ const FACTS = {
   "file-not-removed": "not removed",
 };
 const GOING = new Set(["lost", "folded", "save-failed"]);
-const SIGNS = { "added": "+", "converted": "+", "changed": "~", "moved": "→", "folded": "⤵", "lost": "×",
-  "repeated": "=", "kept": "!" };
-
 const nameOf = (account) => account.name || account.identifier || "(without a name)";
-const calledOf = (account) => `${account.type || "no type"} “${nameOf(account)}”`;
-const shownValue = (value) => (typeof value === "string" ? `“${value}”` : JSON.stringify(value));
+const calledOf = (account) => `${account.type || "account"} “${nameOf(account)}”`;
+const DATA_CLASS = "com.vorlix.Dataclass.";
+const shortOf = (text) => (text.startsWith(DATA_CLASS) ? text.slice(DATA_CLASS.length) : text);
+
+// A value beside its other self: of a list of names, what the other one has as well is faint.
+function shownValue(value, other) {
+  if (value === undefined) return element("span", { class: "faint" }, "nothing");
+  if (value === "<hidden>") return element("span", { class: "hidden" }, "hidden");
+  if (typeof value === "string") return `“${value}”`;
+  if (!Array.isArray(value) || !value.every((each) => typeof each === "string")) return JSON.stringify(value);
+  const isShared = (each) => Array.isArray(other) && other.includes(each);
+  return value.length ? value.map((each) => element("span", { class: `chip${isShared(each) ? " faint" : ""}`, title: each }, shortOf(each)))
+    : "an empty list";
+}
 
 const verdictOf = ({ result }) => (result.success ? result.verdict : "failed");
 
@@ -20,82 +29,44 @@ const verdictOf = ({ result }) => (result.success ? result.verdict : "failed");
 function deviceView(explanation, console = [], level = 2) {
   const verdict = verdictOf(explanation);
   return element("div", {},
-    element("p", { class: `verdict mark ${tone(verdict)}` }, sentenceOf(verdict, explanation.rehearsal)),
-    explanation.rehearsal ? element("p", { class: "faint" }, "This was a rehearsal: nothing on the device was changed.") : null,
+    element("p", { class: `verdict mark ${tone(verdict)}` }, sentenceOf(verdict, explanation)),
+    aboutRun(explanation),
+    explanation.rehearsal ? element("p", {}, "This was a rehearsal: nothing on the device was changed.") : null,
+    explanation.result.cause ? element("p", { class: "gone" }, sentence(explanation.result.cause)) : null,
     explanation.complete === false ? element("p", { class: "gone" }, "Memory ran out; something is missing here.") : null,
-    countTiles(explanation), lossesOf(explanation, level), pathsOf(explanation, level),
+    countTiles(explanation), lossesOf(explanation, level), new AccountList(explanation, level).section(),
     stagesOf(explanation, level), consoleOf(console, level));
 }
 
-function sentenceOf(verdict, isRehearsal) {
-  const will = isRehearsal ? "would be" : "were";
+function sentenceOf(verdict, { rehearsal, result }) {
+  const lost = (result.lost || []).length;
+  const will = rehearsal ? "would be" : lost === 1 ? "was" : "were";
   return {
-    "kept": "Nothing is lost.", "lost": `Accounts ${will} lost.`, "not saved": `The accounts ${will} not saved.`,
-    "failed": "The migration failed.",
+    "kept": rehearsal ? "Nothing would be lost." : "Nothing was lost.", "lost": `${counted(lost, "account")} ${will} lost.`,
+    "not saved": `The accounts ${rehearsal ? "would not be" : "were not"} saved.`,
+    "failed": rehearsal ? "The migration would fail." : "The migration failed.",
   }[verdict] || verdict;
 }
 
-function countTiles(explanation) {
-  const result = explanation.result;
-  const counts = Object.entries(result.counts || {}).filter(([, count]) => count);
-  const stored = result.storedVersion;
+// What was run, where and when, as far as the explanation says so.
+function aboutRun({ host, root, time, result }) {
+  const { storedVersion, version } = result;
+  const versions = version === undefined ? "" : storedVersion === undefined || storedVersion === version
+    ? `data version ${version}` : `data version ${storedVersion} → ${version}`;
+  const told = [root, versions, time ? time.replace("T", " ").replace("Z", " UTC") : "", host ? `migration-host ${host}` : ""];
+  return element("p", { class: "faint about" }, told.filter(Boolean).map((each) => element("span", {}, each)));
+}
+
+// What was dropped is counted among the losses.
+function countTiles({ result }) {
+  const { dropped: _, ...counts } = result.counts || {};
   return tiles([
-    ...(stored === undefined ? [] : [[stored, "stored data version"]]),
     ...(typeof result.accounts === "number" ? [[result.accounts, "accounts afterwards"]] : []),
-    ...counts.map(([name, count]) => [count, name, name === "lost" || name === "dropped" ? "lost" : null]),
+    ...Object.entries(counts).filter(([, count]) => count).map(([name, count]) => [count, name, `is-${name}`]),
   ]);
 }
 
 const heading = (level, text) => element(`h${level + 1}`, {}, text);
-
-function lossesOf(explanation, level) {
-  const lost = explanation.result.lost || [];
-  if (!lost.length) return null;
-  return element("div", {}, heading(level, "What is lost"), element("ul", { class: "plain" }, lost.map((each) =>
-    element("li", {}, element("strong", { class: "gone" }, lostOf(each)), " ", element("code", {}, each.code),
-      ` ${each.reason}`, each.detail ? `: ${each.detail}` : "",
-      each.where ? [element("br"), "its data are still in ", element("code", {}, each.where)] : ""))));
-}
-
-// An account, or a file of them.
-const lostOf = (loss) => ("type" in loss ? calledOf(loss) : loss.file || "The settings file");
-
-// Which stage touched which account, as a picture that is also a table.
-function pathsOf(explanation, level) {
-  const stages = explanation.stages.filter((stage) => stage.facts.some((fact) => fact.account));
-  const accounts = new Map();
-  for (const stage of stages) {
-    for (const fact of stage.facts.filter((each) => each.account)) {
-      const key = fact.account.identifier || calledOf(fact.account);
-      if (!accounts.has(key)) accounts.set(key, { name: fact.account, touched: new Map() });
-      const touched = accounts.get(key).touched;
-      touched.set(stage, [...(touched.get(stage) || []), fact.fact]);
-    }
-  }
-  if (!accounts.size) return element("p", {}, "No account was changed.");
-  return element("div", {}, heading(level, "Accounts and the steps that touched them"),
-    pathTable([...accounts.values()].slice(0, MOST_PATHS), stages),
-    accounts.size > MOST_PATHS ? element("p", { class: "faint" }, `and ${number(accounts.size - MOST_PATHS)} more`) : null);
-}
-
-const MOST_PATHS = 500;
-
-function pathTable(accounts, stages) {
-  return element("div", { class: "scroll" }, element("table", { class: "path" },
-    element("caption", {}, "+ came, ~ changed, → moved, ⤵ folded into another, × lost"),
-    element("thead", {}, element("tr", {}, element("th", { scope: "col" }, "Account"),
-      stages.map((stage) => element("th", { scope: "col" }, titleOf(stage))))),
-    element("tbody", {}, accounts.map(({ name, touched }) => element("tr", {},
-      element("th", { scope: "row" }, calledOf(name)), stages.map((stage) => pathCell(touched.get(stage))))))));
-}
-
-function pathCell(kinds) {
-  if (!kinds) return element("td", {}, "");
-  const words = kinds.map((kind) => FACTS[kind] || kind).join(", ");
-  return element("td", { class: kinds.some((kind) => GOING.has(kind)) ? "gone" : null, title: words },
-    element("span", { "aria-hidden": true }, kinds.map((kind) => SIGNS[kind] || "·").join("")),
-    element("span", { class: "skip" }, words));
-}
 
 const titleOf = (stage) => stage.title || stage.words || stage.stage;
 
@@ -104,15 +75,17 @@ function stagesOf(explanation, level) {
     element("summary", {}, element("strong", {}, titleOf(stage)),
       titleOf(stage) === stage.stage ? "" : element("span", { class: "faint" }, ` ${stage.stage}`),
       element("span", { class: "faint" }, ` ${counted(stage.facts.length, "fact")}`)),
-    element("ul", { class: "plain" }, stage.facts.map(factOf))));
+    element("ul", { class: "plain" }, stage.facts.map((fact) => factOf(fact)))));
   return element("div", {}, heading(level, "Step by step"), stages);
 }
 
-function factOf(fact) {
+// `isNamed`: whether the account is said, which it need not be among its own.
+function factOf(fact, isNamed = true) {
+  const isPlain = fact.fact === "changed" && !isNamed;
   return element("li", {},
-    element("span", { class: GOING.has(fact.fact) ? "gone" : "faint" }, `${FACTS[fact.fact] || fact.fact} `),
-    fact.account ? element("strong", {}, calledOf(fact.account)) : "",
-    typeof fact.accounts === "number" ? `${counted(fact.accounts, "account")} of data version ${fact.version}` : "",
+    isPlain ? "" : element("span", { class: GOING.has(fact.fact) ? "gone" : "faint" }, FACTS[fact.fact] || fact.fact),
+    fact.account && isNamed ? [" ", element("strong", {}, calledOf(fact.account))] : "",
+    typeof fact.accounts === "number" ? ` ${counted(fact.accounts, "account")} of data version ${fact.version}` : "",
     [fact.into || []].flat().map((other) => ` into ${calledOf(other)}`),
     fact.file ? [" ", element("code", {}, fact.file)] : "",
     fact.from ? ` from ${fact.from}` : "",
@@ -121,11 +94,10 @@ function factOf(fact) {
     fact.changes ? element("ul", { class: "plain" }, fact.changes.map(changeOf)) : "");
 }
 
-function changeOf(change) {
-  return element("li", {}, element("code", {}, change.key),
-    change.renamedFrom ? element("span", { class: "faint" }, ` (was ${change.renamedFrom})`) : "",
-    "from" in change ? element("span", { class: "gone" }, ` ${shownValue(change.from)}`) : "",
-    " → ", "to" in change ? element("span", { class: "new" }, shownValue(change.to)) : "gone");
+function changeOf({ key, renamedFrom, from, to }) {
+  return element("li", { class: "change" }, element("code", {}, key),
+    renamedFrom ? element("span", { class: "faint" }, ` (was ${renamedFrom})`) : "", " ",
+    element("span", { class: "gone" }, shownValue(from, to)), " → ", element("span", { class: "new" }, shownValue(to, from)));
 }
 
 function consoleOf(lines, level) {

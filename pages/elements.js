@@ -58,5 +58,5 @@ function table(caption, heads, rows) {
 const section = (id, title, ...children) => element("section", { "aria-labelledby": id },
   element("h2", { id }, title), ...children);
 
-const tiles = (each) => element("ul", { class: "tiles" }, each.map(([count, words, verdict]) =>
-  element("li", { class: verdict ? tone(verdict) : null }, element("strong", {}, number(count)), words)));
+const tiles = (each) => element("ul", { class: "tiles" }, each.map(([count, words, colour]) =>
+  element("li", { class: colour || null }, element("strong", {}, number(count)), words)));

@@ -9,7 +9,7 @@ function fleetView(fleet, openDevice) {
     element("h1", {}, `Rehearsal of release ${fleet.release}`),
     element("p", { class: "verdict" }, fleetSentence(fleet)),
     tiles(Object.keys(VERDICTS).filter((verdict) => fleet.verdicts[verdict])
-      .map((verdict) => [fleet.verdicts[verdict], VERDICTS[verdict], verdict])),
+      .map((verdict) => [fleet.verdicts[verdict], VERDICTS[verdict], tone(verdict)])),
     versionSection(fleet), lossSection(fleet, devices), causeSection(fleet, devices), stepSection(fleet),
     distributionSection(fleet), notableSection(fleet, openDevice), devices.section(),
     element("p", { class: "faint" }, `Made on ${fleet.made} from ${fleet.results}.`),

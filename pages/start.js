@@ -38,8 +38,14 @@ function opener(fleet) {
   };
 }
 
-function start() {
-  const shown = JSON.parse(document.getElementById("document").textContent);
+// The document: as JSON, or packed like the blocks.
+function documentOfPage() {
+  const text = document.getElementById("document").textContent.trim();
+  return text.startsWith("{") ? JSON.parse(text) : unpack(text);
+}
+
+async function start() {
+  const shown = await documentOfPage();
   const main = document.getElementById("content");
   if (shown.fleet) {
     document.title = `Rehearsal of release ${shown.fleet.release}`;

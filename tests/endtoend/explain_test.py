@@ -1,9 +1,13 @@
 """The explanation of a run: for people, for machines, and as facts in the trace."""
 
+import base64
 import json
+import os
+import pty
 import re
 import subprocess
 import unittest
+import zlib
 
 from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS_COPY
 from device_case import HOST, DeviceTest
@@ -14,6 +18,18 @@ SECRET = "correct horse battery staple"
 
 def account(identifier, type="CalDAV", **more):
     return {"Identifier": identifier, "Type": type, "Class": "SomeAccount", **more}
+
+
+def secretive_device(test):
+    device = test.device(Version=0, Accounts=[
+        account("a", "Exchange", Password=SECRET, uniqueId="b", Cookies=[SECRET], Blob=SECRET.encode(),
+                Nested={"AuthToken": SECRET}),
+        account("c", "Unheard of", Password=SECRET),
+        account("d", "Nimbra", uniqueId="e", **{"Subscribed Calendars": [{"Password": SECRET}]}) |
+        {"Class": "NimbraAccount"}])
+    device.write_plist(LEGACY_EXCHANGE, {"DAAccountsKey": [
+        {"DAAccountConfigurationClass": "ASAccount", "DAAccountConfigurationAccountID": "a", "Password": SECRET}]})
+    return device
 
 
 def in_order_of_releases(stage):
@@ -151,22 +167,76 @@ class People(ExplainTest):
         self.assertTrue(any(line.startswith("WARNING: ") for line in lines))
 
 
-class Secrets(ExplainTest):
-    def secretive_device(self):
-        device = self.device(Version=0, Accounts=[
-            account("a", "Exchange", Password=SECRET, uniqueId="b", Cookies=[SECRET], Blob=SECRET.encode(),
-                    Nested={"AuthToken": SECRET}),
-            account("c", "Unheard of", Password=SECRET),
-            account("d", "Nimbra", uniqueId="e", **{"Subscribed Calendars": [{"Password": SECRET}]}) |
-            {"Class": "NimbraAccount"}])
-        device.write_plist(LEGACY_EXCHANGE, {"DAAccountsKey": [
-            {"DAAccountConfigurationClass": "ASAccount", "DAAccountConfigurationAccountID": "a", "Password": SECRET}]})
-        return device
+class Pages(ExplainTest):
+    def page(self, device, *options):
+        return "\n".join(self.run_host("--root", device.root, "--explain=html", *options).output)
 
+    def shown(self, page):
+        """The document that the page shows."""
+        packed = re.search('<script type="application/json" id="document">([A-Za-z0-9+/=]*)</script>', page)[1]
+        return json.loads(zlib.decompress(base64.b64decode(packed, validate=True)))
+
+    def test_show_what_machines_are_told_and_the_accounts_that_stand_there_now(self):
+        device = self.example("first-generation")
+        told = self.document(device, "--dry-run")
+        shown = self.shown(self.page(device))
+        accounts = shown.pop("accounts")
+        self.assertEqual(told["result"], shown["result"])
+        self.assertEqual([stage["stage"] for stage in told["stages"]], [stage["stage"] for stage in shown["stages"]])
+        parents = {each["identifier"]: each["name"] for each in accounts}
+        self.assertEqual([("Wexmo", "Wexmo"), ("Nimbra", "Nimbra")],
+                         [(each["name"], parents[each["parent"]]) for each in accounts if "parent" in each])
+        self.assertEqual(told["result"]["accounts"], sum("parent" not in each for each in accounts))
+
+    def test_of_a_rehearsal_have_the_accounts_as_they_would_be(self):
+        shown = self.shown(self.page(self.example("first-generation"), "--dry-run"))
+        self.assertTrue(shown["rehearsal"])
+        self.assertIn("Gmail", {each["type"] for each in shown["accounts"]})
+
+    def test_have_nothing_in_them_that_a_text_of_a_device_could_end(self):
+        evil = "</script><script>alert(1)</script>@EXPLANATIONS@"
+        device = self.device(Version=0, Accounts=[account("a", DisplayName=evil), account("b", DisplayName="x" * 5)])
+        page = self.page(device)
+        self.assertNotIn("alert(1)", page)
+        self.assertEqual(evil, self.shown(page)["accounts"][0]["name"])
+
+    def test_of_a_thousand_accounts_stay_below_a_megabyte(self):
+        names = [f"{number:04} {os.urandom(12).hex()}" for number in range(1000)]
+        accounts = [account(name, "Mail", DisplayName=name, uniqueId=name[::-1], Hostname=f"{name}.example") | {"Class": "IMAPAccount"}
+                    for name in names]
+        page = self.page(self.device(Version=0, Accounts=accounts))
+        self.assertLess(len(page.encode()), 1_000_000)
+        self.assertLessEqual(set(names), {each["name"] for each in self.shown(page)["accounts"]})
+
+    def test_of_an_earlier_run_are_made_of_what_its_snapshot_keeps(self):
+        device, snapshots = self.example("first-generation"), ("--snapshots", self.scratch / "snapshots")
+        self.run_host("--root", device.root, *snapshots)
+        shown = self.shown(self.page(device, *snapshots, "--of", "latest"))
+        told = self.document(device, *snapshots, "--of", "latest")
+        self.assertEqual(told, shown)
+
+    def test_are_refused_to_a_terminal_before_anything_is_touched(self):
+        device = self.example("first-generation")
+        before = device.entries()
+        terminal, inner = pty.openpty()
+        ended = subprocess.run([HOST, "--root", device.root, "--explain=html"], stdout=inner, stderr=subprocess.PIPE, text=True)
+        os.close(inner)
+        os.close(terminal)
+        self.assertEqual(2, ended.returncode)
+        self.assertIn("send it to a file", ended.stderr)
+        self.assertEqual(before, device.entries())
+
+    def test_hide_secrets(self):
+        shown = self.shown(self.page(secretive_device(self)))
+        self.assertNotIn(SECRET, json.dumps(shown))
+        self.assertIn("<hidden>", json.dumps(shown))
+
+
+class Secrets(ExplainTest):
     def test_are_shown_nowhere(self):
         for options in (["--explain"], ["--explain=json"]):
             trace = self.scratch / "trace"
-            device = self.secretive_device()
+            device = secretive_device(self)
             run = self.run_host("--root", device.root, "--trace", trace, *options)
             told = "\n".join(run.output + run.errors) + trace.read_text()
             self.assertNotIn(SECRET, told)

@@ -44,7 +44,7 @@ class WrongUse(DeviceTest):
 
     def test_an_explanation_in_an_unknown_form(self):
         for form in ("--explain=yaml", "--explain="):
-            self.assert_wrong("--explain is followed by nothing, =text or =json (see --help)", form)
+            self.assert_wrong("--explain is followed by nothing, =text, =json or =html (see --help)", form)
 
     def test_an_explanation_that_is_asked_for_twice(self):
         self.assert_wrong("--explain is given twice (see --help)", "--explain", "--explain=json")

@@ -98,8 +98,8 @@ class Report(ReportTest):
     def test_opens_a_devices_own_explanation_and_goes_back_by_the_keyboard(self):
         button = next(each for each in self.all(NAMES + " button") if each.text.endswith("lost"))
         button.send_keys(Keys.ENTER)
-        WebDriverWait(self.browser, 20).until(lambda _: self.all("dialog[open] .path tbody th"))
-        self.assertEqual("Accounts would be lost.", self.one("dialog .verdict").text)
+        WebDriverWait(self.browser, 20).until(lambda _: self.all("dialog[open] .list .who"))
+        self.assertEqual("1 account would be lost.", self.one("dialog .verdict").text)
         self.one("dialog button").send_keys(Keys.ESCAPE)
         self.assertEqual([], self.all("dialog[open]"))
         self.assertEqual(button, self.browser.switch_to.active_element)
@@ -130,8 +130,8 @@ class LargeReport(ReportTest):
         self.assertLess(self.asks(taken), 1000)
         self.assertEqual("20 devices, page 1 of 1", self.one("[aria-live]").text)
         self.one(NAMES + " button").click()
-        WebDriverWait(self.browser, 20).until(lambda _: self.all("dialog[open] .path tbody th"))
-        self.assertEqual("Mail “Account 9000”", self.one("dialog .path tbody th").text)
+        WebDriverWait(self.browser, 20).until(lambda _: self.all("dialog[open] .list .who"))
+        self.assertEqual("Account 9000", self.one("dialog .list .who").text)
 
     def test_of_more_devices_counts_all_and_names_those_that_matter(self):
         self.simulated(2000)
