@@ -10,21 +10,6 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-Json jsonOfStage(const Explanation::Stage& stage) {
-  Json json{{"stage", stage.name}};
-  if (!stage.words.empty()) json["words"] = stage.words;
-  if (!stage.within.empty()) json["within"] = stage.within;
-  json["facts"] = Json::array();
-  for (const records::Fact& fact : stage.facts) json["facts"].push_back(jsonOf(fact));
-  return json;
-}
-
-Json jsonOfCounts(const Counts& counts) {
-  return {{"kept", counts.kept},           {"changed", counts.changed}, {"added", counts.added},
-          {"converted", counts.converted}, {"moved", counts.moved},     {"folded", counts.folded},
-          {"dropped", counts.dropped},     {"lost", counts.lost}};
-}
-
 // How many accounts of which version the settings file had and has, as far as the run told.
 void addState(const Explanation& explanation, Json& result) {
   const auto put = [&result](std::size_t accounts, std::uint64_t version) {
@@ -41,7 +26,10 @@ Json jsonOfResult(const Explanation& explanation, const Verdict& verdict, const 
   Json json{{"dataClass", run.dataClass}, {"success", run.success}};
   addVerdict(verdict, json);
   addState(explanation, json);
-  json["counts"] = jsonOfCounts(countsOf(explanation, verdict));
+  const Counts counts = countsOf(explanation, verdict);
+  json["counts"] = {{"kept", counts.kept},           {"changed", counts.changed}, {"added", counts.added},
+                    {"converted", counts.converted}, {"moved", counts.moved},     {"folded", counts.folded},
+                    {"dropped", counts.dropped},     {"lost", counts.lost}};
   return json;
 }
 
@@ -49,7 +37,14 @@ Json jsonOfResult(const Explanation& explanation, const Verdict& verdict, const 
 
 std::string jsonDocumentOf(const Explanation& explanation, const Verdict& verdict, const ExplainedRun& run) {
   Json stages = Json::array();
-  for (const Explanation::Stage& stage : explanation.stages()) stages.push_back(jsonOfStage(stage));
+  for (const Explanation::Stage& stage : explanation.stages()) {
+    Json json{{"stage", stage.name}};
+    if (!stage.words.empty()) json["words"] = stage.words;
+    if (!stage.within.empty()) json["within"] = stage.within;
+    json["facts"] = Json::array();
+    for (const records::Fact& fact : stage.facts) json["facts"].push_back(jsonOf(fact));
+    stages.push_back(std::move(json));
+  }
   const Json document{{"schema", 2},
                       {"host", run.version},
                       {"root", run.root},

@@ -33,16 +33,15 @@ struct Column {
   std::string (*cell)(const BasicAccount& account);
 };
 
-std::string shownName(const BasicAccount& account) {
-  const std::string name = nameOf(account);
-  return name.empty() ? "(no name)" : name;
-}
-
 constexpr Column kColumns[] = {
     {"identifier", true, [](const BasicAccount& account) { return textOf(account.identifier()); }},
     {"type", true, [](const BasicAccount& account) { return textOf(account.type()); }},
     {"class", true, [](const BasicAccount& account) { return textOf(account.accountClass()); }},
-    {"name", true, shownName},
+    {"name", true,
+     [](const BasicAccount& account) {
+       const std::string name = nameOf(account);
+       return name.empty() ? "(no name)" : name;
+     }},
     {"user", true, [](const BasicAccount& account) { return ownText(account, accountsettings::kAccountUsername); }},
     {"host", false, [](const BasicAccount& account) { return ownText(account, kAccountHost); }},
     {"enabled", true,
@@ -51,27 +50,21 @@ constexpr Column kColumns[] = {
      }},
 };
 
-const Column& columnNamed(const std::string& name) {
-  const auto* const found = std::ranges::find(kColumns, platform::caseFolded(name), &Column::name);
-  if (found != std::end(kColumns)) return *found;
-  std::vector<std::string> names;
-  for (const Column& each : kColumns) names.emplace_back(each.name);
-  throw commandline::WrongUse{"unknown column: " + name, commandline::hintFor(name, names)};
-}
-
 std::vector<Column> columnsFor(const Options& options) {
   std::vector<Column> columns;
-  for (const std::string& name : options.columns) columns.push_back(columnNamed(name));
+  std::vector<std::string> names;
+  for (const Column& each : kColumns) names.emplace_back(each.name);
+  for (const std::string& name : options.columns) {
+    const auto* const found = std::ranges::find(kColumns, platform::caseFolded(name), &Column::name);
+    if (found == std::end(kColumns)) {
+      throw commandline::WrongUse{"unknown column: " + name, commandline::hintFor(name, names)};
+    }
+    columns.push_back(*found);
+  }
   if (columns.empty()) {
     std::ranges::copy_if(kColumns, std::back_inserter(columns), [](const Column& each) { return each.isUsual; });
   }
   return columns;
-}
-
-commandline::Row headingOf(const std::vector<Column>& columns) {
-  std::vector<std::string> cells;
-  for (const Column& column : columns) cells.push_back(platform::upperCased(column.name));
-  return commandline::Row{std::move(cells), commandline::Emphasis::strong};
 }
 
 commandline::Row rowOf(const std::vector<Column>& columns, const BasicAccount& account, std::string_view indentation) {
@@ -81,26 +74,19 @@ commandline::Row rowOf(const std::vector<Column>& columns, const BasicAccount& a
   return commandline::Row{std::move(cells)};
 }
 
-std::string counted(std::size_t count, std::string_view what) {
-  return std::to_string(count) + " " + std::string{what} + (count == 1 ? "" : "s");
-}
-
 // "12 accounts, 2 of them in others"
 std::string tally(std::size_t accounts, std::size_t children) {
-  const std::string all = counted(accounts + children, "account");
+  const std::size_t count = accounts + children;
+  const std::string all = std::to_string(count) + (count == 1 ? " account" : " accounts");
   return children == 0 ? all : all + ", " + std::to_string(children) + " of them in others";
 }
 
 bool isThere(const platform::Path& path) { return platform::current().files->kindOf(path).isOk(); }
 
-bool hasLegacyFilesOnly() {
-  return !isThere(AccountsManager::fullPathToAccountSettingsPlist()) &&
-         (isThere(accountsettings::daAccountPath()) || isThere(accountsettings::mailAccountsPath()));
-}
-
 // What a reader of the list cannot see in it.
 void sayWhatIsNotListed() {
-  if (hasLegacyFilesOnly()) {
+  const bool hasLegacyFiles = isThere(accountsettings::daAccountPath()) || isThere(accountsettings::mailAccountsPath());
+  if (hasLegacyFiles && !isThere(AccountsManager::fullPathToAccountSettingsPlist())) {
     commandline::say("accountctl",
                      "the device has account files of the first releases alone; a migration converts them");
   }
@@ -172,7 +158,9 @@ Outcome listAccounts(Session& session, const Words&, const Options& options) {
     return report.dump(2) + "\n";
   }
   const auto columns = columnsFor(options);
-  Rows rows{headingOf(columns)};
+  commandline::Row heading{{}, commandline::Emphasis::strong};
+  for (const Column& column : columns) heading.cells.push_back(platform::upperCased(column.name));
+  Rows rows{heading};
   for (const auto& account : accounts.allBasicAccounts()) {
     rows.push_back(rowOf(columns, *account, ""));
     for (const auto& child : byParent[account.get()]) rows.push_back(rowOf(columns, *child, "  "));

@@ -14,13 +14,9 @@ namespace {
 using platform::FileAttributes;
 using platform::FileKind;
 
-constexpr std::size_t kLargestWithAccounts = std::size_t{256} << 20U;  // no larger property list can be read
-constexpr std::size_t kLargestOther = std::size_t{16} << 20U;
+constexpr std::size_t kMaxSizeWithAccounts = std::size_t{256} << 20U;  // no larger property list can be read
+constexpr std::size_t kMaxSizeOfOthers = std::size_t{16} << 20U;
 constexpr std::uint32_t kOrdinaryPermissions = 0777;
-
-bool isNothingThere(const platform::Status& status) {
-  return status.errorNumber() == ENOENT || status.errorNumber() == ENOTDIR;
-}
 
 // Failures that whoever owns the directory can bring about, unlike those of the machine.
 bool isOfSomebodysMaking(const platform::Status& status) {
@@ -35,14 +31,14 @@ bool isOfSomebodysMaking(const platform::Status& status) {
   }
 }
 
-FileState absent() { return {.contents = kAbsent, .attributes = {}, .bytes = {}, .whyUnkept = {}}; }
-
 FileState unkept(std::string why) {
   return {.contents = kUnkept, .attributes = {}, .bytes = {}, .whyUnkept = std::move(why)};
 }
 
 FileState unkeptOrFailed(const platform::Status& status) {
-  if (isNothingThere(status)) return absent();
+  if (status.errorNumber() == ENOENT || status.errorNumber() == ENOTDIR) {
+    return {.contents = kAbsent, .attributes = {}, .bytes = {}, .whyUnkept = {}};
+  }
   if (!isOfSomebodysMaking(status)) require(status);
   return unkept(status.description());
 }
@@ -83,7 +79,7 @@ std::string checksum(std::string_view text) {
 
 FileState stateAt(const Storage& storage, const Path& path, Part part) {
   if (part == Part::marker) return markerAt(storage, path);
-  const std::size_t limit = holdsAccounts(part) ? kLargestWithAccounts : kLargestOther;
+  const std::size_t limit = holdsAccounts(part) ? kMaxSizeWithAccounts : kMaxSizeOfOthers;
   platform::Result<platform::FileCopy> read = storage.keeper->read(path, limit);
   if (!read.isOk()) return unkeptOrFailed(read.status());
   platform::FileCopy file = read.take();

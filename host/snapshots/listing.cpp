@@ -1,9 +1,8 @@
 #include "host/snapshots/listing.h"
 
-#include <algorithm>
-#include <array>
 #include <nlohmann/json.hpp>
 
+#include "commandline/table.h"
 #include "host/snapshots/run_journal.h"
 #include "host/snapshots/snapshot_directory.h"
 #include "host/snapshots/snapshot_store.h"
@@ -12,7 +11,7 @@ namespace host::snapshots {
 namespace {
 
 using Json = nlohmann::ordered_json;
-using Row = std::array<std::string, 6>;
+using commandline::Row;
 
 constexpr int kSchema = 1;
 
@@ -23,18 +22,13 @@ struct Entry {
   std::vector<Path> damage = {};  // the files whose copies are damaged
 };
 
-std::string markedSnapshot(const Storage& storage, const Path& directory) {
-  const auto mark = RunJournal{storage, directory}.read();
-  return mark ? mark->snapshot : std::string{};
-}
-
 std::vector<Entry> entriesIn(const Storage& storage, const Path& directory) {
   static_cast<void>(requireOwnDirectory(storage, directory, Missing::isRefused));
   const SnapshotStore store{storage, directory};
-  const std::string marked = markedSnapshot(storage, directory);
+  const auto mark = RunJournal{storage, directory}.read();
   std::vector<Entry> entries;
   for (const std::string& id : store.identifiers()) {
-    Entry entry{.id = id, .manifest = store.undamagedManifest(id), .isRunning = id == marked};
+    Entry entry{.id = id, .manifest = store.undamagedManifest(id), .isRunning = mark && id == mark->snapshot};
     if (entry.manifest) entry.damage = store.damageOf(*entry.manifest);
     entries.push_back(std::move(entry));
   }
@@ -67,44 +61,6 @@ Row rowOf(const Entry& entry) {
           filesIn(manifest)};
 }
 
-std::string lineOf(const Row& row, const std::array<std::size_t, 6>& widths) {
-  std::string line;
-  for (std::size_t column = 0; column < row.size(); ++column) {
-    line += row[column];
-    if (column + 1 < row.size()) line.append(widths[column] - row[column].size() + 2, ' ');
-  }
-  return line + '\n';
-}
-
-std::string tableOf(const std::vector<Row>& rows) {
-  std::array<std::size_t, 6> widths{};
-  for (const Row& row : rows) {
-    for (std::size_t column = 0; column < row.size(); ++column) {
-      widths[column] = std::max(widths[column], row[column].size());
-    }
-  }
-  std::string table;
-  for (const Row& row : rows) table += lineOf(row, widths);
-  return table;
-}
-
-Json jsonOf(const Entry& entry) {
-  Json json = entry.manifest ? Json::parse(textOf(*entry.manifest)).at("manifest") : Json{{"id", entry.id}};
-  json["state"] = stateOf(entry);
-  json["damage"] = Json::array();
-  for (const Path& path : entry.damage) json["damage"].push_back(path.native());
-  return json;
-}
-
-// What the table has no room for.
-std::string remarksOn(const Entry& entry) {
-  std::string text;
-  for (const Path& path : entry.damage) text += entry.id + " has a damaged copy of " + path.string() + '\n';
-  if (!entry.manifest) return text;
-  for (const std::string& reason : entry.manifest->keptFor) text += entry.id + " is kept: " + reason + '\n';
-  return text;
-}
-
 }  // namespace
 
 std::string listingForPeople(const Storage& storage, const Path& directory) {
@@ -112,14 +68,25 @@ std::string listingForPeople(const Storage& storage, const Path& directory) {
   if (entries.empty()) return "no snapshots in " + directory.string() + "\n";
   std::vector<Row> rows{{"Snapshot", "Taken", "Before", "Version", "State", "Files"}};
   for (const Entry& entry : entries) rows.push_back(rowOf(entry));
-  std::string text = tableOf(rows);
-  for (const Entry& entry : entries) text += remarksOn(entry);
+  std::string text = commandline::table(rows);
+  // What the table has no room for.
+  for (const Entry& entry : entries) {
+    for (const Path& path : entry.damage) text += entry.id + " has a damaged copy of " + path.string() + '\n';
+    if (!entry.manifest) continue;
+    for (const std::string& reason : entry.manifest->keptFor) text += entry.id + " is kept: " + reason + '\n';
+  }
   return text;
 }
 
 std::string listingAsJson(const Storage& storage, const Path& directory) {
   Json list = Json::array();
-  for (const Entry& entry : entriesIn(storage, directory)) list.push_back(jsonOf(entry));
+  for (const Entry& entry : entriesIn(storage, directory)) {
+    Json json = entry.manifest ? Json::parse(textOf(*entry.manifest)).at("manifest") : Json{{"id", entry.id}};
+    json["state"] = stateOf(entry);
+    json["damage"] = Json::array();
+    for (const Path& path : entry.damage) json["damage"].push_back(path.native());
+    list.push_back(std::move(json));
+  }
   return Json{{"schema", kSchema}, {"snapshots", std::move(list)}}.dump(2) + '\n';
 }
 

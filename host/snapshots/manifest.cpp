@@ -18,11 +18,6 @@ constexpr std::uint32_t kOrdinaryPermissions = 0777;
 constexpr const char* kFile = "file";
 constexpr const char* kKeptByAnEarlierRelease = "an earlier release of the host kept it";
 
-Part partNamed(const std::string& name) {
-  const auto* const found = std::ranges::find(kParts, name);
-  return found == kParts.end() ? Part::other : static_cast<Part>(found - kParts.begin());
-}
-
 template <typename Value>
 Json orNull(const std::optional<Value>& value) {
   return value ? Json(*value) : Json(nullptr);
@@ -65,25 +60,20 @@ Json jsonOf(const KeptFile& file) {
   return json;
 }
 
-bool isPlainName(const std::string& name) {
-  return !name.empty() &&
-         std::ranges::all_of(name, [](char character) { return character >= '0' && character <= '9'; });
-}
-
-void readCopy(const Json& json, KeptFile& file) {
-  file.copy = json.at("copy");
-  if (!isPlainName(file.copy)) throw std::invalid_argument{"a copy outside of the snapshot"};
-  file.contents = json.at("sha256");
-  file.attributes.size = json.at("size");
-}
-
 KeptFile fileFrom(const Json& json) {
+  const auto* const part = std::ranges::find(kParts, json.at("part").get<std::string>());
   KeptFile file{.path = json.at("path").get<std::string>(),
-                .part = partNamed(json.at("part")),
+                .part = part == kParts.end() ? Part::other : static_cast<Part>(part - kParts.begin()),
                 .contents = json.at("state"),
                 .attributes = {},
                 .copy = {}};
-  if (file.contents == kFile) readCopy(json, file);
+  if (file.contents == kFile) {
+    file.copy = json.at("copy");
+    const bool isWithin = !file.copy.empty() && file.copy.find_first_not_of("0123456789") == std::string::npos;
+    if (!isWithin) throw std::invalid_argument{"a copy outside of the snapshot"};
+    file.contents = json.at("sha256");
+    file.attributes.size = json.at("size");
+  }
   if (!file.isPresent()) return file;
   file.attributes.owner = json.at("owner");
   file.attributes.group = json.at("group");

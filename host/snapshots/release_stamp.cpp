@@ -13,17 +13,11 @@ namespace {
 using Json = nlohmann::ordered_json;
 
 constexpr int kFormat = 1;
-constexpr std::size_t kLargest = std::size_t{1} << 16U;
+constexpr std::size_t kMaxSize = std::size_t{1} << 16U;
 
 std::string textAt(platform::FileSystem& files, const Path& path) {
-  const platform::Result<platform::Bytes> read = files.read(path, kLargest);
+  const platform::Result<platform::Bytes> read = files.read(path, kMaxSize);
   return read.isOk() ? std::string{read.value().begin(), read.value().end()} : std::string{};
-}
-
-std::string unquoted(std::string value) {
-  const bool isQuoted =
-      value.size() > 1 && (value.front() == '"' || value.front() == '\'') && value.back() == value.front();
-  return isQuoted ? value.substr(1, value.size() - 2) : value;
 }
 
 // The last one, as the shell that reads such a file has it; empty where there is none.
@@ -32,18 +26,14 @@ std::string valueOf(const std::string& key, const std::string& text) {
   for (std::size_t start = 0; start < text.size();) {
     const std::size_t end = std::min(text.find('\n', start), text.size());
     const std::string line = text.substr(start, end - start);
-    if (line.starts_with(key + "=")) value = unquoted(line.substr(key.size() + 1));
     start = end + 1;
+    if (!line.starts_with(key + "=")) continue;
+    value = line.substr(key.size() + 1);
+    const bool isQuoted =
+        value.size() > 1 && (value.front() == '"' || value.front() == '\'') && value.back() == value.front();
+    if (isQuoted) value = value.substr(1, value.size() - 2);
   }
   return value;
-}
-
-// A file without a version of its own, or without a version that is a number, is one of the first.
-bool isOlder(const platform::Platform& services, const Path& settings, const platform::MigrationFootprint& footprint) {
-  const auto contents = services.propertyLists->readDictionary(settings);
-  if (!contents.isOk()) return false;
-  const auto* const version = contents.value().find(footprint.versionKey);
-  return (version == nullptr ? 0 : version->integerValue().value_or(0)) < footprint.currentVersion;
 }
 
 // What cannot be told is for the run to find out.
@@ -51,14 +41,15 @@ bool stands(platform::FileSystem& files, const Path& path) {
   return files.kindOf(path).cause() != platform::Cause::missing;
 }
 
+// A settings file without a version of its own, or without a version that is a number, is one of the first.
 bool hasWork(const platform::Platform& services, const platform::MigrationFile& file,
              const platform::MigrationFootprint& footprint) {
-  switch (file.part) {
-    case Part::settings: return isOlder(services, file.path, footprint);
-    case Part::legacy:
-    case Part::sentinel: return stands(*services.files, file.path);
-    default: return false;
-  }
+  if (file.part == Part::legacy || file.part == Part::sentinel) return stands(*services.files, file.path);
+  if (file.part != Part::settings) return false;
+  const auto contents = services.propertyLists->readDictionary(file.path);
+  if (!contents.isOk()) return false;
+  const auto* const version = contents.value().find(footprint.versionKey);
+  return (version == nullptr ? 0 : version->integerValue().value_or(0)) < footprint.currentVersion;
 }
 
 }  // namespace

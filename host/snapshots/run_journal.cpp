@@ -10,7 +10,7 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-constexpr std::size_t kLargest = std::size_t{1} << 26U;
+constexpr std::size_t kMaxSize = std::size_t{1} << 26U;
 
 std::span<const std::uint8_t> bytesOf(const std::string& text) {
   return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
@@ -24,27 +24,21 @@ std::string lineOf(const Json& json) {
   }
 }
 
-void readHead(const Json& json, RunMark& mark) {
-  mark.snapshot = json.at("snapshot");
-  if (json.contains("restores")) mark.restores = json.at("restores").get<std::string>();
-}
-
-void readEntry(const Json& json, RunMark& mark) {
-  if (json.contains("edited")) {
-    mark.edited.insert(json.at("edited").get<std::string>());
-  } else {
-    const Path path = json.at("path").get<std::string>();
-    mark.left[path].insert(json.at("state"));
-    if (json.contains("made")) mark.made.insert(path);
-  }
-}
-
 RunMark markFrom(const std::string& text) {
   RunMark mark;
   std::size_t start = 0;
   for (std::size_t end = 0; (end = text.find('\n', start)) != std::string::npos; start = end + 1) {
     const Json line = Json::parse(text.substr(start, end - start));
-    start == 0 ? readHead(line, mark) : readEntry(line, mark);
+    if (start == 0) {
+      mark.snapshot = line.at("snapshot");
+      if (line.contains("restores")) mark.restores = line.at("restores").get<std::string>();
+    } else if (line.contains("edited")) {
+      mark.edited.insert(line.at("edited").get<std::string>());
+    } else {
+      const Path path = line.at("path").get<std::string>();
+      mark.left[path].insert(line.at("state"));
+      if (line.contains("made")) mark.made.insert(path);
+    }
   }
   if (start == 0) throw Problem{Problem::Kind::failed, "it is empty"};
   return mark;
@@ -70,7 +64,7 @@ void RunJournal::noteChange(const Path& path, const std::string& contents, bool 
 void RunJournal::noteEdit(const Path& path) const { append(lineOf({{"edited", path.native()}})); }
 
 std::optional<RunMark> RunJournal::read() const {
-  const platform::Result<platform::Bytes> bytes = _storage.files->read(_mark, kLargest);
+  const platform::Result<platform::Bytes> bytes = _storage.files->read(_mark, kMaxSize);
   if (bytes.status().errorNumber() == ENOENT) return std::nullopt;
   require(bytes.status());
   try {

@@ -23,17 +23,14 @@ KnownContents contentsOfBoth(const Manifest& one, const Manifest& other) {
   return known;
 }
 
-// A file that the run was making may be there in part; it is still the maker's own then.
-bool isPartOfWhatWasMade(const FileState& present) {
-  return present.contents != kAbsent && present.contents != kUnkept && present.attributes.owner == ::geteuid();
-}
-
 KnownContents leftByRun(const Storage& storage, const Manifest& taken, const RunMark& mark) {
   KnownContents known = mark.left;
   addContents(taken, known);
   for (const Path& path : mark.made) {
     const FileState present = stateAt(storage, path, Part::settings);
-    if (isPartOfWhatWasMade(present)) known[path].insert(present.contents);
+    // It may be there in part; it is still its maker's own then.
+    const bool isKept = present.contents != kAbsent && present.contents != kUnkept;
+    if (isKept && present.attributes.owner == ::geteuid()) known[path].insert(present.contents);
   }
   for (const Path& path : mark.edited) known.erase(path);
   return known;

@@ -29,11 +29,9 @@ constexpr std::size_t kNoiseDigits = 16;
 constexpr std::size_t kNumberDigits = 6;
 constexpr std::string_view kTime = "ddddddddTddddddZ";
 
-[[noreturn]] void refuse(const Path& directory, const std::string& reason) {
+[[noreturn]] void cannotHold(const Path& directory, const std::string& reason) {
   throw Problem{Problem::Kind::wrongUse, directory.string() + " cannot hold snapshots: " + reason};
 }
-
-bool isOurs(const FileAttributes& attributes) { return attributes.owner == 0 || attributes.owner == ::geteuid(); }
 
 bool isWritableByOthers(const FileAttributes& attributes) { return (attributes.permissions & kWritableByOthers) != 0; }
 
@@ -45,34 +43,14 @@ void requireSafeWay(const Storage& storage, const Path& directory) {
     const FileAttributes attributes = required(storage.keeper->attributesOf(above));
     const bool isDirectory = attributes.kind == FileKind::directory;
     const bool isSticky = (attributes.permissions & kSticky) != 0;
-    if (!isOurs(attributes) || (isDirectory && isWritableByOthers(attributes) && !isSticky)) {
-      refuse(directory, "others could exchange it, by way of " + above.string());
+    const bool isOurs = attributes.owner == 0 || attributes.owner == ::geteuid();
+    if (!isOurs || (isDirectory && isWritableByOthers(attributes) && !isSticky)) {
+      cannotHold(directory, "others could exchange it, by way of " + above.string());
     }
   }
 }
 
-void requireSafe(const Storage& storage, const Path& directory) {
-  requireSafeWay(storage, directory);
-  std::error_code failed;
-  const Path resolved = std::filesystem::canonical(directory, failed);
-  if (failed) refuse(directory, failed.message());
-  requireSafeWay(storage, resolved);
-}
-
-void requireOwn(const Path& directory, const FileAttributes& attributes) {
-  if (attributes.kind != FileKind::directory) refuse(directory, "it is no directory");
-  if (attributes.owner != ::geteuid()) refuse(directory, "it belongs to somebody else");
-  if (isWritableByOthers(attributes)) refuse(directory, "others may write it");
-}
-
 bool isDigit(char character) { return character >= '0' && character <= '9'; }
-
-bool isHexadecimal(char character) { return isDigit(character) || (character >= 'a' && character <= 'f'); }
-
-bool isTime(std::string_view text) {
-  return std::ranges::equal(
-      text, kTime, [](char character, char meant) { return meant == 'd' ? isDigit(character) : character == meant; });
-}
 
 // Nothing where no such file can be read; a part of it where its maker died.
 std::optional<std::string> ownMarkIn(const Storage& storage, const Path& directory) {
@@ -97,13 +75,13 @@ void requireSnapshotsOrNothing(const Storage& storage, const Path& directory) {
   if (mark == kOwnMarkText) return;
   const std::vector<std::string> names = required(storage.keeper->entriesOf(directory));
   const auto foreign = std::ranges::find_if_not(names, &isOwnName);
-  if (foreign != names.end()) refuse(directory, "it holds something else: " + *foreign);
+  if (foreign != names.end()) cannotHold(directory, "it holds something else: " + *foreign);
   if (mark ? !kOwnMarkText.starts_with(*mark) : std::ranges::find(names, kOwnMark) != names.end()) {
-    refuse(directory, std::string{"it holds something else: "} + kOwnMark);
+    cannotHold(directory, std::string{"it holds something else: "} + kOwnMark);
   }
   const bool isOfADeadMaker = std::ranges::all_of(names, [](const std::string& name) { return name == kOwnMark; });
   if (!isOfADeadMaker && !isOfAnEarlierHost(storage, directory)) {
-    refuse(directory, "it holds something else: " + names.front());
+    cannotHold(directory, "it holds something else: " + names.front());
   }
 }
 
@@ -112,13 +90,15 @@ void requireSnapshotsOrNothing(const Storage& storage, const Path& directory) {
 bool isIdentifier(const std::string& name) {
   const auto dash = static_cast<std::size_t>(std::ranges::find_if_not(name, &isDigit) - name.begin());
   return dash >= kNumberDigits && dash < name.size() && name[dash] == '-' &&
-         isTime(std::string_view{name}.substr(dash + 1));
+         std::ranges::equal(std::string_view{name}.substr(dash + 1), kTime, [](char character, char meant) {
+           return meant == 'd' ? isDigit(character) : character == meant;
+         });
 }
 
 bool isPassing(const std::string& name) {
   if (name == kBeingMade || name == kBeingRemoved) return true;
   return name.starts_with(kBeingReplaced) && name.size() == kBeingReplaced.size() + kNoiseDigits &&
-         std::all_of(name.end() - kNoiseDigits, name.end(), &isHexadecimal);
+         name.find_first_not_of("0123456789abcdef", kBeingReplaced.size()) == std::string::npos;
 }
 
 void markAsOwn(const Storage& storage, const Path& directory) {
@@ -131,13 +111,20 @@ bool requireOwnDirectory(const Storage& storage, const Path& directory, Missing 
   platform::Result<FileAttributes> attributes = storage.keeper->attributesOf(directory);
   if (attributes.status().errorNumber() == ELOOP) requireSafeWay(storage, directory);  // says which link it was
   if (attributes.status().errorNumber() == ENOENT) {
-    if (missing == Missing::isRefused) refuse(directory, "it does not exist");
+    if (missing == Missing::isRefused) cannotHold(directory, "it does not exist");
     if (missing == Missing::isAccepted) return false;
     require(storage.files->createDirectories(directory, kOwnerAlone));
     attributes = storage.keeper->attributesOf(directory);
   }
-  requireOwn(directory, required(std::move(attributes)));
-  requireSafe(storage, directory);
+  const FileAttributes own = required(std::move(attributes));
+  if (own.kind != FileKind::directory) cannotHold(directory, "it is no directory");
+  if (own.owner != ::geteuid()) cannotHold(directory, "it belongs to somebody else");
+  if (isWritableByOthers(own)) cannotHold(directory, "others may write it");
+  requireSafeWay(storage, directory);
+  std::error_code failed;
+  const Path resolved = std::filesystem::canonical(directory, failed);
+  if (failed) cannotHold(directory, failed.message());
+  requireSafeWay(storage, resolved);
   requireSnapshotsOrNothing(storage, directory);
   return true;
 }

@@ -202,8 +202,8 @@ void SnapshotSession::finish(const Manifest& manifest) {
 
 void SnapshotSession::boundKept() const {
   const std::vector<std::string> kept = _store.kept();
-  for (std::size_t index = 0; index + SnapshotStore::kMostKept < kept.size(); ++index) {
-    _place.warn("snapshot " + kept[index] + " is kept no longer: " + std::to_string(SnapshotStore::kMostKept) +
+  for (std::size_t index = 0; index + SnapshotStore::kMaxKept < kept.size(); ++index) {
+    _place.warn("snapshot " + kept[index] + " is kept no longer: " + std::to_string(SnapshotStore::kMaxKept) +
                 " newer ones are");
     release(kept[index]);
   }

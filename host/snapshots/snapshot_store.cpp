@@ -14,8 +14,8 @@ namespace {
 
 constexpr const char* kManifest = "manifest";
 constexpr unsigned kOwnerAlone = 0700;
-constexpr std::size_t kLargestManifest = std::size_t{1} << 24U;
-constexpr std::size_t kLargestCopy = std::size_t{256} << 20U;
+constexpr std::size_t kMaxSizeOfManifest = std::size_t{1} << 24U;
+constexpr std::size_t kMaxSizeOfCopy = std::size_t{256} << 20U;
 constexpr const char* kLatest = "latest";
 constexpr std::size_t kDigits = 6;
 
@@ -37,7 +37,7 @@ std::span<const std::uint8_t> bytesOf(std::string_view text) {
   return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
 }
 
-[[noreturn]] void refuse(const std::string& text) { throw Problem{Problem::Kind::wrongUse, text}; }
+[[noreturn]] void failWrongUse(const std::string& text) { throw Problem{Problem::Kind::wrongUse, text}; }
 
 [[noreturn]] void fail(const std::string& text) { throw Problem{Problem::Kind::failed, text}; }
 
@@ -71,17 +71,18 @@ std::string SnapshotStore::identifierMeantBy(const std::string& text) const {
   if (text == kLatest && !known.empty()) return known.back();
   std::vector<std::string> meant = known;
   std::erase_if(meant, [&text](const std::string& id) { return !id.starts_with(text); });
-  if (meant.empty()) refuse("there is no snapshot " + text + " in " + _directory.string());
-  if (meant.size() > 1) refuse("more than one snapshot begins with " + text + ": " + meant[0] + " and " + meant[1]);
+  if (meant.empty()) failWrongUse("there is no snapshot " + text + " in " + _directory.string());
+  if (meant.size() > 1)
+    failWrongUse("more than one snapshot begins with " + text + ": " + meant[0] + " and " + meant[1]);
   return meant.front();
 }
 
 Manifest SnapshotStore::manifest(const std::string& id) const {
   const std::vector<std::string> known = identifiers();
   if (std::ranges::find(known, id) == known.end()) {
-    refuse("there is no snapshot " + id + " in " + _directory.string());
+    failWrongUse("there is no snapshot " + id + " in " + _directory.string());
   }
-  const platform::Bytes bytes = required(_storage.files->read(_directory / id / kManifest, kLargestManifest));
+  const platform::Bytes bytes = required(_storage.files->read(_directory / id / kManifest, kMaxSizeOfManifest));
   std::optional<Manifest> manifest = manifestFrom({reinterpret_cast<const char*>(bytes.data()), bytes.size()});
   if (!manifest || manifest->id != id) fail("the manifest of snapshot " + id + " is damaged");
   return *std::move(manifest);
@@ -114,7 +115,7 @@ void SnapshotStore::keepCopy(KeptFile& file, std::size_t number,
   file.copy = std::to_string(number);
   const Path copy = _directory / kBeingMade / file.copy;
   require(_storage.files->create(copy, state.bytes));
-  if (checksum(required(_storage.files->read(copy, kLargestCopy))) != file.contents) {
+  if (checksum(required(_storage.files->read(copy, kMaxSizeOfCopy))) != file.contents) {
     fail("the copy of " + file.path.string() + " is not like it");
   }
 }
@@ -147,14 +148,14 @@ void SnapshotStore::keepRecord(const std::string& id, const std::string& name, s
 }
 
 std::optional<std::string> SnapshotStore::record(const std::string& id, const std::string& name) const {
-  const platform::Result<platform::Bytes> read = _storage.files->read(_directory / id / name, kLargestCopy);
+  const platform::Result<platform::Bytes> read = _storage.files->read(_directory / id / name, kMaxSizeOfCopy);
   if (read.status().errorNumber() == ENOENT) return std::nullopt;
   require(read.status());
   return std::string{read.value().begin(), read.value().end()};
 }
 
 platform::Bytes SnapshotStore::copyOf(const Manifest& manifest, const KeptFile& file) const {
-  platform::Bytes bytes = required(_storage.files->read(_directory / manifest.id / file.copy, kLargestCopy));
+  platform::Bytes bytes = required(_storage.files->read(_directory / manifest.id / file.copy, kMaxSizeOfCopy));
   if (checksum(bytes) != file.contents) {
     fail("the copy of " + file.path.string() + " in snapshot " + manifest.id + " is damaged");
   }

@@ -17,7 +17,7 @@ class SnapshotStore {
   SnapshotStore(Storage storage, Path directory) : _storage{std::move(storage)}, _directory{std::move(directory)} {}
 
   // How many snapshots are kept beyond the count.
-  static constexpr std::size_t kMostKept = 20;
+  static constexpr std::size_t kMaxKept = 20;
 
   // Removes what a dead host left half made or half removed.
   void sweep() const;
