@@ -34,6 +34,12 @@ class ACCOUNT_EXPORT BasicAccount : public std::enable_shared_from_this<BasicAcc
   // Where a new identifier is needed and none can be made, the record stays without.
   static std::shared_ptr<BasicAccount> accountWithType_class(std::string_view type, std::string_view className);
   static std::shared_ptr<BasicAccount> accountWithProperties(const Dictionary& properties);
+  // A record of the receiving class, where that is derived from this one: it names itself,
+  // `Derived::accountWithProperties<Derived>(properties)`.
+  template <typename Receiver>
+  static std::shared_ptr<Receiver> accountWithProperties(const Dictionary& properties) {
+    return recordOf<Receiver>(properties);
+  }
   static std::shared_ptr<BasicAccount> initWithProperties(const Dictionary& properties);
   static std::shared_ptr<BasicAccount> _initWithType_class(std::string_view type, std::string_view className);
   // Must not be used: throws AssertionFailure "Don't use this method".

@@ -53,6 +53,21 @@ TEST_F(Record, OfATypeHasTypeClassAndOneNewIdentifierForTheAccountAndItsSyncStor
   EXPECT_EQ(account->parentAccount(), nullptr);
 }
 
+// A class derived from it, as a program may have one.
+class ShoutingAccount : public BasicAccount {
+ public:
+  [[nodiscard]] std::optional<Text> displayName() const override { return Text{"SHOUT"}; }
+};
+
+TEST_F(Record, OfAClassDerivedFromItIsMadeByThatClass) {
+  const std::shared_ptr<ShoutingAccount> account = ShoutingAccount::accountWithProperties<ShoutingAccount>(minimal());
+  ASSERT_NE(account, nullptr);
+  EXPECT_EQ(account->properties(), minimal());
+  const std::shared_ptr<BasicAccount> record = account;
+  EXPECT_EQ(record->displayName(), Text{"SHOUT"});
+  EXPECT_EQ(ShoutingAccount::accountWithProperties<ShoutingAccount>({{"Type", "CalDAV"}}), nullptr);
+}
+
 TEST_F(Record, OfATypeNeedsAClass) {
   const AssertionFailure failure = tests::failureOf([] { BasicAccount::accountWithType_class("CalDAV", ""); });
   EXPECT_EQ(failure.message(), "The account class is required.");
