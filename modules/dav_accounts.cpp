@@ -4,6 +4,7 @@
 #include <utility>
 
 #include "modules/account_classes.h"
+#include "platform/kept_for_life.h"
 
 namespace modules {
 namespace {
@@ -18,13 +19,15 @@ constexpr ServiceKind kBookmarkDAV{.name = "Bookmarks", .securePort = 443, .plai
 constexpr ServiceKind kSubscribedCalendar{.name = "Subscribed Calendar", .securePort = 443, .plainPort = 80};
 
 const accountsettings::AccountClassInfo* classForType(std::string_view type) {
-  static const std::array<std::pair<std::string_view, AccountClass>, 4> classes{{
+  // Those who found a class keep its address until the process ends.
+  using Classes = std::array<std::pair<std::string_view, AccountClass>, 4>;
+  static const Classes& classes = platform::keptForLife<Classes>(Classes{{
       {accountsettings::kCalDAVAccountType, serviceAccountClass("CalDAVServiceAccount", kCalDAV)},
       {accountsettings::kCardDAVAccountType, serviceAccountClass("CardDAVServiceAccount", kCardDAV)},
       {accountsettings::kBookmarkDAVAccountType, serviceAccountClass("BookmarkDAVServiceAccount", kBookmarkDAV)},
       {accountsettings::kSubscribedCalendarAccountType,
        serviceAccountClass("SubscribedCalendarServiceAccount", kSubscribedCalendar)},
-  }};
+  }});
   for (const auto& [name, info] : classes) {
     if (name == type) return info.get();
   }
