@@ -216,6 +216,15 @@ TYPED_TEST(FileSystemContract, GivesAFileToAnAccountThatTheDeviceKnows) {
   EXPECT_EQ(this->files.setOwner(this->at("nothing"), account, account).errorNumber(), ENOENT);
 }
 
+TYPED_TEST(FileSystemContract, SaysForWhatItLookedForAnAccountThatItDoesNotFind) {
+  this->put("file", "text");
+  const std::string_view account = this->subject.someAccount();
+  const std::string message = "Could not find the account nobody-of-that-name for " + this->at("file").string() +
+                              ": No such file or directory (errno 2)";
+  EXPECT_EQ(this->files.setOwner(this->at("file"), "nobody-of-that-name", account).description(), message);
+  EXPECT_EQ(this->files.setOwner(this->at("file"), account, "nobody-of-that-name").description(), message);
+}
+
 TYPED_TEST(FileSystemContract, ProposesATemporaryNameAtWhichNothingStands) {
   const auto name = this->files.temporaryName();
   ASSERT_TRUE(name.isOk());

@@ -11,7 +11,9 @@
 #include <cstdlib>
 #include <fstream>
 
+#include "platform/linux/files/file_services.h"
 #include "platform/linux/linux_platform.h"
+#include "tests/support/fake_platform.h"
 #include "tests/support/scratch_directory.h"
 
 namespace tests {
@@ -254,6 +256,45 @@ TEST_F(LinuxFiles, TakeTheirTemporaryNamesFromTheTemporaryDirectory) {
   EXPECT_EQ(first.value().parent_path(), scratch.path());
   ASSERT_TRUE(files->create(first.value(), someBytes).isOk());
   EXPECT_NE(files->temporaryName(), first.value());
+}
+
+TEST_F(LinuxFiles, LeaveOutTheSlashesBehindTheTemporaryDirectory) {
+  ::setenv("TMPDIR", (scratch.path().string() + "///").c_str(), 1);
+  const std::string name = files->temporaryName().value().string();
+  const std::string beginning = scratch.path().string() + "/file";
+  EXPECT_TRUE(name.starts_with(beginning)) << name;
+  EXPECT_EQ(name.size(), beginning.size() + 6);
+}
+
+TEST_F(LinuxFiles, TakeTheirTemporaryNamesFromTheCommonDirectoryWhereTheChosenOneIsNone) {
+  scratch.put("file", "text");
+  for (const Path& chosen : {Path{}, scratch / "nothing", scratch / "file"}) {
+    ::setenv("TMPDIR", chosen.c_str(), 1);
+    EXPECT_EQ(files->temporaryName().value().parent_path(), "/tmp") << chosen;
+  }
+  ::unsetenv("TMPDIR");
+  EXPECT_EQ(files->temporaryName().value().parent_path(), "/tmp");
+}
+
+TEST_F(LinuxFiles, TakeARelativeTemporaryDirectoryFromTheWorkingDirectoryWhileThatIsThere) {
+  fs::create_directories(scratch / "here/temporary");
+  fs::current_path(scratch / "here");
+  ::setenv("TMPDIR", "temporary", 1);
+  const auto name = files->temporaryName();
+  EXPECT_EQ(name.value().parent_path(), "temporary");
+  EXPECT_TRUE(files->create(name.value(), someBytes).isOk());
+  EXPECT_EQ(entries("here/temporary"), 1);
+  fs::remove_all(scratch / "here");
+  EXPECT_EQ(files->temporaryName().value().parent_path(), "/tmp");
+  fs::current_path("/");
+}
+
+TEST(TheTemporaryDirectory, IsNoneWhereNeitherTheChosenNorTheCommonOneIsThere) {
+  const FakeDevice device;
+  ::setenv("TMPDIR", "/nothing", 1);
+  EXPECT_EQ(platform::temporaryDirectory(*device.files).status().errorNumber(), ENOENT);
+  device.files->putDirectory("/tmp");
+  EXPECT_EQ(platform::temporaryDirectory(*device.files), Path{"/tmp"});
 }
 
 TEST_F(LinuxFiles, KeepTheirTemporaryDirectoryBehindALinkThatOnlyTheDeviceKnows) {

@@ -165,9 +165,11 @@ Status FakeFileSystem::setOwner(const Path& path, std::string_view owner, std::s
   const Status begun = begin("setOwner", path);
   if (!begun.isOk()) return begun;
   const Path place = placeOf(path);
-  if (!accounts.contains(std::string{owner}) || !accounts.contains(std::string{group}) || !nodes.contains(place)) {
-    return Status::failure(ENOENT, "set the owner of " + path.string());
+  for (const std::string_view name : {owner, group}) {
+    if (accounts.contains(std::string{name})) continue;
+    return Status::failure(ENOENT, "find the account " + std::string{name} + " for " + path.string());
   }
+  if (!nodes.contains(place)) return Status::failure(ENOENT, "set the owner of " + path.string());
   Node& node = nodes[place];
   if (!node.target.empty()) return Status::failure(ELOOP, "set the owner of " + path.string());
   node.owner = owner;

@@ -36,8 +36,8 @@ class Room {
 };
 
 // `error` is 0 where everything was read and the name was not there.
-Status notFound(int error, const std::string& name) {
-  return Status::failure(error == 0 ? ENOENT : error, "find the account " + name);
+Status notFound(int error, const std::string& name, const std::string& purpose = {}) {
+  return Status::failure(error == 0 ? ENOENT : error, "find the account " + name + purpose);
 }
 
 using File = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
@@ -99,6 +99,16 @@ Result<gid_t> AccountNames::group(const std::string& name) const {
   const int error =
       room.ask([&](char* data, std::size_t size) { return ::getgrnam_r(name.c_str(), &entry, data, size, &found); });
   return found == nullptr ? Result<gid_t>{notFound(error, name)} : found->gr_gid;
+}
+
+Result<AccountNames::Owner> AccountNames::ownerOf(const std::filesystem::path& path, const std::string& user,
+                                                  const std::string& group) const {
+  const std::string purpose = " for " + path.string();
+  const Result<uid_t> userNumber = this->user(user);
+  if (!userNumber.isOk()) return notFound(userNumber.status().errorNumber(), user, purpose);
+  const Result<gid_t> groupNumber = this->group(group);
+  if (!groupNumber.isOk()) return notFound(groupNumber.status().errorNumber(), group, purpose);
+  return Owner{userNumber.value(), groupNumber.value()};
 }
 
 }  // namespace platform

@@ -21,6 +21,14 @@ class AccountNames {
   [[nodiscard]] Result<uid_t> user(const std::string& name) const;
   [[nodiscard]] Result<gid_t> group(const std::string& name) const;
 
+  struct Owner {
+    uid_t user;
+    gid_t group;
+  };
+  // Both for what stands at the path, which a failure names.
+  [[nodiscard]] Result<Owner> ownerOf(const std::filesystem::path& path, const std::string& user,
+                                      const std::string& group) const;
+
  private:
   std::filesystem::path _root;
   PathResolver _paths;

@@ -20,9 +20,10 @@ namespace platform {
 // The files of the device that has these directories, and others; account names are those of that device.
 [[nodiscard]] ACCOUNT_EXPORT std::shared_ptr<FileSystem> makeFileSystem(const BaseDirectories& directories);
 
-// The process's temporary directory, chosen as the C library does: a program with more rights than its user has does
-// not follow the environment.
-[[nodiscard]] Path temporaryDirectory(FileSystem& files);
+// The process's temporary directory, chosen as the C library does: that of TMPDIR, without the slashes behind it, else
+// /tmp; ENOENT where neither is a directory. A program with more rights than its user has does not follow the
+// environment.
+[[nodiscard]] ACCOUNT_EXPORT Result<Path> temporaryDirectory(FileSystem& files);
 
 // The files of a rehearsal.
 class RehearsedFiles : public FileSystem {

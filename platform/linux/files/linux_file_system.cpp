@@ -10,7 +10,6 @@
 #include <cstdlib>
 #include <deque>
 #include <mutex>
-#include <random>
 
 #include "platform/linux/files/account_names.h"
 #include "platform/linux/files/directory_trees.h"
@@ -113,18 +112,18 @@ Descriptor openAgain(const Place& place, const Descriptor& thing) {
 
 // Gives away the very thing that is open, and only a file that has no second name elsewhere, and brings its new owner
 // to stable storage. `made` is the thing where this process made it, not open where it did not.
-bool giveAway(const Place& place, const Descriptor& thing, Descriptor made, uid_t user, gid_t group) {
+bool giveAway(const Place& place, const Descriptor& thing, Descriptor made, const AccountNames::Owner& owner) {
   struct stat status {};
   if (!thing.isOpen() || ::fstat(thing.number(), &status) != 0) return false;
   if (made.isOpen() && !isSame(thing, made)) return refuse(ESTALE);
   if (S_ISLNK(status.st_mode)) return refuse(ELOOP);
   if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return refuse(EMLINK);
-  const bool isTheirs = status.st_uid == user && status.st_gid == group;
+  const bool isTheirs = status.st_uid == owner.user && status.st_gid == owner.group;
   if (isTheirs || (!S_ISDIR(status.st_mode) && !S_ISREG(status.st_mode))) {
-    return ::fchownat(thing.number(), "", user, group, AT_EMPTY_PATH) == 0;
+    return ::fchownat(thing.number(), "", owner.user, owner.group, AT_EMPTY_PATH) == 0;
   }
   if (!made.isOpen()) made = openAgain(place, thing);
-  return made.isOpen() && ::fchown(made.number(), user, group) == 0 && sync(made);
+  return made.isOpen() && ::fchown(made.number(), owner.user, owner.group) == 0 && sync(made);
 }
 
 // The files and directories that were made and may still be given away, kept open: somebody who writes in their
@@ -167,14 +166,14 @@ class MadeThings {
   std::deque<Thing> _things;  // the oldest first
 };
 
-std::string randomLetters() {
+// Empty, with errno set, where there is no randomness to have.
+std::string randomTemporaryName() {
   constexpr std::string_view kLetters = "ABCDEFGHIJKLMNOPQRSTUVWXYZabcdefghijklmnopqrstuvwxyz0123456789";
-  constexpr std::size_t kCount = 6;
-  std::random_device random;
-  std::uniform_int_distribution<std::size_t> place{0, kLetters.size() - 1};
-  std::string letters;
-  while (letters.size() < kCount) letters.push_back(kLetters[place(random)]);
-  return letters;
+  std::array<unsigned char, 6> noise{};
+  if (::getrandom(noise.data(), noise.size(), 0) != static_cast<ssize_t>(noise.size())) return {};
+  std::string name = "file";
+  for (const unsigned char byte : noise) name += kLetters[byte % kLetters.size()];
+  return name;
 }
 
 class LinuxFileSystem final : public FileSystem {
@@ -235,26 +234,27 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
-    const Result<uid_t> user = _accounts.user(std::string{owner});
-    if (!user.isOk()) return user.status();
-    const Result<gid_t> groupNumber = _accounts.group(std::string{group});
-    if (!groupNumber.isOk()) return groupNumber.status();
+    const Result<AccountNames::Owner> numbers = _accounts.ownerOf(path, std::string{owner}, std::string{group});
+    if (!numbers.isOk()) return numbers.status();
     return at(path, "set the owner of", [&](const Place& place) {
-      return giveAway(place, openAt(place, O_PATH), _made.take(path), user.value(), groupNumber.value());
+      return giveAway(place, openAt(place, O_PATH), _made.take(path), numbers.value());
     });
   }
 
   Result<Path> temporaryName() override {
     constexpr int kAttempts = 1000;
-    const Path directory = temporaryDirectory(*this);
+    const Result<Path> directory = temporaryDirectory(*this);
+    if (!directory.isOk()) return directory;
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
-      Path name = directory / ("file" + randomLetters());
-      const Place place = _paths.openParent(name);
+      const std::string name = randomTemporaryName();
+      if (name.empty()) return failure("find a temporary name in", directory.value());
+      Path path = directory.value() / name;
+      const Place place = _paths.openParent(path);
       struct stat status {};
       if (place.parent.isOpen() && isThere(place, status)) continue;
-      return errno == ENOENT ? Result<Path>{std::move(name)} : failure("find a temporary name in", directory);
+      return errno == ENOENT ? Result<Path>{std::move(path)} : failure("find a temporary name in", directory.value());
     }
-    return Status::failure(EEXIST, "find a temporary name in " + directory.string());
+    return Status::failure(EEXIST, "find a temporary name in " + directory.value().string());
   }
 
   Status rename(const Path& from, const Path& to) override {
@@ -290,9 +290,14 @@ std::shared_ptr<FileSystem> makeFileSystem(const BaseDirectories& directories) {
   return std::make_shared<LinuxFileSystem>(treesOf(directories));
 }
 
-Path temporaryDirectory(FileSystem& files) {
-  const char* const chosen = ::secure_getenv("TMPDIR");
-  return chosen != nullptr && files.kindOf(chosen) == FileKind::directory ? chosen : P_tmpdir;
+Result<Path> temporaryDirectory(FileSystem& files) {
+  for (const char* const candidate : {static_cast<const char*>(::secure_getenv("TMPDIR")), P_tmpdir}) {
+    if (candidate == nullptr || files.kindOf(candidate) != FileKind::directory) continue;
+    std::string directory{candidate};
+    while (directory.size() > 1 && directory.ends_with('/')) directory.pop_back();
+    return Path{std::move(directory)};
+  }
+  return Status::failure(ENOENT, "find a directory for temporary files");
 }
 
 }  // namespace platform

@@ -205,8 +205,11 @@ path relativeTo(const Base& base, const path& whole) {
   return below;
 }
 
+// Empty where the path is, and for a relative one in a directory that is no more.
 path wholePath(const path& given) {
-  const path whole = given.is_absolute() ? given : std::filesystem::current_path() / given;
+  std::error_code error;
+  const path whole = given.is_absolute() || given.empty() ? given : std::filesystem::current_path(error) / given;
+  if (error) return {};
   return whole.has_filename() ? whole : whole.parent_path();
 }
 
@@ -261,39 +264,39 @@ const Base& PathResolver::baseOf(const path& path) const {
 }
 
 Place PathResolver::openParent(const path& path) const {
-  if (path.empty()) {
+  const std::filesystem::path whole = wholePath(path);
+  if (whole.empty()) {
     errno = ENOENT;
     return {};
   }
-  const std::filesystem::path whole = wholePath(path);
   const Base& base = baseOf(whole);
   const std::filesystem::path below = relativeTo(base, whole);
   return {openBelow(base, below.parent_path()), below.empty() ? "." : below.filename().string()};
 }
 
 Place PathResolver::openParentOfTarget(const path& path) const {
-  Place place = openParent(path);
-  if (!isLink(place)) return place;
   const std::filesystem::path whole = wholePath(path);
+  Place place = openParent(whole);
+  if (!isLink(place)) return place;
   PathWalk walk{baseOf(whole), nullptr};
   if (!walk.toTarget(relativeTo(baseOf(whole), whole))) return {};
   return {walk.takeDirectory(), walk.leaf()};
 }
 
 std::optional<Spot> PathResolver::find(const path& path) const {
-  if (path.empty()) {
+  const std::filesystem::path whole = wholePath(path);
+  if (whole.empty()) {
     errno = ENOENT;
     return std::nullopt;
   }
-  const std::filesystem::path whole = wholePath(path);
   PathWalk walk{baseOf(whole), _overlay};
   return walk.toEntry(relativeTo(baseOf(whole), whole)) ? walk.takeSpot() : std::nullopt;
 }
 
 std::optional<Spot> PathResolver::findTarget(const path& path) const {
-  std::optional<Spot> spot = find(path);
-  if (!spot || !S_ISLNK(spot->entry.status.st_mode)) return spot;
   const std::filesystem::path whole = wholePath(path);
+  std::optional<Spot> spot = find(whole);
+  if (!spot || !S_ISLNK(spot->entry.status.st_mode)) return spot;
   PathWalk walk{baseOf(whole), _overlay};
   return walk.toTarget(relativeTo(baseOf(whole), whole)) ? walk.takeSpot() : std::nullopt;
 }

@@ -94,9 +94,9 @@ bool isNobodyElses(const Entry& entry) {
 }
 
 // Asks the kernel whether a file of this process could be given away, with a file that lies nowhere.
-bool mayGiveAway(uid_t user, gid_t group) {
+bool mayGiveAway(const AccountNames::Owner& owner) {
   const Descriptor file{::memfd_create("owner", MFD_CLOEXEC)};
-  return file.isOpen() && ::fchown(file.number(), user, group) == 0;
+  return file.isOpen() && ::fchown(file.number(), owner.user, owner.group) == 0;
 }
 
 Place placeOf(const Spot& spot) {
@@ -196,24 +196,22 @@ class RehearsalFileSystem final : public RehearsedFiles {
   }
 
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
-    const Result<uid_t> user = _accounts.user(std::string{owner});
-    if (!user.isOk()) return user.status();
-    const Result<gid_t> groupNumber = _accounts.group(std::string{group});
-    if (!groupNumber.isOk()) return groupNumber.status();
+    const Result<AccountNames::Owner> numbers = _accounts.ownerOf(path, std::string{owner}, std::string{group});
+    if (!numbers.isOk()) return numbers.status();
     const std::optional<Spot> spot = _paths.find(path);
-    const bool isGiven =
-        spot && isThere(spot->entry) && isNobodyElses(spot->entry) && mayGiveAway(user.value(), groupNumber.value());
+    const bool isGiven = spot && isThere(spot->entry) && isNobodyElses(spot->entry) && mayGiveAway(numbers.value());
     return isGiven ? Status{} : failure("set the owner of", path);
   }
 
   Result<Path> temporaryName() override {
-    const Path directory = temporaryDirectory(*this);
+    const Result<Path> directory = temporaryDirectory(*this);
+    if (!directory.isOk()) return directory;
     for (unsigned attempt = 0; attempt < 1'000'000; ++attempt) {
       const std::string number = std::to_string(++_temporaryNames);
-      Path name = directory / ("file" + std::string(6 - std::min<std::size_t>(number.size(), 6), '0') + number);
+      Path name = directory.value() / ("file" + std::string(6 - std::min<std::size_t>(number.size(), 6), '0') + number);
       if (!kindOf(name).isOk()) return name;
     }
-    return Status::failure(EEXIST, "find a temporary name in " + directory.string());
+    return Status::failure(EEXIST, "find a temporary name in " + directory.value().string());
   }
 
   [[nodiscard]] std::optional<unsigned> permissionsAt(const Path& path) override {
