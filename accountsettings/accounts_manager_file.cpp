@@ -13,15 +13,15 @@
 namespace accountsettings {
 namespace {
 
-using platform::Bytes;
+using platform::Cause;
 using platform::FileSystem;
 using platform::Path;
 using platform::Result;
+using platform::SerializedPropertyList;
 using platform::Status;
 
 constexpr const char* kSave = "-[AccountsManager saveAllAccounts]";
 
-using Serialized = std::shared_ptr<const Bytes>;
 using SaveStage = SaveOutcome::Stage;
 
 std::optional<std::int64_t> versionIn(const Dictionary& file) {
@@ -49,11 +49,13 @@ void logCalculated(const BasicAccount& account, const Dictionary& merged) {
                      dataclasses);
 }
 
-Result<Serialized> serialized(const Dictionary& root) {
-  Result<Serialized> list = platform::current().propertyLists->serialize(root);
-  if (!list.isOk()) {
-    _ASLogSystem().log(kSave, "Failed to serialize account settings data: %@", list.status().reason());
-  }
+// An error that came with data is said, too, but does not keep the data from being written.
+SerializedPropertyList serialized(const Dictionary& root) {
+  SerializedPropertyList list = platform::current().propertyLists->serialize(root);
+  if (list.data != nullptr && list.status.isOk()) return list;
+  const auto error = list.status.isOk() ? std::nullopt : std::optional{list.status.reason()};
+  _ASLogSystem().log(kSave, "Failed to serialize account settings data: %@", error);
+  if (error == std::nullopt) list.status = Status::failure(Cause::other, "serialize the accounts", "No data came back");
   return list;
 }
 
@@ -74,13 +76,13 @@ SaveOutcome moveOntoSettingsFile(FileSystem& files, const Path& temporary) {
 
 // The one place where the settings file is written: whole, beside it, and then moved onto it. Whatever fails or is
 // thrown, no temporary file of ours stays; one that somebody else made at the proposed name is not ours to remove.
-SaveOutcome replaceSettingsFile(const Result<Serialized>& data) {
+SaveOutcome replaceSettingsFile(const SerializedPropertyList& list) {
   FileSystem& files = *platform::current().files;
   const Result<Path> name = files.temporaryName();
-  if (!data.isOk()) return {SaveStage::serializing, data.status()};
+  if (list.data == nullptr) return {SaveStage::serializing, list.status};
   if (!name.isOk()) return {SaveStage::naming, name.status()};
   const Path& temporary = name.value();
-  if (Status made = files.create(temporary, *data.value()); !made.isOk()) return {SaveStage::creating, std::move(made)};
+  if (Status made = files.create(temporary, *list.data); !made.isOk()) return {SaveStage::creating, std::move(made)};
   SaveOutcome outcome;
   try {
     outcome = moveOntoSettingsFile(files, temporary);

@@ -78,7 +78,7 @@ void makeDevice(const Path& root, const Population& population) {
   writeTable(root / "etc/group", "mobile:*:" + std::to_string(::getgid()) + ":");
   const platform::Platform services = platform::makeLinuxPlatform({.systemRoot = root});
   const auto list = services.propertyLists->serialize(settingsOf(population));
-  if (!list.isOk() || !services.files->create(root / kSettingsFile, *list.value()).isOk()) {
+  if (list.data == nullptr || !services.files->create(root / kSettingsFile, *list.data).isOk()) {
     throw std::runtime_error{"the settings file cannot be written below " + root.string()};
   }
 }

@@ -33,9 +33,9 @@ class ValuesInMemory final : public platform::PropertyListStore {
   platform::Result<Dictionary> readDictionary(const Path& path) override {
     return path.native().starts_with(kRoot) ? platform::Result<Dictionary>{_values} : _real->readDictionary(path);
   }
-  platform::Result<std::shared_ptr<const Bytes>> serialize(const Dictionary& dictionary) override {
+  platform::SerializedPropertyList serialize(const Dictionary& dictionary) override {
     _values = dictionary;
-    return std::make_shared<const Bytes>(Bytes{0});
+    return {std::make_shared<const Bytes>(Bytes{0}), {}};
   }
 
  private:

@@ -82,7 +82,7 @@ std::shared_ptr<platform::PropertyListStore> listStore(Bytes file) {
 }
 
 Action parse(const Population& population) {
-  Bytes file = *listStore({})->serialize(settingsOf(population)).value();
+  Bytes file = *listStore({})->serialize(settingsOf(population)).data;
   return [store = listStore(std::move(file))] { use(store->readDictionary("/file")); };
 }
 

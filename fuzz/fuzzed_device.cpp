@@ -198,7 +198,7 @@ Array FuzzedDevice::accounts(int depth) {
 }
 
 void FuzzedDevice::putReal(const Path& path, const Dictionary& contents) const {
-  files->put(path, *_store->serialize(contents).value());
+  files->put(path, *_store->serialize(contents).data);
 }
 
 void FuzzedDevice::putFile(const Path& path, const Dictionary& contents) {

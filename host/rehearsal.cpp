@@ -77,7 +77,7 @@ class KeepingPropertyListStore final : public platform::PropertyListStore {
     return kept == keptLists->end() ? _others->readDictionary(path) : kept->second;
   }
 
-  Result<std::shared_ptr<const platform::Bytes>> serialize(const platform::Dictionary& dictionary) override {
+  platform::SerializedPropertyList serialize(const platform::Dictionary& dictionary) override {
     return _others->serialize(dictionary);
   }
 

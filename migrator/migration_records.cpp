@@ -45,7 +45,7 @@ void writeReport(const Path& directory, const Dictionary& report) {
   const std::string time = services.clock->currentLocalTime(kReportTimePattern).valueOr({});
   const std::string name = records::message("AccountMigrationInformation-%@.txt", {time});
   const auto serialized = services.propertyLists->serialize(report);
-  if (serialized.isOk()) std::ignore = services.files->replace(directory / name, *serialized.value());
+  if (serialized.data != nullptr) std::ignore = services.files->replace(directory / name, *serialized.data);
 }
 
 }  // namespace

@@ -7,6 +7,13 @@
 
 namespace platform {
 
+// A dictionary as bytes, and what went wrong. A service may answer bytes and yet say that something did: they are as
+// good as it could make them.
+struct SerializedPropertyList {
+  std::shared_ptr<const Bytes> data;  // null where there are none; the store may keep them, too
+  Status status;
+};
+
 // Property lists as files and bytes. Reads the binary and the XML form and writes the binary form, version 1.0.
 class PropertyListStore {
  public:
@@ -24,8 +31,8 @@ class PropertyListStore {
   virtual Result<Dictionary> readDictionary(const Path& path) = 0;
 
   // The dictionary as a binary property list. What comes back has been read again and compared with the dictionary,
-  // value by value, so it may replace a file. Never null; the store may keep them, too.
-  virtual Result<std::shared_ptr<const Bytes>> serialize(const Dictionary& dictionary) = 0;
+  // value by value, so it may replace a file.
+  [[nodiscard]] virtual SerializedPropertyList serialize(const Dictionary& dictionary) = 0;
 };
 
 }  // namespace platform

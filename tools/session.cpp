@@ -39,8 +39,7 @@ class SettingsFromElsewhere final : public platform::PropertyListStore {
   platform::Result<accountsettings::Dictionary> readDictionary(const platform::Path& path) override {
     return _store->readDictionary(path == AccountsManager::fullPathToAccountSettingsPlist() ? _file : path);
   }
-  platform::Result<std::shared_ptr<const platform::Bytes>> serialize(
-      const accountsettings::Dictionary& dictionary) override {
+  platform::SerializedPropertyList serialize(const accountsettings::Dictionary& dictionary) override {
     return _store->serialize(dictionary);
   }
 

@@ -275,8 +275,15 @@ INSTANTIATE_TEST_SUITE_P(
     , FailingToSaveAccounts,
     testing::Values(
         Failure{"WithoutSerialisation",
-                [](FakeDevice& device) { device.propertyLists->serializeError = "out of ink"; },
+                [](FakeDevice& device) {
+                  device.propertyLists->serializes = false;
+                  device.propertyLists->serializeError = "out of ink";
+                },
                 {"Failed to serialize account settings data: out of ink", "Failed to save accounts to filesystem."},
+                Stage::serializing},
+        Failure{"WithoutDataOrAReason",
+                [](FakeDevice& device) { device.propertyLists->serializes = false; },
+                {"Failed to serialize account settings data: (null)", "Failed to save accounts to filesystem."},
                 Stage::serializing},
         Failure{"WithoutATemporaryName",
                 [](FakeDevice& device) { device.files->hasTemporaryNames = false; },
@@ -288,8 +295,8 @@ INSTANTIATE_TEST_SUITE_P(
                 Stage::creating},
         Failure{"WithoutOwner",
                 [](FakeDevice& device) { device.files->accounts.clear(); },
-                {"Could not set attributes on the temporary account settings plist. Could not set the owner of "
-                 "/var/mobile/tmp/file1: No such file or directory (errno 2)",
+                {"Could not set attributes on the temporary account settings plist. Could not find the account mobile "
+                 "for /var/mobile/tmp/file1: No such file or directory (errno 2)",
                  "Failed to save accounts to filesystem."},
                 Stage::givingAway},
         Failure{"OntoAnotherVolume",
@@ -315,6 +322,17 @@ TEST_F(SavingAccounts, ThatEndsInAnExceptionHasFailedUnlessTheFileWasWritten) {
   EXPECT_TRUE(store->lastSaveOutcome().hasFailed());
   device.propertyLists->beforeRead = nullptr;
   store->saveAllAccounts();
+  EXPECT_TRUE(store->lastSaveOutcome().isSaved());
+}
+
+TEST_F(SavingAccounts, SavesDataThatCameWithAnErrorAndSaysTheError) {
+  const Store store = load({properties("a")});
+  store->allBasicAccounts()[0]->setAccountProperty_forKey(2, "Port");
+  device.propertyLists->serializeError = "low on ink";
+  AccountsManager::_setShouldSkipNotifications(true);
+  store->saveAllAccounts();
+  EXPECT_EQ(fileAccounts(), (Array{properties("a", {{"Port", 2}})}));
+  EXPECT_EQ(messagesOf(kSave).back(), "Failed to serialize account settings data: low on ink");
   EXPECT_TRUE(store->lastSaveOutcome().isSaved());
 }
 

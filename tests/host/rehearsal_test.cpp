@@ -30,7 +30,7 @@ TEST_F(RehearsedPlatform, HasALogThatNobodyReads) { EXPECT_FALSE(rehearsal.syste
 TEST_F(RehearsedPlatform, ReadsThePropertyListsThatTheRehearsalWrote) {
   const auto path = scratch / "list.plist";
   const auto serialized = rehearsal.propertyLists->serialize({{"Key", "value"}});
-  ASSERT_TRUE(rehearsal.files->create(path, *serialized.value()).isOk());
+  ASSERT_TRUE(rehearsal.files->create(path, *serialized.data).isOk());
   EXPECT_EQ(rehearsal.propertyLists->readDictionary(path), (platform::Dictionary{{"Key", "value"}}));
   EXPECT_EQ(device.propertyLists->readDictionary(path).cause(), platform::Cause::missing);
 }

@@ -157,10 +157,10 @@ TEST_F(MigrationRecords, FileInTheDirectorysPlaceIsReported) {
 
 TEST_F(MigrationRecords, NobodyHearsOfAReportThatCannotBeSerialisedOrWritten) {
   migrator._collatedMigrationData.emplace();
-  device.propertyLists->serializeError = "too odd";
+  device.propertyLists->serializes = false;
   migrator._saveCollatedMigrationInformation();
   EXPECT_THAT(device.files->calls, Not(Contains("replace " + kReportFile.string())));
-  device.propertyLists->serializeError.clear();
+  device.propertyLists->serializes = true;
   device.files->failing.insert("replace");
   migrator._saveCollatedMigrationInformation();
   EXPECT_FALSE(device.files->exists(kReportFile));

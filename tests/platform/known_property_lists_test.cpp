@@ -28,14 +28,14 @@ const Dictionary kAccount{{"Identifier", "one"}, {"Port", 993}, {"Names", Array{
 
 TEST(KnownPropertyLists, GiveTheValuesThatWereReadBefore) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).value();
+  const Bytes bytes = *lists.store->serialize(kAccount).data;
   const Dictionary first = *lists.read(bytes);
   EXPECT_TRUE(lists.read(bytes)->isIdenticalTo(first));
 }
 
 TEST(KnownPropertyLists, AreReadFromTheFileEachTime) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).value();
+  const Bytes bytes = *lists.store->serialize(kAccount).data;
   EXPECT_TRUE(lists.read(bytes).has_value());
   static_cast<void>(lists.files->remove("/file.plist"));
   EXPECT_FALSE(lists.store->readDictionary("/file.plist").isOk());
@@ -56,7 +56,7 @@ TEST(KnownPropertyLists, DoNotHideAChangeThatKeepsSizeAndTime) {
 
 TEST(KnownPropertyLists, AreNotChangedByWhoeverEditsTheirValues) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).value();
+  const Bytes bytes = *lists.store->serialize(kAccount).data;
   Dictionary edited = *lists.read(bytes);
   edited.set("Port", 143);
   EXPECT_EQ(*lists.read(bytes), kAccount);
@@ -64,34 +64,33 @@ TEST(KnownPropertyLists, AreNotChangedByWhoeverEditsTheirValues) {
 
 TEST(KnownPropertyLists, GiveTheirBytesForTheSameValues) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).value();
+  const Bytes bytes = *lists.store->serialize(kAccount).data;
   PropertyListFiles others;
-  EXPECT_EQ(*others.store->serialize(*others.read(bytes)).value(), bytes);
+  EXPECT_EQ(*others.store->serialize(*others.read(bytes)).data, bytes);
 }
 
 TEST(KnownPropertyLists, DoNotHideAnEdit) {
   PropertyListFiles lists;
-  Dictionary edited = *lists.read(*lists.store->serialize(kAccount).value());
+  Dictionary edited = *lists.read(*lists.store->serialize(kAccount).data);
   edited.set("Names", Array{"a", "c"});
-  EXPECT_EQ(*lists.read(*lists.store->serialize(edited).value()), edited);
+  EXPECT_EQ(*lists.read(*lists.store->serialize(edited).data), edited);
 }
 
 TEST(KnownPropertyLists, DoNotHideAnEditThatIsTakenBack) {
   PropertyListFiles lists;
-  const Bytes before = *lists.store->serialize(kAccount).value();
+  const Bytes before = *lists.store->serialize(kAccount).data;
   Dictionary edited = kAccount;
   edited.set("Port", 143);
-  const Bytes between = *lists.store->serialize(edited).value();
+  const Bytes between = *lists.store->serialize(edited).data;
   edited.set("Port", 993);
-  EXPECT_EQ(*lists.store->serialize(edited).value(), before);
+  EXPECT_EQ(*lists.store->serialize(edited).data, before);
   EXPECT_NE(before, between);
 }
 
 TEST(KnownPropertyLists, TellKindsOfOneValueApart) {
   PropertyListFiles lists;
   static_cast<void>(lists.store->serialize(Dictionary{{"IsActive", true}}));
-  EXPECT_EQ(*lists.read(*lists.store->serialize(Dictionary{{"IsActive", 1}}).value())->find("IsActive"),
-            PropertyValue{1});
+  EXPECT_EQ(*lists.read(*lists.store->serialize(Dictionary{{"IsActive", 1}}).data)->find("IsActive"), PropertyValue{1});
 }
 
 TEST(KnownPropertyLists, TellOrdersOfKeysApart) {
@@ -99,14 +98,14 @@ TEST(KnownPropertyLists, TellOrdersOfKeysApart) {
   const Dictionary ordered{{"Inner", Dictionary{{"a", 1}, {"b", 2}}}};
   const Dictionary reversed{{"Inner", Dictionary{{"b", 2}, {"a", 1}}}};
   static_cast<void>(lists.store->serialize(ordered));
-  const Dictionary read = *lists.read(*lists.store->serialize(reversed).value());
+  const Dictionary read = *lists.read(*lists.store->serialize(reversed).data);
   EXPECT_EQ(read.dictionary("Inner")->begin()->key.view(), "b");
 }
 
 // What a save writes for a file that was read, unchanged.
 Bytes rewritten(const std::string& file) {
   PropertyListFiles lists;
-  return *lists.store->serialize(*lists.read(file)).value();
+  return *lists.store->serialize(*lists.read(file)).data;
 }
 
 TEST(KnownPropertyLists, AreNotWrittenAgainWithWhatNobodyReaches) {
@@ -143,10 +142,10 @@ TEST(KnownPropertyLists, AreWrittenInTheBinaryFormWhereTheyWereXml) {
 
 TEST(KnownPropertyLists, AreFew) {
   PropertyListFiles lists;
-  const Bytes bytes = *lists.store->serialize(kAccount).value();
+  const Bytes bytes = *lists.store->serialize(kAccount).data;
   const Dictionary first = *lists.read(bytes);
   for (int number = 0; number < 10; ++number) {
-    static_cast<void>(lists.read(*lists.store->serialize(Dictionary{{"Number", number}}).value()));
+    static_cast<void>(lists.read(*lists.store->serialize(Dictionary{{"Number", number}}).data));
   }
   const Dictionary again = *lists.read(bytes);
   EXPECT_FALSE(again.isIdenticalTo(first));

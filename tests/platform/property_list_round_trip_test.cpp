@@ -85,8 +85,8 @@ RC_GTEST_PROP(RandomPropertyLists, SurviveAWriteAndAReadInTheirOrder, ()) {
   const Dictionary dictionary = *tests::genDictionary({}, 3);
   PropertyListFiles files;
   const auto written = files.store->serialize(dictionary);
-  RC_ASSERT(written.isOk());
-  const auto read = files.read(*written.value());
+  RC_ASSERT(written.status.isOk());
+  const auto read = files.read(*written.data);
   RC_ASSERT(read == dictionary);
   RC_ASSERT(dump(*read) == dump(dictionary));
 }
@@ -94,12 +94,12 @@ RC_GTEST_PROP(RandomPropertyLists, SurviveAWriteAndAReadInTheirOrder, ()) {
 RC_GTEST_PROP(RandomPropertyLists, SurviveACopyThatIsEditedAndRestored, ()) {
   const Dictionary dictionary = *tests::genDictionary({}, 2);
   PropertyListFiles files;
-  const auto read = files.read(*files.store->serialize(dictionary).value());
+  const auto read = files.read(*files.store->serialize(dictionary).data);
   Dictionary copy = *read;
   copy.set("one key more than \x01 any other", copy);
   RC_ASSERT(copy != dictionary);
   copy.remove("one key more than \x01 any other");
-  RC_ASSERT(files.read(*files.store->serialize(copy).value()) == dictionary);
+  RC_ASSERT(files.read(*files.store->serialize(copy).data) == dictionary);
 }
 
 class PlistlibTest : public testing::Test {
@@ -133,7 +133,7 @@ TEST_F(PlistlibTest, AgreesOnRandomPropertyLists) {
     lists.push_back(tests::genDictionary(mine, 3)(random.split(), list % 60).value());
     const std::string name = std::to_string(list);
     write(name + ".txt", dump(lists.back()));
-    write(name + ".plist", *files.store->serialize(lists.back()).value());
+    write(name + ".plist", *files.store->serialize(lists.back()).data);
   }
   runPython();
   for (std::size_t list = 0; list < lists.size(); ++list) {
@@ -165,7 +165,7 @@ TEST(DamagedPropertyLists, AreRefusedOrSurviveAWriteAndARead) {
     std::string file = xml;
     if (mutant % 4 != 0) {
       const Dictionary dictionary = tests::genDictionary({}, 2)(generator.split(), mutant % 30).value();
-      const Bytes bytes = *files.store->serialize(dictionary).value();
+      const Bytes bytes = *files.store->serialize(dictionary).data;
       file.assign(bytes.begin(), bytes.end());
     }
     for (std::size_t edits = 1 + below(3); edits > 0; --edits) {
@@ -175,8 +175,8 @@ TEST(DamagedPropertyLists, AreRefusedOrSurviveAWriteAndARead) {
     if (!read) continue;
     ++accepted;
     const auto written = files.store->serialize(*read);
-    ASSERT_TRUE(written.isOk()) << "mutant " << mutant << ": " << written.status().description();
-    ASSERT_EQ(files.read(*written.value()), read) << "mutant " << mutant;
+    ASSERT_TRUE(written.status.isOk()) << "mutant " << mutant << ": " << written.status.description();
+    ASSERT_EQ(files.read(*written.data), read) << "mutant " << mutant;
   }
   EXPECT_GT(accepted, kMutants / 20);
 }

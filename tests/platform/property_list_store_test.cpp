@@ -60,8 +60,8 @@ Dictionary nested(int containers) {
 TEST(PropertyListStore, KeepsEveryKindThroughAWriteAndARead) {
   PropertyListFiles files;
   const auto written = files.store->serialize(everyKind());
-  ASSERT_TRUE(written.isOk()) << written.status().description();
-  const auto read = files.read(*written.value());
+  ASSERT_TRUE(written.status.isOk()) << written.status.description();
+  const auto read = files.read(*written.data);
   ASSERT_TRUE(read);
   EXPECT_EQ(*read, everyKind());
   EXPECT_EQ(keysOf(*read), keysOf(everyKind()));
@@ -69,8 +69,8 @@ TEST(PropertyListStore, KeepsEveryKindThroughAWriteAndARead) {
 
 TEST(PropertyListStore, WritesVersionOneOfTheBinaryForm) {
   const auto written = PropertyListFiles{}.store->serialize({});
-  ASSERT_TRUE(written.isOk());
-  EXPECT_EQ(std::string(written.value()->begin(), written.value()->begin() + 8), "bplist00");
+  ASSERT_TRUE(written.status.isOk());
+  EXPECT_EQ(std::string(written.data->begin(), written.data->begin() + 8), "bplist00");
 }
 
 TEST(PropertyListStore, ReadsThroughTheFileSystemAlone) {
@@ -166,23 +166,23 @@ TEST(PropertyListStore, SharesTheKeysOfAFile) {
 TEST(PropertyListStore, WritesAndReads256NestedContainersButNotOneMore) {
   PropertyListFiles files;
   const auto written = files.store->serialize(nested(256));
-  ASSERT_TRUE(written.isOk()) << written.status().description();
-  EXPECT_EQ(files.read(*written.value()), nested(256));
-  EXPECT_EQ(files.store->serialize(nested(257)).cause(), Cause::excessive);
+  ASSERT_TRUE(written.status.isOk()) << written.status.description();
+  EXPECT_EQ(files.read(*written.data), nested(256));
+  EXPECT_EQ(files.store->serialize(nested(257)).status.cause(), Cause::excessive);
 }
 
 TEST(PropertyListStore, RefusesToWriteWhatUnfoldsBeyondAllMemory) {
   PropertyValue doubled{"leaf"};
   for (int level = 0; level < 40; ++level) doubled = Array{doubled, doubled};
   const auto written = PropertyListFiles{}.store->serialize({{"k", doubled}});
-  EXPECT_EQ(written.cause(), Cause::excessive);
-  EXPECT_EQ(written.status().reason(), "The property list is too large");
+  EXPECT_EQ(written.status.cause(), Cause::excessive);
+  EXPECT_EQ(written.status.reason(), "The property list is too large");
 }
 
 TEST(PropertyListStore, RefusesToWriteAUidThatItCouldNotReadBack) {
   const auto written = PropertyListFiles{}.store->serialize({{"k", Uid{std::uint64_t{1} << 32U}}});
-  EXPECT_EQ(written.cause(), Cause::unsuitable);
-  EXPECT_EQ(written.status().reason(), "A UID is larger than 32 bits");
+  EXPECT_EQ(written.status.cause(), Cause::unsuitable);
+  EXPECT_EQ(written.status.reason(), "A UID is larger than 32 bits");
 }
 
 TEST(PropertyListStore, WritesWhatSharesItsPartsInFull) {
@@ -190,8 +190,8 @@ TEST(PropertyListStore, WritesWhatSharesItsPartsInFull) {
   const Dictionary dictionary{{"a", part}, {"b", Array{part, part}}};
   PropertyListFiles files;
   const auto written = files.store->serialize(dictionary);
-  ASSERT_TRUE(written.isOk());
-  EXPECT_EQ(files.read(*written.value()), dictionary);
+  ASSERT_TRUE(written.status.isOk());
+  EXPECT_EQ(files.read(*written.data), dictionary);
 }
 
 }  // namespace

@@ -241,7 +241,7 @@ RunOutcome ScratchDevice::run(const Mishap& mishap, std::size_t failingAllocatio
 void ScratchDevice::write(const std::filesystem::path& path, const Dictionary& contents) const {
   const platform::Platform services = platform::makeLinuxPlatform(optionsFor(_root));
   const auto list = services.propertyLists->serialize(contents);
-  if (!list.isOk() || !services.files->replace(_root / path, *list.value()).isOk()) {
+  if (list.data == nullptr || !services.files->replace(_root / path, *list.data).isOk()) {
     throw std::runtime_error{"cannot write " + path.string()};
   }
 }

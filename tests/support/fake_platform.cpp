@@ -77,9 +77,12 @@ platform::Result<Dictionary> FakePropertyListStore::readDictionary(const Path& p
   return platform::Status::failure(platform::Cause::malformed, "read " + path.string(), "it is no property list");
 }
 
-platform::Result<std::shared_ptr<const Bytes>> FakePropertyListStore::serialize(const Dictionary& dictionary) {
-  if (serializeError.empty()) return std::make_shared<const Bytes>(bytesFor(dictionary));
-  return platform::Status::failure(platform::Cause::other, "serialize the property list", serializeError);
+platform::SerializedPropertyList FakePropertyListStore::serialize(const Dictionary& dictionary) {
+  platform::SerializedPropertyList list;
+  if (serializes) list.data = std::make_shared<const Bytes>(bytesFor(dictionary));
+  if (serializeError.empty()) return list;
+  list.status = platform::Status::failure(platform::Cause::other, "serialize the property list", serializeError);
+  return list;
 }
 
 std::optional<bool> FakePreferencesStore::boolean(std::string_view domain, std::string_view key) const {

@@ -43,14 +43,15 @@ class FakePropertyListStore final : public platform::PropertyListStore {
  public:
   explicit FakePropertyListStore(std::shared_ptr<FakeFileSystem> files) : _files{std::move(files)} {}
 
-  std::string serializeError;  // where set, serialising fails with it
+  bool serializes = true;      // whether data comes back
+  std::string serializeError;  // where set, serialising says so, beside the data or alone
   std::vector<Path> reads;     // every path that was asked for, in order
   // Called before each read, so that a test can change a file at that moment.
   std::function<void(const Path&)> beforeRead;
 
   [[nodiscard]] Bytes bytesFor(const Dictionary& dictionary);
   platform::Result<Dictionary> readDictionary(const Path& path) override;
-  platform::Result<std::shared_ptr<const Bytes>> serialize(const Dictionary& dictionary) override;
+  platform::SerializedPropertyList serialize(const Dictionary& dictionary) override;
 
  private:
   std::shared_ptr<FakeFileSystem> _files;

@@ -4,6 +4,7 @@
 #include <memory>
 #include <string>
 
+#include "platform/property_list_store.h"
 #include "platform/property_value.h"
 #include "platform/status.h"
 
@@ -24,8 +25,9 @@ struct ParsedPropertyList {
 // merely malformed are repaired in them.
 Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt);
 
-// The dictionary as a binary property list, read back and compared before it is answered. Never null.
-Result<std::shared_ptr<const Bytes>> writePropertyList(const Dictionary& dictionary);
+// The dictionary as a binary property list, read back and compared before it is answered: bytes, or
+// why there are none, never both.
+[[nodiscard]] SerializedPropertyList writePropertyList(const Dictionary& dictionary);
 
 // Whether a binary property list that is safe for libplist holds exactly these values in their order.
 [[nodiscard]] bool readsBackAs(const Bytes& safe, const Dictionary& values);

@@ -22,10 +22,10 @@ class LibplistPropertyListStore final : public PropertyListStore {
     return std::move(parsed.values);
   }
 
-  Result<std::shared_ptr<const Bytes>> serialize(const Dictionary& dictionary) override {
-    if (auto bytes = _known.bytesOf(dictionary)) return bytes;
-    Result<std::shared_ptr<const Bytes>> list = writePropertyList(dictionary);
-    if (list.isOk()) _known.keep(list.value(), dictionary, true);
+  SerializedPropertyList serialize(const Dictionary& dictionary) override {
+    if (auto bytes = _known.bytesOf(dictionary)) return {std::move(bytes), {}};
+    SerializedPropertyList list = writePropertyList(dictionary);
+    if (list.data != nullptr) _known.keep(list.data, dictionary, true);
     return list;
   }
 

@@ -18,6 +18,8 @@ Status failure(Cause cause, const char* reason) {
   return Status::failure(cause, "serialize the property list", reason);
 }
 
+SerializedPropertyList nothing(const Status& why) { return {nullptr, why}; }
+
 // Finds out, before anything is built, why a value cannot be written. Values may share their parts, so a small one may
 // unfold to more than there is memory: counting ends where the limit is reached.
 class Inspection {
@@ -117,21 +119,21 @@ Bytes binaryOf(plist_t tree) {
 
 }  // namespace
 
-Result<std::shared_ptr<const Bytes>> writePropertyList(const Dictionary& dictionary) {
+SerializedPropertyList writePropertyList(const Dictionary& dictionary) {
   Inspection inspection;
   inspection.inspect(dictionary);
-  if (!inspection.objection().isOk()) return inspection.objection();
+  if (!inspection.objection().isOk()) return nothing(inspection.objection());
   LibplistNode tree = nodeOf(dictionary);
   Bytes bytes = binaryOf(tree.get());
-  if (bytes.empty()) return failure(Cause::other, "The property list could not be written");
+  if (bytes.empty()) return nothing(failure(Cause::other, "The property list could not be written"));
   // Before the tree goes: a large block that is asked for when thousands of small ones have just been given back makes
   // the C library sort them all.
   const bool isSafe = repairBinaryPlist(bytes).refusal == Cause::none;
   tree.reset();
   if (!isSafe || !readsBackAs(bytes, dictionary)) {
-    return failure(Cause::other, "What was written does not read back the same");
+    return nothing(failure(Cause::other, "What was written does not read back the same"));
   }
-  return std::make_shared<const Bytes>(std::move(bytes));
+  return {std::make_shared<const Bytes>(std::move(bytes)), {}};
 }
 
 }  // namespace platform
