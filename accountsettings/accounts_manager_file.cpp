@@ -125,8 +125,7 @@ std::shared_ptr<AccountsManager> AccountsManager::loadedFromFile(std::unique_ptr
   store->_loadOutcome.reading = read.status();
   store->_loadOutcome.storedVersion = versionIn(file);
   store->setDataVersion(static_cast<std::uint64_t>(store->_loadOutcome.storedVersion.value_or(0)));
-  if (store->_tracker) store->_tracker->readFile(read.status());
-  if (store->_tracker) store->_tracker->loadedAll(store->_orderedTopLevelAccounts, store->_dataVersion);
+  if (store->_tracker) store->_tracker->loadedAll(store->_orderedTopLevelAccounts, store->_loadOutcome);
   return store;
 }
 
@@ -158,7 +157,6 @@ void AccountsManager::loadAccounts(const Array& accounts) {
       _ASLogSystem().log("-[AccountsManager _initWithAccountsInfo:]", "ERROR: Failed to create a BasicAccount from %@",
                          properties);
       leaveOut(position, properties, faultOf(properties));
-      if (_tracker) _tracker->leftOut(properties);
       continue;
     }
     isFixed |= offerLoaded(account, position, properties);
@@ -168,6 +166,7 @@ void AccountsManager::loadAccounts(const Array& accounts) {
 
 void AccountsManager::leaveOut(std::size_t position, const PropertyValue& element, WhyLeftOut why) {
   _loadOutcome.leftOut.push_back({position, element, why});
+  if (_tracker) _tracker->leftOut(_loadOutcome.leftOut.back());
 }
 
 bool AccountsManager::offerLoaded(const Account& account, std::size_t position, const PropertyValue& element) {
@@ -176,10 +175,11 @@ bool AccountsManager::offerLoaded(const Account& account, std::size_t position, 
     const FixAnswer answer = fixer->fixBasicAccountIfNeeded_loggingMessage(*account, "loading accounts");
     if (answer != FixAnswer::drop) registerAccount(account);
     isFixed |= answer != FixAnswer::nothingToDo;
-    if (answer == FixAnswer::drop) leaveOut(position, element, WhyLeftOut::givenUp);
-    if (!_tracker) continue;
-    answer == FixAnswer::drop ? _tracker->givenUp(element, ASRuntimeFixMailAccount::kFaultOfDropped)
-                              : _tracker->loaded(element, *account);
+    if (answer == FixAnswer::drop) {
+      leaveOut(position, element, WhyLeftOut::givenUp);
+    } else if (_tracker) {
+      _tracker->loaded(element, *account);
+    }
   }
   return isFixed;
 }
@@ -248,7 +248,7 @@ bool AccountsManager::fixAccountsForSaving() {
       // A dropped account is no longer found, but keeps its place in the order and so in the file.
       if (answer == FixAnswer::drop) {
         forgetIdentifierOfAccount(*account);
-        if (_tracker) _tracker->unrepaired(*account, ASRuntimeFixMailAccount::kFaultOfDropped);
+        if (_tracker) _tracker->unrepaired(*account);
       }
       isFixed |= answer != FixAnswer::nothingToDo;
     }

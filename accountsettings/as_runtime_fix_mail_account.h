@@ -5,7 +5,6 @@
 #include <unordered_set>
 
 #include "accountsettings/runtime_fixer.h"
-#include "records/loss.h"
 
 namespace accountsettings {
 
@@ -14,9 +13,6 @@ namespace accountsettings {
 // during a save have been saved, tells the mail application that its accounts changed.
 class ACCOUNT_EXPORT ASRuntimeFixMailAccount final : public RuntimeFixer {
  public:
-  // What is wrong with an account for which it answers `drop`.
-  static constexpr records::LossCode kFaultOfDropped = records::LossCode::droppedUnknownClass;
-
   static std::shared_ptr<ASRuntimeFixMailAccount> init();
   ~ASRuntimeFixMailAccount() override;
 

@@ -8,6 +8,7 @@
 
 #include "accountsettings/basic_account.h"
 #include "accountsettings/dataclass_lists.h"
+#include "platform/kept_for_life.h"
 #include "platform/platform.h"
 
 namespace accountsettings {
@@ -132,7 +133,7 @@ Dataclasses grantedDataclasses(const BasicAccount& account) {
 }  // namespace
 
 const Dataclasses& BasicAccount::supportedDataclasses() const {
-  static const Dataclasses& none = *new Dataclasses;  // for the life of the process
+  static const Dataclasses& none = platform::keptForLife<Dataclasses>();
   const std::optional<Text> ofType = type();
   return ofType ? orderedSupportedDataclassesForAccountType(*ofType) : none;
 }

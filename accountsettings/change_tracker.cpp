@@ -34,19 +34,10 @@ Dictionary propertiesIn(const PropertyValue& element) {
   return properties == nullptr ? Dictionary{} : *properties;
 }
 
-// Why no account can be made of a file's element.
-Lost faultOf(const PropertyValue& element) {
-  const Dictionary* const properties = element.asDictionary();
-  if (properties == nullptr) return {.code = LossCode::droppedNoRecord};
-  Lost lost{.code = LossCode::droppedNoClass, .account = nameOf(*properties)};
-  const PropertyValue* const type = properties->find(kAccountType);
-  const Text* const name = type == nullptr ? nullptr : type->asText();
-  if (type == nullptr) {
-    lost.code = LossCode::droppedNoType;
-  } else if (name == nullptr || !BasicAccount::_isValidAccountType(*name)) {
-    lost.code = LossCode::droppedUnknownType;
-    lost.detail = records::description(*type);
-  }
+Lost lossOf(const LeftOutRecord& record) {
+  const Dictionary properties = propertiesIn(record.element);
+  Lost lost{.code = lossCodeOf(record.why), .account = nameOf(properties)};
+  if (record.why == WhyLeftOut::unknownType) lost.detail = records::description(*properties.find(kAccountType));
   return lost;
 }
 
@@ -95,12 +86,8 @@ void ChangeTracker::attempt(const Action& action) noexcept {
 
 // --- Loading ---
 
-void ChangeTracker::leftOut(const PropertyValue& element) {
-  attempt([&] { _observer->told(faultOf(element)); });
-}
-
-void ChangeTracker::givenUp(const PropertyValue& element, LossCode code) {
-  attempt([&] { _observer->told(Lost{.code = code, .account = nameOf(propertiesIn(element))}); });
+void ChangeTracker::leftOut(const LeftOutRecord& record) {
+  attempt([&] { _observer->told(lossOf(record)); });
 }
 
 void ChangeTracker::loaded(const PropertyValue& element, const BasicAccount& account) {
@@ -110,14 +97,13 @@ void ChangeTracker::loaded(const PropertyValue& element, const BasicAccount& acc
   });
 }
 
-void ChangeTracker::readFile(const platform::Status& status) {
-  if (status.isOk() || status.cause() == platform::Cause::missing) return;
-  attempt([&] { _observer->told(Lost{.code = LossCode::unreadableSettingsFile, .detail = status.reason()}); });
-}
-
-void ChangeTracker::loadedAll(const Accounts& accounts, std::uint64_t version) {
+void ChangeTracker::loadedAll(const Accounts& accounts, const LoadOutcome& outcome) {
   attempt([&] {
+    if (outcome.hasUnreadFile()) {
+      _observer->told(Lost{.code = LossCode::unreadableSettingsFile, .detail = outcome.reading.reason()});
+    }
     _known = stateOf(accounts);
+    const auto version = static_cast<std::uint64_t>(outcome.storedVersion.value_or(0));
     _observer->told(records::Loaded{accounts.size(), version});
     if (static_cast<std::int64_t>(version) < 0 || version <= AccountsManager::currentVersion()) return;
     _observer->told(Lost{.code = LossCode::newerSettingsFile, .detail = "version " + std::to_string(version)});
@@ -184,10 +170,10 @@ void ChangeTracker::tellGone(const Lost& lost, const BasicAccount* account) {
 
 // --- Saving ---
 
-void ChangeTracker::unrepaired(const BasicAccount& account, LossCode fault) {
+void ChangeTracker::unrepaired(const BasicAccount& account) {
   attempt([&] {
-    _atThisSave.push_back(
-        records::Unrepaired{nameOf(account.properties()), std::string{records::meaningOf(fault).text}});
+    const records::LossMeaning& fault = records::meaningOf(lossCodeOf(WhyLeftOut::givenUp));
+    _atThisSave.push_back(records::Unrepaired{nameOf(account.properties()), std::string{fault.text}});
   });
 }
 

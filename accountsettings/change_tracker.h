@@ -1,6 +1,6 @@
 #pragma once
 
-#include <cstdint>
+#include <cstddef>
 #include <memory>
 #include <string>
 #include <string_view>
@@ -8,6 +8,7 @@
 #include <vector>
 
 #include "accountsettings/record_changes.h"
+#include "accountsettings/store_outcomes.h"
 #include "platform/export.h"
 #include "platform/status.h"
 #include "records/fact_observer.h"
@@ -30,11 +31,9 @@ class ChangeTracker {
   [[nodiscard]] ACCOUNT_EXPORT static std::size_t statesTaken();
 
   // --- Loading: each element of the file, then the store ---
-  void leftOut(const PropertyValue& element);  // no account could be made of it
+  void leftOut(const LeftOutRecord& record);
   void loaded(const PropertyValue& element, const BasicAccount& account);
-  void givenUp(const PropertyValue& element, records::LossCode code);
-  void readFile(const platform::Status& status);  // how that ended
-  void loadedAll(const Accounts& accounts, std::uint64_t version);
+  void loadedAll(const Accounts& accounts, const LoadOutcome& outcome);
 
   // --- What is known of an account beforehand; what is said first counts ---
   void willGo(const BasicAccount& account, records::LossCode code);
@@ -48,7 +47,7 @@ class ChangeTracker {
 
   // --- Saving: what could not be repaired, what was written in place of the accounts, and how that ended. What is as
   // it was at the last save is not told again. ---
-  void unrepaired(const BasicAccount& account, records::LossCode fault);
+  void unrepaired(const BasicAccount& account);
   void written(const Accounts& accounts, const Array& records);
   void savedAll(std::size_t count, std::uint64_t version, const std::string& path, const platform::Status& status);
 

@@ -8,6 +8,7 @@
 
 #include "platform/property_value.h"
 #include "platform/status.h"
+#include "records/loss.h"
 
 namespace accountsettings {
 
@@ -17,8 +18,20 @@ enum class WhyLeftOut : std::uint8_t {
   noType,       // it says no type
   unknownType,  // its type is none that is configured, or no text
   noClass,      // its type is known, but nothing was made of it
-  givenUp       // a fixer found that it is beyond repair
+  givenUp       // a fixer found that it is beyond repair: its class is unknown
 };
+
+// What a run tells of an element that was left out.
+[[nodiscard]] constexpr records::LossCode lossCodeOf(WhyLeftOut why) {
+  switch (why) {
+    case WhyLeftOut::noRecord: return records::LossCode::droppedNoRecord;
+    case WhyLeftOut::noType: return records::LossCode::droppedNoType;
+    case WhyLeftOut::unknownType: return records::LossCode::droppedUnknownType;
+    case WhyLeftOut::noClass: return records::LossCode::droppedNoClass;
+    case WhyLeftOut::givenUp: break;
+  }
+  return records::LossCode::droppedUnknownClass;
+}
 
 struct LeftOutRecord {
   std::size_t position = 0;  // in the file's list of accounts
