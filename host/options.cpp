@@ -27,7 +27,8 @@ constexpr std::string_view kStatuses =
     "\n"
     "Exit status: 0 the migration succeeded, 1 it did not, 2 wrong use,\n"
     "3 the plug-in could not be loaded, 5 a snapshot could not be taken or restored,\n"
-    "6 the accounts were not saved, 7 with --strict: some accounts were lost,\n"
+    "6 the accounts were not saved, 7 some accounts were lost (with --strict) or\n"
+    "would be (with --refuse-loss),\n"
     "8 refused, and nothing was touched: a lock could not be had, or a file may be planted.\n";
 
 constexpr std::size_t kUsualColumns = 80;
@@ -61,6 +62,9 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--serve-rehearsals", "", "in place of a run, rehearse the devices that standard input names, each in a child",
        &options.isServer},
       {"--strict", "", "exit with 7 where accounts were lost", &options.isStrict},
+      {"--careful", "", "rehearse before the run, and keep its snapshot for good where a loss is foretold",
+       &options.isCareful},
+      {"--refuse-loss", "", "rehearse before the run, and do not run where a loss is foretold", &options.refusesLoss},
       {"--lock-timeout", "SECONDS", "give up where another program holds a lock for longer", &written.lockTimeout},
       {"--snapshots", "DIR", "before the run, keep copies in DIR of the files that it may change",
        &options.snapshots.directory},
@@ -177,6 +181,9 @@ void settleRun(const Written& written, Options& options) {
   if (options.snapshots.explained && !written.explain) throw WrongUse{"--of needs --explain"};
   if (options.isRehearsal && !isRun) throw WrongUse{"--dry-run is for a run, and this is none"};
   if (options.isStrict && !isRun) throw WrongUse{"--strict is for a run, and this is none"};
+  if (options.isCareful && !isRun) throw WrongUse{"--careful is for a run, and this is none"};
+  if (options.refusesLoss && !isRun) throw WrongUse{"--refuse-loss is for a run, and this is none"};
+  if (options.isCareful && !options.snapshots.directory) throw WrongUse{"--careful needs --snapshots"};
   if (!written.explain) return;
   if (!isRun && !options.snapshots.explained) throw WrongUse{"--explain is for a run, and this is none"};
   options.explain = explainIn(*written.explain);
@@ -185,13 +192,15 @@ void settleRun(const Written& written, Options& options) {
 // A server's options are those of each of its rehearsals, which have no root of their own and nothing to keep.
 void settleServer(const Written& written, const Options& options) {
   if (!options.isServer) return;
-  const std::array<std::pair<bool, const char*>, 7> excluded{
+  const std::array<std::pair<bool, const char*>, 9> excluded{
       {{options.device.systemRoot.has_value(), "--root"},
        {options.device.home.has_value(), "--home"},
        {options.trace.has_value(), "--trace"},
        {written.explain.has_value(), "--explain"},
        {options.isRehearsal, "--dry-run"},
        {options.isStrict, "--strict"},
+       {options.isCareful, "--careful"},
+       {options.refusesLoss, "--refuse-loss"},
        {options.snapshots.directory.has_value(), "--snapshots"}}};
   for (const auto& [isGiven, name] : excluded) {
     if (isGiven) throw WrongUse{"--serve-rehearsals and " + std::string{name} + " exclude each other"};
@@ -223,13 +232,21 @@ std::variant<Options, Answer> parseArguments(std::span<const char* const> argume
   return options;
 }
 
+Options rehearsalOf(const Options& run) {
+  Options options = run;
+  options.device.locks.isShared = true;
+  options.trace.reset();
+  options.explain = Explain::json;
+  options.isRehearsal = true;
+  options.isStrict = options.isCareful = options.refusesLoss = false;
+  options.snapshots.isIfNeeded = false;
+  return options;
+}
+
 Options rehearsalBelow(const std::filesystem::path& root, const Options& server) {
-  Options options = server;
+  Options options = rehearsalOf(server);
   options.isServer = false;
   options.device.systemRoot = std::filesystem::absolute(root);
-  options.device.locks.isShared = true;
-  options.isRehearsal = true;
-  options.explain = Explain::json;
   requireDirectory(options.device.systemRoot);
   return options;
 }

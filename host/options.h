@@ -37,8 +37,10 @@ struct Options {
   std::optional<std::filesystem::path> trace;
   Explain explain = Explain::notAsked;
   bool isRehearsal = false;
-  bool isServer = false;  // of rehearsals, in place of a run
-  bool isStrict = false;  // accounts that are lost have an exit status of their own
+  bool isServer = false;     // of rehearsals, in place of a run
+  bool isStrict = false;     // accounts that are lost have an exit status of their own
+  bool isCareful = false;    // a rehearsal goes before the run
+  bool refusesLoss = false;  // and there is no run where it speaks against it
   SnapshotOptions snapshots;
   std::vector<std::string> given{};  // the options as they were given, each as --name or --name=VALUE
 };
@@ -52,6 +54,9 @@ struct Answer {
 // what is said there, for an argument that is no option, for a root that is no directory, and for options that
 // contradict each other or lack the one that they need.
 [[nodiscard]] std::variant<Options, Answer> parseArguments(std::span<const char* const> arguments);
+
+// The rehearsal, for machines, of the run that these options ask for.
+[[nodiscard]] Options rehearsalOf(const Options& run);
 
 // What `--root ROOT --dry-run --explain=json` together with a server's options asks for. Throws commandline::WrongUse
 // for a root that is no directory.

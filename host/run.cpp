@@ -11,6 +11,7 @@
 #include "commandline/progress_line.h"
 #include "host/explanation.h"
 #include "host/explanation_page.h"
+#include "host/foretelling.h"
 #include "host/migration_lock.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
@@ -84,6 +85,7 @@ struct Account {
   const Explanation& explanation;
   Verdict verdict;
   ExplainedRun run;
+  std::vector<std::string> foretold{};
 
   [[nodiscard]] std::string asText() const { return textOf(explanation, verdict, run); }
   [[nodiscard]] std::string asJson() const { return jsonDocumentOf(explanation, verdict, run); }
@@ -103,6 +105,7 @@ snapshots::RunEnd endOf(const Account& account) {
   for (const records::Lost& lost : account.verdict.lost) {
     if (!isToldBySnapshots(lost)) end.onlyInSnapshot.push_back(textOf(lost));
   }
+  if (account.verdict.lost.empty()) end.onlyInSnapshot = account.foretold;
   return end;
 }
 
@@ -184,6 +187,11 @@ std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMig
   return session;
 }
 
+std::vector<std::string> foretoldOf(const platform::DataClassMigrator& migrator, const Options& options) {
+  const bool isAsked = (options.isCareful || options.refusesLoss) && !options.isRehearsal;
+  return isAsked ? foretell(options, migrator.footprint().lockName) : std::vector<std::string>{};
+}
+
 ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Onlookers& onlookers) {
   ExplainedRun run{.dataClass = migrator.dataClassName(),
                    .isRehearsal = options.isRehearsal,
@@ -191,13 +199,14 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
                    .root = platform::current().directories->systemRoot(),
                    .time = now()};
   if (onlookers.trace) onlookers.trace->start(run.version, run.root, options.given, run.time);
+  const auto foretold = foretoldOf(migrator, options);
   const auto session = prepare(migrator, options, *onlookers.recorder);
   run.success = migrator.performMigration();
   commandline::progressLine().end();
 
   const Explanation& explanation = onlookers.recorder->explanation();
   if (!explanation.isComplete()) say("memory ran out while the run was watched: what is said of it may be incomplete");
-  Account account{explanation, verdictOf(explanation, session ? session->runSnapshot().string() : ""), run};
+  Account account{explanation, verdictOf(explanation, session ? session->runSnapshot().string() : ""), run, foretold};
   endSession(session.get(), options.snapshots.keep, account);
   if (onlookers.trace) {
     onlookers.trace->result(run.dataClass, run.success, account.verdict);
@@ -208,7 +217,7 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
       !commandline::print(explanationOf(options.explain, account, migrator.footprint()))) {
     say("the explanation could not be written to standard output");
   }
-  return statusOf(account, options.isStrict);
+  return statusOf(account, options.isStrict || (options.isRehearsal && options.refusesLoss));
 }
 
 // A plug-in that cannot be loaded is the run's to tell.

@@ -20,6 +20,7 @@ PLACES = {
     "migrator/*_generation_steps.cpp": rf"setDataVersion\({NUMBER}\)|// From data version \d+\.",
     "tests/migrator/*step*_test.cpp": r"",  # what one step reads and stamps
     "README.md": rf"data version (?:\d+ -> )?{NUMBER}",
+    "docs/STEPS.md": r"",  # what each step reads and leaves
     "docs/FORMAT.md": rf"^Version {NUMBER} is current",
     "docs/EXPLAIN.md": rf"data version {NUMBER}|as version {NUMBER}|\"(?:v|storedV)ersion\": ?{NUMBER}",
     # What was measured on a device of that version.

@@ -11,6 +11,8 @@ complete -c migration-host -l explain -a 'text json html'
 complete -c migration-host -l dry-run
 complete -c migration-host -l serve-rehearsals
 complete -c migration-host -l strict
+complete -c migration-host -l careful
+complete -c migration-host -l refuse-loss
 complete -c migration-host -l lock-timeout -x
 complete -c migration-host -l snapshots -r -a '(__fish_complete_directories)'
 complete -c migration-host -l keep -x
