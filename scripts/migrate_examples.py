@@ -1,13 +1,16 @@
 """Migrates a copy of each example device and shows what became of its accounts."""
 
+import json
+import shutil
 import sys
 import tempfile
+import textwrap
 from pathlib import Path
 
-from device import EXAMPLES, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, Device
+from device import EXAMPLES, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, Device
 
 ABSENT = "-"
-SHOWN = 3  # changes of one account that are named; the others are counted
+COLUMN = 58  # in which changes are wrapped
 TITLES = ("Account", "Before", "After", "What changed")
 
 
@@ -70,17 +73,25 @@ def changes(before, after):
         ("-", [key for key in old if key not in new]),
         ("~", [key for key in new if key in old and new[key] != old[key]]),
     ) for key in keys]
-    if not parts:
-        return "nothing"
-    return ", ".join(parts[:SHOWN]) + (f" and {len(parts) - SHOWN} more" if len(parts) > SHOWN else "")
+    return ", ".join(parts) or "nothing"
 
 
-def rows(before, after):
+def fates_of(explanation):
+    """What became of the accounts that went, by identifier."""
+    facts = [fact for stage in explanation["stages"] for fact in stage["facts"]]
+    folded = {fact["account"]["identifier"]: "folded into " + " and ".join(other["name"] for other in fact["into"])
+              for fact in facts if fact["fact"] == "folded"}
+    lost = {loss.get("identifier"): f"lost: {loss['reason']}" for loss in explanation["result"].get("lost", [])}
+    return {**folded, **lost}
+
+
+def rows(before, after, fates):
     left = list(after)
     for account in before:
         partner = partner_of(account, left)
         if partner is None:
-            yield account.name(), account.summary(), ABSENT, "gone"
+            fate = next((fates[each] for each in account.identifiers() if each in fates), "gone")
+            yield account.name(), account.summary(), ABSENT, fate
         else:
             left.remove(partner)
             yield account.name(), account.summary(), partner.summary(), changes(account, partner)
@@ -89,9 +100,11 @@ def rows(before, after):
 
 
 def show_table(table):
-    widths = [max(len(row[column]) for row in [TITLES, *table]) for column in range(len(TITLES))]
-    for row in [TITLES, tuple("-" * width for width in widths), *table]:
-        print("  " + "  ".join(cell.ljust(width) for cell, width in zip(row, widths)).rstrip())
+    widths = [max(len(row[column]) for row in [TITLES, *table]) for column in range(len(TITLES) - 1)]
+    for row in [TITLES, tuple("-" * width for width in [*widths, COLUMN]), *table]:
+        begin = "  " + "  ".join(cell.ljust(width) for cell, width in zip(row, widths)) + "  "
+        for number, line in enumerate(textwrap.wrap(row[-1], COLUMN)):
+            print((begin if number == 0 else " " * len(begin)) + line)
 
 
 def version_of(device):
@@ -100,23 +113,34 @@ def version_of(device):
 
 def migrate_example(example, directory, host):
     device = Device.like(example, directory / example)
+    Device.like(example, directory / f"{example}.before")
     version, accounts = version_of(device), accounts_of(device)
-    run = device.migrate(host)
+    run = device.migrate(host, "--explain=json")
     print(f"\n{example}: data version {version} -> {version_of(device)}, exit status {run.status}\n")
-    show_table(list(rows(accounts, accounts_of(device))))
-    print(f"\n  settings  {device.path(SETTINGS)}")
-    if device.path(SETTINGS_COPY).is_file():
-        print(f"  before    {device.path(SETTINGS_COPY)}")
-    print(f"  trace     {device.root}.trace ({len(run.events)} events)")
+    show_table(list(rows(accounts, accounts_of(device), fates_of(json.loads("\n".join(run.output))))))
     return run.status
 
 
-def main(host):
-    directory = Path(tempfile.mkdtemp(prefix="migrated-devices-"))
+def place_for(devices):
+    """A new directory beside this link, which leads to it from now on; what it led to until now is gone."""
+    devices.parent.mkdir(parents=True, exist_ok=True)
+    former = devices.resolve() if devices.is_symlink() else None
+    made = Path(tempfile.mkdtemp(prefix=devices.name + "-", dir=devices.parent))
+    fresh = made / "link"
+    fresh.symlink_to(made.name)
+    fresh.replace(devices)
+    if former and former.parent == made.parent and former.name.startswith(devices.name + "-"):
+        shutil.rmtree(former)
+    return made
+
+
+def main(host, devices):
+    devices = Path(devices)
+    directory = place_for(devices)
     statuses = [migrate_example(example.name, directory, host) for example in sorted(EXAMPLES.iterdir())]
-    print(f"\nThe migrated devices stay in {directory} until you delete them.")
+    print(f"\nThe devices lie in {devices}, each beside what it was (.before) and the events of its run (.trace).")
     return max(statuses)
 
 
 if __name__ == "__main__":
-    sys.exit(main(sys.argv[1]))
+    sys.exit(main(*sys.argv[1:]))

@@ -10,6 +10,7 @@ import os
 import re
 import shutil
 import subprocess
+import sys
 import unittest
 from pathlib import Path
 
@@ -20,11 +21,11 @@ from device_case import HOST, DeviceTest
 SOURCES = Path(os.environ["SOURCE_TREE"])
 DOCUMENTS = [
     "README.md", "CONTRIBUTING.md", "docs/ACCOUNTCTL.md", "docs/ARCHITECTURE.md", "docs/CONFIGURATION.md",
-    "docs/EXPLAIN.md", "docs/FLEET.md", "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MODULES.md", "docs/OPERATIONS.md", "docs/RELIABILITY.md", "docs/SNAPSHOTS.md",
+    "docs/EXPLAIN.md", "docs/FLEET.md", "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MESSAGES.md", "docs/MODULES.md", "docs/OPERATIONS.md", "docs/RELIABILITY.md", "docs/SNAPSHOTS.md",
 ]
 # It tells of a device after its update.
 MIGRATED = "docs/OPERATIONS.md"
-BLOCK = re.compile(r"^(?:<!-- not run: (?P<reason>.+) -->\n)?```(?P<language>[a-z]*)\n(?P<text>.*?)^```$", re.M | re.S)
+BLOCK = re.compile(r"^(?:<!-- not run: (?P<reason>[^\n]+) -->\n)?```(?P<language>[a-z]*)\n(?P<text>.*?)^```$", re.M | re.S)
 MIGRATE = "migration-host --home /var/mobile --snapshots /var/lib/account-settings/snapshots"
 PROGRAMS = re.compile(
     r"^(?:sudo )?(?:migration-host|migration-rehearse|accountctl|\./|tools/|cmake|ctest|cpack|apt|dpkg|systemctl|journalctl)"
@@ -95,6 +96,25 @@ class Documents(DeviceTest):
             wrapper.chmod(0o755)
         self.environment = {**plain_environment(), "PATH": f"{programs}:{os.environ['PATH']}", "LC_ALL": "C.UTF-8"}
 
+    def prepare_as_run_does(self):
+        """What ./run leaves of a fresh tree, seen from there; answers what it printed."""
+        work = self.scratch / "work"
+        (work / "build/release").mkdir(parents=True)
+        (work / "build/release/bin").symlink_to(HOST.parent)
+        ended = subprocess.run([sys.executable, SOURCES / "scripts/migrate_examples.py", HOST, "build/devices"], cwd=work,
+                               env=plain_environment(), capture_output=True, text=True, check=True)
+        return ended.stdout
+
+    def test_the_example_in_the_readme_is_what_run_prints(self):
+        printed = self.prepare_as_run_does()
+        (shown,) = [block["text"] for block in blocks("README.md") if block["text"].startswith("first-generation: ")]
+        self.assertIn(shown, printed)
+
+    def test_the_commands_that_run_prints_are_those_of_the_readme(self):
+        told = re.findall(r"^  (build/.*)$", (SOURCES / "run").read_text(encoding="utf-8"), re.M)
+        self.assertEqual(3, len(told))
+        self.assertIn("\n".join(told) + "\n", [block["text"] for block in blocks("README.md")])
+
     def here(self, text):
         names = "|".join(map(re.escape, self.places))
         return re.sub(rf"(?<![\w/])({names})\b", lambda match: str(self.places[match[1]]), text)
@@ -127,6 +147,8 @@ class Documents(DeviceTest):
 
 def test_of(document):
     def test(self):
+        if document == "README.md":
+            self.prepare_as_run_does()
         if document == MIGRATED:
             self.assertEqual(0, self.run_shell(MIGRATE).returncode)
         for block in blocks(document):
