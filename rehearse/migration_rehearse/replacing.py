@@ -37,7 +37,7 @@ class Replacer:
         """The text in place of one that stands under a key."""
         if key in READ_KEYS:
             return self._read_text(text)
-        if names_credential(key):
+        if text and names_credential(key):
             return self._once("secret", text, self._secret)
         return text if text in self.known else self._replaced(text)
 

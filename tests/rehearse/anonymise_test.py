@@ -132,6 +132,13 @@ class Words(unittest.TestCase):
                           for character in address.replace("@", "%40"))
         self.assertEqual(f"/calendar/dav/{escaped}/user", path)
 
+    def test_of_secrets_are_replaced_whole_and_no_secret_stays_none(self):
+        replacer = Replacer(KEY)
+        secret, again, empty = (replacer.text(text, "Password") for text in ("sword-fish 7", "sword-fish 7", ""))
+        self.assertEqual((secret, ""), (again, empty))
+        self.assertRegex(secret, r"^\w{12}$")
+        self.assertNotIn("sword", secret)
+
     def test_are_others_under_another_key(self):
         self.assertNotEqual(self.replaced("Jane Smithson"), self.replaced("Jane Smithson", key=b"another key of a campaign"))
 
