@@ -9,7 +9,6 @@ foreach(component IN LISTS CPACK_COMPONENTS_ALL)
   set(name "${CPACK_DEBIAN_${upper}_PACKAGE_NAME}")
   set(tree "${CPACK_TEMPORARY_INSTALL_DIRECTORY}/${component}${CPACK_PACKAGING_INSTALL_PREFIX}")
 
-  file(REMOVE_RECURSE "${tree}/share/doc")
   set(documents "${tree}/share/doc/${name}")
   file(COPY "${CPACK_PACKAGING_SOURCES}/copyright" "${CPACK_PACKAGING_SOURCES}/changelog"
     DESTINATION "${documents}" FILE_PERMISSIONS OWNER_READ OWNER_WRITE GROUP_READ WORLD_READ)

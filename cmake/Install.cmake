@@ -1,6 +1,6 @@
 # What `cmake --install` leaves behind: a tree in which everything finds everything else from wherever the tree stands.
 # Each file belongs to one component: library (what programs that use accounts need to run), development (what they need
-# to build), host (what a device needs to migrate), tools, rehearse. The packages are made of them.
+# to build), host (what a device needs to migrate), tools, rehearse, documents. The packages are made of them.
 
 include(CMakePackageConfigHelpers)
 
@@ -40,8 +40,12 @@ foreach(rest account_modules pages rehearse resources)
   endif()
 endforeach()
 
-install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md
-  DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT library)
+# The documents lie as they do in the source tree, so that what links to another one leads to it.
+install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md ${CMAKE_SOURCE_DIR}/CONTRIBUTING.md
+    ${CMAKE_SOURCE_DIR}/CHANGELOG.md
+  DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT documents)
+install(DIRECTORY ${CMAKE_SOURCE_DIR}/docs ${CMAKE_SOURCE_DIR}/examples
+  DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT documents PATTERN man EXCLUDE)
 
 # What the store, the plug-in and the tests share is not for other programs.
 set(internal_headers "/(file_paths|record_changes|change_tracker)[.]h$")

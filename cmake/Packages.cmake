@@ -6,9 +6,9 @@ set(CPACK_PACKAGE_VENDOR "Vorlix")
 set(CPACK_PACKAGE_CONTACT "Account Settings Maintainers <account-settings@vorlix.com>")
 set(CPACK_PACKAGE_DIRECTORY "${CMAKE_BINARY_DIR}/packages")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
-set(CPACK_STRIP_FILES ON)
+set(CPACK_DEBIAN_DEBUGINFO_PACKAGE ON)  # strips, too, and puts the symbols into packages of their own
 set(CPACK_VERBATIM_VARIABLES ON)
-set(CPACK_COMPONENTS_ALL library development host tools rehearse)
+set(CPACK_COMPONENTS_ALL library development host tools rehearse documents)
 set(CPACK_PRE_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/FinishPackages.cmake")
 set(CPACK_POST_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/TrimPackages.cmake")
 set(CPACK_PACKAGING_SOURCES "${CMAKE_SOURCE_DIR}/packaging")
@@ -46,6 +46,8 @@ debian_package(HOST migration-host admin
 The migration host is run once after a system update. It upgrades the account
 settings that an earlier release of the system left behind, and converts the
 mail and Exchange accounts of its first releases.")
+set(CPACK_DEBIAN_HOST_PACKAGE_RECOMMENDS accountctl)
+set(CPACK_DEBIAN_HOST_PACKAGE_SUGGESTS account-settings-doc)
 debian_package(TOOLS accountctl utils "${same_library}" "accounts of a device - command-line client
 accountctl lists, verifies and changes the accounts of a device.")
 debian_package(REHEARSE migration-rehearse admin
@@ -55,6 +57,11 @@ migration-rehearse tells what an upgrade of the account settings would do to
 many device images and archives, none of which it changes.")
 set(CPACK_DEBIAN_REHEARSE_PACKAGE_SUGGESTS python3-distributed)
 set(CPACK_DEBIAN_REHEARSE_PACKAGE_ARCHITECTURE all)
+debian_package(DOCUMENTS account-settings-doc doc "" "accounts of a device - documents and examples
+What the upgrade of the account settings does step by step, how it is put into
+a device and operated, and how programs and modules are written for it, with
+example devices, an example program and an example module.")
+set(CPACK_DEBIAN_DOCUMENTS_PACKAGE_ARCHITECTURE all)
 
 # control_files(COMPONENT FILE...): packaging/COMPONENT.FILE as the package's control file FILE.
 function(control_files component)

@@ -6,12 +6,16 @@ from pathlib import Path
 
 SOURCES = Path(os.environ["SOURCE_TREE"])
 PACKAGES = SOURCES / "build" / "package" / "packages"
-NAMES = ["accountctl", "libaccountsettings-dev", "libaccountsettings1", "migration-host", "migration-rehearse"]
+NAMES = ["account-settings-doc", "accountctl", "libaccountsettings-dev", "libaccountsettings1", "migration-host", "migration-rehearse"]
 
 
 def package_files():
     """The newest packages by name."""
     return {name: max(PACKAGES.glob(f"{name}_*.deb"), key=os.path.getmtime) for name in NAMES}
+
+
+def debug_symbols_of(name):
+    return max(PACKAGES.glob(f"{name}-dbgsym_*.ddeb"), key=os.path.getmtime)
 
 
 def run(*command, **more):

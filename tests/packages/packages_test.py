@@ -6,7 +6,7 @@ import tempfile
 import unittest
 from pathlib import Path
 
-from packages_case import package_files, run
+from packages_case import debug_symbols_of, package_files, run
 
 
 def field(name, file):
@@ -26,6 +26,34 @@ class Packages(unittest.TestCase):
         for needed in ("libc6", "libplist3", "libsystemd0", "libutf8proc2", "libuuid1", "libicu72"):
             self.assertRegex(field("Depends", files["libaccountsettings1"]), rf"(^|, ){re.escape(needed)} \(")
         self.assertIn("systemd | systemd-standalone-sysusers", field("Depends", files["migration-host"]))
+
+    def test_bring_the_client_and_the_documents_along_with_the_host(self):
+        host = package_files()["migration-host"]
+        self.assertEqual("accountctl", field("Recommends", host))
+        self.assertEqual("account-settings-doc", field("Suggests", host))
+
+    def test_have_their_debug_symbols_in_packages_of_their_own(self):
+        with tempfile.TemporaryDirectory() as scratch:
+            for name in ("accountctl", "libaccountsettings1", "migration-host"):
+                run("dpkg-deb", "--extract", debug_symbols_of(name), Path(scratch) / name)
+                run("dpkg-deb", "--extract", package_files()[name], Path(scratch) / name)
+                symbols = list((Path(scratch) / name / "usr/lib/debug/.build-id").rglob("*.debug"))
+                self.assertGreater(len(symbols), 0)
+                self.assertIn(".debug_info", run("readelf", "--sections", "--wide", symbols[0]))
+            program = Path(scratch) / "accountctl/usr/bin/accountctl"
+            self.assertNotIn(".debug_info", run("readelf", "--sections", "--wide", program))
+            identifier = re.search(r"Build ID: (\w\w)(\w+)", run("readelf", "--notes", program))
+            self.assertTrue((Path(scratch) / "accountctl/usr/lib/debug/.build-id" / identifier[1] / f"{identifier[2]}.debug").is_file())
+
+    def test_have_documents_whose_links_lead_somewhere(self):
+        with tempfile.TemporaryDirectory() as scratch:
+            run("dpkg-deb", "--extract", package_files()["account-settings-doc"], scratch)
+            documents = list((Path(scratch) / "usr/share/doc/account-settings").rglob("*.md"))
+            self.assertGreater(len(documents), 12)
+            for document in documents:
+                text = re.sub(r"^```.*?^```$", "", document.read_text(encoding="utf-8"), flags=re.M | re.S)
+                for target in re.findall(r"\]\((?!https?:)([^)#]+)", text):
+                    self.assertTrue((document.parent / target).exists(), f"{document.name}: {target}")
 
     def test_have_scripts_only_where_there_is_something_to_do(self):
         scripts = {"preinst", "postinst", "prerm", "postrm"}
