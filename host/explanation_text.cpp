@@ -20,8 +20,6 @@ std::string lineOf(std::size_t indentation, const std::string& text) {
   return std::string(indentation, ' ') + commandline::printable(text) + "\n";
 }
 
-std::string quoted(const std::string& text) { return description(PropertyValue{text}); }
-
 // Cut between two characters.
 std::string shortened(std::string text) {
   if (text.size() <= kMaxValueLength) return text;
@@ -33,31 +31,18 @@ std::string shortened(std::string text) {
 // Mail "June" (4F1C…), in 0B6C…
 std::string shown(const Name& name) {
   std::string text = name.type.empty() ? "account" : name.type;
-  if (!name.name.empty()) text += " " + shortened(quoted(name.name));
+  if (!name.name.empty()) text += " " + shortened(description(PropertyValue{name.name}));
   if (!name.identifier.empty()) text += " (" + shortened(name.identifier) + ")";
   if (!name.parent.empty()) text += ", in " + shortened(name.parent);
   return text;
 }
 
-std::string shownWithoutParent(Name name) {
-  name.parent.clear();
-  return shown(name);
-}
-
-std::string shownAll(const std::vector<Name>& names) {
-  std::string text;
-  for (const Name& name : names) text += (text.empty() ? "" : " and ") + shown(name);
-  return text;
-}
-
 // --- Changes ---
-
-bool contains(const Array& array, const PropertyValue& value) { return std::ranges::find(array, value) != array.end(); }
 
 std::string membership(const Array& of, const Array& notOf, std::string_view mark) {
   std::string text;
   for (const PropertyValue& element : of) {
-    if (!contains(notOf, element)) text += " " + std::string{mark} + description(element);
+    if (std::ranges::find(notOf, element) == notOf.end()) text += " " + std::string{mark} + description(element);
   }
   return text;
 }
@@ -129,25 +114,25 @@ std::string changesOf(const std::vector<Change>& changes) {
 
 std::string line(std::string_view kind, const std::string& rest) { return lineOf(2, std::string{kind} + ": " + rest); }
 
-std::string fromOf(const Converted& converted) {
-  return " from " + converted.from + (converted.isReplacement ? ", in place of the account with this identifier" : "");
-}
-
 // What is told of by the result or by another fact has no line of its own.
 std::string shown(const Fact& fact) {
   return std::visit(
       Visitor{[](const Loaded&) { return std::string{}; }, [](const CopiedAside&) { return std::string{}; },
               [](const Added& it) { return line("added", shown(it.account)); },
               [](const Converted& it) {
-                return line("converted", shown(it.account) + fromOf(it)) + conversionOf(it.changes);
+                const std::string instead = it.isReplacement ? ", in place of the account with this identifier" : "";
+                return line("converted", shown(it.account) + " from " + it.from + instead) + conversionOf(it.changes);
               },
               [](const Changed& it) { return lineOf(2, shown(it.account)) + changesOf(it.changes); },
               [](const Moved& it) {
-                return line("moved", shownWithoutParent(it.account) +
-                                         (it.into ? " into " + shown(*it.into) : " out of its parent"));
+                Name account = it.account;
+                account.parent.clear();
+                return line("moved", shown(account) + (it.into ? " into " + shown(*it.into) : " out of its parent"));
               },
               [](const Folded& it) {
-                return line("folded", shown(it.account) + " into " + shownAll(it.into) + ": " + it.reason);
+                std::string into;
+                for (const Name& name : it.into) into += (into.empty() ? "" : " and ") + shown(name);
+                return line("folded", shown(it.account) + " into " + into + ": " + it.reason);
               },
               [](const Lost& it) { return line("lost", textOf(it)); },
               [](const Repeated& it) { return line("repeated", shown(it.account) + " stands there once more"); },
@@ -159,14 +144,11 @@ std::string shown(const Fact& fact) {
       fact);
 }
 
-// version 4 to 5: Gmail and Yahoo accounts get their own type (_migrateAccountsFrom7A242:)
-std::string titleOf(const Explanation::Stage& stage) {
-  const bool isPartOfStep = stage.name == "save" && !stage.within.empty();
-  const std::string title = stage.words.empty() ? stage.name : stage.words + " (" + stage.name + ")";
-  return "\n" + lineOf(0, title + (isPartOfStep ? ", within " + stage.within : ""));
-}
-
-// The stage's facts under its name; empty where none of them is worth a line.
+// The stage's facts under its title, such as
+//
+//   version 4 to 5: Gmail and Yahoo accounts get their own type (_migrateAccountsFrom7A242:)
+//
+// Empty where none of them is worth a line.
 std::string shown(const Explanation::Stage& stage) {
   std::string text;
   std::size_t changed = 0;
@@ -177,15 +159,13 @@ std::string shown(const Explanation::Stage& stage) {
   if (changed > kMaxChangedAccounts) {
     text += lineOf(2, "and " + std::to_string(changed - kMaxChangedAccounts) + " more accounts with other values");
   }
-  return text.empty() ? text : titleOf(stage) + text;
+  if (text.empty()) return text;
+  const bool isPartOfStep = stage.name == "save" && !stage.within.empty();
+  const std::string title = stage.words.empty() ? stage.name : stage.words + " (" + stage.name + ")";
+  return "\n" + lineOf(0, title + (isPartOfStep ? ", within " + stage.within : "")) + text;
 }
 
 // --- The whole ---
-
-std::string heading(const ExplainedRun& run) {
-  return run.isRehearsal ? "What a run would do (this was a rehearsal: nothing on the device was changed)\n"
-                         : "What the run did\n";
-}
 
 std::string tally(const Counts& counts) {
   std::string text;
@@ -243,10 +223,6 @@ std::string warnings(const Explanation& explanation, const Verdict& verdict) {
   return text.empty() ? text : "\n" + text;
 }
 
-std::string aboutRun(const ExplainedRun& run) {
-  return lineOf(0, "run: migration-host " + std::string{run.version} + " on " + run.root + " at " + run.time);
-}
-
 }  // namespace
 
 std::string textOf(const Lost& lost) {
@@ -260,10 +236,14 @@ std::string textOf(const Explanation& explanation, const Verdict& verdict, const
   std::string stages;
   for (const Explanation::Stage& stage : explanation.stages()) stages += shown(stage);
   if (stages.empty()) stages = "\nNo account was changed.\n";
-  return heading(run) + stages + "\n" +
+  const std::string heading = run.isRehearsal
+                                  ? "What a run would do (this was a rehearsal: nothing on the device was changed)\n"
+                                  : "What the run did\n";
+  return heading + stages + "\n" +
          lineOf(0, "result: " + std::string{run.success ? "success" : "failure"} + ending(verdict) +
                        stateOf(explanation)) +
-         lineOf(0, "accounts: " + tally(countsOf(explanation, verdict))) + aboutRun(run) +
+         lineOf(0, "accounts: " + tally(countsOf(explanation, verdict))) +
+         lineOf(0, "run: migration-host " + std::string{run.version} + " on " + run.root + " at " + run.time) +
          warnings(explanation, verdict);
 }
 
