@@ -44,14 +44,6 @@ std::string takeOldKey(const PropertyValue& value, std::vector<Change>& gone) {
   return key;
 }
 
-std::vector<Change> goneKeys(const Dictionary& before, const Dictionary& after) {
-  std::vector<Change> gone;
-  for (const auto& [key, value] : before) {
-    if (!after.contains(key) && isToldByKey(key, before, after)) gone.push_back({key.string(), {}, value, {}});
-  }
-  return gone;
-}
-
 // --- Records ---
 
 constexpr std::size_t kNone = static_cast<std::size_t>(-1);
@@ -240,7 +232,10 @@ Name nameOf(const Dictionary& properties, std::string_view parent) {
 std::vector<Change> changesOf(const Dictionary& before, const Dictionary& after) {
   if (before.isIdenticalTo(after)) return {};
   std::vector<Change> changes;
-  std::vector<Change> gone = goneKeys(before, after);
+  std::vector<Change> gone;
+  for (const auto& [key, value] : before) {
+    if (!after.contains(key) && isToldByKey(key, before, after)) gone.push_back({key.string(), {}, value, {}});
+  }
   for (const auto& [key, value] : after) {
     const PropertyValue* const former = before.find(key);
     if ((former != nullptr && *former == value) || !isToldByKey(key, before, after)) continue;

@@ -59,17 +59,6 @@ void makePrimary(BasicAccount& account) {
 }
 
 // Answers whether the account became the primary one.
-bool settleSeparateAccount(BasicAccount& account) {
-  const Text typeString = platform::current().systemAccount->systemAccountTypeString();
-  if (account.displayName() == Text{"Nimbra"}) account.setDisplayName(typeString);
-  const bool isToBePrimary = account.isEnabledForDataclass(kAccountDataclassDeviceLocator);
-  if (isToBePrimary) makePrimary(account);
-  account.setAccountProperty_forKey(typeString, kAccountTypeString);
-  account.setAccountProperty_forKey(typeString, kAccountShortTypeString);
-  return isToBePrimary;
-}
-
-// Answers whether the account became the primary one.
 bool settleCloudAccount(BasicAccount& account) {
   if (hostedServiceStatus(account) != kSeparateStatus) {
     // Takes back what the calendars may just have switched on: such an account has no reminders of its own.
@@ -82,7 +71,13 @@ bool settleCloudAccount(BasicAccount& account) {
     writeToConsole("Standard Nimbra account with status 2, reverting to status 1");
     return false;
   }
-  return settleSeparateAccount(account);
+  const Text typeString = platform::current().systemAccount->systemAccountTypeString();
+  if (account.displayName() == Text{"Nimbra"}) account.setDisplayName(typeString);
+  const bool isToBePrimary = account.isEnabledForDataclass(kAccountDataclassDeviceLocator);
+  if (isToBePrimary) makePrimary(account);
+  account.setAccountProperty_forKey(typeString, kAccountTypeString);
+  account.setAccountProperty_forKey(typeString, kAccountShortTypeString);
+  return isToBePrimary;
 }
 
 // --- Provisioning ---
@@ -97,21 +92,6 @@ void letProvisioningFollowChildren(BasicAccount& account) {
       kAccountDataclassMail, account, kNimbraAccountType);
   AccountsDataMigrator::_enableProvisioningForDataClass_toAccount_ifChildAccountExistsOfType(
       kAccountDataclassCalendars, account, kCalDAVAccountType);
-}
-
-// --- Passes ---
-
-void letPassesFollowDocuments(BasicAccount& account) {
-  const BasicAccount::Dataclasses provisioned = account.provisionedDataclasses();
-  if (!isPrimary(account) || !contains(provisioned, kAccountDataclassQuorvel)) return;
-  if (!contains(provisioned, kAccountDataclassTickora)) {
-    writeToConsole("AccountsDataMigrator: Provisioning Tickora data class in primary account");
-    provision(account, kAccountDataclassTickora);
-  }
-  if (account.isEnabledForDataclass(kAccountDataclassQuorvel)) {
-    writeToConsole("AccountsDataMigrator: Enabling Tickora data class in primary account");
-    account.setEnabled_forDataclass(true, kAccountDataclassTickora);
-  }
 }
 
 }  // namespace
@@ -169,7 +149,17 @@ void AccountsDataMigrator::_enableProvisioningForDataClass_toAccount_ifChildAcco
 
 bool AccountsDataMigrator::_migrateAccountsFrom9B176(AccountsManager& store) {
   for (const Account& account : cloudAndHostedAccountsOf(store)) {
-    letPassesFollowDocuments(*account);
+    const BasicAccount::Dataclasses provisioned = account->provisionedDataclasses();
+    if (isPrimary(*account) && contains(provisioned, kAccountDataclassQuorvel)) {
+      if (!contains(provisioned, kAccountDataclassTickora)) {
+        writeToConsole("AccountsDataMigrator: Provisioning Tickora data class in primary account");
+        provision(*account, kAccountDataclassTickora);
+      }
+      if (account->isEnabledForDataclass(kAccountDataclassQuorvel)) {
+        writeToConsole("AccountsDataMigrator: Enabling Tickora data class in primary account");
+        account->setEnabled_forDataclass(true, kAccountDataclassTickora);
+      }
+    }
     if (account->isEnabledForDataclass(kAccountDataclassBookmarks)) platform::current().cloudTabs->post(true);
   }
   store.setDataVersion(12);

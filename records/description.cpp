@@ -63,11 +63,6 @@ bool hasShortCredentialWord(std::string_view key) {
   return false;
 }
 
-bool isPlainWord(std::string_view text) {
-  return !text.empty() &&
-         std::ranges::all_of(text, [](unsigned char character) { return std::isalnum(character) != 0; });
-}
-
 class Writer {
  public:
   void write(const PropertyValue& value) {
@@ -89,7 +84,10 @@ class Writer {
     std::string_view separator;
     for (const auto& [key, value] : dictionary) {
       append(separator);
-      isPlainWord(key) ? append(key) : writeText(key);
+      const bool isWord = !key.empty() && std::ranges::all_of(key.view(), [](unsigned char character) {
+        return std::isalnum(character) != 0;
+      });
+      isWord ? append(key) : writeText(key);
       append(" = ");
       namesCredential(key) ? append(kHidden) : write(value);
       separator = "; ";

@@ -13,18 +13,16 @@
 namespace platform {
 namespace {
 
-const IcuFunctions* openedFunctions() {
-  const std::string file = ownDirectory() / "account-settings/platform-icu.so";
-  void* const library = ::dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
-  if (library == nullptr) return nullptr;
-  const auto functions = reinterpret_cast<IcuFunctionsGetter>(::dlsym(library, kIcuFunctionsSymbol));
-  return functions == nullptr ? nullptr : functions();
-}
-
 // ICU's functions, opened by the first who asks. Null where the library that has them does not stand where it was
 // installed or cannot be opened: dates are then not written and texts are in English, but no account waits for that.
 const IcuFunctions* icuFunctions() {
-  static const IcuFunctions* const functions = openedFunctions();
+  static const IcuFunctions* const functions = []() -> const IcuFunctions* {
+    const std::string file = ownDirectory() / "account-settings/platform-icu.so";
+    void* const library = ::dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
+    if (library == nullptr) return nullptr;
+    const auto getter = reinterpret_cast<IcuFunctionsGetter>(::dlsym(library, kIcuFunctionsSymbol));
+    return getter == nullptr ? nullptr : getter();
+  }();
   return functions;
 }
 
@@ -53,16 +51,6 @@ bool isLanguageName(std::string_view name) {
   });
 }
 
-// The user's language and the more general ones, then English.
-std::vector<std::string> languages() {
-  const std::string environment = localeOfEnvironment();
-  const IcuFunctions* const icu = environment.empty() ? nullptr : icuFunctions();
-  std::vector<std::string> names = icu == nullptr ? std::vector<std::string>{} : icu->localeNames(environment);
-  names.erase(std::ranges::find_if_not(names, isLanguageName), names.end());
-  names.emplace_back(kBaseLanguage);
-  return names;
-}
-
 class LinuxLocalizedStrings final : public LocalizedStrings {
  public:
   explicit LinuxLocalizedStrings(DeviceConfiguration configuration) : _configuration{std::move(configuration)} {}
@@ -70,7 +58,12 @@ class LinuxLocalizedStrings final : public LocalizedStrings {
   [[nodiscard]] std::optional<std::string> text(std::string_view table, std::string_view key) const override {
     if (table.find('/') != std::string_view::npos) return std::nullopt;
     const std::string file = std::string{table} + ".strings";
-    for (const std::string& language : languages()) {
+    const std::string locale = localeOfEnvironment();
+    const IcuFunctions* const icu = locale.empty() ? nullptr : icuFunctions();
+    std::vector<std::string> languages = icu == nullptr ? std::vector<std::string>{} : icu->localeNames(locale);
+    languages.erase(std::ranges::find_if_not(languages, isLanguageName), languages.end());
+    languages.emplace_back(kBaseLanguage);
+    for (const std::string& language : languages) {
       const Dictionary entries = tableAt(Path{language} / file);
       if (const Text* const found = entries.text(key)) return found->string();
     }
