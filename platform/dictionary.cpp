@@ -9,7 +9,7 @@ namespace platform {
 namespace {
 
 // Up to this many keys a walk is at least as quick as an index.
-constexpr std::size_t kLargestWithoutIndex = 32;
+constexpr std::size_t kMaxWithoutIndex = 32;
 
 using Index = std::unordered_map<std::string_view, std::size_t>;
 
@@ -36,7 +36,7 @@ struct Dictionary::Contents {
   ~Contents() { dropIndex(); }
 
   [[nodiscard]] const Entry* find(std::string_view key) const {
-    if (entries.size() > kLargestWithoutIndex) return findIndexed(key);
+    if (entries.size() > kMaxWithoutIndex) return findIndexed(key);
     for (const Entry& entry : entries) {
       if (entry.key == key) return &entry;
     }

@@ -23,7 +23,7 @@ using namespace std::string_literals;
 
 namespace {
 
-constexpr std::uint64_t kLargestUnsigned = std::numeric_limits<std::uint64_t>::max();
+constexpr std::uint64_t kMaxUnsigned = std::numeric_limits<std::uint64_t>::max();
 
 // What malformed objects become; the key beside them always stays.
 TEST(MalformedValues, DoNotCostTheRestOfABinaryFile) {
@@ -47,15 +47,15 @@ TEST(MalformedValues, DoNotCostTheRestOfABinaryFile) {
       {"\x62\xD8\x3D\xDE\x00"s, "\U0001F600"},                // a sound pair
       {"\x53"
        "a\0b"s,
-       "a\uFFFDb"},                                // NUL in 8-bit text
-      {"\x52\xC3\xA9"s, "\u00E9"},                 // UTF-8 where ASCII is due
-      {"\x52\xE9!"s, "\uFFFD!"},                   // neither
-      {"\x14"s + zeros + ones, kLargestUnsigned},  // 16-byte integers
-      {"\x14"s + zeros + zeros, 0},                //
-      {"\x14"s + ones + ones, -1},                 //
+       "a\uFFFDb"},                            // NUL in 8-bit text
+      {"\x52\xC3\xA9"s, "\u00E9"},             // UTF-8 where ASCII is due
+      {"\x52\xE9!"s, "\uFFFD!"},               // neither
+      {"\x14"s + zeros + ones, kMaxUnsigned},  // 16-byte integers
+      {"\x14"s + zeros + zeros, 0},            //
+      {"\x14"s + ones + ones, -1},             //
       {"\x14"s + ones + zeros, std::numeric_limits<std::int64_t>::min()},
       {"\x14\x80"s + std::string(15, '\0'), std::numeric_limits<std::int64_t>::min()},
-      {"\x14\x01"s + std::string(15, '\0'), kLargestUnsigned},
+      {"\x14\x01"s + std::string(15, '\0'), kMaxUnsigned},
       {"\x83\xFF\xFF\xFF\xFF"s, Uid{4294967295}},         //
       {"\x87"s + std::string(7, '\0') + "\x05", Uid{5}},  //
       {"\x87"s + ones, -1},                               // UIDs above 32 bits
@@ -152,7 +152,7 @@ TEST(MalformedValues, DoNotCostTheRestOfAnXmlFile) {
       {"<integer>-9223372036854775809</integer>", std::numeric_limits<std::int64_t>::min()},
       {"<integer>-99999999999999999999999</integer>", std::numeric_limits<std::int64_t>::min()},
       {"<integer>9223372036854775808</integer>", std::uint64_t{1} << 63U},
-      {"<integer>99999999999999999999999</integer>", kLargestUnsigned},
+      {"<integer>99999999999999999999999</integer>", kMaxUnsigned},
       {"<integer><![CDATA[12]]></integer>", 12},
       {"<real>1e3</real>", 1000.0},
       {"<real>-inf</real>", -std::numeric_limits<double>::infinity()},

@@ -21,7 +21,7 @@ using namespace std::string_literals;
 
 namespace {
 
-constexpr std::uint64_t kLargestUnsigned = std::numeric_limits<std::uint64_t>::max();
+constexpr std::uint64_t kMaxUnsigned = std::numeric_limits<std::uint64_t>::max();
 
 Dictionary everyKind() {
   return {{"string", "h\u00E9 \U0001F600"},
@@ -30,7 +30,7 @@ Dictionary everyKind() {
           {"integer", -1},
           {"smallest", std::numeric_limits<std::int64_t>::min()},
           {"2^63", std::uint64_t{1} << 63U},
-          {"2^64-1", kLargestUnsigned},
+          {"2^64-1", kMaxUnsigned},
           {"real", 0.1},
           {"negative zero", -0.0},
           {"infinity", std::numeric_limits<double>::infinity()},
@@ -126,7 +126,7 @@ TEST(PropertyListStore, ReadsTheXmlForm) {
   const Dictionary expected{{"s", "a & <b>"},
                             {"e", ""},
                             {"i", -12},
-                            {"u", kLargestUnsigned},
+                            {"u", kMaxUnsigned},
                             {"h", 31},
                             {"r", 1.5},
                             {"t", true},

@@ -18,21 +18,21 @@ namespace {
 
 using Kind = PropertyValue::Kind;
 
-constexpr std::int64_t kSmallest = std::numeric_limits<std::int64_t>::min();
-constexpr std::int64_t kLargest = std::numeric_limits<std::int64_t>::max();
-constexpr std::uint64_t kLargestUnsigned = std::numeric_limits<std::uint64_t>::max();
+constexpr std::int64_t kMinInteger = std::numeric_limits<std::int64_t>::min();
+constexpr std::int64_t kMaxInteger = std::numeric_limits<std::int64_t>::max();
+constexpr std::uint64_t kMaxUnsigned = std::numeric_limits<std::uint64_t>::max();
 const double kNotANumber = std::nan("");
 const double kInfinity = std::numeric_limits<double>::infinity();
 
 std::vector<PropertyValue> oneOfEachKind() {
-  return {"text", 1, 1.0, true, Date{1.0}, Bytes{1}, Array{1}, Dictionary{{"k", 1}}, Uid{1}, kLargestUnsigned};
+  return {"text", 1, 1.0, true, Date{1.0}, Bytes{1}, Array{1}, Dictionary{{"k", 1}}, Uid{1}, kMaxUnsigned};
 }
 
 TEST(PropertyValues, KnowTheirKind) {
   EXPECT_EQ(PropertyValue{}.kind(), Kind::string);
   EXPECT_EQ(PropertyValue{"text"}.kind(), Kind::string);
   EXPECT_EQ(PropertyValue{1}.kind(), Kind::integer);
-  EXPECT_EQ(PropertyValue{kLargestUnsigned}.kind(), Kind::integer);
+  EXPECT_EQ(PropertyValue{kMaxUnsigned}.kind(), Kind::integer);
   EXPECT_EQ(PropertyValue{1.0}.kind(), Kind::real);
   EXPECT_EQ(PropertyValue{true}.kind(), Kind::boolean);
   EXPECT_EQ(PropertyValue{Date{}}.kind(), Kind::date);
@@ -84,25 +84,25 @@ TEST(PropertyValues, CompareContainersDeeply) {
 
 TEST(PropertyValues, HoldEachIntegerInOneForm) {
   EXPECT_EQ(PropertyValue{std::uint64_t{7}}, PropertyValue{7});
-  EXPECT_EQ(PropertyValue{static_cast<std::uint64_t>(kLargest)}, PropertyValue{kLargest});
-  const auto above = PropertyValue{static_cast<std::uint64_t>(kLargest) + 1}.asInteger();
+  EXPECT_EQ(PropertyValue{static_cast<std::uint64_t>(kMaxInteger)}, PropertyValue{kMaxInteger});
+  const auto above = PropertyValue{static_cast<std::uint64_t>(kMaxInteger) + 1}.asInteger();
   ASSERT_TRUE(above);
   EXPECT_TRUE(above->isAboveInt64);
-  EXPECT_NE(PropertyValue{static_cast<std::uint64_t>(kLargest) + 1}, PropertyValue{kSmallest});
+  EXPECT_NE(PropertyValue{static_cast<std::uint64_t>(kMaxInteger) + 1}, PropertyValue{kMinInteger});
 }
 
 TEST(PropertyValues, GiveAnInteger) {
   const std::vector<std::pair<PropertyValue, std::optional<std::int64_t>>> rows{
       {7, 7},
-      {kSmallest, kSmallest},
-      {kLargestUnsigned, -1},
+      {kMinInteger, kMinInteger},
+      {kMaxUnsigned, -1},
       {2.9, 2},
       {-2.9, -2},
-      {1e300, kLargest},
-      {-1e300, kSmallest},
-      {9223372036854775808.0, kLargest},
-      {-9223372036854775808.0, kSmallest},
-      {kInfinity, kLargest},
+      {1e300, kMaxInteger},
+      {-1e300, kMinInteger},
+      {9223372036854775808.0, kMaxInteger},
+      {-9223372036854775808.0, kMinInteger},
+      {kInfinity, kMaxInteger},
       {kNotANumber, 0},
       {"12", 12},
       {"12 monkeys", 12},
@@ -116,9 +116,9 @@ TEST(PropertyValues, GiveAnInteger) {
       {"", 0},
       {"-", 0},
       {"twelve", 0},
-      {"99999999999999999999", kLargest},
-      {"-99999999999999999999", kSmallest},
-      {"+99999999999999999999", kLargest},
+      {"99999999999999999999", kMaxInteger},
+      {"-99999999999999999999", kMinInteger},
+      {"+99999999999999999999", kMaxInteger},
       {true, std::nullopt},
       {Date{1}, std::nullopt},
       {Bytes{'1'}, std::nullopt},
@@ -138,7 +138,7 @@ TEST(PropertyValues, GiveATruth) {
       {1, true},
       {0, false},
       {-1, true},
-      {kLargestUnsigned, true},
+      {kMaxUnsigned, true},
       {0.5, true},
       {0.0, false},
       {-0.0, false},

@@ -12,7 +12,7 @@ namespace platform {
 namespace {
 
 // A name that stands behind a longer entry (a group with very many members) is not found.
-constexpr std::size_t entryLimit = std::size_t{1} << 20;
+constexpr std::size_t kMaxEntrySize = std::size_t{1} << 20;
 
 // Room for the texts of an entry: little, and where that does not do, as much as an entry may take.
 class Room {
@@ -22,9 +22,9 @@ class Room {
   int ask(const Question& question) {
     const int error = question(_data, _size);
     if (error != ERANGE || _large != nullptr) return error;
-    _large = std::make_unique_for_overwrite<char[]>(entryLimit);
+    _large = std::make_unique_for_overwrite<char[]>(kMaxEntrySize);
     _data = _large.get();
-    _size = entryLimit;
+    _size = kMaxEntrySize;
     return question(_data, _size);
   }
 
@@ -49,56 +49,46 @@ File openTable(const Place& place) {
   return {file, &std::fclose};
 }
 
-Result<uid_t> userInTable(const Place& place, const std::string& name) {
+// The number behind a name in a table of the tree, which `next` reads an entry at a time.
+template <typename Entry, typename Number>
+Result<Number> numberInTable(const Place& place, const std::string& name, char* Entry::*nameOf, Number Entry::*numberOf,
+                             int (*next)(std::FILE*, Entry*, char*, std::size_t, Entry**)) {
   const File table = openTable(place);
   if (!table) return notFound(errno, name);
   Room room;
-  passwd entry{};
-  passwd* found = nullptr;
-  const auto next = [&](char* data, std::size_t size) {
-    return ::fgetpwent_r(table.get(), &entry, data, size, &found);
-  };
-  while (room.ask(next) == 0) {
-    if (name == found->pw_name) return found->pw_uid;
+  Entry entry{};
+  Entry* found = nullptr;
+  const auto read = [&](char* data, std::size_t size) { return next(table.get(), &entry, data, size, &found); };
+  while (room.ask(read) == 0) {
+    if (name == found->*nameOf) return found->*numberOf;
   }
   return notFound(0, name);
 }
 
-Result<gid_t> groupInTable(const Place& place, const std::string& name) {
-  const File table = openTable(place);
-  if (!table) return notFound(errno, name);
+// The same as the name services of the running system, which `find` asks, know it.
+template <typename Entry, typename Number>
+Result<Number> numberInSystem(const std::string& name, Number Entry::*numberOf,
+                              int (*find)(const char*, Entry*, char*, std::size_t, Entry**)) {
   Room room;
-  struct group entry {};
-  struct group* found = nullptr;
-  const auto next = [&](char* data, std::size_t size) {
-    return ::fgetgrent_r(table.get(), &entry, data, size, &found);
-  };
-  while (room.ask(next) == 0) {
-    if (name == found->gr_name) return found->gr_gid;
-  }
-  return notFound(0, name);
+  Entry entry{};
+  Entry* found = nullptr;
+  const int error =
+      room.ask([&](char* data, std::size_t size) { return find(name.c_str(), &entry, data, size, &found); });
+  return found == nullptr ? Result<Number>{notFound(error, name)} : found->*numberOf;
 }
 
 }  // namespace
 
 Result<uid_t> AccountNames::user(const std::string& name) const {
-  if (_root != "/") return userInTable(_paths.openParentOfTarget(_root / "etc/passwd"), name);
-  Room room;
-  passwd entry{};
-  passwd* found = nullptr;
-  const int error =
-      room.ask([&](char* data, std::size_t size) { return ::getpwnam_r(name.c_str(), &entry, data, size, &found); });
-  return found == nullptr ? Result<uid_t>{notFound(error, name)} : found->pw_uid;
+  if (_root == "/") return numberInSystem(name, &passwd::pw_uid, &::getpwnam_r);
+  const Place table = _paths.openParentOfTarget(_root / "etc/passwd");
+  return numberInTable(table, name, &passwd::pw_name, &passwd::pw_uid, &::fgetpwent_r);
 }
 
 Result<gid_t> AccountNames::group(const std::string& name) const {
-  if (_root != "/") return groupInTable(_paths.openParentOfTarget(_root / "etc/group"), name);
-  Room room;
-  struct group entry {};
-  struct group* found = nullptr;
-  const int error =
-      room.ask([&](char* data, std::size_t size) { return ::getgrnam_r(name.c_str(), &entry, data, size, &found); });
-  return found == nullptr ? Result<gid_t>{notFound(error, name)} : found->gr_gid;
+  if (_root == "/") return numberInSystem(name, &::group::gr_gid, &::getgrnam_r);
+  const Place table = _paths.openParentOfTarget(_root / "etc/group");
+  return numberInTable(table, name, &::group::gr_name, &::group::gr_gid, &::fgetgrent_r);
 }
 
 Result<AccountNames::Owner> AccountNames::ownerOf(const std::filesystem::path& path, const std::string& user,

@@ -17,17 +17,6 @@
 namespace platform {
 namespace {
 
-Status failure(const char* verb, const Path& path) {
-  const int cause = errno;
-  return Status::failure(cause, std::string{verb} + " " + path.string());
-}
-
-// For a step that says why it fails in errno.
-bool refuse(int cause) {
-  errno = cause;
-  return false;
-}
-
 bool isThere(const Place& place, struct stat& status) {
   return ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0;
 }
@@ -87,14 +76,6 @@ bool moveFile(const Place& from, const Place& to) {
   });
 }
 
-bool replaceFile(const Place& place, std::span<const std::uint8_t> bytes) {
-  const Place beside{Descriptor{::openat(place.parent.number(), ".", O_PATH | O_DIRECTORY | O_CLOEXEC)}, randomName()};
-  if (!beside.parent.isOpen() || !makeFileOf(beside, bytes).isOpen()) return false;
-  if (moveFile(beside, place)) return true;
-  unlinkKeepingCause(beside);
-  return false;
-}
-
 bool isSame(const Descriptor& one, const Descriptor& other) {
   struct stat first {};
   struct stat second {};
@@ -102,27 +83,22 @@ bool isSame(const Descriptor& one, const Descriptor& other) {
          first.st_ino == second.st_ino;
 }
 
-// The thing opened so that it can be synced; it is the one that was looked at before, or not open.
-Descriptor openAgain(const Place& place, const Descriptor& thing) {
-  Descriptor again = openAt(place, O_RDONLY | O_NONBLOCK | O_NOCTTY);
-  if (!again.isOpen() || isSame(again, thing)) return again;
-  errno = ESTALE;
-  return {};
-}
-
 // Gives away the very thing that is open, and only a file that has no second name elsewhere, and brings its new owner
 // to stable storage. `made` is the thing where this process made it, not open where it did not.
 bool giveAway(const Place& place, const Descriptor& thing, Descriptor made, const AccountNames::Owner& owner) {
   struct stat status {};
   if (!thing.isOpen() || ::fstat(thing.number(), &status) != 0) return false;
-  if (made.isOpen() && !isSame(thing, made)) return refuse(ESTALE);
-  if (S_ISLNK(status.st_mode)) return refuse(ELOOP);
-  if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return refuse(EMLINK);
+  if (made.isOpen() && !isSame(thing, made)) return failWith(ESTALE);
+  if (S_ISLNK(status.st_mode)) return failWith(ELOOP);
+  if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return failWith(EMLINK);
   const bool isTheirs = status.st_uid == owner.user && status.st_gid == owner.group;
   if (isTheirs || (!S_ISDIR(status.st_mode) && !S_ISREG(status.st_mode))) {
     return ::fchownat(thing.number(), "", owner.user, owner.group, AT_EMPTY_PATH) == 0;
   }
-  if (!made.isOpen()) made = openAgain(place, thing);
+  if (!made.isOpen()) {
+    made = openAt(place, O_RDONLY | O_NONBLOCK | O_NOCTTY);
+    if (made.isOpen() && !isSame(made, thing)) return failWith(ESTALE);
+  }
   return made.isOpen() && ::fchown(made.number(), owner.user, owner.group) == 0 && sync(made);
 }
 
@@ -184,15 +160,14 @@ class LinuxFileSystem final : public FileSystem {
     Place place = _paths.openParentOfTarget(path);
     if (!place.parent.isOpen() && errno == ELOOP) place = _paths.openParent(path);
     struct stat status {};
-    if (!place.parent.isOpen() || !isThere(place, status)) return failure("look at", path);
-    if (S_ISREG(status.st_mode)) return FileKind::file;
-    return S_ISDIR(status.st_mode) ? FileKind::directory : FileKind::other;
+    if (!place.parent.isOpen() || !isThere(place, status)) return failureOf("look at", path);
+    return platform::kindOf(status.st_mode);
   }
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
     Bytes bytes;
     const Descriptor file = openToRead(path);
-    if (!file.isOpen() || !readUpTo(file.number(), sizeLimit, bytes)) return failure("read", path);
+    if (!file.isOpen() || !readUpTo(file.number(), sizeLimit, bytes)) return failureOf("read", path);
     return bytes;
   }
 
@@ -207,12 +182,19 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status replace(const Path& path, std::span<const std::uint8_t> bytes) override {
-    return at(path, "replace", [bytes](const Place& place) { return replaceFile(place, bytes); });
+    return at(path, "replace", [bytes](const Place& place) {
+      Descriptor parent{::openat(place.parent.number(), ".", O_PATH | O_DIRECTORY | O_CLOEXEC)};
+      const Place beside{std::move(parent), randomName()};
+      if (!beside.parent.isOpen() || !makeFileOf(beside, bytes).isOpen()) return false;
+      if (moveFile(beside, place)) return true;
+      unlinkKeepingCause(beside);
+      return false;
+    });
   }
 
   Status copy(const Path& from, const Path& to) override {
     const Descriptor source = openToRead(from);
-    if (!source.isOpen()) return failure("copy", from);
+    if (!source.isOpen()) return failureOf("copy", from);
     return at(to, "copy to", [&](const Place& place) {
       return makeSyncedFile(place, [&](int file) { return copyBytes(source.number(), file); }).isOpen();
     });
@@ -226,7 +208,7 @@ class LinuxFileSystem final : public FileSystem {
 
   Status createDirectories(const Path& path, unsigned permissions) override {
     std::optional<Descriptor> directory = makeDirectories(_paths, path, permissions);
-    if (!directory) return failure("create the directory", path);
+    if (!directory) return failureOf("create the directory", path);
     if (!directory->isOpen()) return {};
     _made.makeRoomFor(path);
     _made.remember(path, *std::move(directory));
@@ -247,12 +229,12 @@ class LinuxFileSystem final : public FileSystem {
     if (!directory.isOk()) return directory;
     for (int attempt = 0; attempt < kAttempts; ++attempt) {
       const std::string name = randomTemporaryName();
-      if (name.empty()) return failure("find a temporary name in", directory.value());
+      if (name.empty()) return failureOf("find a temporary name in", directory.value());
       Path path = directory.value() / name;
       const Place place = _paths.openParent(path);
       struct stat status {};
       if (place.parent.isOpen() && isThere(place, status)) continue;
-      return errno == ENOENT ? Result<Path>{std::move(path)} : failure("find a temporary name in", directory.value());
+      return errno == ENOENT ? Result<Path>{std::move(path)} : failureOf("find a temporary name in", directory.value());
     }
     return Status::failure(EEXIST, "find a temporary name in " + directory.value().string());
   }
@@ -276,7 +258,7 @@ class LinuxFileSystem final : public FileSystem {
   template <typename Action>
   Status at(const Path& path, const char* verb, const Action& action) {
     const Place place = _paths.openParent(path);
-    return place.parent.isOpen() && action(place) ? Status{} : failure(verb, path);
+    return place.parent.isOpen() && action(place) ? Status{} : failureOf(verb, path);
   }
 
   AccountNames _accounts;

@@ -21,11 +21,6 @@ using Base = PathResolver::Base;
 
 constexpr int kMaxLinks = 40;
 
-bool fail(int cause) {
-  errno = cause;
-  return false;
-}
-
 Descriptor openAsGiven(const path& directory) {
   return Descriptor{::open(directory.c_str(), O_PATH | O_DIRECTORY | O_CLOEXEC)};
 }
@@ -56,13 +51,13 @@ class PathWalk {
     for (bool isAtEnd = _ahead.empty(); !isAtEnd;) {
       if (!step(isAtEnd)) return false;
     }
-    return givesPlanterNothing() || fail(ELOOP);
+    return givesPlanterNothing() || failWith(ELOOP);
   }
 
   bool toDirectory(const path& below) {
     if (!toTarget(below)) return false;
     if (_leaf == ".") return true;
-    if (!_target.isThere()) return fail(ENOENT);
+    if (!_target.isThere()) return failWith(ENOENT);
     return enter(std::exchange(_target, {}));
   }
 
@@ -95,7 +90,7 @@ class PathWalk {
     if (name == "..") return goUp();
     Entry entry;
     if (!look(name, entry)) return false;
-    if (!entry.isThere() && !isAtEnd) return fail(ENOENT);
+    if (!entry.isThere() && !isAtEnd) return failWith(ENOENT);
     if (S_ISLNK(entry.status.st_mode)) {
       if (!follow(entry)) return false;
       isAtEnd = _ahead.empty();
@@ -122,21 +117,21 @@ class PathWalk {
   }
 
   bool enter(Entry entry) {
-    if (!S_ISDIR(entry.status.st_mode)) return fail(ENOTDIR);
+    if (!S_ISDIR(entry.status.st_mode)) return failWith(ENOTDIR);
     const bool isOpenToAll = (entry.status.st_mode & S_IXOTH) != 0;
-    if (_planter && entry.status.st_uid != *_planter && !isOpenToAll) return fail(ELOOP);
+    if (_planter && entry.status.st_uid != *_planter && !isOpenToAll) return failWith(ELOOP);
     _directories.push_back(std::move(entry));
     return true;
   }
 
   bool goUp() {
-    if (_directories.size() == 1) return _isUnderRoot || fail(EXDEV);
+    if (_directories.size() == 1) return _isUnderRoot || failWith(EXDEV);
     _directories.pop_back();
     return true;
   }
 
   bool follow(const Entry& link) {
-    if (++_links > kMaxLinks || !mayFollow(link.status)) return fail(ELOOP);
+    if (++_links > kMaxLinks || !mayFollow(link.status)) return failWith(ELOOP);
     path target;
     if (!readLink(link, target)) return false;
     putAhead(target.relative_path());
@@ -152,7 +147,7 @@ class PathWalk {
     }
     std::array<char, PATH_MAX> text{};
     const ssize_t size = ::readlinkat(link.descriptor.number(), "", text.data(), text.size());
-    if (size <= 0) return size < 0 ? false : fail(ENOENT);
+    if (size <= 0) return size < 0 ? false : failWith(ENOENT);
     target = std::string{text.data(), static_cast<std::size_t>(size)};
     return true;
   }
@@ -213,34 +208,15 @@ path wholePath(const path& given) {
   return whole.has_filename() ? whole : whole.parent_path();
 }
 
+// A link or "..", or a kernel that does not know the call below or does not let it through.
+constexpr int kCausesToWalk[] = {ELOOP, EXDEV, EAGAIN, ENOSYS, EPERM, EINVAL};
+
 // In one call of the kernel where no link stands in the way; errno tells whether that could be known.
 Descriptor openWithoutLinks(const Descriptor& base, const path& below) {
   open_how how{};
   how.flags = O_PATH | O_DIRECTORY | O_CLOEXEC;
   how.resolve = RESOLVE_NO_SYMLINKS | RESOLVE_BENEATH;
   return Descriptor{static_cast<int>(::syscall(SYS_openat2, base.number(), below.c_str(), &how, sizeof how))};
-}
-
-// A link or "..", or a kernel that does not know the call or does not let it through.
-bool needsWalk(int cause) {
-  constexpr int causes[] = {ELOOP, EXDEV, EAGAIN, ENOSYS, EPERM, EINVAL};
-  return std::ranges::find(causes, cause) != std::end(causes);
-}
-
-Descriptor openBelow(const Base& base, const path& below) {
-  const Descriptor start = openAsGiven(base.path);
-  if (!start.isOpen()) return {};
-  Descriptor directory = openWithoutLinks(start, below.empty() ? "." : below);
-  if (directory.isOpen() || !needsWalk(errno)) return directory;
-  PathWalk walk{base, nullptr};
-  return walk.toDirectory(below) ? walk.takeDirectory() : Descriptor{};
-}
-
-bool isLink(const Place& place) {
-  struct stat status {};
-  return place.parent.isOpen() &&
-         ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
-         S_ISLNK(status.st_mode);
 }
 
 }  // namespace
@@ -271,13 +247,26 @@ Place PathResolver::openParent(const path& path) const {
   }
   const Base& base = baseOf(whole);
   const std::filesystem::path below = relativeTo(base, whole);
-  return {openBelow(base, below.parent_path()), below.empty() ? "." : below.filename().string()};
+  const std::filesystem::path above = below.parent_path();
+  const std::string leaf = below.empty() ? "." : below.filename().string();
+  const Descriptor start = openAsGiven(base.path);
+  if (!start.isOpen()) return {{}, leaf};
+  Descriptor directory = openWithoutLinks(start, above.empty() ? "." : above);
+  if (directory.isOpen() || std::ranges::find(kCausesToWalk, errno) == std::end(kCausesToWalk)) {
+    return {std::move(directory), leaf};
+  }
+  PathWalk walk{base, nullptr};
+  return {walk.toDirectory(above) ? walk.takeDirectory() : Descriptor{}, leaf};
 }
 
 Place PathResolver::openParentOfTarget(const path& path) const {
   const std::filesystem::path whole = wholePath(path);
   Place place = openParent(whole);
-  if (!isLink(place)) return place;
+  struct stat status {};
+  const bool isLink = place.parent.isOpen() &&
+                      ::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) == 0 &&
+                      S_ISLNK(status.st_mode);
+  if (!isLink) return place;
   PathWalk walk{baseOf(whole), nullptr};
   if (!walk.toTarget(relativeTo(baseOf(whole), whole))) return {};
   return {walk.takeDirectory(), walk.leaf()};

@@ -19,84 +19,53 @@
 namespace platform {
 namespace {
 
-bool refuse(int errorNumber) {
-  errno = errorNumber;
-  return false;
-}
-
-Status failure(const char* verb, const Path& path) {
-  const int cause = errno;
-  return Status::failure(cause, std::string{verb} + " " + path.string());
-}
-
 bool isDirectory(const Entry& entry) { return S_ISDIR(entry.status.st_mode); }
 
-bool isThere(const Entry& entry) { return entry.isThere() || refuse(ENOENT); }
+bool isThere(const Entry& entry) { return entry.isThere() || failWith(ENOENT); }
 
-bool isFree(const Entry& entry) { return !entry.isThere() || refuse(EEXIST); }
+bool isFree(const Entry& entry) { return !entry.isThere() || failWith(EEXIST); }
 
-bool isFile(const Entry& entry) {
-  if (S_ISREG(entry.status.st_mode)) return true;
-  if (!entry.isThere()) return refuse(ENOENT);
-  if (isDirectory(entry)) return refuse(EISDIR);
-  return refuse(S_ISLNK(entry.status.st_mode) ? ELOOP : EINVAL);
-}
-
-bool mayBeCovered(const Entry& entry) { return !isDirectory(entry) || refuse(EISDIR); }
+bool mayBeCovered(const Entry& entry) { return !isDirectory(entry) || failWith(EISDIR); }
 
 // In a sticky directory, only the owner of an entry or of the directory takes the entry away.
-bool mayBeTaken(const Entry& entry, const struct stat& directory) {
+bool mayBeChanged(const Spot& spot) {
+  const struct stat& directory = spot.directory.status;
+  if (Overlay::isMade(directory)) return true;
+  if (::faccessat(spot.directory.descriptor.number(), ".", R_OK | W_OK | X_OK, AT_EACCESS) != 0) return false;
   const uid_t user = ::geteuid();
   const bool isSticky = (directory.st_mode & S_ISVTX) != 0;
-  if (!isSticky || user == 0 || !entry.isThere()) return true;
-  return entry.status.st_uid == user || directory.st_uid == user || refuse(EPERM);
+  if (!isSticky || user == 0 || !spot.entry.isThere()) return true;
+  return spot.entry.status.st_uid == user || directory.st_uid == user || failWith(EPERM);
 }
 
-bool mayBeChanged(const Spot& spot) {
-  if (Overlay::isMade(spot.directory.status)) return true;
-  return ::faccessat(spot.directory.descriptor.number(), ".", R_OK | W_OK | X_OK, AT_EACCESS) == 0 &&
-         mayBeTaken(spot.entry, spot.directory.status);
-}
-
-bool isThereRoomFor(std::size_t size, const Descriptor& directory) {
-  rlimit limit{};
-  if (::getrlimit(RLIMIT_FSIZE, &limit) == 0 && size > limit.rlim_cur) return refuse(EFBIG);
-  struct statvfs volume {};
-  if (::fstatvfs(directory.number(), &volume) != 0 || volume.f_blocks == 0) return true;
-  const std::uintmax_t blocks = ::geteuid() == 0 ? volume.f_bfree : volume.f_bavail;
-  return size <= blocks * volume.f_frsize || refuse(ENOSPC);
-}
-
+// Whether a file of that size may be made there, and there is room for it.
 bool mayBePut(const Spot& spot, std::size_t size) {
-  return mayBeChanged(spot) && isThereRoomFor(size, spot.directory.descriptor);
-}
-
-bool isOnOneVolume(const Spot& left, const Spot& right) {
-  struct stat first {};
-  struct stat second {};
-  if (::fstat(left.directory.descriptor.number(), &first) != 0) return false;
-  if (::fstat(right.directory.descriptor.number(), &second) != 0) return false;
-  return first.st_dev == second.st_dev || refuse(EXDEV);
+  if (!mayBeChanged(spot)) return false;
+  rlimit limit{};
+  if (::getrlimit(RLIMIT_FSIZE, &limit) == 0 && size > limit.rlim_cur) return failWith(EFBIG);
+  struct statvfs volume {};
+  if (::fstatvfs(spot.directory.descriptor.number(), &volume) != 0 || volume.f_blocks == 0) return true;
+  const std::uintmax_t blocks = ::geteuid() == 0 ? volume.f_bfree : volume.f_bavail;
+  return size <= blocks * volume.f_frsize || failWith(ENOSPC);
 }
 
 bool mayBeMoved(const Spot& source, const Spot& target) {
-  if (!isThere(source.entry) || !isOnOneVolume(source, target)) return false;
-  if (isDirectory(source.entry)) return refuse(ENOTSUP);
+  if (!isThere(source.entry)) return false;
+  struct stat from {};
+  struct stat to {};
+  if (::fstat(source.directory.descriptor.number(), &from) != 0) return false;
+  if (::fstat(target.directory.descriptor.number(), &to) != 0) return false;
+  if (from.st_dev != to.st_dev) return failWith(EXDEV);
+  if (isDirectory(source.entry)) return failWith(ENOTSUP);
   return mayBeCovered(target.entry) && mayBeChanged(source) && mayBeChanged(target);
 }
 
 // What the rehearsal made has one name and belongs to this process.
 bool isNobodyElses(const Entry& entry) {
-  if (S_ISLNK(entry.status.st_mode)) return refuse(ELOOP);
+  if (S_ISLNK(entry.status.st_mode)) return failWith(ELOOP);
   if (entry.node != nullptr) return true;
-  if (!isDirectory(entry) && entry.status.st_nlink > 1) return refuse(EMLINK);
-  return ::geteuid() == 0 || entry.status.st_uid == ::geteuid() || refuse(EPERM);
-}
-
-// Asks the kernel whether a file of this process could be given away, with a file that lies nowhere.
-bool mayGiveAway(const AccountNames::Owner& owner) {
-  const Descriptor file{::memfd_create("owner", MFD_CLOEXEC)};
-  return file.isOpen() && ::fchown(file.number(), owner.user, owner.group) == 0;
+  if (!isDirectory(entry) && entry.status.st_nlink > 1) return failWith(EMLINK);
+  return ::geteuid() == 0 || entry.status.st_uid == ::geteuid() || failWith(EPERM);
 }
 
 Place placeOf(const Spot& spot) {
@@ -108,9 +77,11 @@ bool readDeviceFile(const Descriptor& file, std::size_t sizeLimit, Bytes& bytes)
 }
 
 bool readContents(const Spot& spot, std::size_t sizeLimit, Bytes& bytes) {
-  if (!isFile(spot.entry)) return false;
+  if (!isThere(spot.entry)) return false;
+  if (isDirectory(spot.entry)) return failWith(EISDIR);
+  if (!S_ISREG(spot.entry.status.st_mode)) return failWith(S_ISLNK(spot.entry.status.st_mode) ? ELOOP : EINVAL);
   if (spot.entry.node == nullptr) return readDeviceFile(openOwnFile(placeOf(spot)), sizeLimit, bytes);
-  if (spot.entry.node->bytes.size() > sizeLimit) return refuse(EFBIG);
+  if (spot.entry.node->bytes.size() > sizeLimit) return failWith(EFBIG);
   bytes = spot.entry.node->bytes;
   return true;
 }
@@ -145,28 +116,27 @@ class RehearsalFileSystem final : public RehearsedFiles {
   Result<FileKind> kindOf(const Path& path) override {
     std::optional<Spot> spot = _paths.findTarget(path);
     if (!spot && errno == ELOOP) spot = _paths.find(path);
-    if (!spot || !isThere(spot->entry)) return failure("look at", path);
-    if (S_ISREG(spot->entry.status.st_mode)) return FileKind::file;
-    return isDirectory(spot->entry) ? FileKind::directory : FileKind::other;
+    if (!spot || !isThere(spot->entry)) return failureOf("look at", path);
+    return platform::kindOf(spot->entry.status.st_mode);
   }
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
     Bytes bytes;
     const std::optional<Spot> spot = _paths.findTarget(path);
-    if (!spot || !readContents(*spot, sizeLimit, bytes)) return failure("read", path);
+    if (!spot || !readContents(*spot, sizeLimit, bytes)) return failureOf("read", path);
     return bytes;
   }
 
   Status create(const Path& path, std::span<const std::uint8_t> bytes) override {
     const std::optional<Spot> spot = _paths.find(path);
-    if (!spot || !isFree(spot->entry) || !mayBePut(*spot, bytes.size())) return failure("create", path);
+    if (!spot || !isFree(spot->entry) || !mayBePut(*spot, bytes.size())) return failureOf("create", path);
     putFile(*spot, {bytes.begin(), bytes.end()});
     return {};
   }
 
   Status replace(const Path& path, std::span<const std::uint8_t> bytes) override {
     const std::optional<Spot> spot = _paths.find(path);
-    if (!spot || !mayBePut(*spot, bytes.size()) || !mayBeCovered(spot->entry)) return failure("replace", path);
+    if (!spot || !mayBePut(*spot, bytes.size()) || !mayBeCovered(spot->entry)) return failureOf("replace", path);
     putFile(*spot, {bytes.begin(), bytes.end()});
     return {};
   }
@@ -174,16 +144,16 @@ class RehearsalFileSystem final : public RehearsedFiles {
   Status copy(const Path& from, const Path& to) override {
     Bytes bytes;
     const std::optional<Spot> source = _paths.findTarget(from);
-    if (!source || !readContents(*source, SIZE_MAX, bytes)) return failure("copy", from);
+    if (!source || !readContents(*source, SIZE_MAX, bytes)) return failureOf("copy", from);
     const std::optional<Spot> target = _paths.find(to);
-    if (!target || !isFree(target->entry) || !mayBePut(*target, bytes.size())) return failure("copy to", to);
+    if (!target || !isFree(target->entry) || !mayBePut(*target, bytes.size())) return failureOf("copy to", to);
     putFile(*target, std::move(bytes));
     return {};
   }
 
   Status remove(const Path& path) override {
     const std::optional<Spot> spot = _paths.find(path);
-    if (!spot || !isThere(spot->entry) || !mayBeChanged(*spot)) return failure("remove", path);
+    if (!spot || !isThere(spot->entry) || !mayBeChanged(*spot)) return failureOf("remove", path);
     if (!isEntryName(spot->leaf)) return Status::failure(EINVAL, "remove " + path.string());
     _overlay.put(spot->directory.status, spot->leaf, {});
     return {};
@@ -192,15 +162,18 @@ class RehearsalFileSystem final : public RehearsedFiles {
   Status createDirectories(const Path& path, unsigned permissions) override {
     return makeDirectories(path.has_filename() ? path : path.parent_path(), permissions)
                ? Status{}
-               : failure("create the directory", path);
+               : failureOf("create the directory", path);
   }
 
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
     const Result<AccountNames::Owner> numbers = _accounts.ownerOf(path, std::string{owner}, std::string{group});
     if (!numbers.isOk()) return numbers.status();
     const std::optional<Spot> spot = _paths.find(path);
-    const bool isGiven = spot && isThere(spot->entry) && isNobodyElses(spot->entry) && mayGiveAway(numbers.value());
-    return isGiven ? Status{} : failure("set the owner of", path);
+    if (!spot || !isThere(spot->entry) || !isNobodyElses(spot->entry)) return failureOf("set the owner of", path);
+    // Whether a file of this process could be given away, the kernel tells of one that lies nowhere.
+    const Descriptor file{::memfd_create("owner", MFD_CLOEXEC)};
+    const bool isGiven = file.isOpen() && ::fchown(file.number(), numbers.value().user, numbers.value().group) == 0;
+    return isGiven ? Status{} : failureOf("set the owner of", path);
   }
 
   Result<Path> temporaryName() override {
@@ -246,7 +219,7 @@ class RehearsalFileSystem final : public RehearsedFiles {
       spot = _paths.find(path);
     }
     if (!spot) return false;
-    if (spot->entry.isThere()) return isDirectory(spot->entry) || refuse(ENOTDIR);
+    if (spot->entry.isThere()) return isDirectory(spot->entry) || failWith(ENOTDIR);
     if (!mayBeChanged(*spot)) return false;
     _overlay.put(spot->directory.status, spot->leaf, nodeOf(S_IFDIR | permissions));
     return true;

@@ -17,7 +17,7 @@ constexpr std::uint8_t kInteger = 0x10;
 constexpr std::uint8_t kCountFollows = 0xF;
 constexpr std::uint8_t kNoUtf8 = 0xFF;  // becomes U+FFFD where the text is taken
 constexpr std::uint64_t kReplacementUnit = 0xFFFD;
-constexpr std::uint64_t kLargestUid = std::numeric_limits<std::uint32_t>::max();
+constexpr std::uint64_t kMaxUid = std::numeric_limits<std::uint32_t>::max();
 constexpr std::uint64_t kSignBit = std::uint64_t{1} << 63U;
 
 bool isLead(std::uint64_t unit) { return unit >= 0xD800 && unit <= 0xDBFF; }
@@ -69,7 +69,7 @@ void BinaryPlistRepair::repairInteger(const Object& integer) {
 }
 
 void BinaryPlistRepair::repairUid(const Object& uid) {
-  if (bigEndian(std::span{_file}.subspan(uid.payload, uid.size)) <= kLargestUid) return;
+  if (bigEndian(std::span{_file}.subspan(uid.payload, uid.size)) <= kMaxUid) return;
   switch (uid.size) {
     case 8: return overwrite(uid.marker, kInteger | 3U);
     case 16: return overwrite(uid.marker, kInteger | 4U);

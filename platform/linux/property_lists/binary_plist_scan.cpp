@@ -60,7 +60,7 @@ class Scan {
   [[nodiscard]] bool hasRepaired() const { return _repair.hasRepaired(); }
 
   // Whether the file holds what the root reaches, as it would be written, and nothing else.
-  [[nodiscard]] bool isPlain() const {
+  [[nodiscard]] bool isFaithful() const {
     return !_repair.hasRepaired() && !_repair.hasFoundOddities() && _reached == _weights.size() &&
            _reachedBytes == _layout.objectArea() && _layout.endsWithTable();
   }
@@ -174,7 +174,7 @@ BinaryPlistFinding repairBinaryPlist(Bytes& file) {
     Scan scan{file, *layout};
     if (!scan.run()) return {scan.refusal()};
     if (scan.hasRepaired()) continue;
-    return {.isPlain = pass == 0 && scan.isPlain()};
+    return {.isFaithful = pass == 0 && scan.isFaithful()};
   }
   return {Cause::malformed};
 }

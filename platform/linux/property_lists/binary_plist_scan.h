@@ -10,7 +10,7 @@ struct BinaryPlistFinding {
   // would unfold to more than its size allows.
   Cause refusal = Cause::none;
   // As any writer could have made it: nothing was repaired, and the root reaches every byte of every object.
-  bool isPlain = false;
+  bool isFaithful = false;
 };
 
 // Makes a binary property list safe for libplist, which unfolds whatever is shared and recurses into whatever is

@@ -5,8 +5,8 @@
 namespace platform {
 namespace {
 
-constexpr std::size_t kMostLists = 4;
-constexpr std::size_t kLargestList = std::size_t{16} << 20U;
+constexpr std::size_t kMaxLists = 4;
+constexpr std::size_t kMaxListSize = std::size_t{16} << 20U;
 
 bool isWrittenAlike(const PropertyValue& left, const PropertyValue& right);
 
@@ -55,9 +55,9 @@ std::shared_ptr<const Bytes> KnownPropertyLists::bytesOf(const Dictionary& value
 }
 
 void KnownPropertyLists::keep(std::shared_ptr<const Bytes> bytes, Dictionary values, bool isFaithful) {
-  if (bytes->size() > kLargestList) return;
+  if (bytes->size() > kMaxListSize) return;
   const std::scoped_lock lock{_guard};
-  if (_lists.size() == kMostLists) _lists.erase(_lists.begin());
+  if (_lists.size() == kMaxLists) _lists.erase(_lists.begin());
   _lists.push_back({std::move(bytes), std::move(values), isFaithful});
 }
 

@@ -10,8 +10,8 @@
 
 namespace platform {
 
-constexpr std::size_t kLargestPropertyList = std::size_t{256} << 20U;
-constexpr std::size_t kLargestXmlPropertyList = std::size_t{16} << 20U;
+constexpr std::size_t kMaxPropertyListSize = std::size_t{256} << 20U;
+constexpr std::size_t kMaxXmlPropertyListSize = std::size_t{16} << 20U;
 
 struct ParsedPropertyList {
   Dictionary values;

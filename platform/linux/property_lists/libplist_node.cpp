@@ -52,31 +52,6 @@ double writtenSeconds(plist_t node) {
   return std::bit_cast<double>(bits);
 }
 
-PropertyValue booleanOf(plist_t node) {
-  std::uint8_t truth = 0;
-  plist_get_bool_val(node, &truth);
-  return truth != 0;
-}
-
-PropertyValue integerOf(plist_t node) {
-  std::uint64_t bits = 0;
-  plist_get_uint_val(node, &bits);
-  if (isAboveInt64(node, bits)) return bits;
-  return static_cast<std::int64_t>(bits);
-}
-
-PropertyValue realOf(plist_t node) {
-  double real = 0;
-  plist_get_real_val(node, &real);
-  return real;
-}
-
-PropertyValue uidOf(plist_t node) {
-  Uid uid;
-  plist_get_uid_val(node, &uid.number);
-  return uid;
-}
-
 }  // namespace
 
 void LibplistNodeDeleter::operator()(void* node) const { plist_free(node); }
@@ -129,12 +104,19 @@ std::span<const std::uint8_t> dataOfLibplist(void* dataNode) {
 }
 
 PropertyValue scalarOfLibplist(void* node) {
+  std::uint8_t boolean = 0;
+  std::uint64_t bits = 0;
+  double real = 0;
+  Uid uid;
   switch (plist_get_node_type(node)) {
-    case PLIST_BOOLEAN: return booleanOf(node);
-    case PLIST_UINT: return integerOf(node);
-    case PLIST_REAL: return realOf(node);
+    case PLIST_BOOLEAN: plist_get_bool_val(node, &boolean); return boolean != 0;
+    case PLIST_UINT:
+      plist_get_uint_val(node, &bits);
+      if (isAboveInt64(node, bits)) return bits;
+      return static_cast<std::int64_t>(bits);
+    case PLIST_REAL: plist_get_real_val(node, &real); return real;
     case PLIST_DATE: return Date{secondsOfLibplistDate(node)};
-    case PLIST_UID: return uidOf(node);
+    case PLIST_UID: plist_get_uid_val(node, &uid.number); return uid;
     default: return Text{};
   }
 }

@@ -11,7 +11,7 @@ class LibplistPropertyListStore final : public PropertyListStore {
   explicit LibplistPropertyListStore(std::shared_ptr<FileSystem> files) : _files{std::move(files)} {}
 
   Result<Dictionary> readDictionary(const Path& path) override {
-    Result<Bytes> read = _files->read(path, kLargestPropertyList);
+    Result<Bytes> read = _files->read(path, kMaxPropertyListSize);
     if (!read.isOk()) return read.status();
     Bytes bytes = read.take();
     if (auto values = _known.valuesOf(bytes)) return *std::move(values);

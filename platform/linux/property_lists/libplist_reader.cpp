@@ -21,14 +21,14 @@ namespace {
 class RecentTexts {
  public:
   Text text(std::string_view characters) {
-    if (characters.size() > kLongest) return characters;
+    if (characters.size() > kMaxSize) return characters;
     Text& recent = _texts[place(characters)];
     if (recent != characters) recent = characters;
     return recent;
   }
 
  private:
-  static constexpr std::size_t kLongest = 35;
+  static constexpr std::size_t kMaxSize = 35;
   static constexpr std::size_t kPlaces = 512;
 
   static std::size_t place(std::string_view characters) {
@@ -141,7 +141,7 @@ const char* charactersOf(const Bytes& bytes) { return reinterpret_cast<const cha
 
 struct Tree {
   LibplistNode root = {};
-  bool isPlain = false;         // see BinaryPlistFinding
+  bool isFaithful = false;      // see BinaryPlistFinding
   Cause refusal = Cause::none;  // why there is no root
 };
 
@@ -151,14 +151,8 @@ LibplistNode treeOf(const Bytes& binary) {
   return LibplistNode{root};
 }
 
-Tree parseBinary(Bytes& bytes) {
-  const BinaryPlistFinding finding = repairBinaryPlist(bytes);
-  if (finding.refusal != Cause::none) return {.refusal = finding.refusal};
-  return {treeOf(bytes), finding.isPlain};
-}
-
 Tree parseXml(Bytes& bytes) {
-  if (bytes.size() > kLargestXmlPropertyList) return {.refusal = Cause::excessive};
+  if (bytes.size() > kMaxXmlPropertyListSize) return {.refusal = Cause::excessive};
   if (const Cause refusal = repairXmlPlist(bytes); refusal != Cause::none) return {.refusal = refusal};
   const PlainNumbers plainNumbers;
   plist_t root = nullptr;
@@ -168,9 +162,11 @@ Tree parseXml(Bytes& bytes) {
 
 // A tree whose root is a dictionary, or the refusal.
 Tree parse(Bytes bytes) {
-  if (bytes.size() > kLargestPropertyList) return {.refusal = Cause::excessive};
+  if (bytes.size() > kMaxPropertyListSize) return {.refusal = Cause::excessive};
   const bool isBinary = std::string_view{charactersOf(bytes), bytes.size()}.starts_with("bplist");
-  Tree tree = isBinary ? parseBinary(bytes) : parseXml(bytes);
+  const BinaryPlistFinding finding = isBinary ? repairBinaryPlist(bytes) : BinaryPlistFinding{};
+  if (finding.refusal != Cause::none) return {.refusal = finding.refusal};
+  Tree tree = isBinary ? Tree{treeOf(bytes), finding.isFaithful} : parseXml(bytes);
   if (tree.refusal != Cause::none) return tree;
   if (tree.root == nullptr) return {.refusal = Cause::malformed};
   if (plist_get_node_type(tree.root.get()) != PLIST_DICT) return {.refusal = Cause::unsuitable};
@@ -191,28 +187,18 @@ const char* reasonFor(Cause refusal) {
 bool holdsInOrder(plist_t tree, const Dictionary& values);
 bool holds(plist_t node, const PropertyValue& value);
 
-bool holdsText(plist_t node, const Text* text) { return text != nullptr && *text == textOfLibplist(node); }
-
-bool holdsData(plist_t node, const Bytes* data) {
-  return data != nullptr && std::ranges::equal(*data, dataOfLibplist(node));
-}
-
 bool holdsArray(plist_t node, const Array* array) {
   if (array == nullptr || array->size() != plist_array_get_size(node)) return false;
   LibplistArrayItems items{node};
   return std::ranges::all_of(*array, [&items](const PropertyValue& element) { return holds(items.next(), element); });
 }
 
-bool holdsDictionary(plist_t node, const Dictionary* dictionary) {
-  return dictionary != nullptr && holdsInOrder(node, *dictionary);
-}
-
 bool holds(plist_t node, const PropertyValue& value) {
   switch (plist_get_node_type(node)) {
-    case PLIST_STRING: return holdsText(node, value.asText());
-    case PLIST_DATA: return holdsData(node, value.asData());
+    case PLIST_STRING: return value.asText() != nullptr && *value.asText() == textOfLibplist(node);
+    case PLIST_DATA: return value.asData() != nullptr && std::ranges::equal(*value.asData(), dataOfLibplist(node));
     case PLIST_ARRAY: return holdsArray(node, value.asArray());
-    case PLIST_DICT: return holdsDictionary(node, value.asDictionary());
+    case PLIST_DICT: return value.asDictionary() != nullptr && holdsInOrder(node, *value.asDictionary());
     default: return scalarOfLibplist(node) == value;
   }
 }
@@ -232,7 +218,7 @@ Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt) {
   if (tree.refusal != Cause::none) return Status::failure(tree.refusal, std::move(attempt), reasonFor(tree.refusal));
   Conversion conversion;
   Dictionary values = conversion.dictionary(tree.root.get());
-  return ParsedPropertyList{std::move(values), tree.isPlain && !conversion.hasFoundRepeatedKeys()};
+  return ParsedPropertyList{std::move(values), tree.isFaithful && !conversion.hasFoundRepeatedKeys()};
 }
 
 bool readsBackAs(const Bytes& safe, const Dictionary& values) {

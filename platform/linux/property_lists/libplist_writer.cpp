@@ -11,8 +11,8 @@
 namespace platform {
 namespace {
 
-constexpr std::size_t kMostValues = 8'000'000;
-constexpr std::uint64_t kLargestUid = std::numeric_limits<std::uint32_t>::max();
+constexpr std::size_t kMaxValues = 8'000'000;
+constexpr std::uint64_t kMaxUid = std::numeric_limits<std::uint32_t>::max();
 
 Status failure(Cause cause, const char* reason) {
   return Status::failure(cause, "serialize the property list", reason);
@@ -40,7 +40,7 @@ class Inspection {
     add(0);
     if (const Text* const text = value.asText()) add(text->size());
     if (const Bytes* const data = value.asData()) add(data->size());
-    if (const Uid* const uid = value.asUid(); uid != nullptr && uid->number > kLargestUid) {
+    if (const Uid* const uid = value.asUid(); uid != nullptr && uid->number > kMaxUid) {
       object(Cause::unsuitable, "A UID is larger than 32 bits");
     }
     if (const Dictionary* const dictionary = value.asDictionary()) inspect(*dictionary, depth + 1);
@@ -52,7 +52,7 @@ class Inspection {
   void add(std::size_t bytes) {
     ++_values;
     _bytes += bytes;
-    if (_values > kMostValues || _bytes > kLargestPropertyList)
+    if (_values > kMaxValues || _bytes > kMaxPropertyListSize)
       object(Cause::excessive, "The property list is too large");
   }
 

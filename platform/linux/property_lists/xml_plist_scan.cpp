@@ -17,8 +17,8 @@ constexpr std::string_view kByteOrderMark = "\xEF\xBB\xBF";
 constexpr char kNoUtf8 = '\xFF';
 
 // libplist moves the rest of a text for each entity in it.
-constexpr std::uint64_t kMostMovedBytes = std::uint64_t{1} << 33U;
-constexpr std::uint64_t kMostKeySteps = std::uint64_t{1} << 24U;
+constexpr std::uint64_t kMaxMovedBytes = std::uint64_t{1} << 33U;
+constexpr std::uint64_t kMaxKeySteps = std::uint64_t{1} << 24U;
 
 constexpr std::size_t kTableFrom = 250;  // libplist counts keys and values
 constexpr std::size_t kTableSize = 4096;
@@ -265,7 +265,7 @@ class Scan {
       const std::span<char> text = _file.subspan(part.begin, part.end - part.begin);
       if (!part.isVerbatim) _movedBytes += repairXmlText(text) * text.size();
     }
-    return _movedBytes <= kMostMovedBytes || giveUp(Cause::excessive);
+    return _movedBytes <= kMaxMovedBytes || giveUp(Cause::excessive);
   }
 
   [[nodiscard]] bool countKey(const Tag& tag) {
@@ -273,7 +273,7 @@ class Scan {
     const std::string_view key = _text.substr(_parts.front().begin, _parts.front().end - _parts.front().begin);
     const bool isPlain = _parts.size() == 1 && key.find('&') == std::string_view::npos;
     _keySteps += _containers.back().keys.add(key, isPlain);
-    return _keySteps <= kMostKeySteps || giveUp(Cause::excessive);
+    return _keySteps <= kMaxKeySteps || giveUp(Cause::excessive);
   }
 
   // libplist takes of data no more than stands before the first comment.

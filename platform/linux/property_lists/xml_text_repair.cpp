@@ -11,9 +11,9 @@ namespace platform {
 namespace {
 
 constexpr char kNoUtf8 = '\xFF';  // becomes U+FFFD where the text is taken
-constexpr std::size_t kLongestReference = 8;
-constexpr std::uint64_t kSmallestMagnitude = std::uint64_t{1} << 63U;
-constexpr std::string_view kSmallestDigits = "9223372036854775808";
+constexpr std::size_t kMaxReferenceSize = 8;
+constexpr std::uint64_t kMinMagnitude = std::uint64_t{1} << 63U;
+constexpr std::string_view kMinDigits = "9223372036854775808";
 
 bool isDigit(char character) { return character >= '0' && character <= '9'; }
 
@@ -29,7 +29,7 @@ bool isCharacterNumber(std::string_view digits) {
 
 bool isEntity(std::string_view name) {
   static constexpr std::array<std::string_view, 5> kNames{"amp", "apos", "quot", "lt", "gt"};
-  if (name.starts_with('#')) return name.size() <= kLongestReference && isCharacterNumber(name.substr(1));
+  if (name.starts_with('#')) return name.size() <= kMaxReferenceSize && isCharacterNumber(name.substr(1));
   return std::ranges::find(kNames, name) != kNames.end();
 }
 
@@ -42,11 +42,11 @@ void rewrite(std::span<char> text, std::string_view digits) {
 }  // namespace
 
 std::size_t repairXmlText(std::span<char> text) {
-  constexpr std::size_t kLongestEntity = kLongestReference + 1;
+  constexpr std::size_t kMaxEntitySize = kMaxReferenceSize + 1;
   std::size_t entities = 0;
   for (std::size_t index = 0; index < text.size(); ++index) {
     if (text[index] != '&') continue;
-    const std::string_view rest{text.data() + index + 1, std::min(text.size() - index - 1, kLongestEntity)};
+    const std::string_view rest{text.data() + index + 1, std::min(text.size() - index - 1, kMaxEntitySize)};
     const std::size_t length = rest.find(';');
     if (length != std::string_view::npos && isEntity(rest.substr(0, length))) {
       ++entities;
@@ -69,7 +69,7 @@ void repairXmlInteger(std::span<char> text) {
   if (!isNegative) return;
   std::uint64_t magnitude = 0;
   const auto [end, error] = std::from_chars(text.data(), text.data() + text.size(), magnitude);
-  if (error == std::errc::result_out_of_range || magnitude > kSmallestMagnitude) rewrite(text, kSmallestDigits);
+  if (error == std::errc::result_out_of_range || magnitude > kMinMagnitude) rewrite(text, kMinDigits);
 }
 
 }  // namespace platform
