@@ -51,7 +51,7 @@ set(CPACK_DEBIAN_HOST_PACKAGE_SUGGESTS account-settings-doc)
 debian_package(TOOLS accountctl utils "${same_library}" "accounts of a device - command-line client
 accountctl lists, verifies and changes the accounts of a device.")
 debian_package(REHEARSE migration-rehearse admin
-  "migration-host (= ${PROJECT_VERSION}), python3 (>= 3.11), python3-libarchive-c, util-linux"
+  "migration-host (= ${PROJECT_VERSION}), python3 (>= 3.11), python3-libarchive-c"
   "accounts of a device - rehearsals over many device images
 migration-rehearse tells what an upgrade of the account settings would do to
 many device images and archives, none of which it changes.")

@@ -85,6 +85,21 @@ class Lists(RehearseTest):
         self.assertEqual({image.name for image in images}, set.union(*parts))
 
 
+    def test_of_more_images_need_no_more_memory(self):
+        few, many = self.peak_with(200), self.peak_with(10_000)
+        self.assertLess(many - few, 512)
+
+    def peak_with(self, count):
+        """The program's memory, in KiB, with so many images that are not there."""
+        listed = self.scratch / "many"
+        listed.write_text("".join(f"/nowhere/{number}\n" for number in range(count)))
+        running = subprocess.Popen([REHEARSE, "--results", self.scratch / f"{count}.sqlite", "--list", listed],
+                                   stdout=subprocess.DEVNULL)
+        _, _, usage = os.wait4(running.pid, 0)
+        running.returncode = 3
+        return usage.ru_maxrss
+
+
 class Again(RehearseTest):
     def test_does_nothing_twice(self):
         images = self.fleet(4)
