@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <atomic>
+#include <map>
 #include <optional>
 #include <utility>
 
@@ -62,7 +63,7 @@ class Overwritten {
 
   const ChangeTracker::Accounts& _accounts;
   const Array& _records;
-  std::unordered_map<std::string_view, const BasicAccount*> _lastOf;
+  std::map<std::string_view, const BasicAccount*> _lastOf;
 };
 
 }  // namespace

@@ -1,7 +1,7 @@
 #include <algorithm>
 #include <atomic>
+#include <map>
 #include <memory>
-#include <unordered_map>
 
 #include "platform/property_value.h"
 
@@ -11,11 +11,11 @@ namespace {
 // Up to this many keys a walk is at least as quick as an index.
 constexpr std::size_t kMaxWithoutIndex = 32;
 
-using Index = std::unordered_map<std::string_view, std::size_t>;
+// In order: no choice of keys makes it slow.
+using Index = std::map<std::string_view, std::size_t>;
 
 Index indexOf(const std::vector<Dictionary::Entry>& entries) {
   Index index;
-  index.reserve(entries.size());
   for (std::size_t position = 0; position < entries.size(); ++position) {
     index.emplace(entries[position].key.view(), position);
   }

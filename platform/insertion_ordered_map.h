@@ -1,8 +1,8 @@
 #pragma once
 
 #include <list>
+#include <map>
 #include <string_view>
-#include <unordered_map>
 #include <utility>
 
 #include "platform/text.h"
@@ -10,7 +10,8 @@
 namespace platform {
 
 // A map from text to Value that is walked in the order in which its keys were inserted; storing under a key that is
-// there keeps the key's place. Look-up, insertion and removal take constant time whatever the size. References and
+// there keeps the key's place. Look-up, insertion and removal take time that grows with the logarithm of the size,
+// whatever the keys are: they come from files, and files can be made to collide in a table of hashes. References and
 // iterators stay good until their own entry is removed.
 template <typename Value>
 class InsertionOrderedMap {
@@ -77,7 +78,7 @@ class InsertionOrderedMap {
   }
 
   std::list<Entry> _entries;
-  std::unordered_map<std::string_view, typename std::list<Entry>::iterator> _places;
+  std::map<std::string_view, typename std::list<Entry>::iterator> _places;
 };
 
 }  // namespace platform

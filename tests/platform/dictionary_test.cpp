@@ -4,6 +4,7 @@
 #include <vector>
 
 #include "platform/property_value.h"
+#include "tests/support/colliding_keys.h"
 
 using platform::Array;
 using platform::Dictionary;
@@ -29,6 +30,21 @@ TEST(Dictionaries, KeepTheOrderInWhichKeysCame) {
   dictionary.set("c", 4);
   EXPECT_EQ(keysOf(dictionary), (std::vector<std::string>{"b", "a", "c"}));
   EXPECT_EQ(*dictionary.find("b"), PropertyValue{3});
+}
+
+TEST(Dictionaries, TakeNoLongerForKeysThatAreMadeToCollide) {
+  constexpr std::size_t kCount = 30'000;
+  const auto fill = [](const std::vector<std::string>& keys) {
+    return tests::secondsFor([&keys] {
+      Dictionary dictionary;
+      for (const std::string& key : keys) dictionary.set(key, true);
+    });
+  };
+  const std::vector<std::string> colliding = tests::CollidingKeys::make(kCount);
+  for (const std::string& key : colliding) {
+    ASSERT_EQ(std::hash<std::string_view>{}(key), std::hash<std::string_view>{}(colliding[0]));
+  }
+  EXPECT_LT(fill(colliding), 4 * fill(tests::harmlessKeys(kCount)) + 0.2);
 }
 
 TEST(Dictionaries, AnswerTheValueThatIsTakenOut) {

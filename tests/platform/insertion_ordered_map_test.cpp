@@ -5,6 +5,8 @@
 #include <string>
 #include <vector>
 
+#include "tests/support/colliding_keys.h"
+
 using platform::InsertionOrderedMap;
 
 namespace {
@@ -22,6 +24,17 @@ TEST(InsertionOrderedMap, IsWalkedInTheOrderInWhichKeysCame) {
   map.set("b", 3);
   EXPECT_EQ(keysOf(map), (std::vector<std::string>{"b", "a"}));
   EXPECT_EQ(*map.find("b"), 3);
+}
+
+TEST(InsertionOrderedMap, TakesNoLongerForKeysThatAreMadeToCollide) {
+  constexpr std::size_t kCount = 30'000;
+  const auto fill = [](const std::vector<std::string>& keys) {
+    return tests::secondsFor([&keys] {
+      InsertionOrderedMap<int> map;
+      for (const std::string& key : keys) map.set(key, 1);
+    });
+  };
+  EXPECT_LT(fill(tests::CollidingKeys::make(kCount)), 4 * fill(tests::harmlessKeys(kCount)) + 0.2);
 }
 
 TEST(InsertionOrderedMap, PutsAKeyThatComesBackAtTheEnd) {
