@@ -1,11 +1,17 @@
 #pragma once
 
+#include <cstddef>
 #include <memory>
 
 #include "platform/file_system.h"
 #include "platform/property_value.h"
 
 namespace platform {
+
+// What a property list may have: containers in one another, the root included, and values, keys among them. Whatever
+// can be read can be written.
+constexpr std::size_t kMaxNesting = 256;
+constexpr std::size_t kMaxValues = 8'000'000;
 
 // A dictionary as bytes, and what went wrong. A service may answer bytes and yet say that something did: they are as
 // good as it could make them.

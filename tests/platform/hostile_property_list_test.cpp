@@ -4,11 +4,18 @@
 #include <unistd.h>
 
 #include <algorithm>
+#include <fstream>
 #include <functional>
+#include <new>
+#include <optional>
 #include <string>
+#include <tuple>
+#include <vector>
 
+#include "tests/support/colliding_keys.h"
 #include "tests/support/property_list_files.h"
 
+using platform::Dictionary;
 using tests::bigEndian;
 using tests::BinaryFile;
 using tests::countedMarker;
@@ -233,6 +240,115 @@ TEST(HostileFiles, WithCollidingOrRepeatedKeysInXmlAreRefusedButManyKeysAreRead)
   expectSettled(xmlWith(colliding), Outcome::refused);
   expectSettled(xmlWith(repeatedKeys), Outcome::refused);
   expectSettled(xmlWith(distinct), Outcome::accepted);
+}
+
+// A list of texts, of which one of two may stand for every bit of a number.
+std::string textsOfBits(std::size_t count, const std::string& zero, const std::string& one) {
+  BinaryFile file{.objects = {"", "\x51k", ""}, .referenceSize = 3};
+  file.objects[0] = "\xD1" + file.reference(1) + file.reference(2);
+  file.objects[2] = countedMarker(0xA, count);
+  for (std::size_t number = 0; number < count; ++number) {
+    std::string text;
+    for (unsigned bit = 0; bit < 15; ++bit) text += (number >> bit & 1U) != 0 ? one : zero;
+    file.objects[2] += file.reference(file.add(countedMarker(5, text.size()) + text));
+  }
+  return file.bytes();
+}
+
+TEST(HostileFiles, WithTextsThatCollideAsTheyAreWrittenAreRefusedButManyTextsAreRead) {
+  expectSettled(textsOfBits(20'000, "FY", "Ez"), Outcome::refused);
+  expectSettled(textsOfBits(20'000, "FY", "FZ"), Outcome::accepted);
+  expectSettled(textsOfBits(2'000, "FY", "Ez"), Outcome::accepted);
+}
+
+// A number of which the library's table makes the same as of every other such number; nothing for most seeds. The
+// lowest byte weighs most in the table, and the highest, which weighs least, brings all to one remainder.
+std::optional<std::uint64_t> collidingNumber(std::uint64_t seed) {
+  std::uint64_t number = 0;
+  std::uint32_t hash = 0;
+  for (unsigned byte = 0; byte < 7; ++byte) {
+    const std::uint64_t digit = seed >> (5 * byte) & 31U;
+    number |= digit << (8 * byte);
+    hash = hash * 33 + static_cast<std::uint32_t>(digit);
+  }
+  const std::uint32_t last = (0 - hash * 33) % 4096;
+  return last < 128 ? std::optional{number | std::uint64_t{last} << 56U} : std::nullopt;
+}
+
+TEST(HostileFiles, WithNumbersThatCollideAsTheyAreWrittenAreRefusedButManyNumbersAreRead) {
+  const auto listOf = [](const std::vector<std::uint64_t>& numbers) {
+    BinaryFile file{.objects = {"", "\x51k", ""}, .referenceSize = 3};
+    file.objects[0] = "\xD1" + file.reference(1) + file.reference(2);
+    file.objects[2] = countedMarker(0xA, numbers.size());
+    for (const std::uint64_t number : numbers) {
+      file.objects[2] += file.reference(file.add("\x13" + bigEndian(number, 8)));
+    }
+    return file.bytes();
+  };
+  std::vector<std::uint64_t> colliding;
+  std::vector<std::uint64_t> others;
+  for (std::uint64_t seed = 0; colliding.size() < 20'000; ++seed) {
+    if (const auto number = collidingNumber(seed)) colliding.push_back(*number);
+    if (others.size() < colliding.size()) others.push_back(seed);
+  }
+  expectSettled(listOf(colliding), Outcome::refused);
+  expectSettled(listOf(others), Outcome::accepted);
+}
+
+TEST(HostileFiles, WithKeysThatCollideInATableOfHashesAreReadAsQuicklyAsOthers) {
+  const auto seconds = [](const std::vector<std::string>& keys) {
+    BinaryFile file{.objects = {"", "\x09"}, .referenceSize = 3};
+    std::string values;
+    file.objects[0] = countedMarker(0xD, keys.size());
+    for (const std::string& key : keys) {
+      file.objects[0] += file.reference(file.add(countedMarker(5, key.size()) + key));
+      values += file.reference(1);
+    }
+    file.objects[0] += values;
+    PropertyListFiles files;
+    return tests::secondsFor([&] { EXPECT_EQ(files.read(file.bytes()).value().size(), keys.size()); });
+  };
+  constexpr std::size_t kCount = 30'000;
+  EXPECT_LT(seconds(tests::CollidingKeys::make(kCount)), 4 * seconds(tests::harmlessKeys(kCount)) + 0.2);
+}
+
+TEST(HostileFiles, OfMoreValuesThanCanBeWrittenAreRefused) {
+  expectSettled(sharedLeaf("\x09", 1, platform::kMaxValues + 1), Outcome::refused);
+}
+
+// In a process of its own that may take little more memory than it has.
+Outcome withLittleMemory(const std::function<void()>& action) {
+  const pid_t child = fork();
+  if (child == 0) {
+    rlimit limit{};
+    getrlimit(RLIMIT_AS, &limit);
+    std::size_t pages = 0;
+    std::ifstream{"/proc/self/statm"} >> pages;
+    limit.rlim_cur = pages * static_cast<std::size_t>(sysconf(_SC_PAGESIZE)) + 4 * kMebibyte;
+    setrlimit(RLIMIT_AS, &limit);
+    try {
+      action();
+      _exit(static_cast<int>(Outcome::accepted));
+    } catch (const std::bad_alloc&) {
+      _exit(static_cast<int>(Outcome::refused));
+    }
+  }
+  int status = 0;
+  EXPECT_EQ(waitpid(child, &status, 0), child);
+  EXPECT_TRUE(WIFEXITED(status)) << "ended by signal " << WTERMSIG(status);
+  return Outcome{WEXITSTATUS(status)};
+}
+
+TEST(HostileFiles, AreNeitherLostNorTheEndOfTheProcessForWantOfMemory) {
+  if (!kCanMeasureMemory) GTEST_SKIP() << "the sanitizers take more memory than that";
+  PropertyListFiles files;
+  files.files->put("/file.plist", textsOfBits(20'000, "FY", "FZ"));
+  const Dictionary values = files.store->readDictionary("/file.plist").take();
+  PropertyListFiles others;  // which know neither the bytes nor the values
+  others.files = files.files;
+  others.store = platform::makeLibplistPropertyListStore(files.files);
+  EXPECT_EQ(withLittleMemory([&] { std::ignore = others.store->serialize(values); }), Outcome::refused);
+  EXPECT_EQ(withLittleMemory([&] { std::ignore = others.store->readDictionary("/file.plist"); }), Outcome::refused);
 }
 
 TEST(HostileFiles, LargerThanTheLimitForXmlAreRefused) {

@@ -1,10 +1,11 @@
 #include "platform/linux/property_lists/binary_plist_scan.h"
 
+#include <algorithm>
 #include <vector>
 
 #include "platform/linux/property_lists/binary_plist_layout.h"
 #include "platform/linux/property_lists/binary_plist_repair.h"
-#include "platform/linux/property_lists/libplist_node.h"
+#include "platform/property_list_store.h"
 
 namespace platform {
 namespace {
@@ -28,7 +29,9 @@ struct Limits {
   std::uint64_t levels;  // libplist looks for cycles by comparing each node with all above it
 
   explicit Limits(std::uint64_t fileSize)
-      : nodes{fileSize}, bytes{120 * fileSize + (4U << 20U)}, levels{64 * fileSize + (4U << 20U)} {}
+      : nodes{std::min<std::uint64_t>(fileSize, kMaxValues)},
+        bytes{120 * fileSize + (4U << 20U)},
+        levels{64 * fileSize + (4U << 20U)} {}
 };
 
 struct Weight {
@@ -58,6 +61,8 @@ class Scan {
   // Why it ended where it failed.
   [[nodiscard]] Cause refusal() const { return _refusal; }
   [[nodiscard]] bool hasRepaired() const { return _repair.hasRepaired(); }
+
+  [[nodiscard]] std::uint64_t unfoldedBytes() const { return _weights[_layout.root()].bytes + _once; }
 
   // Whether the file holds what the root reaches, as it would be written, and nothing else.
   [[nodiscard]] bool isFaithful() const {
@@ -109,7 +114,7 @@ class Scan {
   }
 
   [[nodiscard]] bool open(std::size_t index, Object container) {
-    if (_open.size() == kDeepestNesting) return exceed();
+    if (_open.size() == kMaxNesting) return exceed();
     _references += referencesOf(container);
     if (_references > _limits.nodes) return exceed();
     if (!_repair.repairContainer(container)) return false;
@@ -141,7 +146,7 @@ class Scan {
     sum.levels += child.levels + child.nodes;
     if (child.height >= sum.height) sum.height = static_cast<std::uint16_t>(child.height + 1);
     const bool isWithinLimits = sum.nodes <= _limits.nodes && sum.bytes + _once <= _limits.bytes &&
-                                sum.levels <= _limits.levels && _open.size() + child.height <= kDeepestNesting;
+                                sum.levels <= _limits.levels && _open.size() + child.height <= kMaxNesting;
     return isWithinLimits || exceed();
   }
 
@@ -174,7 +179,7 @@ BinaryPlistFinding repairBinaryPlist(Bytes& file) {
     Scan scan{file, *layout};
     if (!scan.run()) return {scan.refusal()};
     if (scan.hasRepaired()) continue;
-    return {.isFaithful = pass == 0 && scan.isFaithful()};
+    return {.isFaithful = pass == 0 && scan.isFaithful(), .unfoldedBytes = scan.unfoldedBytes()};
   }
   return {Cause::malformed};
 }

@@ -1,5 +1,7 @@
 #pragma once
 
+#include <cstdint>
+
 #include "platform/property_value.h"
 #include "platform/status.h"
 
@@ -11,6 +13,7 @@ struct BinaryPlistFinding {
   Cause refusal = Cause::none;
   // As any writer could have made it: nothing was repaired, and the root reaches every byte of every object.
   bool isFaithful = false;
+  std::uint64_t unfoldedBytes = 0;  // the memory that libplist's tree and the values take together, about
 };
 
 // Makes a binary property list safe for libplist, which unfolds whatever is shared and recurses into whatever is

@@ -1,12 +1,14 @@
 #include "platform/linux/property_lists/libplist_node.h"
 
 #include <plist/plist.h>
+#include <sys/mman.h>
 
 #include <array>
 #include <bit>
 #include <cstddef>
 #include <cstdlib>
 #include <limits>
+#include <new>
 #include <string>
 
 namespace platform {
@@ -57,6 +59,14 @@ double writtenSeconds(plist_t node) {
 void LibplistNodeDeleter::operator()(void* node) const { plist_free(node); }
 
 void LibplistMemoryDeleter::operator()(void* memory) const { std::free(memory); }
+
+// Asked of the kernel, not of the allocator, whose blocks of one size or another it would disturb.
+void requireMemory(std::size_t bytes) {
+  if (bytes == 0) return;
+  void* const memory = ::mmap(nullptr, bytes, PROT_READ | PROT_WRITE, MAP_PRIVATE | MAP_ANONYMOUS, -1, 0);
+  if (memory == MAP_FAILED) throw std::bad_alloc{};
+  ::munmap(memory, bytes);
+}
 
 LibplistNode makeLibplistDate(double secondsSince2001) {
   if (isWholeInt32(secondsSince2001)) {

@@ -23,8 +23,9 @@ using LibplistNode = std::unique_ptr<void, LibplistNodeDeleter>;
 // Characters that the library allocated, up to a NUL.
 using LibplistText = std::unique_ptr<char, LibplistMemoryDeleter>;
 
-// How deep containers may nest: libplist frees, copies and writes a tree recursively.
-constexpr std::size_t kDeepestNesting = 256;
+// Throws std::bad_alloc where this much memory is not to be had. libplist ends the process, or gives up without a word,
+// where an allocation of its own fails; so whoever hands it something large asks beforehand.
+void requireMemory(std::size_t bytes);
 
 // Dates and integers above the signed range, exactly. The library's own calls cut a date to 32-bit seconds and make a
 // negative number of such an integer, so these go through a binary property list that holds the one value.

@@ -28,7 +28,9 @@ namespace platform {
 // A file is refused only where it is no property list for libplist at all, or where reading it would exhaust the
 // process: more than 256 nested containers, cycles, contents that unfold to more than about 120 times the file's size
 // in memory (shared references), XML with thousands of keys made to collide or to repeat in one dictionary or with very
-// many entities in one text, files above 256 MiB (binary) or 16 MiB (XML).
+// many entities in one text, texts or numbers made to collide in libplist's writer, more than 8 million values, files
+// above 256 MiB (binary) or 16 MiB (XML). Where there is not the memory that libplist will take, both throw
+// std::bad_alloc.
 //
 // `serialize` fails for what such a reader would not give back: more than 256 nested containers, UIDs above
 // 32 bits, more than 8 million values or 256 MiB. Its time grows with the square of the number of values: unnoticeable

@@ -5,12 +5,13 @@
 #include <algorithm>
 #include <array>
 #include <clocale>
+#include <map>
 #include <string_view>
-#include <unordered_map>
 #include <vector>
 
 #include "platform/linux/property_lists/binary_plist_scan.h"
 #include "platform/linux/property_lists/libplist_node.h"
+#include "platform/linux/property_lists/writing_cost.h"
 #include "platform/linux/property_lists/xml_plist_scan.h"
 
 namespace platform {
@@ -52,6 +53,8 @@ class Conversion {
   }
 
   [[nodiscard]] bool hasFoundRepeatedKeys() const { return _hasFoundRepeatedKeys; }
+  // How many keys and values there were.
+  [[nodiscard]] std::size_t size() const { return _size; }
 
  private:
   struct Item {
@@ -68,7 +71,9 @@ class Conversion {
   std::vector<Item> itemsOf(plist_t node) {
     ++_dictionaries;
     std::vector<Item> items;
-    items.reserve(plist_dict_get_size(node));
+    const std::size_t count = plist_dict_get_size(node);
+    items.reserve(count);
+    _size += count;
     LibplistEntries entries{node};
     while (entries.advance()) {
       Key& key = known(entries.key().get());
@@ -93,6 +98,7 @@ class Conversion {
   }
 
   PropertyValue value(plist_t node) {
+    ++_size;
     switch (plist_get_node_type(node)) {
       case PLIST_STRING: return _texts.text(textOfLibplist(node));
       case PLIST_ARRAY: return array(node);
@@ -115,9 +121,10 @@ class Conversion {
     return array;
   }
 
-  std::unordered_map<std::string_view, Key> _keys;  // by views of their texts
+  std::map<std::string_view, Key> _keys;  // by views of their texts
   RecentTexts _texts;
   std::size_t _dictionaries = 0;
+  std::size_t _size = 0;
   bool _hasFoundRepeatedKeys = false;
 };
 
@@ -137,6 +144,8 @@ class PlainNumbers {
   locale_t _previous;
 };
 
+constexpr std::size_t kXmlGrowth = 24;  // what most lists take in memory for each byte of XML
+
 const char* charactersOf(const Bytes& bytes) { return reinterpret_cast<const char*>(bytes.data()); }
 
 struct Tree {
@@ -154,6 +163,7 @@ LibplistNode treeOf(const Bytes& binary) {
 Tree parseXml(Bytes& bytes) {
   if (bytes.size() > kMaxXmlPropertyListSize) return {.refusal = Cause::excessive};
   if (const Cause refusal = repairXmlPlist(bytes); refusal != Cause::none) return {.refusal = refusal};
+  requireMemory(kXmlGrowth * bytes.size());
   const PlainNumbers plainNumbers;
   plist_t root = nullptr;
   plist_from_xml(charactersOf(bytes), static_cast<std::uint32_t>(bytes.size()), &root);
@@ -166,6 +176,7 @@ Tree parse(Bytes bytes) {
   const bool isBinary = std::string_view{charactersOf(bytes), bytes.size()}.starts_with("bplist");
   const BinaryPlistFinding finding = isBinary ? repairBinaryPlist(bytes) : BinaryPlistFinding{};
   if (finding.refusal != Cause::none) return {.refusal = finding.refusal};
+  requireMemory(finding.unfoldedBytes);
   Tree tree = isBinary ? Tree{treeOf(bytes), finding.isFaithful} : parseXml(bytes);
   if (tree.refusal != Cause::none) return tree;
   if (tree.root == nullptr) return {.refusal = Cause::malformed};
@@ -218,6 +229,8 @@ Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt) {
   if (tree.refusal != Cause::none) return Status::failure(tree.refusal, std::move(attempt), reasonFor(tree.refusal));
   Conversion conversion;
   Dictionary values = conversion.dictionary(tree.root.get());
+  if (isDearToWrite(values, conversion.size()))
+    return Status::failure(Cause::excessive, std::move(attempt), reasonFor(Cause::excessive));
   return ParsedPropertyList{std::move(values), tree.isFaithful && !conversion.hasFoundRepeatedKeys()};
 }
 

@@ -11,7 +11,7 @@
 namespace platform {
 namespace {
 
-constexpr std::size_t kMaxValues = 8'000'000;
+constexpr std::size_t kBytesForValue = 400;
 constexpr std::uint64_t kMaxUid = std::numeric_limits<std::uint32_t>::max();
 
 Status failure(Cause cause, const char* reason) {
@@ -33,6 +33,8 @@ class Inspection {
   }
 
   [[nodiscard]] const Status& objection() const { return _objection; }
+  // That libplist takes for its tree, its table, the bytes and the tree that is read back, about.
+  [[nodiscard]] std::size_t memoryNeeded() const { return kBytesForValue * _values + 6 * _bytes; }
 
  private:
   void inspect(const PropertyValue& value, std::size_t depth) {
@@ -57,7 +59,7 @@ class Inspection {
   }
 
   bool goesOn(std::size_t depth) {
-    if (depth > kDeepestNesting) object(Cause::excessive, "The property list has more than 256 nested containers");
+    if (depth > kMaxNesting) object(Cause::excessive, "The property list has more than 256 nested containers");
     return _objection.isOk();
   }
 
@@ -123,6 +125,7 @@ SerializedPropertyList writePropertyList(const Dictionary& dictionary) {
   Inspection inspection;
   inspection.inspect(dictionary);
   if (!inspection.objection().isOk()) return nothing(inspection.objection());
+  requireMemory(inspection.memoryNeeded());
   LibplistNode tree = nodeOf(dictionary);
   Bytes bytes = binaryOf(tree.get());
   if (bytes.empty()) return nothing(failure(Cause::other, "The property list could not be written"));

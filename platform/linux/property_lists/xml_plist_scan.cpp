@@ -2,12 +2,12 @@
 
 #include <algorithm>
 #include <cstdint>
+#include <set>
 #include <string_view>
-#include <unordered_set>
 #include <vector>
 
-#include "platform/linux/property_lists/libplist_node.h"
 #include "platform/linux/property_lists/xml_text_repair.h"
+#include "platform/property_list_store.h"
 
 namespace platform {
 namespace {
@@ -42,8 +42,8 @@ class XmlKeyCost {
   bool record(std::uint32_t hash);
 
   std::vector<std::uint32_t> _hashes;
-  std::unordered_set<std::uint32_t> _known;  // the same, from where the library has its table on
-  std::vector<std::uint32_t> _chains;        // how many keys share a place of the table
+  std::set<std::uint32_t> _known;      // the same, from where the library has its table on
+  std::vector<std::uint32_t> _chains;  // how many keys share a place of the table
 };
 
 std::uint64_t XmlKeyCost::add(std::string_view key, bool isPlain) {
@@ -180,7 +180,7 @@ class Scan {
   [[nodiscard]] bool push(Open kind) {
     _open.push_back(kind);
     if (kind != Open::plist) _containers.push_back({kind == Open::dictionary});
-    return _containers.size() <= kDeepestNesting || giveUp(Cause::excessive);
+    return _containers.size() <= kMaxNesting || giveUp(Cause::excessive);
   }
 
   [[nodiscard]] bool pop(Open kind) {

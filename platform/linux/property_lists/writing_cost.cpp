@@ -1,0 +1,128 @@
+#include "platform/linux/property_lists/writing_cost.h"
+
+#include <array>
+#include <bit>
+#include <cstdint>
+#include <set>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+namespace platform {
+namespace {
+
+constexpr std::size_t kTableSize = 4096;
+constexpr std::uint64_t kCheap = std::uint64_t{1} << 25U;  // comparisons: a fraction of a second
+constexpr std::uint64_t kMaxUnevenness = 8;                // times what evenly spread ones take
+
+// What the library makes of a kind before it looks at the characters or the eight bytes.
+enum class Kind : std::uint32_t { integer = 1, real = 2, text = 3, date = 6, key = 8, uid = 9 };
+
+std::uint32_t placeOf(Kind kind, std::string_view bytes) {
+  std::uint32_t hash = 5381 + static_cast<std::uint32_t>(kind);
+  for (const char byte : bytes) hash = hash * 33 + static_cast<std::uint32_t>(byte);
+  return hash % kTableSize;
+}
+
+// Hands every text, key and number to the visitor, with its kind.
+template <typename Visitor>
+class Walk {
+ public:
+  explicit Walk(Visitor& visitor) : _visitor{visitor} {}
+
+  void visit(const Dictionary& dictionary) {
+    for (const auto& [key, value] : dictionary) {
+      _visitor.see(Kind::key, key.view());
+      visit(value);
+    }
+  }
+
+ private:
+  void visit(const PropertyValue& value) {
+    if (const Text* const text = value.asText()) return _visitor.see(Kind::text, text->view());
+    if (const Dictionary* const dictionary = value.asDictionary()) return visit(*dictionary);
+    if (const Array* const array = value.asArray()) {
+      for (const PropertyValue& element : *array) visit(element);
+    } else if (const auto integer = value.asInteger()) {
+      seeNumber(Kind::integer, integer->bits);
+    } else if (const double* const real = value.asReal()) {
+      seeNumber(Kind::real, *real);
+    } else if (const Date* const date = value.asDate()) {
+      seeNumber(Kind::date, date->secondsSince2001);
+    } else if (const Uid* const uid = value.asUid()) {
+      seeNumber(Kind::uid, uid->number);
+    }
+  }
+
+  template <typename Number>
+  void seeNumber(Kind kind, Number number) {
+    const auto bytes = std::bit_cast<std::array<char, sizeof number>>(number);
+    _visitor.see(kind, {bytes.data(), bytes.size()});
+  }
+
+  Visitor& _visitor;
+};
+
+// How often each place is looked into.
+class Uses {
+ public:
+  void see(Kind kind, std::string_view bytes) {
+    ++_total;
+    ++_ofPlace[placeOf(kind, bytes)];
+  }
+  [[nodiscard]] std::uint64_t total() const { return _total; }
+  [[nodiscard]] std::uint64_t of(std::size_t place) const { return _ofPlace[place]; }
+  // As many comparisons as there could be, were all that fall into a place different.
+  [[nodiscard]] std::uint64_t mostComparisons() const {
+    std::uint64_t sum = 0;
+    for (const std::uint64_t uses : _ofPlace) sum += uses * uses;
+    return sum;
+  }
+
+ private:
+  std::uint64_t _total = 0;
+  std::vector<std::uint32_t> _ofPlace = std::vector<std::uint32_t>(kTableSize);
+};
+
+// Sums up the comparisons, telling equal ones from different ones.
+class Comparisons {
+ public:
+  explicit Comparisons(const Uses& uses) : _uses{uses} {}
+
+  void see(Kind kind, std::string_view bytes) {
+    // What numbers are made of does not outlive the call.
+    const bool isNew = kind == Kind::text || kind == Kind::key ? _texts.emplace(kind, bytes).second
+                                                               : _numbers.emplace(kind, numberIn(bytes)).second;
+    if (isNew) _sum += _uses.of(placeOf(kind, bytes));
+  }
+  [[nodiscard]] bool areUneven() const {
+    const std::uint64_t evenly = _uses.total() * ((_texts.size() + _numbers.size()) / kTableSize + 1);
+    return _sum > kCheap + kMaxUnevenness * evenly;
+  }
+
+ private:
+  static std::uint64_t numberIn(std::string_view bytes) {
+    std::uint64_t number = 0;
+    for (const char byte : bytes) number = number << 8U | static_cast<unsigned char>(byte);
+    return number;
+  }
+
+  const Uses& _uses;
+  std::set<std::pair<Kind, std::string_view>> _texts;
+  std::set<std::pair<Kind, std::uint64_t>> _numbers;
+  std::uint64_t _sum = 0;
+};
+
+}  // namespace
+
+bool isDearToWrite(const Dictionary& dictionary, std::size_t size) {
+  if (size * size <= kCheap) return false;
+  Uses uses;
+  Walk{uses}.visit(dictionary);
+  if (uses.mostComparisons() <= kCheap) return false;
+  Comparisons comparisons{uses};
+  Walk{comparisons}.visit(dictionary);
+  return comparisons.areUneven();
+}
+
+}  // namespace platform
