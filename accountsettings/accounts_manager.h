@@ -128,6 +128,8 @@ class ACCOUNT_EXPORT AccountsManager {
   void insertAccount(const Account& account);
   void updateAccount(const Account& account);
   void deleteAccount(const Account& account);
+  // Internal: deletes each of them in turn, in one walk over the store.
+  void deleteAccounts(const Accounts& accounts);
   // The identifier must be a registered top-level account's.
   void deleteAccountWithIdentifier(std::string_view identifier);
   // The old account must be in the order. The new one is found by identifier only in a store loaded afresh.

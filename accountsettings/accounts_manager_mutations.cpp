@@ -1,5 +1,7 @@
 #include <algorithm>
+#include <map>
 #include <ranges>
+#include <string>
 #include <unordered_set>
 
 #include "accountsettings/accounts_manager.h"
@@ -28,6 +30,12 @@ std::optional<Text> identifierProperty(const BasicAccount& account) {
 
 void enter(AccountsByID& accounts, const std::optional<Text>& identifier, const Account& account) {
   if (identifier) accounts.set(*identifier, account);
+}
+
+// Deletes the last of the accounts that is not deleted already; it may stand there more than once.
+void deleteLast(Accounts& accounts, std::unordered_set<Account>& deleted) {
+  while (!accounts.empty() && deleted.contains(accounts.back())) accounts.pop_back();
+  if (!accounts.empty()) deleted.insert(accounts.back());
 }
 
 Account foundIn(const AccountsByID& accounts, const std::optional<Text>& identifier) {
@@ -66,16 +74,27 @@ void AccountsManager::updateAccount(const Account& account) {
   }
 }
 
-void AccountsManager::deleteAccount(const Account& account) {
-  _ASLogSystem().log("-[AccountsManager deleteAccount:]", "Deleting account: %@", account->properties());
-  forgetIdentifierOfAccount(*account);
-  if (_tracker) _tracker->willGo(*account, records::LossCode::deleted);
-  const std::optional<Text> identifier = account->identifier();
-  const auto last = std::ranges::find_if(_orderedTopLevelAccounts.rbegin(), _orderedTopLevelAccounts.rend(),
-                                         [&](const Account& present) { return hasIdentifier(*present, identifier); });
-  if (last == _orderedTopLevelAccounts.rend()) return;
-  const Account deleted = *last;
-  std::erase(_orderedTopLevelAccounts, deleted);
+void AccountsManager::deleteAccount(const Account& account) { deleteAccounts({account}); }
+
+void AccountsManager::deleteAccounts(const Accounts& accounts) {
+  std::map<std::string, Accounts, std::less<>> present;  // of each identifier, in the order of the store
+  for (const Account& account : accounts) {
+    if (const std::optional<Text> identifier = account->identifier()) present[identifier->string()];
+  }
+  for (const Account& account : _orderedTopLevelAccounts) {
+    const std::optional<Text> identifier = account->identifier();
+    const auto same = identifier ? present.find(identifier->view()) : present.end();
+    if (same != present.end()) same->second.push_back(account);
+  }
+  std::unordered_set<Account> deleted;
+  for (const Account& account : accounts) {
+    _ASLogSystem().log("-[AccountsManager deleteAccount:]", "Deleting account: %@", account->properties());
+    forgetIdentifierOfAccount(*account);
+    if (_tracker) _tracker->willGo(*account, records::LossCode::deleted);
+    if (const std::optional<Text> identifier = account->identifier())
+      deleteLast(present[identifier->string()], deleted);
+  }
+  std::erase_if(_orderedTopLevelAccounts, [&deleted](const Account& account) { return deleted.contains(account); });
 }
 
 void AccountsManager::deleteAccountWithIdentifier(std::string_view identifier) {

@@ -1,13 +1,12 @@
 #include <algorithm>
 #include <array>
-#include <bit>
-#include <map>
 #include <set>
 #include <string>
 #include <unordered_set>
 
 #include "accountsettings/basic_account.h"
 #include "accountsettings/dataclass_lists.h"
+#include "accountsettings/equality_key.h"
 #include "platform/kept_for_life.h"
 #include "platform/platform.h"
 
@@ -27,60 +26,6 @@ Dataclasses intersection(const Dataclasses& list, const Dataclasses& other) {
   return common;
 }
 
-void write(std::string& key, const PropertyValue& value);
-
-template <typename Number>
-void writeNumber(std::string& key, Number number) {
-  const auto bytes = std::bit_cast<std::array<char, sizeof number>>(number);
-  key.append(bytes.data(), bytes.size());
-}
-
-void writeSized(std::string& key, std::string_view bytes) {
-  writeNumber(key, bytes.size());
-  key += bytes;
-}
-
-void writeEach(std::string& key, const Array& array) {
-  writeNumber(key, array.size());
-  for (const PropertyValue& element : array) write(key, element);
-}
-
-// Dictionaries are equal whatever their order.
-void writeEach(std::string& key, const Dictionary& dictionary) {
-  std::map<std::string_view, const PropertyValue*> sorted;
-  for (const auto& [name, held] : dictionary) sorted.emplace(name.view(), &held);
-  writeNumber(key, sorted.size());
-  for (const auto& [name, held] : sorted) {
-    writeSized(key, name);
-    write(key, *held);
-  }
-}
-
-// Equal values, and only they, write the same bytes.
-void write(std::string& key, const PropertyValue& value) {
-  key.push_back(static_cast<char>(value.kind()));
-  if (const Text* const text = value.asText()) return writeSized(key, text->view());
-  if (const auto integer = value.asInteger()) {
-    writeNumber(key, integer->isAboveInt64);
-    return writeNumber(key, integer->bits);
-  }
-  if (const double* const real = value.asReal()) return writeNumber(key, *real);
-  if (const bool* const boolean = value.asBoolean()) return writeNumber(key, *boolean);
-  if (const platform::Date* const date = value.asDate()) return writeNumber(key, date->secondsSince2001);
-  if (const platform::Uid* const uid = value.asUid()) return writeNumber(key, uid->number);
-  if (const platform::Bytes* const data = value.asData()) {
-    return writeSized(key, {reinterpret_cast<const char*>(data->data()), data->size()});
-  }
-  if (const Array* const array = value.asArray()) return writeEach(key, *array);
-  if (const Dictionary* const dictionary = value.asDictionary()) writeEach(key, *dictionary);
-}
-
-std::string keyOf(const PropertyValue& value) {
-  std::string key;
-  write(key, value);
-  return key;
-}
-
 // The elements of a stored list as a set: each once, of whatever kind, in the order in which they first stand.
 Array setOfElements(const Array* stored) {
   if (stored == nullptr) return {};
@@ -88,7 +33,7 @@ Array setOfElements(const Array* stored) {
   Array elements;
   elements.reserve(stored->size() + 1);
   std::ranges::copy_if(*stored, std::back_inserter(elements),
-                       [&seen](const PropertyValue& element) { return seen.insert(keyOf(element)).second; });
+                       [&seen](const PropertyValue& element) { return seen.insert(equalityKey(element)).second; });
   return elements;
 }
 

@@ -48,7 +48,7 @@ install(DIRECTORY ${CMAKE_SOURCE_DIR}/docs ${CMAKE_SOURCE_DIR}/examples
   DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT documents PATTERN man EXCLUDE)
 
 # What the store, the plug-in and the tests share is not for other programs.
-set(internal_headers "/(file_paths|record_changes|change_tracker)[.]h$")
+set(internal_headers "/(file_paths|record_changes|change_tracker|equality_key)[.]h$")
 foreach(folder accountsettings records platform)
   file(GLOB headers CONFIGURE_DEPENDS "${CMAKE_SOURCE_DIR}/${folder}/*.h")
   list(FILTER headers EXCLUDE REGEX "${internal_headers}")

@@ -1,6 +1,8 @@
-#include <algorithm>
 #include <array>
+#include <map>
+#include <string>
 
+#include "accountsettings/equality_key.h"
 #include "accountsettings/product_values.h"
 #include "accountsettings/vocabulary.h"
 #include "migrator/account_reads.h"
@@ -77,14 +79,15 @@ void cleanChildrenOf(BasicAccount& cloudAccount) {
   const std::optional<Array> children = arrayForKey(cloudAccount, kAccountChildAccounts);
   if (!children) return;
   Array cleaned = *children;
-  for (const PropertyValue& child : *children) {
+  std::map<std::string, std::size_t> firstPlaces;  // of equal children
+  for (std::size_t place = 0; place < children->size(); ++place) {
+    const PropertyValue& child = (*children)[place];
     const Dictionary* const properties = child.asDictionary();
     const Account record = BasicAccount::accountWithProperties(properties != nullptr ? *properties : Dictionary{});
     if (record == nullptr || !isHostedMail(*record) || !record->displayName()) continue;
     record->removeAccountPropertyForKey(kAccountDisplayName);
     // The place is that of the first equal child, so of two equal ones only the first is ever cleaned.
-    const auto place = std::ranges::find(*children, child) - children->begin();
-    cleaned[static_cast<std::size_t>(place)] = record->properties();
+    cleaned[firstPlaces.try_emplace(equalityKey(child), place).first->second] = record->properties();
   }
   cloudAccount.setAccountProperty_forKey(std::move(cleaned), kAccountChildAccounts);
 }

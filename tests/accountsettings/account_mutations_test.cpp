@@ -100,6 +100,24 @@ TEST_F(EditingAccounts, DeletesNothingFromTheOrderWhereNoneHasTheIdentifier) {
   EXPECT_EQ(messagesOf("-[AccountsManager deleteAccount:]").size(), 1U);
 }
 
+TEST_F(EditingAccounts, DeletesManyAsItDeletesEachInTurn) {
+  const Array records{properties("a"), withChildren("b", {properties("c")})->properties(), properties("a"),
+                      properties("d"), properties("a")};
+  const auto afterwards = [&](const auto& deleteFrom) {
+    const Store store = load(records);
+    device.systemLog->lines.clear();
+    const Accounts all = store->allBasicAccounts();
+    // Of one identifier another record goes each time, whichever of them is named; "e" is none of the store's.
+    deleteFrom(*store, Accounts{all[0], all[1], account("e"), all[0], all[1]});
+    return std::tuple{orderOf(store), allOf(store), device.logMessages()};
+  };
+  const auto inTurn = afterwards([](AccountsManager& store, const Accounts& accounts) {
+    for (const Account& each : accounts) store.deleteAccount(each);
+  });
+  EXPECT_EQ(std::get<0>(inTurn), (Lines{"a", "d"}));
+  EXPECT_EQ(afterwards([](AccountsManager& store, const Accounts& all) { store.deleteAccounts(all); }), inTurn);
+}
+
 TEST_F(EditingAccounts, DeletesATopLevelAccountByItsIdentifier) {
   const Store store = storeOf({account("a"), account("b")});
   store->deleteAccountWithIdentifier("a");
