@@ -1,12 +1,14 @@
 #include <algorithm>
 #include <array>
-#include <unordered_map>
+#include <map>
+#include <set>
 
 #include "accountsettings/change_tracker.h"
 #include "accountsettings/device_local_account.h"
 #include "accountsettings/vocabulary.h"
 #include "migrator/account_reads.h"
 #include "migrator/accounts_data_migrator.h"
+#include "migrator/hostile_accounts.h"
 #include "migrator/stored_names.h"
 #include "migrator/telling.h"
 #include "platform/platform.h"
@@ -63,7 +65,7 @@ bool isKeptOnDevice(const DataclassSources& kind) {
 
 // --- CalDAV ---
 
-// The calendar accounts of a store, found by the name that they log in with.
+// The calendar accounts of a store, found by all that makes one somebody's partner.
 class CalDAVAccounts {
  public:
   explicit CalDAVAccounts(const AccountsManager& store) {
@@ -74,42 +76,51 @@ class CalDAVAccounts {
 
   // In the order of the store.
   [[nodiscard]] Accounts partnersOf(const BasicAccount& umbrella) const {
-    std::vector<std::size_t> places;
-    for (const std::string& username : AccountsDataMigrator::_expectedCalDAVUsernamesForAccount(umbrella)) {
-      const auto found = _placesByLogin.find(username);
-      if (found != _placesByLogin.end()) std::ranges::copy(found->second, std::back_inserter(places));
+    const auto host = AccountsDataMigrator::_expectedCalDAVHostnameForAccount(umbrella);
+    if (!host) return {};
+    std::set<std::size_t> places;
+    for (const std::string& login : AccountsDataMigrator::_expectedCalDAVUsernamesForAccount(umbrella)) {
+      for (const std::string& path : AccountsDataMigrator::_expectedCalDAVPrincipalURLsForAccount(umbrella)) {
+        const auto found = _places.find({*host, login, path});
+        if (found != _places.end()) places.insert(found->second.begin(), found->second.end());
+      }
     }
-    std::ranges::sort(places);
     Accounts partners;
     for (const std::size_t place : places) {
-      const AccountsManager::Account& candidate = _accounts[place];
-      if (AccountsDataMigrator::_calDAVAccount_matchesUmbrellaAccount(*candidate, umbrella)) {
-        partners.push_back(candidate);
+      if (AccountsDataMigrator::_calDAVAccount_matchesUmbrellaAccount(*_accounts[place], umbrella)) {
+        partners.push_back(_accounts[place]);
       }
     }
     return partners;
   }
 
  private:
-  // One without a login name is nobody's partner.
+  using Identity = std::array<std::string, 3>;  // server, login and principal path
+
+  // One that lacks any of these is nobody's partner.
   void add(const AccountsManager::Account& account) {
     const Dictionary principal = dictionaryForKey(*account, kCalDAVPrincipalKey).value_or(Dictionary{});
+    const Dictionary configuration = dictionaryForKey(*account, kCalDAVConfigurationKey).value_or(Dictionary{});
+    const Text* const server = principal.text(kCalDAVServerKey);
     const Text* const login = principal.text(kCalDAVLoginKey);
-    if (login == nullptr) return;
-    _placesByLogin[login->string()].push_back(_accounts.size());
+    const Text* const path = configuration.text(kCalDAVPrincipalPathKey);
+    if (server == nullptr || login == nullptr || path == nullptr) return;
+    _places[{server->string(), login->string(), path->string()}].push_back(_accounts.size());
     _accounts.push_back(account);
   }
 
   Accounts _accounts;
-  std::unordered_map<std::string, std::vector<std::size_t>> _placesByLogin;
+  std::map<Identity, std::vector<std::size_t>> _places;
 };
 
 // Every partner is folded in, not just the first; one with two umbrellas is listed for each.
 void foldPartnersInto(BasicAccount& umbrella, const CalDAVAccounts& candidates, Accounts& folded,
                       ChangeTracker* tracker) {
   if (!hasClassAmong(umbrella, {kGmailAccountClass, kYahooAccountClass})) return;
-  for (const AccountsManager::Account& partner : candidates.partnersOf(umbrella)) {
-    umbrella.setEnabled_forDataclass(true, kAccountDataclassCalendars);
+  const Accounts partners = candidates.partnersOf(umbrella);
+  if (!partners.empty()) umbrella.setEnabled_forDataclass(true, kAccountDataclassCalendars);
+  refuseAbove(kMaxFolded, folded.size() + partners.size(), "pairs of a mail account and its calendar account");
+  for (const AccountsManager::Account& partner : partners) {
     folded.push_back(partner);
     if (tracker != nullptr) tracker->willBeFolded(*partner, umbrella, "the same user's calendars at the same service");
   }
@@ -187,7 +198,7 @@ bool AccountsDataMigrator::_migrateAccountsFrom7A242(AccountsManager& store) {
     }
     foldPartnersInto(*account, candidates, folded, store.changeTracker());
   }
-  for (const AccountsManager::Account& account : folded) store.deleteAccount(account);
+  store.deleteAccounts(folded);
   store.setDataVersion(5);
   return true;
 }

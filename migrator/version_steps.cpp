@@ -2,6 +2,7 @@
 
 #include "accountsettings/vocabulary.h"
 #include "migrator/accounts_data_migrator.h"
+#include "migrator/hostile_accounts.h"
 #include "migrator/stored_names.h"
 #include "migrator/version_chain.h"
 #include "platform/platform.h"
@@ -59,6 +60,7 @@ bool AccountsDataMigrator::_migrateNewAccountsInfo(AccountsManager& store) {
   }
   // Compared without sign: a negative stored version counts as newer than every release and is left alone.
   if (storedVersion >= AccountsManager::currentVersion()) return true;
+  refuseHostileAccounts(store);
   return runVersionSteps(std::span{kSteps}, storedVersion,
                          [&](const Step& step) { return runAsStage(*this, step, store); });
 }

@@ -3,6 +3,7 @@
 import plistlib
 import resource
 import struct
+import time
 import unittest
 
 from device import CURRENT_VERSION, SETTINGS, SETTINGS_COPY, TEMPORARY, exactly
@@ -66,6 +67,37 @@ UNREADABLE = {
 }
 
 
+def folding(count):
+    """As many mail accounts of one user as calendar accounts, each of which belongs to each of them."""
+    calendars = {
+        "Type": "CalDAV",
+        "Class": "MobileCalDAVAccount",
+        "CalDAVPrincipalConfiguration": {"Login_Key": "jane", "CalDAV_Server_Key": "www.google.com"},
+        "CalDAVAccountConfiguration": {"CalDAV_PrincipalPath_Key": "/calendar/dav/jane/user"},
+    }
+    mail = {"Type": "Mail", "Class": "GmailAccount", "Username": "jane"}
+    return [{**each, "Identifier": each["Type"] + str(number)} for each in (calendars, mail) for number in range(count)]
+
+
+def of_one_identifier(count):
+    return [{"Type": "Nimbra", "Class": "NimbraAccount", "Identifier": "A", "Username": str(each)} for each in range(count)]
+
+
+def children_of_long_lists(count):
+    child = {"Type": "CalDAV", "Class": "X"}
+    listed = ["com.vorlix.Dataclass.Notes"] * 20_000
+    children = [{**child, "Identifier": str(number)} for number in range(count)]
+    parent = {"Type": "VorlixAccount", "Class": "KQAccount", "Identifier": "P"}
+    return [{**parent, "Enabled Dataclasses": listed, "ChildAccounts": children}]
+
+
+MULTIPLYING = {
+    "accounts of one identifier": of_one_identifier(350),
+    "pairs of a mail account and its calendar account": folding(300),
+    "data classes in lists that children inherit": children_of_long_lists(5_000),
+}
+
+
 class HostileSettings(DeviceTest):
     def migrate(self, content):
         device = self.device()
@@ -85,6 +117,32 @@ class HostileSettings(DeviceTest):
                 device, run = self.migrate(content)
                 self.assertEqual(EMPTY, device.read_plist(SETTINGS))
                 self.assertEqual([], run.console())
+
+    def test_accounts_that_the_steps_would_multiply_are_refused_in_words_and_left_as_they_are(self):
+        for what, accounts in MULTIPLYING.items():
+            with self.subTest(what):
+                content = plistlib.dumps({"Accounts": accounts, "Version": 0}, fmt=plistlib.FMT_BINARY)
+                device = self.device()
+                device.write(SETTINGS, content)
+                began = time.monotonic()
+                run = device.migrate(HOST)
+                self.assertLess(time.monotonic() - began, 20)  # a machine may be slow; it took minutes, or all memory
+                self.assertEqual(1, run.status, run.errors)
+                self.assertIn("The migration was given up. It is refused as hostile: it has ", run.errors[-1])
+                self.assertIn(what, run.errors[-1])
+                self.assertEqual(content, device.read(SETTINGS))
+
+    def test_an_account_nested_as_deeply_as_may_be_is_saved_below_its_new_parent(self):
+        deep = []
+        for _ in range(250):
+            deep = [deep]
+        hosted = {"Type": "Nimbra", "Class": "NimbraAccount", "Identifier": "A", "Deep": deep}
+        device = self.device()
+        device.write(SETTINGS, plistlib.dumps({"Accounts": [hosted], "Version": 0}, fmt=plistlib.FMT_BINARY))
+        run = device.migrate(HOST)
+        self.assertEqual(0, run.status, run.errors)
+        parents = [each for each in device.read_plist(SETTINGS)["Accounts"] if "ChildAccounts" in each]
+        self.assertEqual([deep], [each["ChildAccounts"][0]["Deep"] for each in parents])
 
     def test_a_small_file_takes_little_memory(self):
         content = doubled_references(30)

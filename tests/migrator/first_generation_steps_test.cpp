@@ -351,6 +351,30 @@ TEST_F(MailAndCalDAV, DeletesAPartnerOfTwoUmbrellasTwice) {
             2);
 }
 
+TEST_F(MailAndCalDAV, DeletesManyPartnersOnceForEachOfManyUmbrellas) {
+  constexpr std::size_t kEach = 60;
+  Array accounts;
+  for (std::size_t number = 0; number < kEach; ++number) {
+    accounts.emplace_back(gmail("G" + std::to_string(number), "jane"));
+    accounts.emplace_back(googlePartner("C" + std::to_string(number), "jane"));
+  }
+  load(accounts);
+  migrate();
+  EXPECT_EQ(store->count(), kEach);
+  EXPECT_EQ(device.logMessages().size(), kEach * kEach);
+}
+
+TEST_F(MailAndCalDAV, RefusesMorePairsThanAnyDeviceHas) {
+  Array accounts;
+  for (int number = 0; number < 101; ++number) {
+    accounts.emplace_back(gmail("G" + std::to_string(number), "jane"));
+    accounts.emplace_back(googlePartner("C" + std::to_string(number), "jane"));
+  }
+  load(accounts);
+  EXPECT_THROW(migrator._migrateAccountsFrom7A242(*store), std::runtime_error);
+  EXPECT_EQ(store->count(), 202U);
+}
+
 TEST_F(MailAndCalDAV, KeepsACalDAVAccountThatBelongsToNobody) {
   const Dictionary stranger = googlePartner("C", "john");
   Dictionary ofAnotherClass = googlePartner("D", "jane");
