@@ -1,5 +1,8 @@
 #include <gmock/gmock.h>
 
+#include <cstdio>
+#include <cstdlib>
+
 #include "accountsettings/device_local_account.h"
 #include "accountsettings/service_objects.h"
 #include "tests/modules/module_device.h"
@@ -7,6 +10,7 @@
 namespace tests {
 namespace {
 
+using accountsettings::AccountClassInfo;
 using accountsettings::RefreshQueueObject;
 using accountsettings::RefreshRequest;
 using accountsettings::ServiceAccountObject;
@@ -45,6 +49,28 @@ class ShippedModules : public ModuleDevice {
                                        {"Class", family + kind + "AccountCreator"}}}};
   }
 };
+
+// Destroyed after whatever a test or a module makes: made before main.
+class LastUser {
+ public:
+  const AccountClassInfo* found = nullptr;
+  ~LastUser() {
+    if (found != nullptr) std::fprintf(stderr, "found %s\n", found->name().c_str());
+  }
+};
+
+LastUser lastUser;
+
+TEST_F(ShippedModules, KeepTheClassesThatTheyAnsweredUntilTheProcessEnds) {
+  testing::GTEST_FLAG(death_test_style) = "threadsafe";  // a process of its own, from the start
+  const auto findAndEnd = [this] {
+    account({{"Type", "CalDAV"}})->fullAccountUsingLoader(nullptr);
+    const platform::ClassInfo* const creator = platform::current().classes->classNamed("DAVAccountCreator");
+    lastUser.found = dynamic_cast<const AccountClassInfo&>(*creator).classForAccountType("CalDAV");
+    std::exit(0);
+  };
+  EXPECT_EXIT(findAndEnd(), testing::ExitedWithCode(0), "found CalDAVServiceAccount");
+}
 
 struct Address {
   const char* name;
