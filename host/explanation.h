@@ -68,6 +68,7 @@ struct ExplainedRun {
   std::string_view version{};  // of the host
   std::string root{};
   std::string time{};  // of its start, as in 2026-03-07T10:15:00Z
+  double seconds = 0;  // that it took
 };
 
 // For people: by stage and account, what changed in short, and nothing of what did not. Values are cut and long lists
@@ -77,6 +78,10 @@ struct ExplainedRun {
 
 // Mail "June" (4F1C…): it has no type [dropped-no-type]
 [[nodiscard]] std::string textOf(const records::Lost& lost);
+
+// What a person has to know of the verdict, a line each: why the accounts are not saved, and each loss, with the place
+// that still has its data.
+[[nodiscard]] std::vector<std::string> warningsOf(const Verdict& verdict);
 
 // For machines: one JSON document, as docs/EXPLAIN.md describes it.
 [[nodiscard]] std::string jsonDocumentOf(const Explanation& explanation, const Verdict& verdict,

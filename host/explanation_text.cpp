@@ -118,6 +118,10 @@ std::string line(std::string_view kind, const std::string& rest) { return lineOf
 std::string shown(const Fact& fact) {
   return std::visit(
       Visitor{[](const Loaded&) { return std::string{}; }, [](const CopiedAside&) { return std::string{}; },
+              [](const KeptAside& it) {
+                return line("kept aside", (it.file.empty() ? "the settings file" : it.file) + ", as " + it.where);
+              },
+              [](const Swept& it) { return line("swept", it.file + ", which a program that was killed had left"); },
               [](const Added& it) { return line("added", shown(it.account)); },
               [](const Converted& it) {
                 const std::string instead = it.isReplacement ? ", in place of the account with this identifier" : "";
@@ -208,15 +212,21 @@ std::string ending(const Verdict& verdict) {
   return {};
 }
 
+// What was lost, with a colon; empty where the meaning of the code says it.
+std::string subjectOf(const Lost& lost) {
+  const bool isSaidByCode = lost.code == LossCode::unreadableSettingsFile || lost.code == LossCode::newerSettingsFile ||
+                            lost.code == LossCode::failedStep;
+  if (isSaidByCode) return {};
+  return (lost.account == Name{} && !lost.file.empty() ? lost.file : shown(lost.account)) + ": ";
+}
+
 std::string whereOf(const Lost& lost) {
   return lost.where.empty() ? "its data is nowhere else on the device" : "its data is still in " + lost.where;
 }
 
 std::string warnings(const Explanation& explanation, const Verdict& verdict) {
   std::string text;
-  if (verdict.kind == Verdict::Kind::notSaved)
-    text += lineOf(0, "WARNING: the accounts were not saved: " + verdict.cause);
-  for (const Lost& lost : verdict.lost) text += lineOf(0, "WARNING: lost: " + textOf(lost) + "; " + whereOf(lost));
+  for (const std::string& warning : warningsOf(verdict)) text += lineOf(0, "WARNING: " + warning);
   if (!explanation.isComplete()) {
     text += lineOf(0, "WARNING: memory ran out while the run was watched; something is missing here.");
   }
@@ -227,9 +237,15 @@ std::string warnings(const Explanation& explanation, const Verdict& verdict) {
 
 std::string textOf(const Lost& lost) {
   const LossMeaning& meaning = meaningOf(lost.code);
-  const std::string subject = lost.account == Name{} && !lost.file.empty() ? lost.file : shown(lost.account);
-  return subject + ": " + std::string{meaning.text} + (lost.detail.empty() ? "" : ": " + lost.detail) + " [" +
+  return subjectOf(lost) + std::string{meaning.text} + (lost.detail.empty() ? "" : ": " + lost.detail) + " [" +
          std::string{meaning.name} + "]";
+}
+
+std::vector<std::string> warningsOf(const Verdict& verdict) {
+  std::vector<std::string> warnings;
+  if (verdict.kind == Verdict::Kind::notSaved) warnings.push_back("the accounts were not saved: " + verdict.cause);
+  for (const Lost& lost : verdict.lost) warnings.push_back("lost: " + textOf(lost) + "; " + whereOf(lost));
+  return warnings;
 }
 
 std::string textOf(const Explanation& explanation, const Verdict& verdict, const ExplainedRun& run) {

@@ -84,12 +84,23 @@ Json ofMove(const Moved& moved) {
   return ofAccount(moved.account, moved.into ? Json{{"into", Json::array({jsonOfName(*moved.into)})}} : Json::object());
 }
 
+Json ofKeptFile(const KeptAside& kept) {
+  Json json = Json::object();
+  addUnlessEmpty("file", kept.file, json);
+  json["where"] = kept.where;
+  return json;
+}
+
 Json membersOf(const Fact& fact) {
   return std::visit(
       Visitor{[](const Loaded& it) {
                 return Json{{"accounts", it.accounts}, {"version", it.version}};
               },
               [](const CopiedAside& it) {
+                return Json{{"file", it.file}};
+              },
+              [](const KeptAside& it) { return ofKeptFile(it); },
+              [](const Swept& it) {
                 return Json{{"file", it.file}};
               },
               [](const Added& it) { return ofAccount(it.account); },

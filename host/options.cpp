@@ -29,7 +29,9 @@ constexpr std::string_view kStatuses =
     "3 the plug-in could not be loaded, 5 a snapshot could not be taken or restored,\n"
     "6 the accounts were not saved, 7 some accounts were lost (with --strict) or\n"
     "would be (with --refuse-loss),\n"
-    "8 refused, and nothing was touched: a lock could not be had, or a file may be planted.\n";
+    "8 refused, and nothing was touched: a lock could not be had, a file may be planted,\n"
+    "or the settings could neither be read nor kept, 9 the migration succeeded, but its\n"
+    "explanation, trace or metrics could not be written.\n";
 
 constexpr std::size_t kUsualColumns = 80;
 
@@ -56,6 +58,7 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--resources", "DIR", "the plug-in's resources, in place of the installed ones", &options.device.resources},
       {"--plugin", "FILE", "the plug-in to load, in place of the installed one", &options.plugin},
       {"--trace", "FILE", "append the run's events to this file, one JSON object a line", &options.trace},
+      {"--metrics", "FILE", "replace this file by the run in numbers, as OpenMetrics text", &options.metrics},
       {"--explain", "", "print what the run did to which account; =json for machines, =html as a page for a browser",
        Form{&written.explain, {"text", "json", "html"}}},
       {"--dry-run", "", "rehearse the run: the device stays as it is", Form{&written.dryRun, {}}},
@@ -180,6 +183,7 @@ void settleRun(const Written& written, Options& options) {
   options.isRehearsal = written.dryRun.has_value();
   if (options.snapshots.explained && !written.explain) throw WrongUse{"--of needs --explain"};
   if (options.isRehearsal && !isRun) throw WrongUse{"--dry-run is for a run, and this is none"};
+  if (options.metrics && !isRun) throw WrongUse{"--metrics is for a run, and this is none"};
   if (options.isStrict && !isRun) throw WrongUse{"--strict is for a run, and this is none"};
   if (options.isCareful && !isRun) throw WrongUse{"--careful is for a run, and this is none"};
   if (options.refusesLoss && !isRun) throw WrongUse{"--refuse-loss is for a run, and this is none"};
@@ -192,10 +196,11 @@ void settleRun(const Written& written, Options& options) {
 // A server's options are those of each of its rehearsals, which have no root of their own and nothing to keep.
 void settleServer(const Written& written, const Options& options) {
   if (!options.isServer) return;
-  const std::array<std::pair<bool, const char*>, 9> excluded{
+  const std::array<std::pair<bool, const char*>, 10> excluded{
       {{options.device.systemRoot.has_value(), "--root"},
        {options.device.home.has_value(), "--home"},
        {options.trace.has_value(), "--trace"},
+       {options.metrics.has_value(), "--metrics"},
        {written.explain.has_value(), "--explain"},
        {options.isRehearsal, "--dry-run"},
        {options.isStrict, "--strict"},
@@ -236,6 +241,7 @@ Options rehearsalOf(const Options& run) {
   Options options = run;
   options.device.locks.isShared = true;
   options.trace.reset();
+  options.metrics.reset();
   options.explain = Explain::json;
   options.isRehearsal = true;
   options.isStrict = options.isCareful = options.refusesLoss = false;

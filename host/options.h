@@ -35,6 +35,7 @@ struct Options {
   platform::LinuxPlatformOptions device;
   std::optional<std::filesystem::path> plugin;  // default: the installed one
   std::optional<std::filesystem::path> trace;
+  std::optional<std::filesystem::path> metrics;
   Explain explain = Explain::notAsked;
   bool isRehearsal = false;
   bool isServer = false;     // of rehearsals, in place of a run

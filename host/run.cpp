@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <chrono>
 #include <ctime>
 #include <memory>
 #include <utility>
@@ -12,12 +13,15 @@
 #include "host/explanation.h"
 #include "host/explanation_page.h"
 #include "host/foretelling.h"
+#include "host/keeping_files.h"
+#include "host/metrics.h"
 #include "host/migration_lock.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
 #include "host/run_recorder.h"
 #include "host/say.h"
 #include "host/snapshot_steps.h"
+#include "host/sweeping.h"
 #include "host/trace.h"
 #include "host/verdict.h"
 #include "platform/base_directories.h"
@@ -27,6 +31,9 @@ namespace host {
 namespace {
 
 using commandline::Ending;
+using Clock = std::chrono::system_clock;
+
+double secondsOf(Clock::duration duration) { return std::chrono::duration<double>{duration}.count(); }
 
 // What looks on at a run from outside; the trace is null where none is asked for.
 struct Onlookers {
@@ -34,9 +41,9 @@ struct Onlookers {
   std::shared_ptr<RunRecorder> recorder;
 };
 
-// The present time, as in 2026-03-07T10:15:00Z.
-std::string now() {
-  const std::time_t seconds = std::time(nullptr);
+// As in 2026-03-07T10:15:00Z.
+std::string universal(Clock::time_point time) {
+  const std::time_t seconds = Clock::to_time_t(time);
   std::tm utc{};
   gmtime_r(&seconds, &utc);
   std::array<char, 32> text{};
@@ -91,20 +98,13 @@ struct Account {
   [[nodiscard]] std::string asJson() const { return jsonDocumentOf(explanation, verdict, run); }
 };
 
-// What the state of the settings file itself tells the snapshots, they know.
-bool isToldBySnapshots(const records::Lost& lost) {
-  return lost.code == records::LossCode::unreadableSettingsFile || lost.code == records::LossCode::newerSettingsFile;
-}
-
 snapshots::RunEnd endOf(const Account& account) {
   snapshots::RunEnd end{.isMigrated = account.run.success,
                         .isSaved = account.verdict.kind != Verdict::Kind::notSaved,
                         .onlyInSnapshot = {},
                         .explanation = account.asText(),
                         .explanationAsJson = account.asJson()};
-  for (const records::Lost& lost : account.verdict.lost) {
-    if (!isToldBySnapshots(lost)) end.onlyInSnapshot.push_back(textOf(lost));
-  }
+  for (const records::Lost& lost : account.verdict.lost) end.onlyInSnapshot.push_back(textOf(lost));
   if (account.verdict.lost.empty()) end.onlyInSnapshot = account.foretold;
   return end;
 }
@@ -115,6 +115,17 @@ void endSession(snapshots::SnapshotSession* session, std::size_t keep, Account& 
   if (session->end(endOf(account), keep) != snapshots::Ended::rolledBack) return;
   say("the accounts could not be saved; the device is as it was before the run");
   account.verdict.lost.clear();
+}
+
+// On the console, without a word where everything was kept. What a snapshot is kept for, its session says.
+void sayVerdict(const Verdict& verdict, bool hasSnapshot) {
+  constexpr std::size_t kMost = 40;
+  if (hasSnapshot && verdict.kind == Verdict::Kind::lost) return;
+  const std::vector<std::string> warnings = warningsOf(verdict);
+  for (std::size_t place = 0; place < std::min(warnings.size(), kMost); ++place) say(warnings[place]);
+  if (warnings.size() > kMost) {
+    say("and " + std::to_string(warnings.size() - kMost) + " more losses, which --explain and --trace name");
+  }
 }
 
 // The accounts that stand in the settings file now; where it cannot be read, none.
@@ -135,6 +146,36 @@ std::string explanationOf(Explain how, const Account& account, const platform::M
     case Explain::html: return pageOf(account.asJson(), presentAccounts(footprint));
   }
   return {};
+}
+
+bool explain(Explain how, const Account& account, const platform::MigrationFootprint& footprint) {
+  if (how == Explain::notAsked) return true;
+  const bool isPrinted = commandline::print(explanationOf(how, account, footprint));
+  if (!isPrinted) say("the explanation could not be written to standard output");
+  return isPrinted;
+}
+
+bool endTrace(Trace& trace, const Account& account) {
+  trace.result(account.run.dataClass, account.run.success, account.verdict);
+  const platform::Status& traced = trace.outcome();
+  if (!traced.isOk()) say("the trace is incomplete: not every event could be written: " + traced.reason());
+  return traced.isOk();
+}
+
+bool measure(const std::filesystem::path& file, const Account& account) {
+  const std::string text =
+      metricsOf(account.explanation, account.verdict, account.run, secondsOf(Clock::now().time_since_epoch()));
+  const platform::Status written = writeMetrics(file, text, *platform::current().directories);
+  if (!written.isOk()) say("the metrics could not be written: " + written.description());
+  return written.isOk();
+}
+
+// Tells of the run in every way that is asked for. Answers whether all of it was written.
+bool tell(const Options& options, const Onlookers& onlookers, const Account& account,
+          const platform::MigrationFootprint& footprint) {
+  const bool isTraced = !onlookers.trace || endTrace(*onlookers.trace, account);
+  const bool isMeasured = !options.metrics || measure(*options.metrics, account);
+  return explain(options.explain, account, footprint) && isTraced && isMeasured;
 }
 
 ExitStatus statusOf(const Account& account, bool isStrict) {
@@ -172,18 +213,38 @@ std::size_t stepsAhead(const platform::MigrationFootprint& footprint) {
       std::clamp<std::int64_t>(footprint.currentVersion - stored, 0, footprint.currentVersion));
 }
 
+// Without snapshots the plug-in takes away no account that stands nowhere else. What cannot be kept ends the run.
+void keepWhatWouldGo(const platform::MigrationFootprint& footprint, const Options& options,
+                     const RunRecorder& recorder) {
+  if (options.snapshots.directory) return;
+  snapshots::Storage storage = storageFor(options);
+  const auto keeping = std::make_shared<KeepingFiles>(std::move(storage.files), std::move(storage.keeper), footprint,
+                                                      recorder.explanation());
+  const platform::Status kept = keeping->keepUnusableSettings();
+  if (!kept.isOk()) {
+    throw Ending{ExitStatus::refused, "the settings file is of no use to this run, and cannot be kept: " +
+                                          kept.description() + "; the device was not touched"};
+  }
+  platform::Platform services = platform::current();
+  services.files = keeping;
+  platform::setCurrent(std::move(services));
+}
+
 // Everything that may keep a run from beginning. Answers the session of its snapshots; null where there is none.
 std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMigrator& migrator, const Options& options,
-                                                    RunRecorder& recorder) {
+                                                    RunRecorder& recorder, Clock::time_point start) {
   commandline::progressLine().show({"the device's files are looked at"});
-  recorder.expect(stepsAhead(migrator.footprint()));
+  const platform::MigrationFootprint footprint = migrator.footprint();
+  recorder.expect(stepsAhead(footprint));
   auto session = beginRunWithSnapshots(options, migrator);
-  const platform::Status held = holdMigrationLock(migrator.footprint().lockName);
+  const platform::Status held = holdMigrationLock(footprint.lockName);
   if (!held.isOk()) {
     if (session) static_cast<void>(session->end({}, options.snapshots.keep));
     throw Ending{ExitStatus::refused, held.description() + "; the device was not touched"};
   }
+  keepWhatWouldGo(footprint, options, recorder);
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
+  sweepTemporaryFiles(storageFor(options), start);
   return session;
 }
 
@@ -193,31 +254,27 @@ std::vector<std::string> foretoldOf(const platform::DataClassMigrator& migrator,
 }
 
 ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Onlookers& onlookers) {
+  const Clock::time_point start = Clock::now();
   ExplainedRun run{.dataClass = migrator.dataClassName(),
                    .isRehearsal = options.isRehearsal,
                    .version = HOST_VERSION,
                    .root = platform::current().directories->systemRoot(),
-                   .time = now()};
+                   .time = universal(start)};
   if (onlookers.trace) onlookers.trace->start(run.version, run.root, options.given, run.time);
   const auto foretold = foretoldOf(migrator, options);
-  const auto session = prepare(migrator, options, *onlookers.recorder);
+  const auto session = prepare(migrator, options, *onlookers.recorder, start);
   run.success = migrator.performMigration();
+  run.seconds = secondsOf(Clock::now() - start);
   commandline::progressLine().end();
 
   const Explanation& explanation = onlookers.recorder->explanation();
   if (!explanation.isComplete()) say("memory ran out while the run was watched: what is said of it may be incomplete");
   Account account{explanation, verdictOf(explanation, session ? session->runSnapshot().string() : ""), run, foretold};
   endSession(session.get(), options.snapshots.keep, account);
-  if (onlookers.trace) {
-    onlookers.trace->result(run.dataClass, run.success, account.verdict);
-    const platform::Status& traced = onlookers.trace->outcome();
-    if (!traced.isOk()) say("the trace is incomplete: not every event could be written: " + traced.reason());
-  }
-  if (options.explain != Explain::notAsked &&
-      !commandline::print(explanationOf(options.explain, account, migrator.footprint()))) {
-    say("the explanation could not be written to standard output");
-  }
-  return statusOf(account, options.isStrict || (options.isRehearsal && options.refusesLoss));
+  sayVerdict(account.verdict, session != nullptr);
+  const bool isTold = tell(options, onlookers, account, migrator.footprint());
+  const ExitStatus status = statusOf(account, options.isStrict || (options.isRehearsal && options.refusesLoss));
+  return status == ExitStatus::migrated && !isTold ? ExitStatus::untold : status;
 }
 
 // A plug-in that cannot be loaded is the run's to tell.
@@ -235,8 +292,7 @@ ExitStatus run(const Options& options) {
   const Onlookers onlookers = onlookersFor(options);
   platform::setCurrent(platformFor(options, onlookers));
   if (isToBePrinted(options.snapshots)) {
-    printFromSnapshots(options.snapshots, options.explain);
-    return ExitStatus::migrated;
+    return printFromSnapshots(options.snapshots, options.explain) ? ExitStatus::migrated : ExitStatus::untold;
   }
   const auto migrator = load(options);  // first, so that nothing is touched where there is none
   if (isToBeChanged(options.snapshots)) {

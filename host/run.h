@@ -14,7 +14,8 @@ enum class ExitStatus : std::uint8_t {
   noSnapshot = 5,
   notSaved = 6,
   accountsLost = 7,  // told so where the command line is strict
-  refused = 8
+  refused = 8,
+  untold = 9  // migrated, but what is asked to be told of it could not be written
 };
 
 // What the command line asks for: a run (makes the platform, loads the plug-in, calls it once and reports), or

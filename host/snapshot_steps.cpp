@@ -28,7 +28,7 @@ snapshots::Storage storage() {
 snapshots::SessionPlace placeFor(const Options& options, platform::MigrationFootprint footprint) {
   const Path& directory = *options.snapshots.directory;
   return {.services = platform::current(),
-          .keeper = storage().keeper,
+          .keeper = storageFor(options).keeper,
           .locks = platform::makeFileLocks({.directory = directory,
                                             .manner = options.device.locks,
                                             .say = [](std::string_view line) { say(std::string{line}); }}),
@@ -43,24 +43,31 @@ snapshots::SessionPlace placeFor(const Options& options, platform::MigrationFoot
 }
 
 std::unique_ptr<SnapshotSession> rehearse(snapshots::SessionPlace place) {
-  place.keeper = makeRehearsalKeeper(std::move(place.keeper), place.services.files);
   SnapshotSession{std::move(place), Missing::isAccepted}.rehearse();
   return nullptr;
 }
 
-void printExplanation(const SnapshotOptions& options, Explain explain) {
+std::string explanationOf(const SnapshotOptions& options, Explain explain) {
   static_cast<void>(requireOwnDirectory(storage(), *options.directory, Missing::isRefused));
   const snapshots::SnapshotStore store{storage(), *options.directory};
   const std::string id = store.identifierMeantBy(*options.explained);
   const auto text =
       store.record(id, explain == Explain::text ? snapshots::kExplanation : snapshots::kExplanationAsJson);
   if (!text) throw Problem{Problem::Kind::wrongUse, "snapshot " + id + " has no explanation"};
-  static_cast<void>(commandline::print(explain == Explain::json   ? *text
-                                       : explain == Explain::html ? pageOf(*text, {})
-                                                                  : commandline::printableLines(*text)));
+  switch (explain) {
+    case Explain::json: return *text;
+    case Explain::html: return pageOf(*text, {});
+    default: return commandline::printableLines(*text);
+  }
 }
 
 }  // namespace
+
+snapshots::Storage storageFor(const Options& options) {
+  snapshots::Storage of = storage();
+  if (options.isRehearsal) of.keeper = makeRehearsalKeeper(std::move(of.keeper), of.files);
+  return of;
+}
 
 std::unique_ptr<SnapshotSession> beginRunWithSnapshots(const Options& options,
                                                        const platform::DataClassMigrator& migrator) {
@@ -80,15 +87,14 @@ bool isRunNeeded(const SnapshotOptions& options, const platform::DataClassMigrat
 
 bool isToBePrinted(const SnapshotOptions& options) { return options.explained || options.listing != Listing::none; }
 
-void printFromSnapshots(const SnapshotOptions& options, Explain explain) {
-  if (options.explained) {
-    printExplanation(options, explain);
-  } else {
-    const std::string text = options.listing == Listing::json
-                                 ? listingAsJson(storage(), *options.directory)
-                                 : commandline::printableLines(listingForPeople(storage(), *options.directory));
-    static_cast<void>(commandline::print(text));
-  }
+bool printFromSnapshots(const SnapshotOptions& options, Explain explain) {
+  const std::string text = options.explained ? explanationOf(options, explain)
+                           : options.listing == Listing::json
+                               ? listingAsJson(storage(), *options.directory)
+                               : commandline::printableLines(listingForPeople(storage(), *options.directory));
+  if (commandline::print(text)) return true;
+  say("what is asked for could not be written to standard output");
+  return false;
 }
 
 bool isToBeChanged(const SnapshotOptions& options) { return options.restore || options.isUndo || options.release; }

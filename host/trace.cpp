@@ -1,8 +1,10 @@
 #include "host/trace.h"
 
+#include <sys/stat.h>
 #include <unistd.h>
 
 #include <cerrno>
+#include <fstream>
 #include <nlohmann/json.hpp>
 #include <utility>
 
@@ -24,6 +26,16 @@ int writeLine(int descriptor, const std::string& line) {
     if (errno != EINTR) return errno;
   }
   return EINTR;
+}
+
+// How many runs begin in a file; what is no file is no older than this run.
+std::uint64_t runsIn(int descriptor) {
+  struct stat status {};
+  if (::fstat(descriptor, &status) != 0 || !S_ISREG(status.st_mode)) return 0;
+  std::ifstream lines{"/proc/self/fd/" + std::to_string(descriptor)};
+  std::uint64_t runs = 0;
+  for (std::string line; std::getline(lines, line);) runs += line.starts_with(R"({"event":"start",)") ? 1U : 0U;
+  return runs;
 }
 
 template <typename Service>
@@ -87,6 +99,8 @@ platform::Result<std::shared_ptr<Trace>> Trace::open(const std::filesystem::path
   return platform::Status::failure(file.status().errorNumber(), "open the trace file " + path.string());
 }
 
+Trace::Trace(platform::Descriptor file) : _file{std::move(file)}, _run{runsIn(_file.number()) + 1} {}
+
 void Trace::lose(int cause) noexcept {
   if (_outcome.isOk()) _outcome = platform::Status::failure(cause, "write an event");
 }
@@ -105,7 +119,7 @@ void Trace::append(const MakeEvent& makeEvent) noexcept {
 void Trace::start(std::string_view version, const std::string& root, const std::vector<std::string>& options,
                   const std::string& time) noexcept {
   append([&] {
-    return Event{{"event", "start"}, {"schema", 1},        {"version", version},
+    return Event{{"event", "start"}, {"schema", 1},        {"run", _run}, {"version", version},
                  {"root", root},     {"options", options}, {"time", time}};
   });
 }

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <cstdint>
 #include <filesystem>
 #include <functional>
 #include <memory>
@@ -29,8 +30,8 @@ class Trace {
   Trace& operator=(const Trace&) = delete;
   ~Trace() = default;
 
-  // What is about to be run: the host's version, the system's root, the options in force, and the time, as in
-  // 2026-03-07T10:15:00Z.
+  // What is about to be run: its number among the runs that are in the file, the host's version, the system's root, the
+  // options in force, and the time, as in 2026-03-07T10:15:00Z.
   void start(std::string_view version, const std::string& root, const std::vector<std::string>& options,
              const std::string& time) noexcept;
   void console(std::string_view message) noexcept;
@@ -45,12 +46,13 @@ class Trace {
   [[nodiscard]] const platform::Status& outcome() const { return _outcome; }
 
  private:
-  explicit Trace(platform::Descriptor file) : _file{std::move(file)} {}
+  explicit Trace(platform::Descriptor file);
   void lose(int cause) noexcept;
   template <typename MakeEvent>
   void append(const MakeEvent& makeEvent) noexcept;
 
   platform::Descriptor _file;
+  std::uint64_t _run;
   platform::Status _outcome;
 };
 

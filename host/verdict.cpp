@@ -24,6 +24,7 @@ class Judge {
   explicit Judge(std::string_view snapshot) : _snapshot{snapshot} {}
 
   void hear(const CopiedAside& copy) { _copy = copy.file; }
+  void hear(const KeptAside& kept) { _kept[kept.file] = kept.where; }
   void hear(const Converted& converted) {
     _sources[converted.account.identifier] = converted.file;
     _unsaved[converted.file].push_back(
@@ -62,11 +63,13 @@ class Judge {
   }
   [[nodiscard]] std::string placeOf(const Lost& lost) const {
     if (!_snapshot.empty()) return _snapshot;
+    if (const auto kept = _kept.find(lost.file); kept != _kept.end()) return kept->second;
     return lost.file.empty() ? _copy : std::string{};
   }
 
   std::string _snapshot;
   std::string _copy;                            // of the settings file
+  std::map<std::string, std::string> _kept;     // where files are kept that no run overwrites, by the file
   std::map<std::string, std::string> _sources;  // of the converted accounts, by identifier: the file
   std::map<std::string, Losses> _unsaved;       // what is lost if the file goes and nothing is saved before
   std::map<std::string, Losses> _unconverted;   // what is lost if the file goes
@@ -138,6 +141,11 @@ class Tally {
   Identifiers _converted;
 };
 
+void follow(const Explanation& explanation, Judge& judge) {
+  explanation.forEachFact(
+      [&judge](const Fact& fact) { std::visit([&judge](const auto& each) { judge.hear(each); }, fact); });
+}
+
 bool isDropped(const Lost& lost) { return meaningOf(lost.code).name.starts_with("dropped-"); }
 
 }  // namespace
@@ -153,9 +161,17 @@ std::string_view nameOf(Verdict::Kind kind) {
 
 Verdict verdictOf(const Explanation& explanation, std::string_view snapshot) {
   Judge judge{snapshot};
-  explanation.forEachFact(
-      [&judge](const Fact& fact) { std::visit([&judge](const auto& each) { judge.hear(each); }, fact); });
+  follow(explanation, judge);
   return std::move(judge).verdict();
+}
+
+Losses lossesFrom(const std::string& file, const Explanation& explanation, const Fact& next) {
+  Judge judge{{}};
+  follow(explanation, judge);
+  std::visit([&judge](const auto& each) { judge.hear(each); }, next);
+  Losses losses = std::move(judge).verdict().lost;
+  std::erase_if(losses, [&file](const Lost& lost) { return lost.file != file; });
+  return losses;
 }
 
 Counts countsOf(const Explanation& explanation, const Verdict& verdict) {

@@ -26,6 +26,10 @@ struct Verdict {
 // legacy file once that is deleted. `snapshot` says where what the run may change was kept before it; may be empty.
 [[nodiscard]] Verdict verdictOf(const Explanation& explanation, std::string_view snapshot = {});
 
+// What the verdict would name as lost from this file if the fact came next.
+[[nodiscard]] std::vector<records::Lost> lossesFrom(const std::string& file, const Explanation& explanation,
+                                                    const records::Fact& next);
+
 // How many accounts went which way, accounts within accounts left out: the first four are all that the settings have.
 struct Counts {
   std::size_t kept = 0;  // as they were

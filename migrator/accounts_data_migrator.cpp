@@ -118,7 +118,8 @@ platform::MigrationFootprint AccountsDataMigrator::footprint() const {
                     {Part::other, originalCompanionOf(exchange)},
                     {Part::other, originalCompanionOf(mail)},
                     {Part::sentinel, accountsettings::removalSentinelPath()},
-                    {Part::marker, accountsettings::mailAutoFetchMarkerPath()}}};
+                    {Part::marker, accountsettings::mailAutoFetchMarkerPath()}},
+          .copyAside = copyAsidePath()};
 }
 
 bool AccountsDataMigrator::performMigration() {
@@ -145,6 +146,8 @@ bool AccountsDataMigrator::executeMigrationSteps() {
   if (_failedToRemoveOldAccountsInfo()) {
     const platform::RunStage stage{"legacy removal"};
     writeToConsole("Detected that a removal old accounts info was in progress. Early return!.");
+    tellUnsavedExchange();
+    tellUnsavedMail();
     _removeOldAccountsInfo();
     return true;  // and leaves notifications off for the rest of the process, as this exit always has
   }

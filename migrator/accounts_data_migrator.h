@@ -40,6 +40,7 @@ class AccountsDataMigrator final : public platform::DataClassMigrator {
 
   // --- Records of the run (migration_records.cpp) ---
   void _copyAsideAccountsPlist();
+  [[nodiscard]] static platform::Path copyAsidePath();
   [[nodiscard]] static bool _saveMigrationInformation();
   void _saveCollatedMigrationInformation();
 

@@ -1,5 +1,6 @@
 #include "migrator/legacy_conversion.h"
 
+#include <set>
 #include <tuple>
 #include <utility>
 
@@ -15,6 +16,7 @@ using accountsettings::BasicAccount;
 using platform::Array;
 using platform::Dictionary;
 using platform::PropertyValue;
+using platform::Text;
 using records::LossCode;
 using records::Lost;
 
@@ -63,7 +65,43 @@ void tellRefused(const LegacySource& source, std::size_t refused) {
   }
 }
 
+// A step that gives accounts new identifiers leaves the former ones as those that they are synced by.
+void collectIdentifiers(const Array* records, std::set<std::string>& identifiers) {
+  for (std::size_t index = 0; records != nullptr && index < records->size(); ++index) {
+    const Dictionary* const record = (*records)[index].asDictionary();
+    if (record == nullptr) continue;
+    for (const auto& key : {accountsettings::kAccountIdentifier, accountsettings::kAccountSyncIdentifier}) {
+      const Text* const identifier = record->text(key);
+      if (identifier != nullptr) identifiers.insert(identifier->string());
+    }
+    collectIdentifiers(record->array(accountsettings::kAccountChildAccounts), identifiers);
+  }
+}
+
+std::set<std::string> savedIdentifiers() {
+  const auto settings =
+      platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist()).valueOr({});
+  std::set<std::string> identifiers;
+  collectIdentifiers(settings.array(accountsettings::kPlistAccountsKey), identifiers);
+  return identifiers;
+}
+
 }  // namespace
+
+void tellUnsaved(const LegacySource& source) {
+  const std::set<std::string> saved = savedIdentifiers();
+  const Array* const descriptions = source.contents.array(source.key);
+  for (std::size_t index = 0; descriptions != nullptr && index < descriptions->size(); ++index) {
+    records::Name name = nameOf((*descriptions)[index], source.renames);
+    if (saved.contains(name.identifier)) continue;
+    records::tellFact([&] {
+      return Lost{.code = LossCode::notSaved,
+                  .account = std::move(name),
+                  .detail = placeOf(source.path, source.key, index),
+                  .file = source.path};
+    });
+  }
+}
 
 void noteOrigins(AccountsManager& store, const LegacySource& source, const AccountsManager::Accounts& accounts) {
   accountsettings::ChangeTracker* const tracker = store.changeTracker();

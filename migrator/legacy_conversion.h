@@ -46,6 +46,13 @@ struct LegacySource {
 void noteOrigins(accountsettings::AccountsManager& store, const LegacySource& source,
                  const accountsettings::AccountsManager::Accounts& accounts);
 
+// Ahead of a deletion that an earlier run began, for the run's observer: each description in the legacy file of whose
+// identifier the settings have no account, since that run had not saved it; or that the file cannot be read.
+void tellUnsavedMail();
+void tellUnsavedExchange();
+// The same of one array of a file.
+void tellUnsaved(const LegacySource& source);
+
 // What earlier releases left beside a legacy file: its copy under the same name with ".original" appended.
 [[nodiscard]] std::string originalCompanionOf(const std::string& legacyPath);
 // Deletes it.

@@ -4,6 +4,8 @@
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/legacy_conversion.h"
 #include "migrator/stored_names.h"
+#include "platform/platform.h"
+#include "records/fact_observer.h"
 
 namespace migrator {
 namespace {
@@ -25,6 +27,13 @@ constexpr std::array kSwitches{Switch{"DAAccountEnabledForCalendar", kAccountDat
                                Switch{"DAAccountEnabledForContactsSearch", kAccountDataclassContactsSearch}};
 
 }  // namespace
+
+void tellUnsavedExchange() {
+  const std::string path = daAccountPath();
+  if (records::factObserver() == nullptr || !platform::current().files->kindOf(path).isOk()) return;
+  const Dictionary legacyFile = readLegacyFile(path);
+  tellUnsaved({path, legacyFile, "DAAccountsKey", kRenames});
+}
 
 std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertExchangeAccountDescription(const Dictionary& description) {
   Dictionary record = renamed(description, kRenames);

@@ -7,6 +7,7 @@
 #include "migrator/legacy_conversion.h"
 #include "migrator/stored_names.h"
 #include "platform/platform.h"
+#include "records/fact_observer.h"
 
 namespace migrator {
 namespace {
@@ -68,6 +69,14 @@ Conversion conversionOfType(std::string_view initialType) {
 }
 
 }  // namespace
+
+void tellUnsavedMail() {
+  const std::string path = mailAccountsPath();
+  if (records::factObserver() == nullptr || !platform::current().files->kindOf(path).isOk()) return;
+  const Dictionary legacyFile = readLegacyFile(path);
+  tellUnsaved({path, legacyFile, "DeliveryAccounts", kRenames});
+  tellUnsaved({path, legacyFile, "MailAccounts", kRenames});
+}
 
 Text AccountsDataMigrator::_accountTypeForMailAccountClass(std::string_view className) {
   return mailClassNamed(className).type;

@@ -50,11 +50,16 @@ void writeReport(const Path& directory, const Dictionary& report) {
 
 }  // namespace
 
+Path AccountsDataMigrator::copyAsidePath() {
+  return platform::current().directories->sharedResources() / kLogs /
+         Path{AccountsManager::fullPathToAccountSettingsPlist()}.filename();
+}
+
 void AccountsDataMigrator::_copyAsideAccountsPlist() {
   const platform::RunStage stage{"copy aside"};
   platform::FileSystem& files = *platform::current().files;
   const Path source = AccountsManager::fullPathToAccountSettingsPlist();
-  const Path destination = platform::current().directories->sharedResources() / kLogs / source.filename();
+  const Path destination = copyAsidePath();
   if (files.kindOf(destination).isOk() && !files.remove(destination).isOk()) {
     writeToConsole("Couldn't remove existing accountsettings copy at %@", destination.native());
   }

@@ -32,6 +32,7 @@ struct MigrationFootprint {
   std::string versionKey;           // under which the settings, a property list, tell their data version
   std::int64_t currentVersion = 0;  // the data version that a run leaves behind
   std::vector<MigrationFile> files;
+  std::filesystem::path copyAside;  // where a run copies the settings before it begins; empty where it does not
 };
 
 // The base of every data-class migrator plug-in: what the migration host makes and calls once after a system update.

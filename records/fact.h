@@ -51,6 +51,19 @@ struct CopiedAside {
   friend bool operator==(const CopiedAside&, const CopiedAside&) = default;
 };
 
+// A file that the run takes away, though accounts in it stand nowhere else, was kept first where no run overwrites it.
+struct KeptAside {
+  std::string file;  // empty for the settings file
+  std::string where;
+  friend bool operator==(const KeptAside&, const KeptAside&) = default;
+};
+
+// A temporary file that a program which was killed had left behind was removed.
+struct Swept {
+  std::string file;
+  friend bool operator==(const Swept&, const Swept&) = default;
+};
+
 // A new account.
 struct Added {
   Name account;
@@ -139,8 +152,8 @@ struct FileNotRemoved {
   friend bool operator==(const FileNotRemoved&, const FileNotRemoved&) = default;
 };
 
-using Fact = std::variant<Loaded, CopiedAside, Added, Converted, Changed, Moved, Folded, Lost, Repeated, Unrepaired,
-                          Saved, SaveFailed, FileRemoved, FileNotRemoved>;
+using Fact = std::variant<Loaded, CopiedAside, KeptAside, Swept, Added, Converted, Changed, Moved, Folded, Lost,
+                          Repeated, Unrepaired, Saved, SaveFailed, FileRemoved, FileNotRemoved>;
 
 // Makes one visitor of several functions; the compiler refuses one that leaves a kind of fact out.
 template <typename... Functions>
@@ -154,6 +167,7 @@ Visitor(Functions...) -> Visitor<Functions...>;
 [[nodiscard]] inline std::string_view nameOf(const Fact& fact) {
   return std::visit(
       Visitor{[](const Loaded&) { return "loaded"; }, [](const CopiedAside&) { return "copied-aside"; },
+              [](const KeptAside&) { return "kept-aside"; }, [](const Swept&) { return "swept"; },
               [](const Added&) { return "added"; }, [](const Converted&) { return "converted"; },
               [](const Changed&) { return "changed"; }, [](const Moved&) { return "moved"; },
               [](const Folded&) { return "folded"; }, [](const Lost&) { return "lost"; },

@@ -90,23 +90,12 @@ Manifest SnapshotSession::snapshotFor(Manifest description) const {
   return _store.take(std::move(description), _place.warn);
 }
 
-std::optional<std::string> SnapshotSession::settingsUnread() const {
-  for (const KeptFile& file : _run.files) {
-    if (file.part != Part::settings || !file.isPresent()) continue;
-    const auto contents = _place.services.propertyLists->readDictionary(file.path);
-    if (!contents.isOk()) return "the settings file could not be read: " + contents.status().reason();
-  }
-  if (_run.dataVersion.value_or(0) <= _place.footprint.currentVersion) return std::nullopt;
-  return "the settings file is of the newer version " + std::to_string(*_run.dataVersion);
-}
-
 std::shared_ptr<platform::FileSystem> SnapshotSession::begin() {
   requireFootprint();
   const HeldLock migration = hold(*_place.services.locks, _place.footprint.lockName);
   _store.sweep();
   recover();
   _run = snapshotFor(description(Manifest::kRun));
-  _unread = settingsUnread();
   _journal.begin(_run.id, std::nullopt);
   _watched = std::make_shared<WatchedFiles>(_storage, _run, _journal);
   return _watched;
@@ -158,7 +147,6 @@ void SnapshotSession::keepRun(const RunEnd& end) {
   attempt([&] { _store.keepRecord(_run.id, kExplanation, end.explanation); });
   attempt([&] { _store.keepRecord(_run.id, kExplanationAsJson, end.explanationAsJson); });
   _run.keptFor = end.onlyInSnapshot;
-  if (_unread) _run.keptFor.push_back(*_unread);
   if (_run.isKept()) sayWhatOnlyTheSnapshotHas();
   _run.outcome = end.isMigrated ? kMigrated : kNotMigrated;
   finish(_run);

@@ -94,7 +94,6 @@ class SnapshotSession {
   void sayLeft(const std::vector<Path>& left) const;
 
   void replaceBy(const Manifest& target, const Manifest& before);
-  [[nodiscard]] std::optional<std::string> settingsUnread() const;
   [[nodiscard]] bool hasChangedNothing() const;
   void discardRun();
   [[nodiscard]] Ended rollBack();
@@ -110,9 +109,8 @@ class SnapshotSession {
   SnapshotStore _store;
   RunJournal _journal;
   HeldLock _lock;
-  bool _isThere = true;                // the directory
-  Manifest _run;                       // the snapshot of the run that was begun
-  std::optional<std::string> _unread;  // why the settings are not what the run began with
+  bool _isThere = true;  // the directory
+  Manifest _run;         // the snapshot of the run that was begun
   std::shared_ptr<WatchedFiles> _watched;
 };
 

@@ -9,7 +9,7 @@ namespace host::snapshots {
 using platform::Status;
 
 WatchedFiles::WatchedFiles(Storage storage, const Manifest& snapshot, RunJournal journal)
-    : _storage{std::move(storage)}, _journal{std::move(journal)} {
+    : ForwardingFiles{storage.files}, _storage{std::move(storage)}, _journal{std::move(journal)} {
   for (const KeptFile& file : snapshot.files) {
     _known[file.path].insert(file.contents);
     _parts[file.path] = file.part;
@@ -52,12 +52,6 @@ Status WatchedFiles::noted(const Path& path, const Contents& contents, const Cha
   return change();
 }
 
-platform::Result<platform::FileKind> WatchedFiles::kindOf(const Path& path) { return _storage.files->kindOf(path); }
-
-platform::Result<platform::Bytes> WatchedFiles::read(const Path& path, std::size_t sizeLimit) {
-  return _storage.files->read(path, sizeLimit);
-}
-
 // A file that is made at a path of which nothing is known yet stood there in no form before.
 Status WatchedFiles::create(const Path& path, std::span<const std::uint8_t> bytes) {
   _known.try_emplace(path, std::set<std::string>{kAbsent});
@@ -79,16 +73,6 @@ Status WatchedFiles::remove(const Path& path) {
   return noted(
       path, [] { return std::string{kAbsent}; }, [&] { return _storage.files->remove(path); });
 }
-
-Status WatchedFiles::createDirectories(const Path& path, unsigned permissions) {
-  return _storage.files->createDirectories(path, permissions);
-}
-
-Status WatchedFiles::setOwner(const Path& path, std::string_view owner, std::string_view group) {
-  return _storage.files->setOwner(path, owner, group);
-}
-
-platform::Result<Path> WatchedFiles::temporaryName() { return _storage.files->temporaryName(); }
 
 Status WatchedFiles::rename(const Path& from, const Path& to) {
   return noted(

@@ -5,6 +5,7 @@
 #include <set>
 #include <string>
 
+#include "host/snapshots/forwarding_files.h"
 #include "host/snapshots/manifest.h"
 #include "host/snapshots/run_journal.h"
 
@@ -13,19 +14,14 @@ namespace host::snapshots {
 // The device's files as the plug-in gets them during a run that can be undone: each change to a file of the snapshot,
 // and each file that is newly made, is noted in the journal before it is made. A change that cannot be noted fails
 // instead. All other calls are passed on as they are.
-class WatchedFiles final : public platform::FileSystem {
+class WatchedFiles final : public ForwardingFiles {
  public:
   WatchedFiles(Storage storage, const Manifest& snapshot, RunJournal journal);
 
-  platform::Result<platform::FileKind> kindOf(const Path& path) override;
-  platform::Result<platform::Bytes> read(const Path& path, std::size_t sizeLimit) override;
   platform::Status create(const Path& path, std::span<const std::uint8_t> bytes) override;
   platform::Status replace(const Path& path, std::span<const std::uint8_t> bytes) override;
   platform::Status copy(const Path& from, const Path& to) override;
   platform::Status remove(const Path& path) override;
-  platform::Status createDirectories(const Path& path, unsigned permissions) override;
-  platform::Status setOwner(const Path& path, std::string_view owner, std::string_view group) override;
-  platform::Result<Path> temporaryName() override;
   platform::Status rename(const Path& from, const Path& to) override;
 
  private:

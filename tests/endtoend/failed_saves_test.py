@@ -20,6 +20,7 @@ SHARED_MEMORY = Path("/dev/shm")
 PR_CAPBSET_DROP = 24
 CAP_CHOWN = 0
 CAP_DAC_OVERRIDE = 1
+CAP_DAC_READ_SEARCH = 2
 
 
 def without_capabilities(*capabilities):

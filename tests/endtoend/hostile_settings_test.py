@@ -9,6 +9,7 @@ import unittest
 from device import CURRENT_VERSION, SETTINGS, SETTINGS_COPY, TEMPORARY, exactly
 from device_case import HOST, DeviceTest
 
+KEPT = SETTINGS_COPY + ".unreadable-1"
 EMPTY = {"Accounts": [], "Version": CURRENT_VERSION}
 MEBIBYTE = 1024  # of the unit in which the system counts
 REJECTED = "ERROR: Failed to create a BasicAccount from "
@@ -99,22 +100,25 @@ MULTIPLYING = {
 
 
 class HostileSettings(DeviceTest):
-    def migrate(self, content):
+    def migrate(self, content, kept=()):
         device = self.device()
+        for path in device.path(SETTINGS_COPY).parent.glob("*.unreadable-*"):
+            path.unlink()
         device.write(SETTINGS, content)
         device.path(SETTINGS).chmod(0o600)
         before = device.entries()
         run = device.migrate(HOST)
         self.assertEqual(0, run.status, run.errors)
         self.assertEqual(("result", True), (run.events[-1]["event"], run.events[-1]["success"]))
-        self.assertEqual(sorted({*before, TEMPORARY, SETTINGS_COPY}), sorted(device.entries()))
-        self.assertEqual(content, device.read(SETTINGS_COPY))
+        self.assertEqual(sorted({*before, TEMPORARY, SETTINGS_COPY, *kept}), sorted(device.entries()))
+        for path in (SETTINGS_COPY, *kept):
+            self.assertEqual(content, device.read(path))
         return device, run
 
     def test_an_unreadable_file_gives_an_empty_one(self):
         for name, content in UNREADABLE.items():
             with self.subTest(name):
-                device, run = self.migrate(content)
+                device, run = self.migrate(content, [KEPT])
                 self.assertEqual(EMPTY, device.read_plist(SETTINGS))
                 self.assertEqual([], run.console())
 
@@ -149,7 +153,7 @@ class HostileSettings(DeviceTest):
         self.assertLess(len(content), 200)
         self.migrate(plistlib.dumps(EMPTY))
         usual = resource.getrusage(resource.RUSAGE_CHILDREN).ru_maxrss
-        self.migrate(content)
+        self.migrate(content, [KEPT])
         self.assertLess(resource.getrusage(resource.RUSAGE_CHILDREN).ru_maxrss, usual + 4 * MEBIBYTE)
 
     def test_elements_of_the_wrong_kind_are_skipped_and_named(self):

@@ -79,7 +79,8 @@ class Verdicts(LossesTest):
     def test_name_every_account_of_a_legacy_file_of_which_one_is_refused(self):
         device = self.device()
         device.write_plist(LEGACY_MAIL, {"MailAccounts": [{"AccountType": "IMAPAccount", "uniqueId": "GOOD"}, {"uniqueId": "BAD"}]})
-        self.assertEqual([("refused-file", "GOOD", None), ("refused-description", "BAD", None)], self.losses(device))
+        kept = str(device.path(LEGACY_MAIL + ".unconverted-1"))
+        self.assertEqual([("refused-file", "GOOD", kept), ("refused-description", "BAD", kept)], self.losses(device))
 
     def test_name_a_legacy_file_that_cannot_be_read(self):
         device = self.device()
@@ -91,16 +92,16 @@ class Verdicts(LossesTest):
     def test_name_a_settings_file_that_cannot_be_read(self):
         device = self.device()
         device.write(SETTINGS, plistlib.dumps({"Version": CURRENT_VERSION, "Accounts": [KEPT]}, fmt=plistlib.FMT_BINARY)[:-20])
-        self.assertEqual([("unreadable-settings-file", None, str(device.path(SETTINGS_COPY)))], self.losses(device))
+        self.assertEqual([("unreadable-settings-file", None, str(device.path(SETTINGS_COPY + ".unreadable-1")))], self.losses(device))
 
     def test_name_a_converted_account_that_its_parents_record_replaces(self):
         device = self.device(Version=CURRENT_VERSION, Accounts=[PARENT])
         device.write_plist(LEGACY_MAIL, {"MailAccounts": [{"AccountType": "NimbraAccount", "uniqueId": "LEGACY"}]})
-        self.assertEqual([("replaced-duplicate", "LEGACY", None)], self.losses(device))
+        self.assertEqual([("replaced-duplicate", "LEGACY", str(device.path(LEGACY_MAIL + ".unsaved-1")))], self.losses(device))
 
     def test_name_a_settings_file_of_a_newer_version(self):
         device = self.device(Version=99, Accounts=[KEPT], Further="key")
-        self.assertEqual([("newer-settings-file", None, str(device.path(SETTINGS_COPY)))], self.losses(device))
+        self.assertEqual([("newer-settings-file", None, str(device.path(SETTINGS_COPY + ".newer-1")))], self.losses(device))
 
     def test_say_that_a_snapshot_has_the_data(self):
         device = self.device(Version=CURRENT_VERSION, Accounts=[UNFIXABLE])

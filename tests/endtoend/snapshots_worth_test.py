@@ -32,7 +32,7 @@ class Worth(SnapshotsTest):
         self.assertEqual(0, run.status)
         (snapshot,) = self.list()
         self.assertTrue(snapshot["kept"])
-        self.assertRegex(snapshot["keptFor"][0], r"^the settings file could not be read: ")
+        self.assertRegex(snapshot["keptFor"][0], r"^the settings file could not be read, .* \[unreadable-settings-file\]$")
         self.assertIn(f"migration-host:   {snapshot['keptFor'][0]}", run.errors)
         for number in range(3):
             self.edit(device, f"new {number}")
@@ -47,12 +47,13 @@ class Worth(SnapshotsTest):
         device = self.old_device()
         device.write_plist(SETTINGS, {"Version": 13, "Accounts": [], "More": "of it"})
         self.assertEqual(0, self.migrate(device).status)
-        self.assertEqual([["the settings file is of the newer version 13"]], [each["keptFor"] for each in self.list()])
+        [[kept]] = [each["keptFor"] for each in self.list()]
+        self.assertRegex(kept, r"^the settings file is of a newer version, .*: version 13 \[newer-settings-file\]$")
 
     def test_the_list_tells_why_one_is_kept(self):
         device, _ = self.unreadable()
         lines = self.work(device, "--list-snapshots").output
-        self.assertIn(f"{self.identifiers()[0]} is kept: the settings file could not be read: ", "\n".join(lines))
+        self.assertIn(f"{self.identifiers()[0]} is kept: the settings file could not be read, ", "\n".join(lines))
 
     def test_the_list_tells_of_damaged_copies(self):
         device = self.old_device()

@@ -50,7 +50,7 @@ class TraceTest(DeviceTest):
         when = calendar.timegm(time.strptime(start.pop("time"), "%Y-%m-%dT%H:%M:%SZ"))
         self.assertTrue(int(before) <= when <= time.time())
         version = self.run_host("--version").output[0].split()[-1]
-        self.assertEqual({"event": "start", "schema": 1, "version": version, "root": str(self.scratch / "device"),
+        self.assertEqual({"event": "start", "schema": 1, "run": 1, "version": version, "root": str(self.scratch / "device"),
                           "options": given}, start)
 
     def test_keeps_the_order_of_an_events_members(self):
@@ -77,6 +77,12 @@ class TraceTest(DeviceTest):
         self.run_directed("succeed", "--trace", self.trace)
         self.assertEqual(["earlier", "start", "result"], [line.split('"')[3] if '"' in line else line for line in self.lines()[:-1]])
 
+    def test_numbers_the_runs_of_a_file(self):
+        for _ in range(3):
+            self.run_directed("tell", "--trace", self.trace)
+        starts = [event for event in map(json.loads, self.lines()[:-1]) if event["event"] == "start"]
+        self.assertEqual([1, 2, 3], [start["run"] for start in starts])
+
     def test_refuses_a_symbolic_link(self):
         self.trace.symlink_to(self.scratch / "target")
         run = self.run_directed("succeed", "--trace", self.trace)
@@ -91,7 +97,7 @@ class TraceTest(DeviceTest):
 
     def test_that_cannot_be_written_is_said_to_be_incomplete(self):
         run = self.run_directed("succeed", "--trace", "/dev/full")
-        self.assertEqual((0, [f"{INCOMPLETE}No space left on device (errno 28)"]), (run.status, run.errors))
+        self.assertEqual((9, [f"{INCOMPLETE}No space left on device (errno 28)"]), (run.status, run.errors))
 
     def test_whose_reader_goes_away_does_not_end_the_run(self):
         os.mkfifo(self.trace)
@@ -99,7 +105,7 @@ class TraceTest(DeviceTest):
         reader.start()
         run = self.run_directed("tell slowly", "--trace", self.trace)
         reader.join()
-        self.assertEqual((0, f"{INCOMPLETE}Broken pipe (errno 32)"), (run.status, run.errors[-1]))
+        self.assertEqual((9, f"{INCOMPLETE}Broken pipe (errno 32)"), (run.status, run.errors[-1]))
 
 
 def read_a_little(pipe):

@@ -39,6 +39,7 @@ std::string rest(const Lost& lost) {
 std::string rest(const Fact& fact) {
   return std::visit(
       Visitor{[](const Loaded&) { return std::string{}; }, [](const CopiedAside&) { return std::string{}; },
+              [](const KeptAside&) { return std::string{}; }, [](const Swept&) { return std::string{}; },
               [](const Added& it) { return shown(it.account); },
               [](const Converted& it) {
                 return shown(it.account) + shown(it.changes) + " (" + it.from +

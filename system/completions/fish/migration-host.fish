@@ -7,6 +7,7 @@ complete -c migration-host -l shared-resources -r -a '(__fish_complete_directori
 complete -c migration-host -l resources -r -a '(__fish_complete_directories)'
 complete -c migration-host -l plugin -r -F
 complete -c migration-host -l trace -r -F
+complete -c migration-host -l metrics -r -F
 complete -c migration-host -l explain -a 'text json html'
 complete -c migration-host -l dry-run
 complete -c migration-host -l serve-rehearsals

@@ -3,7 +3,7 @@
 import itertools
 import unittest
 
-from device import CURRENT_VERSION, SETTINGS
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY
 from legacy_case import (
     CALENDARS,
     CONTACTS,
@@ -189,6 +189,7 @@ class LegacyAccountsTest(LegacyCase):
             accounts=[STANDING],
             console=[MIGRATING, failure],
             log=[decision(1, 0, 0), MISSING_CLASS, *save_of("LDAP")],
+            files=[SETTINGS, SETTINGS_COPY, LEGACY_MAIL + ".unconverted-1"],
         )
 
     def test_one_bad_mail_account_in_the_middle_keeps_all_out(self):
@@ -213,6 +214,7 @@ class LegacyAccountsTest(LegacyCase):
             accounts=[STANDING, mail_record("M1")],
             console=[MIGRATING, failure],
             log=[decision(1, 1, 0), MISSING_CLASS, REPLACING, REPLACING, *save_of("LDAP", "Mail")],
+            files=[SETTINGS, SETTINGS_COPY, LEGACY_EXCHANGE + ".unconverted-1"],
         )
 
     def test_elements_that_are_no_accounts(self):
@@ -226,6 +228,7 @@ class LegacyAccountsTest(LegacyCase):
                     accounts=[STANDING],
                     console=[MIGRATING, failure],
                     log=[decision(0, 1, 0), MISSING_CLASS, *save_of("LDAP")],
+                    files=[SETTINGS, SETTINGS_COPY, LEGACY_EXCHANGE + ".unconverted-1"],
                 )
 
     def test_values_of_odd_kinds_are_kept(self):

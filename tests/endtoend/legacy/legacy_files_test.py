@@ -51,6 +51,7 @@ class LegacyFilesTest(LegacyCase):
                     device.migrate(HOST),
                     accounts=[STANDING],
                     log=[decision(1, 0, 0), REPLACING, REPLACING, *save_of("LDAP")],
+                    files=[SETTINGS, SETTINGS_COPY, LEGACY_MAIL + ".unreadable-1"],
                 )
 
     def test_unreadable_exchange_file_is_converted_to_nothing_and_deleted(self):
@@ -62,6 +63,7 @@ class LegacyFilesTest(LegacyCase):
                     device.migrate(HOST),
                     accounts=[STANDING, mail_record("M1")],
                     log=[decision(1, 1, 0), *[REPLACING] * 3, *save_of("LDAP", "Mail")],
+                    files=[SETTINGS, SETTINGS_COPY, LEGACY_EXCHANGE + ".unreadable-1"],
                 )
 
     def test_directory_in_a_files_place_is_converted_to_nothing_and_deleted_with_what_is_in_it(self):
@@ -104,7 +106,7 @@ class LegacyFilesTest(LegacyCase):
             device.write(path + ".original", "old")
         device.write(AUTO_FETCH, "")
         self.assertEqual(0, device.migrate(HOST).status)
-        self.assert_files(device, [SETTINGS, SETTINGS_COPY])
+        self.assert_files(device, [SETTINGS, SETTINGS_COPY, LEGACY_MAIL + ".unconverted-1"])
 
     def test_companion_without_its_file_stays(self):
         device = self.device(mail=mail_file([]))
@@ -121,7 +123,7 @@ class LegacyFilesTest(LegacyCase):
         self.assertEqual([MIGRATING], run.console())
         self.assertEqual("Failed to save accounts to filesystem.", run.messages()[-1])
         self.assertEqual(before, device.read(SETTINGS))
-        self.assert_files(device, [SETTINGS, SETTINGS_COPY])
+        self.assert_files(device, [SETTINGS, SETTINGS_COPY, LEGACY_MAIL + ".unsaved-1"])
 
     def test_interrupted_deletion_is_finished_and_nothing_else_is_done(self):
         device = self.device(
@@ -134,7 +136,8 @@ class LegacyFilesTest(LegacyCase):
         self.assertEqual(0, run.status)
         self.assertEqual([EARLY_RETURN], run.console())
         self.assertEqual(["start", "console", "result"], [event["event"] for event in run.events])
-        self.assert_files(device, [SETTINGS, SETTINGS_COPY, AUTO_FETCH, RECORDS_SWITCH])
+        kept = [LEGACY_MAIL + ".unsaved-1", LEGACY_EXCHANGE + ".unsaved-1"]  # that run had not saved their accounts
+        self.assert_files(device, [SETTINGS, SETTINGS_COPY, AUTO_FETCH, RECORDS_SWITCH, *kept])
         self.assertEqual([before, before], [device.read(SETTINGS), device.read(SETTINGS_COPY)])
 
     def test_settings_are_copied_aside_as_they_were(self):

@@ -77,6 +77,22 @@ class InterruptionTest(MortalCase):
                 left = {path for path in found if path.startswith("var/") and not path.startswith(TEMPORARY)}
                 self.assertEqual({SETTINGS, SETTINGS_COPY}, left)
 
+    def test_no_interruption_makes_a_verdict_wrong(self):
+        _, changes = self.undisturbed()
+        for change in range(1, len(changes) + 1):
+            with self.subTest(before=changes[change - 1]):
+                self.assertEqual("kept", self.interrupted(change).migrate(HOST).result()["verdict"])
+
+    def test_a_deletion_that_an_earlier_run_began_spares_accounts_that_were_not_saved(self):
+        device = self.legacy_device()
+        device.write(SENTINEL, "")
+        run = device.migrate(HOST)
+        kept = {name: str(device.path(file + ".unsaved-1")) for file, name in ((LEGACY_EXCHANGE, "E1"), (LEGACY_MAIL, "M1"))}
+        lost = {each["identifier"]: (each["code"], each["where"]) for each in run.result()["lost"]}
+        self.assertEqual({"E1", "D1", "M1", "G1"}, set(lost))
+        self.assertEqual({name: ("not-saved", where) for name, where in kept.items()}, {name: lost[name] for name in kept})
+        self.assertTrue(all(os.path.exists(where) for where in kept.values()))
+
     def test_second_run_waits_for_the_first_and_goes_on_when_that_is_killed(self):
         reference, changes = self.undisturbed()
         device = self.legacy_device()

@@ -56,6 +56,7 @@ class Deaths(MortalCase):
                 run = device.migrate(HOST, *self.with_snapshots)
                 self.assertEqual(0, run.status, run.errors)
                 self.assertEqual(expected, self.outcome(device))
+                self.assertEqual("kept", run.result()["verdict"])
                 self.assertLessEqual(len(self.snapshots()), 2)
 
     def test_the_next_run_says_that_it_takes_the_device_back(self):

@@ -1,0 +1,52 @@
+#pragma once
+
+#include <filesystem>
+#include <memory>
+#include <string>
+
+#include "host/explanation.h"
+#include "host/snapshots/forwarding_files.h"
+#include "platform/data_class_migrator.h"
+#include "platform/file_keeper.h"
+
+namespace host {
+
+// The device's files as the plug-in gets them where no snapshot is taken: before a run takes away accounts that stand
+// nowhere else, the file that has them is kept under a name of which no run makes use again. The settings are copied
+// beside the copy that the run makes of them, owner, permissions and time included; a legacy file stays in its
+// directory, under another name. The name ends in why, and a number: `.unreadable-1`, `.newer-1`, `.unconverted-1`,
+// `.unsaved-1`. Of one file and reason kMost are kept, the first ones; a further one goes as the rules require, with a
+// line. What cannot be kept does not go: the call fails.
+class KeepingFiles final : public snapshots::ForwardingFiles {
+ public:
+  static constexpr int kMost = 9;
+
+  // `explanation` is the run's, as far as it is told; it outlives this object.
+  KeepingFiles(std::shared_ptr<platform::FileSystem> files, std::shared_ptr<platform::FileKeeper> keeper,
+               platform::MigrationFootprint footprint, const Explanation& explanation);
+
+  // Keeps the settings file where it has a newer version or cannot be read, ahead of a run.
+  platform::Status keepUnusableSettings();
+
+  platform::Status remove(const platform::Path& path) override;
+  platform::Status rename(const platform::Path& from, const platform::Path& to) override;
+
+ private:
+  using Path = platform::Path;
+
+  // In a few words why the settings are of no use to the run; empty where they are.
+  [[nodiscard]] std::string_view whyUnusable();
+  [[nodiscard]] std::string_view whyToldUnusable() const;
+  [[nodiscard]] platform::Status keepSettings(std::string_view why);
+  [[nodiscard]] platform::Result<platform::FileCopy> settings();
+  [[nodiscard]] platform::Result<Path> keptAs(std::string_view why, const platform::FileCopy& settings);
+  [[nodiscard]] platform::Result<Path> freeName(const Path& place, std::string_view why);
+
+  std::shared_ptr<platform::FileKeeper> _keeper;
+  platform::MigrationFootprint _footprint;
+  Path _settings;  // empty where the plug-in tells of none
+  const Explanation& _explanation;
+  bool _areSettingsKept = false;
+};
+
+}  // namespace host
