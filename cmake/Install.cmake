@@ -20,6 +20,18 @@ foreach(library accountplatform accountsettings)
   endif()
 endforeach()
 
+# The interface for programs: its headers stand by themselves, and need no more than C++17.
+if(TARGET accountsettings-client)
+  set(client_headers_dir "${CMAKE_INSTALL_INCLUDEDIR}/account-settings-client")
+  add_dependencies(product accountsettings-client)
+  target_compile_features(accountsettings-client INTERFACE cxx_std_17)
+  set_target_properties(accountsettings-client PROPERTIES EXPORT_NAME client)
+  install(TARGETS accountsettings-client EXPORT AccountSettings
+    LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT library NAMELINK_COMPONENT development
+    INCLUDES DESTINATION "${client_headers_dir}")
+  install(DIRECTORY "${CMAKE_SOURCE_DIR}/client/include/" DESTINATION "${client_headers_dir}" COMPONENT development)
+endif()
+
 function(install_program program component)
   if(TARGET ${program})
     add_dependencies(product ${program})
@@ -70,13 +82,16 @@ install(FILES
 
 file(RELATIVE_PATH prefix_from_pkgconfig "/${CMAKE_INSTALL_LIBDIR}/pkgconfig" "/")
 string(REGEX REPLACE "/$" "" prefix_from_pkgconfig "${prefix_from_pkgconfig}")
-configure_file("${CMAKE_SOURCE_DIR}/cmake/account-settings.pc.in" "${CMAKE_BINARY_DIR}/account-settings.pc" @ONLY)
-install(FILES "${CMAKE_BINARY_DIR}/account-settings.pc" DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig" COMPONENT development)
+foreach(description account-settings account-settings-client)
+  configure_file("${CMAKE_SOURCE_DIR}/cmake/${description}.pc.in" "${CMAKE_BINARY_DIR}/${description}.pc" @ONLY)
+  install(FILES "${CMAKE_BINARY_DIR}/${description}.pc"
+    DESTINATION "${CMAKE_INSTALL_LIBDIR}/pkgconfig" COMPONENT development)
+endforeach()
 
 # The build tree has the installed tree's shape, so its programs and libraries find each other by the same paths. What
 # CMake puts into a build tree otherwise ends in empty places, for which the linker searches the current directory.
 if(NOT CMAKE_SKIP_INSTALL_RPATH)
-  foreach(target accountplatform accountsettings migration-host accountctl accounts-migrator)
+  foreach(target accountplatform accountsettings accountsettings-client migration-host accountctl accounts-migrator)
     if(TARGET ${target})
       set_target_properties(${target} PROPERTIES BUILD_WITH_INSTALL_RPATH ON)
     endif()

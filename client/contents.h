@@ -1,0 +1,52 @@
+#pragma once
+
+#include <memory>
+#include <vector>
+
+#include "accounts/account_settings.h"
+#include "accountsettings/accounts_manager.h"
+#include "client/device.h"
+
+// What the values of the interface hold.
+namespace accounts {
+
+struct Value::Content {
+  platform::PropertyValue value;
+};
+
+[[nodiscard]] inline Value valueOf(platform::PropertyValue value) {
+  return Value{std::make_shared<const Value::Content>(Value::Content{std::move(value)})};
+}
+
+// The record is never changed from then on.
+struct Account::Content {
+  std::shared_ptr<const Device> device;
+  std::shared_ptr<accountsettings::BasicAccount> record;
+};
+
+[[nodiscard]] inline Account accountOf(std::shared_ptr<const Device> device,
+                                       std::shared_ptr<accountsettings::BasicAccount> record) {
+  return Account{std::make_shared<const Account::Content>(Account::Content{std::move(device), std::move(record)})};
+}
+
+// The store is never changed from then on.
+struct Accounts::Content {
+  std::shared_ptr<const Device> device;
+  std::shared_ptr<accountsettings::AccountsManager> store;
+  std::vector<Account> topLevel;
+};
+
+[[nodiscard]] inline Accounts accountsOf(const std::shared_ptr<const Device>& device,
+                                         std::shared_ptr<accountsettings::AccountsManager> store) {
+  std::vector<Account> topLevel;
+  topLevel.reserve(store->count());
+  for (const auto& record : store->allBasicAccounts()) topLevel.push_back(accountOf(device, record));
+  return Accounts{
+      std::make_shared<const Accounts::Content>(Accounts::Content{device, std::move(store), std::move(topLevel)})};
+}
+
+[[nodiscard]] Result<Edit> beginEdit(std::shared_ptr<const Device> device);
+[[nodiscard]] Result<Watch> beginWatch(std::shared_ptr<const Device> device, const Accounts& since,
+                                       Watch::Callback callback, Watch::Caller caller);
+
+}  // namespace accounts

@@ -1,0 +1,378 @@
+#include "accounts/edit.h"
+
+#include <algorithm>
+#include <cerrno>
+#include <utility>
+
+#include "client/changes.h"
+#include "client/changing_thread.h"
+
+namespace accounts {
+namespace {
+
+using accountsettings::AccountsManager;
+using accountsettings::BasicAccount;
+using accountsettings::kAccountChildAccounts;
+using accountsettings::kAccountIdentifier;
+using platform::Dictionary;
+using platform::PropertyValue;
+using platform::Text;
+using Record = std::shared_ptr<BasicAccount>;
+
+Outcome done() { return std::monostate{}; }
+Outcome failed(Code code, std::string sentence) { return Error{code, std::move(sentence)}; }
+
+Error unknownAccount(std::string_view identifier) {
+  return {Code::unknownAccount, "there is no account " + std::string{identifier}};
+}
+
+Error finished() { return {Code::finished, "the edit is over"}; }
+
+std::string nameOf(const Dictionary& account) {
+  const Text* const identifier = account.text(kAccountIdentifier);
+  return "the account " + (identifier == nullptr ? std::string{"without identifier"} : identifier->string());
+}
+
+Records recordsOf(const AccountsManager& store) {
+  Records records;
+  records.reserve(store.count());
+  for (const Record& record : store.allBasicAccounts()) records.push_back(record->properties());
+  return records;
+}
+
+// The account of an identifier: a top-level record, or the place of a child's properties in its record.
+struct Target {
+  Record record;
+  std::optional<std::size_t> child;
+};
+
+Target targetIn(const AccountsManager& store, std::string_view identifier) {
+  Record record = store.accountWithIdentifier(identifier);
+  if (record == nullptr || record->identifier() == Text{identifier}) return {std::move(record), std::nullopt};
+  const auto* const children = std::as_const(*record).properties().array(kAccountChildAccounts);
+  for (std::size_t place = children == nullptr ? 0 : children->size(); place > 0; --place) {
+    const Dictionary* const child = (*children)[place - 1].asDictionary();
+    const Text* const own = child == nullptr ? nullptr : child->text(kAccountIdentifier);
+    if (own != nullptr && *own == identifier) return {std::move(record), place - 1};
+  }
+  return {};
+}
+
+Record recordOf(const Target& target) {
+  const Dictionary& own = std::as_const(*target.record).properties();
+  if (!target.child) return BasicAccount::initWithProperties(own);
+  Record child = BasicAccount::initWithProperties(*(*own.array(kAccountChildAccounts))[*target.child].asDictionary());
+  if (child != nullptr) child->setParentAccount(BasicAccount::initWithProperties(own));
+  return child;
+}
+
+// Null where there is no such account, or it could not be loaded as it was changed.
+Record copyIn(const AccountsManager& store, std::string_view identifier) {
+  const Target target = targetIn(store, identifier);
+  return target.record == nullptr ? nullptr : recordOf(target);
+}
+
+void put(AccountsManager& store, const Target& target, Dictionary properties) {
+  if (!target.child) {
+    target.record->properties() = std::move(properties);
+    return;
+  }
+  platform::Array children = *std::as_const(*target.record).properties().array(kAccountChildAccounts);
+  children[*target.child] = std::move(properties);
+  target.record->setAccountProperty_forKey(std::move(children), kAccountChildAccounts);
+  store._loadChildrenFromAccount(target.record);
+}
+
+Dictionary propertiesOf(const Target& target) {
+  const Dictionary& own = std::as_const(*target.record).properties();
+  return target.child ? *(*own.array(kAccountChildAccounts))[*target.child].asDictionary() : own;
+}
+
+// --- Bringing a change into another store ---
+
+Outcome bringInto(AccountsManager& store, const Pair& pair) {
+  const Dictionary& named = pair.after == nullptr ? *pair.before : *pair.after;
+  const Target target = targetIn(store, *named.text(kAccountIdentifier));
+  const bool isThere = target.record != nullptr;
+  if (pair.after == nullptr) {
+    if (isThere && !target.child) store.deleteAccount(target.record);
+    return done();
+  }
+  if (pair.before == nullptr) {
+    if (isThere) return failed(Code::conflict, nameOf(named) + " was added by another program meanwhile");
+    if (const Record added = BasicAccount::initWithProperties(named)) store.insertAccount(added);
+    return done();
+  }
+  if (!isThere || target.child) {
+    return failed(Code::conflict, nameOf(named) + " was removed by another program meanwhile");
+  }
+  Dictionary& present = target.record->properties();
+  for (const std::string& key : differingKeys(pair)) {
+    const PropertyValue* const value = pair.after->find(key);
+    value == nullptr ? static_cast<void>(present.remove(key)) : present.set(key, *value);
+  }
+  store._loadChildrenFromAccount(target.record);
+  return done();
+}
+
+// --- What a save must not bring into the file ---
+
+bool couldBeLoaded(const AccountsManager& store, const Dictionary& properties) {
+  const Record record = BasicAccount::initWithProperties(properties);
+  if (record == nullptr) return false;
+  return std::ranges::all_of(store._createRuntimeFixers(), [&](const auto& fixer) {
+    return fixer->fixBasicAccountIfNeeded_loggingMessage(*record, "saving accounts") !=
+           accountsettings::FixAnswer::drop;
+  });
+}
+
+Outcome examine(const AccountsManager& store, const Pair& pair) {
+  if (pair.after == nullptr) return done();
+  const auto dropped = [](const Dictionary& account) {
+    return failed(
+        Code::wouldBeDropped,
+        nameOf(account) + " could not be loaded again: its type is unknown, or its class is missing or wrong");
+  };
+  if (!couldBeLoaded(store, *pair.after)) return dropped(*pair.after);
+  const Records before = childrenOf(pair.before);
+  const Records after = childrenOf(pair.after);
+  for (const Pair& child : differingPairs(before, after)) {
+    if (child.after != nullptr && BasicAccount::initWithProperties(*child.after) == nullptr) {
+      return dropped(*child.after);
+    }
+  }
+  return done();
+}
+
+Error failureOf(const accountsettings::SaveOutcome& outcome) {
+  const int cause = outcome.status.errorNumber();
+  const std::string sentence = "the accounts were not saved: " + outcome.status.description();
+  if (cause == ENOSPC || cause == EDQUOT) return {Code::noSpace, sentence};
+  const bool isForbidden = cause == EACCES || cause == EPERM || cause == EROFS;
+  return {isForbidden ? Code::noPermission : Code::notSaved, sentence};
+}
+
+// Saves without telling any notifier, since modules are not to run while the lock is held.
+void saveSilently(AccountsManager& store) {
+  struct Silence {
+    bool before = AccountsManager::shouldSkipNotifications();
+    Silence() { AccountsManager::_setShouldSkipNotifications(true); }
+    ~Silence() { AccountsManager::_setShouldSkipNotifications(before); }
+  } const silence;
+  store.saveAllAccounts();
+}
+
+}  // namespace
+
+struct Edit::Content {
+  std::shared_ptr<const Device> device;
+  std::unique_ptr<ChangingThread> thread;
+  std::optional<HeldLocks> locks;
+  FileIdentity file = {};
+  Store store = nullptr;
+  Records before = {};
+
+  [[nodiscard]] bool isOver() const { return !locks; }
+
+  // The store is read after its file was looked at: what is written in between is noticed, at worst needlessly.
+  Outcome read() {
+    file = FileIdentity::of(device->settingsFile());
+    Result<Store> loaded = device->load();
+    if (!loaded.isOk()) return loaded.error();
+    store = std::move(loaded).value();
+    if (!store->loadOutcome().leftOut.empty() && !device->options().mayDropUnreadable) {
+      return failed(Code::wouldDropOthers,
+                    std::to_string(store->loadOutcome().leftOut.size()) +
+                        " records of the accounts file cannot be loaded, and a save would remove them");
+    }
+    before = recordsOf(*store);
+    return done();
+  }
+
+  Outcome readAgain() {
+    const Records past = std::move(before);
+    const Records now = recordsOf(*store);
+    if (Outcome again = read(); !again.isOk()) return again;
+    for (const Pair& pair : differingPairs(past, now)) {
+      if (Outcome brought = bringInto(*store, pair); !brought.isOk()) return brought;
+    }
+    return done();
+  }
+
+  Result<Saved> write() {
+    const Within within{*device};
+    if (FileIdentity::of(device->settingsFile()) != file) {
+      if (const Outcome again = readAgain(); !again.isOk()) return again.error();
+    }
+    const Records after = recordsOf(*store);
+    const std::vector<Pair> pairs = differingPairs(before, after);
+    for (const Pair& pair : pairs) {
+      if (const Outcome sound = examine(*store, pair); !sound.isOk()) return sound.error();
+    }
+    if (pairs.empty()) return Saved{};
+    Saved saved{changesBetween(before, after, device), std::nullopt};
+    device->prepareSaving();
+    saveSilently(*store);
+    const auto& outcome = store->lastSaveOutcome();
+    return outcome.isSaved() ? Result<Saved>{std::move(saved)} : failureOf(outcome);
+  }
+
+  [[nodiscard]] std::optional<Error> announce() const {
+    if (!device->isAnnounced()) return std::nullopt;
+    const Outcome told = answerOf([this]() -> Outcome {
+      const Within within{*device};
+      if (!AccountsManager::shouldSkipNotifications()) store->_sendNotificationsForChangedAccounts();
+      return done();
+    });
+    if (told.isOk()) return std::nullopt;
+    return Error{Code::notAnnounced, "the accounts were saved, but not announced: " + told.error().sentence};
+  }
+
+  void letGo() {
+    locks.reset();
+    thread.reset();
+  }
+
+  // Changes the properties of one account by the function, which answers them.
+  template <typename Function>
+  Outcome alter(std::string_view identifier, const Function& altered) {
+    if (isOver()) return finished();
+    return answerOf([&]() -> Outcome {
+      const Within within{*device};
+      const Target target = targetIn(*store, identifier);
+      if (target.record == nullptr) return unknownAccount(identifier);
+      Result<Dictionary> properties = altered(target);
+      if (!properties.isOk()) return properties.error();
+      put(*store, target, std::move(properties).value());
+      return done();
+    });
+  }
+
+  Result<Account> addTo(const std::string& parent, const Record& record) {
+    if (parent.empty()) {
+      store->insertAccount(record);
+      return accountOf(device, BasicAccount::initWithProperties(record->properties()));
+    }
+    const Target target = targetIn(*store, parent);
+    if (target.record == nullptr) return unknownAccount(parent);
+    if (target.child) return Error{Code::unsuitable, "a child account cannot have children"};
+    store->addChild_toAccount(record, target.record);
+    return accountOf(device, copyIn(*store, *record->identifier()));
+  }
+};
+
+Edit::Edit(std::unique_ptr<Content> content) : _content{std::move(content)} {}
+Edit::Edit(Edit&&) noexcept = default;
+Edit& Edit::operator=(Edit&&) noexcept = default;
+Edit::~Edit() = default;
+
+Result<Edit> beginEdit(std::shared_ptr<const Device> device) {
+  auto thread = std::make_unique<ChangingThread>(device->settingsFile());
+  if (!thread->isFirst()) return Error{Code::nested, "this thread is changing the accounts already"};
+  Result<HeldLocks> locks = device->takeLocks();
+  if (!locks.isOk()) return locks.error();
+  auto content =
+      std::make_unique<Edit::Content>(Edit::Content{std::move(device), std::move(thread), std::move(locks).value()});
+  if (const Outcome loaded = content->read(); !loaded.isOk()) return loaded.error();
+  return Edit{std::move(content)};
+}
+
+std::vector<Account> Edit::accounts() const {
+  std::vector<Account> accounts;
+  const Within within{*_content->device};
+  for (const Dictionary& properties : recordsOf(*_content->store)) {
+    if (Record record = BasicAccount::initWithProperties(properties)) {
+      accounts.push_back(accountOf(_content->device, std::move(record)));
+    }
+  }
+  return accounts;
+}
+
+std::optional<Account> Edit::account(std::string_view identifier) const {
+  const Within within{*_content->device};
+  Record record = copyIn(*_content->store, identifier);
+  return record == nullptr ? std::nullopt : std::optional{accountOf(_content->device, std::move(record))};
+}
+
+Result<Account> Edit::add(const NewAccount& account) {
+  if (_content->isOver()) return finished();
+  return answerOf([&]() -> Result<Account> {
+    const Within within{*_content->device};
+    Dictionary properties{{accountsettings::kAccountType, account.type},
+                          {accountsettings::kAccountClass, account.accountClass}};
+    for (const auto& [key, value] : account.properties) properties.set(key, value.content().value);
+    const Record record = BasicAccount::initWithProperties(properties);
+    if (record == nullptr || !record->identifier()) {
+      return Error{Code::wouldBeDropped, "no account can be of the type \"" + account.type + "\" and the class \"" +
+                                             account.accountClass + "\""};
+    }
+    const Text identifier = *record->identifier();
+    if (targetIn(*_content->store, identifier).record != nullptr) {
+      return Error{Code::alreadyThere, "there is an account " + identifier.string() + " already"};
+    }
+    return _content->addTo(account.parentIdentifier, record);
+  });
+}
+
+Outcome Edit::remove(std::string_view identifier) {
+  if (_content->isOver()) return finished();
+  return answerOf([&]() -> Outcome {
+    const Within within{*_content->device};
+    const Target target = targetIn(*_content->store, identifier);
+    if (target.record == nullptr) return unknownAccount(identifier);
+    if (target.child) {
+      _content->store->removeChildWithIdentifier_fromAccount(identifier, target.record);
+    } else {
+      _content->store->deleteAccount(target.record);
+    }
+    return done();
+  });
+}
+
+namespace {
+
+bool isKept(std::string_view key) { return key == kAccountIdentifier || key == kAccountChildAccounts; }
+
+Outcome keptKey(std::string_view key) { return failed(Code::unsuitable, std::string{key} + " cannot be changed"); }
+
+}  // namespace
+
+Outcome Edit::set(std::string_view identifier, std::string_view key, const Value& value) {
+  if (isKept(key)) return keptKey(key);
+  return _content->alter(identifier, [&](const Target& target) -> Result<Dictionary> {
+    Dictionary properties = propertiesOf(target);
+    properties.set(key, value.content().value);
+    return properties;
+  });
+}
+
+Outcome Edit::erase(std::string_view identifier, std::string_view key) {
+  if (isKept(key)) return keptKey(key);
+  return _content->alter(identifier, [&](const Target& target) -> Result<Dictionary> {
+    Dictionary properties = propertiesOf(target);
+    properties.remove(key);
+    return properties;
+  });
+}
+
+Outcome Edit::setEnabled(std::string_view identifier, std::string_view dataclass, bool enabled) {
+  return _content->alter(identifier, [&](const Target& target) -> Result<Dictionary> {
+    const Record record = recordOf(target);
+    const auto& supported = record == nullptr ? BasicAccount::Dataclasses{} : record->supportedDataclasses();
+    if (std::ranges::find(supported, Text{dataclass}) == supported.end()) {
+      return Error{Code::unsuitable, nameOf(propertiesOf(target)) + " cannot have " + std::string{dataclass}};
+    }
+    record->setEnabled_forDataclass(enabled, dataclass);
+    return record->properties();
+  });
+}
+
+Result<Saved> Edit::save() {
+  if (_content->isOver()) return finished();
+  Result<Saved> saved = answerOf([this] { return _content->write(); });
+  _content->letGo();
+  if (saved.isOk() && !saved.value().changes.empty()) saved.value().notAnnounced = _content->announce();
+  return saved;
+}
+
+}  // namespace accounts

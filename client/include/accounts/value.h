@@ -1,0 +1,70 @@
+#pragma once
+
+#include <cstdint>
+#include <memory>
+#include <optional>
+#include <string>
+#include <string_view>
+#include <utility>
+#include <vector>
+
+#include "accounts/result.h"
+
+namespace accounts {
+
+// A point in time: seconds since 2001-01-01 00:00:00 UTC, fractions and earlier times included.
+struct Date {
+  double secondsSince2001 = 0;
+};
+
+// The value of a property. It never changes, copies share what they hold, and any thread may read it.
+//
+// Reads are total: they answer nothing for a value of another kind. Text is UTF-8; what is malformed, and NUL, is
+// replaced by U+FFFD.
+class ACCOUNTS_API Value {
+ public:
+  // `other` is a kind that files may hold and nobody reads; it may be passed on.
+  enum class Kind : std::int32_t { text, integer, real, boolean, date, data, list, dictionary, other };
+  using Data = std::vector<std::uint8_t>;
+  using List = std::vector<Value>;
+  using Dictionary = std::vector<std::pair<std::string, Value>>;  // in the file's order; of one key the last counts
+
+  Value();  // an empty text
+  Value(const char* text);
+  Value(std::string_view text);
+  Value(const std::string& text);
+  Value(bool boolean);
+  Value(int integer);
+  Value(std::int64_t integer);
+  Value(std::uint64_t integer);
+  Value(double real);
+  Value(Date date);
+  Value(Data data);
+  Value(const List& list);
+  Value(const Dictionary& dictionary);
+  Value(const void*) = delete;
+
+  [[nodiscard]] Kind kind() const;
+  [[nodiscard]] std::optional<std::string> text() const;
+  [[nodiscard]] std::optional<std::int64_t> integer() const;           // nothing above the signed range
+  [[nodiscard]] std::optional<std::uint64_t> unsignedInteger() const;  // nothing below zero
+  [[nodiscard]] std::optional<double> real() const;
+  [[nodiscard]] std::optional<bool> boolean() const;
+  [[nodiscard]] std::optional<Date> date() const;
+  [[nodiscard]] std::optional<Data> data() const;
+  [[nodiscard]] std::optional<List> list() const;
+  [[nodiscard]] std::optional<Dictionary> dictionary() const;
+
+  // Deep and exact: 1, 1.0 and true are three different values; a dictionary's order does not count.
+  friend ACCOUNTS_API bool operator==(const Value& left, const Value& right);
+  friend bool operator!=(const Value& left, const Value& right) { return !(left == right); }
+
+  struct Content;  // internal
+  explicit Value(std::shared_ptr<const Content> content);
+  [[nodiscard]] const Content& content() const { return *_content; }
+
+ private:
+  std::shared_ptr<const Content> _content;
+};
+
+}  // namespace accounts

@@ -1,0 +1,110 @@
+#include <fcntl.h>
+#include <sys/file.h>
+
+#include <thread>
+
+#include "tests/support/device_with_accounts.h"
+
+namespace tests {
+namespace {
+
+using accounts::AccountSettings;
+using accounts::Code;
+
+class OpeningAccountSettings : public DeviceWithAccounts {
+ protected:
+  [[nodiscard]] Code whyNot() const { return codeOf(AccountSettings::open(options())); }
+
+  // Holds the migration lock as a process that migrates does.
+  [[nodiscard]] int heldLock() const {
+    device.root.put(kLock, "");
+    const int file = ::open((device.root / kLock).c_str(), O_RDONLY | O_CLOEXEC);
+    ::flock(file, LOCK_EX);
+    return file;
+  }
+};
+
+TEST_F(OpeningAccountSettings, SaysThatTheFileIsMissing) {
+  std::filesystem::remove(device.root / kSettings);
+  EXPECT_EQ(whyNot(), Code::missing);
+}
+
+TEST_F(OpeningAccountSettings, TakesAMissingFileForNoAccountsWhereItMay) {
+  std::filesystem::remove(device.root / kSettings);
+  auto may = options();
+  may.mayBeMissing = true;
+  EXPECT_TRUE(opened(may).accounts().value().empty());
+}
+
+TEST_F(OpeningAccountSettings, SaysThatAnEarlierReleasesFileIsNotMigrated) {
+  putAccounts(kAccounts, 11);
+  EXPECT_EQ(whyNot(), Code::notMigrated);
+}
+
+TEST_F(OpeningAccountSettings, SaysThatLegacyFilesAreNotMigrated) {
+  std::filesystem::remove(device.root / kSettings);
+  device.put("var/mobile/Library/Mail/Accounts.plist", "");
+  EXPECT_EQ(whyNot(), Code::notMigrated);
+}
+
+TEST_F(OpeningAccountSettings, SaysThatALaterReleasesFileIsNewer) {
+  putAccounts(kAccounts, 13);
+  EXPECT_EQ(whyNot(), Code::newer);
+}
+
+TEST_F(OpeningAccountSettings, SaysThatADamagedFileIsUnreadable) {
+  device.root.put(kSettings, "bplist00 and nothing more");
+  EXPECT_EQ(whyNot(), Code::unreadable);
+}
+
+TEST_F(OpeningAccountSettings, RefusesAFileThatAnybodyMayHavePlanted) {
+  std::filesystem::permissions((device.root / kSettings).parent_path(), std::filesystem::perms::all);
+  std::filesystem::create_hard_link(device.root / kSettings, device.root / "second");
+  EXPECT_EQ(whyNot(), Code::refused);
+}
+
+TEST_F(OpeningAccountSettings, SaysHowTheFileIsCalledAndWhatIsWrong) {
+  putAccounts(kAccounts, 13);
+  const auto result = AccountSettings::open(options());
+  EXPECT_EQ(result.error().sentence, (device.root / kSettings).string() + " has data version 13, a later release's");
+}
+
+TEST_F(OpeningAccountSettings, GivesAMigrationNoMoreThanTheTimeLimit) {
+  const int lock = heldLock();
+  EXPECT_EQ(whyNot(), Code::busy);
+  ::close(lock);
+}
+
+TEST_F(OpeningAccountSettings, WaitsForAMigrationAndSeesWhatItLeft) {
+  const int lock = heldLock();
+  putAccounts(kAccounts, 3);
+  std::thread migration{[&] {
+    std::this_thread::sleep_for(50ms);
+    replaceAccounts(account("A"));
+    ::close(lock);
+  }};
+  const auto accounts = looked();
+  migration.join();
+  EXPECT_TRUE(accounts.withIdentifier("A").has_value());
+}
+
+TEST_F(OpeningAccountSettings, LeavesEverythingOnTheDeviceAsItIs) {
+  const std::string before = device.root.contents(kSettings);
+  static_cast<void>(looked());
+  EXPECT_EQ(device.root.contents(kSettings), before);
+  EXPECT_FALSE(std::filesystem::exists(device.root / "tmp"));
+}
+
+TEST_F(OpeningAccountSettings, OpensSeveralDevicesInOneProcess) {
+  const RealDevice other;
+  other.put(kSettings, "<key>Accounts</key><array/><key>Version</key><integer>12</integer>");
+  auto elsewhere = options();
+  elsewhere.root = other.root.path();
+  const AccountSettings first = opened();
+  const AccountSettings second = opened(elsewhere);
+  EXPECT_EQ(first.accounts().value().size(), 2U);
+  EXPECT_EQ(second.accounts().value().size(), 0U);
+}
+
+}  // namespace
+}  // namespace tests
