@@ -1,6 +1,6 @@
 # What `cmake --install` leaves behind: a tree in which everything finds everything else from wherever the tree stands.
 # Each file belongs to one component: library (what programs that use accounts need to run), development (what they need
-# to build), host (what a device needs to migrate), tools, rehearse, documents. The packages are made of them.
+# to build), host (what a device needs to migrate), tools, rehearse, python, documents. The packages are made of them.
 
 include(CMakePackageConfigHelpers)
 
@@ -29,7 +29,8 @@ if(TARGET accountsettings-client)
   install(TARGETS accountsettings-client EXPORT AccountSettings
     LIBRARY DESTINATION "${CMAKE_INSTALL_LIBDIR}" COMPONENT library NAMELINK_COMPONENT development
     INCLUDES DESTINATION "${client_headers_dir}")
-  install(DIRECTORY "${CMAKE_SOURCE_DIR}/client/include/" DESTINATION "${client_headers_dir}" COMPONENT development)
+  install(DIRECTORY "${CMAKE_SOURCE_DIR}/client/include/" "${CMAKE_SOURCE_DIR}/bindings/include/"
+    DESTINATION "${client_headers_dir}" COMPONENT development)
 endif()
 
 function(install_program program component)

@@ -8,7 +8,7 @@ set(CPACK_PACKAGE_DIRECTORY "${CMAKE_BINARY_DIR}/packages")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
 set(CPACK_DEBIAN_DEBUGINFO_PACKAGE ON)  # strips, too, and puts the symbols into packages of their own
 set(CPACK_VERBATIM_VARIABLES ON)
-set(CPACK_COMPONENTS_ALL library development host tools rehearse documents)
+set(CPACK_COMPONENTS_ALL library development host tools rehearse python documents)
 set(CPACK_PRE_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/FinishPackages.cmake")
 set(CPACK_POST_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/TrimPackages.cmake")
 set(CPACK_PACKAGING_SOURCES "${CMAKE_SOURCE_DIR}/packaging")
@@ -62,6 +62,11 @@ What the upgrade of the account settings does step by step, how it is put into
 a device and operated, and how programs and modules are written for it, with
 example devices, an example program and an example module.")
 set(CPACK_DEBIAN_DOCUMENTS_PACKAGE_ARCHITECTURE all)
+debian_package(PYTHON python3-account-settings python
+  "${library_package} (>= ${PROJECT_VERSION}), python3 (>= 3.11)" "accounts of a device - Python module
+The module account_settings lists, changes and watches the accounts of a
+device.")
+set(CPACK_DEBIAN_PYTHON_PACKAGE_ARCHITECTURE all)
 
 # control_files(COMPONENT FILE...): packaging/COMPONENT.FILE as the package's control file FILE.
 function(control_files component)

@@ -22,6 +22,7 @@ SOURCES = Path(os.environ["SOURCE_TREE"])
 DOCUMENTS = [
     "README.md", "CONTRIBUTING.md", "docs/ACCOUNTCTL.md", "docs/ARCHITECTURE.md", "docs/CONFIGURATION.md",
     "docs/EXPLAIN.md", "docs/FLEET.md", "docs/FORMAT.md", "docs/INTEGRATION.md", "docs/MESSAGES.md", "docs/MODULES.md", "docs/OPERATIONS.md", "docs/RELIABILITY.md", "docs/SNAPSHOTS.md",
+    "docs/CLIENTS.md",
 ]
 # It tells of a device after its update.
 MIGRATED = "docs/OPERATIONS.md"

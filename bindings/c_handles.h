@@ -1,0 +1,129 @@
+#pragma once
+
+#include <exception>
+#include <memory>
+#include <new>
+#include <optional>
+#include <string>
+#include <utility>
+#include <vector>
+
+#include "account-settings.h"
+#include "accounts/account_settings.h"
+
+// What the handles of the C interface are. Strings are kept beside what they are of, since a handle lends them.
+
+struct account_settings {
+  accounts::AccountSettings settings;
+};
+
+struct account_settings_error {
+  std::int32_t code;
+  std::string sentence;
+};
+
+struct account_settings_value {
+  explicit account_settings_value(accounts::Value given)
+      : value{std::move(given)}, text{value.text()}, data{value.data()} {
+    if (const auto list = value.list()) elements = *list;
+    for (auto& [key, element] : value.dictionary().value_or(accounts::Value::Dictionary{})) {
+      keys.push_back(key);
+      elements.push_back(std::move(element));
+    }
+  }
+
+  accounts::Value value;
+  std::optional<std::string> text;
+  std::optional<accounts::Value::Data> data;
+  accounts::Value::List elements = {};
+  std::vector<std::string> keys = {};  // of a dictionary, in the places of its elements
+};
+
+struct account_settings_account {
+  explicit account_settings_account(accounts::Account given)
+      : account{std::move(given)},
+        identifier{account.identifier()},
+        type{account.type()},
+        accountClass{account.accountClass()},
+        displayName{account.displayName()},
+        username{account.username()},
+        syncIdentifier{account.syncIdentifier()},
+        parent{account.parentIdentifier()} {}
+
+  accounts::Account account;
+  std::string identifier;
+  std::string type;
+  std::string accountClass;
+  std::optional<std::string> displayName;
+  std::optional<std::string> username;
+  std::optional<std::string> syncIdentifier;
+  std::string parent;
+};
+
+struct account_settings_accounts {
+  std::vector<accounts::Account> list;
+  std::optional<accounts::Accounts> whole;  // where they are all accounts of a device
+};
+
+struct account_settings_edit {
+  accounts::Edit edit;
+};
+
+struct account_settings_changes {
+  std::vector<accounts::Change> changes;
+  std::optional<accounts::Error> notAnnounced;
+};
+
+struct account_settings_watch {
+  accounts::Watch watch;
+};
+
+namespace accounts::c {
+
+// What the function answers; where it cannot for want of memory, the other value.
+template <typename Function, typename Otherwise>
+auto orElse(Otherwise otherwise, const Function& function) noexcept -> decltype(function()) {
+  try {
+    return function();
+  } catch (const std::exception&) {
+    return otherwise;
+  }
+}
+
+inline void tell(account_settings_error** error, std::int32_t code, const std::string& sentence) noexcept {
+  if (error == nullptr) return;
+  *error = orElse(static_cast<account_settings_error*>(nullptr), [&] {
+    return new account_settings_error{code, sentence};
+  });
+}
+
+// The handle that the function makes of what it is answered, or null and the error.
+template <typename Function>
+auto made(account_settings_error** error, const Function& function) noexcept -> decltype(function()) {
+  if (error != nullptr) *error = nullptr;
+  try {
+    return function();
+  } catch (const std::exception&) {
+    tell(error, ACCOUNT_SETTINGS_NO_MEMORY, "");
+    return {};
+  }
+}
+
+template <typename Answer>
+bool isDone(const accounts::Result<Answer>& result, account_settings_error** error) {
+  if (!result.isOk()) tell(error, static_cast<std::int32_t>(result.error().code), result.error().sentence);
+  return result.isOk();
+}
+
+template <typename Handle, typename Content>
+Handle* handle(std::optional<Content> content) {
+  return content ? new Handle{*std::move(content)} : nullptr;
+}
+
+template <typename Content>
+bool put(const std::optional<Content>& content, Content* place) {
+  if (content && place != nullptr) *place = *content;
+  return content.has_value();
+}
+
+}  // namespace accounts::c

@@ -1,0 +1,258 @@
+"""The C interface as Python calls it: functions by their name, handles that free themselves, values both ways."""
+
+from __future__ import annotations
+
+import ctypes
+from collections.abc import Iterator, Mapping
+from contextlib import contextmanager
+from ctypes import POINTER, byref, c_bool, c_char_p, c_double, c_int, c_int32, c_int64, c_size_t, c_uint32, c_uint64, c_void_p
+from datetime import datetime, timedelta, timezone
+from enum import IntEnum
+from typing import Any, Union
+
+Property = Union[str, int, float, bool, datetime, bytes, "list[Property]", "dict[str, Property]", "Opaque"]
+
+CALLBACK = ctypes.CFUNCTYPE(None, c_void_p, c_void_p)
+MOST = 2**31
+_EPOCH = datetime(2001, 1, 1, tzinfo=timezone.utc)
+_library = ctypes.CDLL("libaccountsettings-client.so.1")
+
+
+class Code(IntEnum):
+    """Why something was not done."""
+
+    MISSING = 1
+    NOT_MIGRATED = 2
+    NEWER = 3
+    UNREADABLE = 4
+    REFUSED = 5
+    NO_PERMISSION = 6
+    BUSY = 7
+    NESTED = 8
+    NO_SPACE = 9
+    NOT_SAVED = 10
+    WOULD_BE_DROPPED = 11
+    WOULD_DROP_OTHERS = 12
+    UNKNOWN_ACCOUNT = 13
+    ALREADY_THERE = 14
+    UNSUITABLE = 15
+    CONFLICT = 16
+    CANCELLED = 17
+    FINISHED = 18
+    NOT_ANNOUNCED = 19
+    NOT_WATCHED = 20
+    BROKEN_INSTALLATION = 21
+    NO_MEMORY = 22
+
+
+class AccountSettingsError(Exception):
+    """Something was not done: `code` says why to the program, the text to people."""
+
+    def __init__(self, code: int, sentence: str):
+        super().__init__(sentence)
+        #: A `Code`; a plain number where a later release of the library has a new one.
+        self.code: int = Code(code) if code in list(Code) else code
+
+
+# What each function answers and takes, without the error that the last ones of the table tell by.
+_TEXT, _HANDLE, _SIZE = c_char_p, c_void_p, c_size_t
+_PLAIN = {
+    "error_code": (c_int32, _HANDLE), "error_sentence": (_TEXT, _HANDLE),
+    "accounts_count": (_SIZE, _HANDLE), "accounts_at": (_HANDLE, _HANDLE, _SIZE),
+    "accounts_find": (_HANDLE, _HANDLE, _TEXT), "accounts_find_sync": (_HANDLE, _HANDLE, _TEXT),
+    "accounts_of_type": (_HANDLE, _HANDLE, _TEXT), "accounts_with_dataclass": (_HANDLE, _HANDLE, _TEXT),
+    **{f"account_{name}": (_TEXT, _HANDLE) for name in (
+        "identifier", "type", "class", "display_name", "username", "sync_identifier", "parent")},
+    **{f"account_{name}": (_HANDLE, _HANDLE) for name in ("children", "supported", "enabled", "properties")},
+    "account_is_enabled": (c_bool, _HANDLE, _TEXT), "account_property": (_HANDLE, _HANDLE, _TEXT),
+    "account_integer": (c_bool, _HANDLE, _TEXT, POINTER(c_int64)),
+    "account_boolean": (c_bool, _HANDLE, _TEXT, POINTER(c_bool)),
+    "value_kind": (c_int32, _HANDLE), "value_text": (_TEXT, _HANDLE),
+    "value_integer": (c_bool, _HANDLE, POINTER(c_int64)), "value_unsigned": (c_bool, _HANDLE, POINTER(c_uint64)),
+    "value_real": (c_bool, _HANDLE, POINTER(c_double)), "value_boolean": (c_bool, _HANDLE, POINTER(c_bool)),
+    "value_date": (c_bool, _HANDLE, POINTER(c_double)), "value_data": (_HANDLE, _HANDLE, POINTER(_SIZE)),
+    "value_count": (_SIZE, _HANDLE), "value_at": (_HANDLE, _HANDLE, _SIZE), "value_key_at": (_TEXT, _HANDLE, _SIZE),
+    "value_of_text": (_HANDLE, _TEXT), "value_of_integer": (_HANDLE, c_int64), "value_of_unsigned": (_HANDLE, c_uint64),
+    "value_of_real": (_HANDLE, c_double), "value_of_boolean": (_HANDLE, c_bool), "value_of_date": (_HANDLE, c_double),
+    "value_of_data": (_HANDLE, _TEXT, _SIZE), "value_of_list": (_HANDLE,), "value_of_dictionary": (_HANDLE,),
+    "value_append": (c_bool, _HANDLE, _HANDLE), "value_set": (c_bool, _HANDLE, _TEXT, _HANDLE),
+    "edit_accounts": (_HANDLE, _HANDLE), "edit_find": (_HANDLE, _HANDLE, _TEXT),
+    "changes_count": (_SIZE, _HANDLE), "changes_kind": (c_int32, _HANDLE, _SIZE),
+    "changes_account": (_HANDLE, _HANDLE, _SIZE), "changes_key": (_TEXT, _HANDLE, _SIZE, _SIZE),
+    "changes_not_announced": (_TEXT, _HANDLE),
+    "watch_descriptor": (c_int, _HANDLE), "watch_dispatch": (None, _HANDLE),
+    **{name + "free": (None, _HANDLE) for name in (
+        "", "error_", "account_", "accounts_", "value_", "edit_", "changes_", "watch_")},
+}
+_FAILING = {
+    "open": (_HANDLE, _TEXT, c_int64, c_uint32), "look": (_HANDLE, _HANDLE), "edit_begin": (_HANDLE, _HANDLE),
+    "edit_add": (_HANDLE, _HANDLE, _TEXT, _TEXT, _HANDLE, _TEXT), "edit_remove": (c_bool, _HANDLE, _TEXT),
+    "edit_set": (c_bool, _HANDLE, _TEXT, _TEXT, _HANDLE), "edit_erase": (c_bool, _HANDLE, _TEXT, _TEXT),
+    "edit_set_enabled": (c_bool, _HANDLE, _TEXT, _TEXT, c_bool), "edit_save": (_HANDLE, _HANDLE),
+    "watch_begin": (_HANDLE, _HANDLE, _HANDLE, CALLBACK, c_void_p, c_int32),
+}
+
+
+def _declared(name: str, signature: tuple, *more: Any) -> Any:
+    function = getattr(_library, "account_settings_" + name)
+    function.restype, *arguments = signature
+    function.argtypes = [*arguments, *more]
+    return function
+
+
+_functions = {name: _declared(name, signature) for name, signature in _PLAIN.items()}
+_attempts = {name: _declared(name, signature, POINTER(_HANDLE)) for name, signature in _FAILING.items()}
+
+
+class Handle:
+    """What the library handed out, freed when nobody has it any more."""
+
+    def __init__(self, kind: str, pointer: int):
+        self._free = _functions[kind + "_free" if kind else "free"]
+        self._as_parameter_: int | None = pointer
+
+    def free(self) -> None:
+        pointer, self._as_parameter_ = self._as_parameter_, None
+        if pointer:
+            self._free(pointer)
+
+    def __del__(self) -> None:
+        self.free()
+
+
+def handle(kind: str, pointer: int | None) -> Handle:
+    """The handle of what was handed out; nothing is handed out for want of memory only."""
+    if not pointer:
+        raise MemoryError
+    return Handle(kind, pointer)
+
+
+def call(name: str, *arguments: Any) -> Any:
+    return _functions[name](*arguments)
+
+
+def attempt(name: str, *arguments: Any) -> Any:
+    """What the function answers, or the error that it tells."""
+    error = c_void_p()
+    answer = _attempts[name](*arguments, byref(error))
+    if not error.value:
+        if not answer:
+            raise MemoryError
+        return answer
+    told = Handle("error", error.value)
+    code = call("error_code", told)
+    if code == Code.NO_MEMORY:
+        raise MemoryError
+    raise AccountSettingsError(code, call("error_sentence", told).decode())
+
+
+def encoded(text: str) -> bytes:
+    """The text for C, which ends it at the first NUL."""
+    if "\0" in text:
+        raise ValueError("a text with a NUL")
+    return text.encode()
+
+
+class Opaque:
+    """A value of a kind that nobody reads; it can be given back as it is."""
+
+    def __init__(self, value: Handle):
+        self._as_parameter_ = value
+
+
+def _read(name: str, kind: Any, value: Handle) -> Any:
+    place = kind()
+    return place.value if call("value_" + name, value, byref(place)) else None
+
+
+def _data(value: Handle) -> bytes:
+    size = c_size_t()
+    return ctypes.string_at(call("value_data", value, byref(size)), size.value)
+
+
+def _elements(value: Handle) -> Iterator[Any]:
+    for place in range(call("value_count", value)):
+        yield python_value(call("value_at", value, place))
+
+
+def _dictionary(value: Handle) -> dict[str, Any]:
+    return {call("value_key_at", value, place).decode(): each for place, each in enumerate(_elements(value))}
+
+
+def _integer(value: Handle) -> int:
+    signed = _read("integer", c_int64, value)
+    return signed if signed is not None else _read("unsigned", c_uint64, value)
+
+
+def _date(value: Handle) -> Any:
+    try:
+        return _EPOCH + timedelta(seconds=_read("date", c_double, value))
+    except (OverflowError, ValueError):  # no time of this calendar, or none at all
+        return Opaque(value)
+
+
+# By the number of the kind.
+_READERS = (
+    lambda value: call("value_text", value).decode(),
+    _integer,
+    lambda value: _read("real", c_double, value),
+    lambda value: _read("boolean", c_bool, value),
+    _date,
+    _data,
+    lambda value: list(_elements(value)),
+    _dictionary,
+    Opaque,
+)
+
+
+def python_value(pointer: int | None) -> Any:
+    """The value as Python has it; takes the handle over."""
+    value = handle("value", pointer)
+    return _READERS[call("value_kind", value)](value)
+
+
+def _made(value: Any) -> Handle:
+    if isinstance(value, str):
+        return handle("value", call("value_of_text", encoded(value)))
+    if isinstance(value, bool):
+        return handle("value", call("value_of_boolean", value))
+    if isinstance(value, int):
+        if not -(2**63) <= value < 2**64:
+            raise OverflowError("an integer that no property list holds")
+        return handle("value", call("value_of_integer" if value < 2**63 else "value_of_unsigned", value))
+    if isinstance(value, float):
+        return handle("value", call("value_of_real", value))
+    if isinstance(value, datetime):
+        return handle("value", call("value_of_date", (value.astimezone(timezone.utc) - _EPOCH).total_seconds()))
+    if isinstance(value, (bytes, bytearray)):
+        return handle("value", call("value_of_data", bytes(value), len(value)))
+    return _filled(value)
+
+
+def _filled(value: Any) -> Handle:
+    if isinstance(value, Mapping):
+        made = handle("value", call("value_of_dictionary"))
+        for key, element in value.items():
+            with c_value(element) as each:
+                call("value_set", made, encoded(key), each)
+        return made
+    if isinstance(value, (list, tuple)):
+        made = handle("value", call("value_of_list"))
+        for element in value:
+            with c_value(element) as each:
+                call("value_append", made, each)
+        return made
+    raise TypeError(f"no property is a {type(value).__name__}")
+
+
+@contextmanager
+def c_value(value: Any) -> Iterator[Handle]:
+    """The value as the library has it, for the length of a block."""
+    if isinstance(value, Opaque):
+        yield value._as_parameter_
+        return
+    made = _made(value)
+    try:
+        yield made
+    finally:
+        made.free()

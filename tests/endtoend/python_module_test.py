@@ -1,0 +1,199 @@
+"""The Python module, and through it the C interface: values, changes, and each failure that can show."""
+
+import fcntl
+import os
+import pydoc
+import select
+import sys
+import threading
+import unittest
+from datetime import datetime, timezone
+from pathlib import Path
+
+SANITIZE = os.environ["SANITIZE"]
+SOURCES = Path(os.environ["SOURCE_TREE"])
+LIBRARY = Path(os.environ["BUILD_TREE"]) / os.environ["LIBRARY_DIRECTORY"]
+if os.environ.get("LD_LIBRARY_PATH") != str(LIBRARY):  # which the dynamic linker reads as a program starts
+    os.environ["LD_LIBRARY_PATH"] = str(LIBRARY)
+    os.execv(sys.executable, [sys.executable, "-B", *sys.argv])
+if SANITIZE:
+    sys.exit(77)  # the sanitizer's run time stands in the program, and Python has none
+sys.path.insert(0, str(SOURCES / "bindings/python"))
+
+import account_settings  # noqa: E402
+from account_settings import AccountSettings, AccountSettingsError, Code, Kind  # noqa: E402
+from accountctl_case import CLOUD, HOME_MAIL, MAIL, NOTES  # noqa: E402
+from device import CURRENT_VERSION, SETTINGS, exactly  # noqa: E402
+from device_case import DeviceTest  # noqa: E402
+
+
+class PythonModule(DeviceTest):
+    def setUp(self):
+        super().setUp()
+        self.tree = self.device(Version=CURRENT_VERSION, Accounts=[HOME_MAIL, CLOUD])
+
+    def settings(self, **options):
+        return AccountSettings(self.tree.root, time_limit=0.1, **options)
+
+    def assert_fails(self, code, function):
+        with self.assertRaises(AccountSettingsError) as caught:
+            function()
+        self.assertEqual(code, caught.exception.code)
+        self.assertRegex(str(caught.exception), "^[^ ].*[^.]$")
+
+    def accounts(self):
+        return self.tree.read_plist(SETTINGS)["Accounts"]
+
+
+class Looking(PythonModule):
+    def test_shows_accounts_as_mappings_of_their_properties(self):
+        accounts = self.settings().accounts
+        self.assertEqual(["M1", "V1"], [each.identifier for each in accounts])
+        self.assertEqual(exactly(HOME_MAIL), exactly(dict(accounts["M1"])))
+
+    def test_finds_children_types_and_dataclasses(self):
+        accounts = self.settings().accounts
+        self.assertEqual(("V1", "Cirrant"), (accounts["C1"].parent, accounts["C1"].display_name))
+        self.assertEqual(["C1"], [each.identifier for each in accounts.of_type("CalDAV")])
+        self.assertEqual(["M1"], [each.identifier for each in accounts.with_dataclass(NOTES)])
+        self.assertEqual(["C1", "K1"], [each.identifier for each in accounts["V1"].children])
+        self.assertIsNone(accounts.get("unknown"))
+        self.assertNotIn("unknown", accounts)
+
+    def test_says_why_it_cannot(self):
+        settings = {"Accounts": [], "Version": CURRENT_VERSION}
+        for code, root in ((Code.NOT_MIGRATED, {**settings, "Version": 1}), (Code.NEWER, {**settings, "Version": 99})):
+            self.tree.write_plist(SETTINGS, root)
+            self.assert_fails(code, self.settings)
+        self.tree.write(SETTINGS, "no property list")
+        self.assert_fails(Code.UNREADABLE, self.settings)
+        self.tree.path(SETTINGS).unlink()
+        self.assert_fails(Code.MISSING, self.settings)
+        self.assertEqual([], list(self.settings(may_be_missing=True).accounts))
+
+    def test_waits_for_a_migration_no_longer_than_it_may(self):
+        self.tree.write("tmp/AccountMigrationInProgress", "")
+        with self.tree.path("tmp/AccountMigrationInProgress").open("rb") as lock:
+            fcntl.flock(lock, fcntl.LOCK_EX)
+            self.assert_fails(Code.BUSY, self.settings)
+
+    def test_is_worth_reading_in_help(self):
+        page = pydoc.plain(pydoc.render_doc(account_settings))
+        for text in ("with settings.edit() as edit", "time_limit: the seconds for which", "The accounts as the file has them now"):
+            self.assertIn(text, page)
+
+
+class Changing(PythonModule):
+    def test_saves_values_of_every_kind(self):
+        moment = datetime(2026, 3, 7, 10, 15, tzinfo=timezone.utc)
+        values = {"a": "b", "c": [1, -1, 2**64 - 1, 0.5, True, b"\0"], "d": {"e": ""}}
+        with self.settings().edit() as edit:
+            edit["M1"]["Values"] = {**values, "moment": moment}
+        self.assertEqual([(Kind.CHANGED, "M1", ("Values",))], [
+            (each.kind, each.account.identifier, each.keys) for each in edit.changes])
+        saved = self.accounts()[0]["Values"]
+        self.assertEqual(moment.replace(tzinfo=None), saved.pop("moment"))
+        self.assertEqual(exactly(values), exactly(saved))
+        self.assertEqual({**values, "moment": moment}, self.settings().accounts["M1"]["Values"])
+
+    def test_adds_removes_and_switches(self):
+        with self.settings().edit() as edit:
+            child = edit.add("CardDAV", "CardDAVAccount", {"Identifier": "C2"}, parent="V1")
+            del edit["M1"]
+            edit["V1"].enable("com.vorlix.Dataclass.Notes")
+            edit["V1"].enable("com.vorlix.Dataclass.Contacts", False)
+        self.assertEqual("V1", child.parent)
+        self.assertEqual(["V1"], [each["Identifier"] for each in self.accounts()])
+        self.assertEqual([NOTES], self.accounts()[0]["Enabled Dataclasses"])
+        self.assertEqual("C2", self.accounts()[0]["ChildAccounts"][-1]["Identifier"])
+
+    def test_saves_nothing_of_a_block_that_raises(self):
+        before = self.accounts()
+        with self.assertRaises(KeyError), self.settings().edit() as edit:
+            del edit["M1"]
+            edit["M1"]["Port"] = 1
+        self.assertEqual(before, self.accounts())
+        with self.settings().edit() as edit:
+            edit["M1"]["Port"] = 1
+
+    def test_says_which_step_cannot_be_done(self):
+        with self.settings().edit() as edit:
+            account = edit["M1"]
+            self.assert_fails(Code.UNSUITABLE, lambda: account.__setitem__("Identifier", "M2"))
+            self.assert_fails(Code.UNSUITABLE, lambda: account.enable("com.vorlix.Dataclass.Contacts"))
+            self.assert_fails(Code.ALREADY_THERE, lambda: edit.add("LDAP", "A", {"Identifier": "C1"}))
+            self.assert_fails(Code.WOULD_BE_DROPPED, lambda: edit.add("No such type", "A"))
+            self.assert_fails(Code.UNKNOWN_ACCOUNT, lambda: edit.add("CalDAV", "A", parent="unknown"))
+            self.assertRaises(TypeError, account.__setitem__, "Port", object())
+            self.assertRaises(OverflowError, account.__setitem__, "Port", 2**64)
+            del edit["M1"]
+            self.assert_fails(Code.UNKNOWN_ACCOUNT, lambda: account.__setitem__("Port", 1))
+        self.assert_fails(Code.FINISHED, edit.save)
+
+    def test_says_why_it_cannot_save(self):
+        edit = self.settings().edit()
+        edit["M1"]["Type"] = "No such type"
+        self.assert_fails(Code.WOULD_BE_DROPPED, edit.save)
+        edit = self.settings().edit()
+        edit["M1"]["Port"] = 1
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": [CLOUD]})
+        self.assert_fails(Code.CONFLICT, edit.save)
+        edit = self.settings().edit()
+        edit["V1"]["Port"] = 1
+        self.tree.write("var/mobile/tmp", "a file in the directory's place")
+        self.assert_fails(Code.NOT_SAVED, edit.save)
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": [{**CLOUD, "Type": "To come"}]})
+        self.assert_fails(Code.WOULD_DROP_OTHERS, self.settings().edit)
+
+    def test_waits_for_another_but_not_for_itself(self):
+        settings, codes = self.settings(), []
+
+        def change():
+            try:
+                settings.edit()
+            except AccountSettingsError as error:
+                codes.append(error.code)
+
+        edit = settings.edit()
+        change()
+        other = threading.Thread(target=change)
+        other.start()
+        other.join()
+        edit.close()
+        self.assertEqual([Code.NESTED, Code.BUSY], codes)
+
+
+class Watching(PythonModule):
+    def test_tells_in_a_thread_of_its_own(self):
+        told, settings = [], self.settings()
+        is_told = threading.Event()
+
+        def tell(change):
+            told.append((change.kind, change.account.identifier, change.keys))
+            is_told.set()
+
+        with settings.watch(tell):
+            with settings.edit() as edit:
+                edit["C1"]["Username"] = "ada"
+            self.assertTrue(is_told.wait(10))
+        self.assertEqual([(Kind.CHANGED, "C1", ("Username",))], told)
+
+    def test_tells_an_event_loop_what_came_since_the_look(self):
+        told, settings = [], self.settings()
+        seen = settings.accounts
+        with settings.edit() as edit:
+            edit["M1"].enable(MAIL, False)
+        with settings.watch(told.append, since=seen, own_thread=False) as watch:
+            self.assertEqual([watch], select.select([watch], [], [], 10)[0])
+            watch.dispatch()
+        self.assertEqual([("Enabled Dataclasses",)], [change.keys for change in told])
+
+    def test_says_where_nothing_can_be_watched(self):
+        settings = self.settings()
+        seen = settings.accounts
+        self.tree.path("var/mobile/Library").rename(self.tree.path("elsewhere"))
+        self.assert_fails(Code.NOT_WATCHED, lambda: settings.watch(print, since=seen))
+
+
+if __name__ == "__main__":
+    unittest.main()
