@@ -34,6 +34,12 @@ void leave(const Option& option, Word place, const Values& values) {
   *place = values.front();
 }
 
+void leave(const Option& option, Words place, const Values& values) {
+  const bool lacksOne = std::ranges::any_of(values, [](const auto& each) { return each.empty() || each == kNoValue; });
+  if (lacksOne) throw WrongUse{longName(option) + " needs a value"};
+  *place = values;
+}
+
 void leave(const Option& option, PathWord place, const Values& values) {
   std::optional<std::string> word;
   leave(option, &word, values);
@@ -56,7 +62,7 @@ void leave(const Option& option, const Form& form, const Values& values) {
 
 CLI::Option* declare(CLI::App& parser, const Option& option) {
   const bool takesNextWord =
-      std::holds_alternative<Word>(option.target) || std::holds_alternative<PathWord>(option.target);
+      !std::holds_alternative<Switch>(option.target) && !std::holds_alternative<Form>(option.target);
   if (takesNextWord) {
     auto* const declared = parser.add_option(option.names)->expected(0, 1)->default_str(kNoValue);
     return declared->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);

@@ -16,6 +16,7 @@ namespace commandline {
 
 using Switch = bool*;  // `--json`: becomes true, however often it is given
 using Word = std::optional<std::string>*;
+using Words = std::vector<std::string>*;                 // may be given any number of times, each with a value
 using PathWord = std::optional<std::filesystem::path>*;  // becomes absolute
 
 // `--explain`, or `--explain=FORM` with one of the forms; given once. The place then holds the form, which is empty
@@ -30,7 +31,7 @@ struct Option {
   std::string names;     // "--root", or "--help,-h": a long name, and perhaps a short one
   std::string argument;  // how the help calls its value, "DIR"; empty where it has none
   std::string summary;   // for the help
-  std::variant<Switch, Word, PathWord, Form> target;
+  std::variant<Switch, Word, Words, PathWord, Form> target;
 };
 
 // Reads the arguments that follow the program's name, and answers those that are no options, in their order.
