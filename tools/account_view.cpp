@@ -4,6 +4,7 @@
 #include <nlohmann/json.hpp>
 
 #include "accountsettings/device_local_account.h"
+#include "platform/characters.h"
 #include "records/description.h"
 
 namespace tools {
@@ -41,6 +42,10 @@ std::string fullDataclass(std::string_view name) {
   return std::string{name.starts_with(kDataclassPrefix) ? std::string_view{} : kDataclassPrefix} + std::string{name};
 }
 
+BasicAccount::Dataclasses enabledOf(const BasicAccount& account) {
+  return account.enabledDataclasses().value_or(BasicAccount::Dataclasses{});
+}
+
 std::string joinedDataclasses(const BasicAccount::Dataclasses& dataclasses) {
   std::string joined;
   for (const Text& dataclass : dataclasses) joined += (joined.empty() ? "" : ", ") + shortDataclass(dataclass);
@@ -52,13 +57,48 @@ std::string nameOf(const BasicAccount& account) {
   return account.displayName().value_or(Text{}).string();
 }
 
-std::string ownText(const BasicAccount& account, std::string_view key) {
-  const Text* const text = account.properties().text(key);
+std::string textUnder(const Dictionary& properties, std::string_view key) {
+  const Text* const text = properties.text(key);
   return text == nullptr ? std::string{} : text->string();
 }
 
+std::string ownText(const BasicAccount& account, std::string_view key) { return textUnder(account.properties(), key); }
+
 std::string ownName(const BasicAccount& account) {
   return isDeviceLocal(account) ? nameOf(account) : ownText(account, accountsettings::kAccountDisplayName);
+}
+
+Names namesOf(const Dictionary& properties) {
+  return {textUnder(properties, accountsettings::kAccountIdentifier),
+          textUnder(properties, accountsettings::kAccountDisplayName),
+          textUnder(properties, accountsettings::kAccountUsername), textUnder(properties, kAccountHost)};
+}
+
+Names namesOf(const BasicAccount& account) {
+  Names names = namesOf(account.properties());
+  names.identifier = account.identifier().value_or(Text{}).string();
+  names.name = ownName(account);
+  return names;
+}
+
+std::string serviceOf(const Dictionary& properties) {
+  const Names names = namesOf(properties);
+  if (names.user.empty()) return {};
+  return names.user + (names.host.empty() ? "\n" + names.name : "@" + names.host);
+}
+
+bool Names::areMeantBy(const std::string& word) const {
+  const std::string meant = platform::caseFolded(word);
+  const auto isCalled = [&](const std::string& called) {
+    return !called.empty() && platform::caseFolded(called) == meant;
+  };
+  return !meant.empty() && (platform::caseFolded(identifier).starts_with(meant) || isCalled(name) || isCalled(user) ||
+                            (!user.empty() && isCalled(user + "@" + host)));
+}
+
+std::string Names::described() const {
+  if (identifier.empty()) return name.empty() ? "an account without a name" : name;
+  return identifier + (name.empty() ? "" : " (" + name + ")");
 }
 
 ChildrenByParent childrenByParent(const AccountsManager& accounts) {

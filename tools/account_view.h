@@ -12,6 +12,8 @@ namespace tools {
 // A data class as people write it ("Mail"), and back. The long form stands for itself.
 [[nodiscard]] std::string shortDataclass(std::string_view dataclass);
 [[nodiscard]] std::string fullDataclass(std::string_view name);
+// The data classes that are switched on; none where the account has no list of them.
+[[nodiscard]] BasicAccount::Dataclasses enabledOf(const BasicAccount& account);
 // "Mail, Notes".
 [[nodiscard]] std::string joinedDataclasses(const BasicAccount::Dataclasses& dataclasses);
 
@@ -23,6 +25,27 @@ constexpr std::string_view kAccountHost = "Hostname";
 // A text of the account's own, not of its parent; empty where it has none. The second is its name, as nameOf has it.
 [[nodiscard]] std::string ownText(const BasicAccount& account, std::string_view key);
 [[nodiscard]] std::string ownName(const BasicAccount& account);
+// What a person may mean an account by; whatever it does not have is empty.
+struct Names {
+  std::string identifier;
+  std::string name;
+  std::string user;
+  std::string host;
+
+  // Whether the word is the beginning of the identifier, the name, the user name, or user@host, in any case.
+  [[nodiscard]] bool areMeantBy(const std::string& word) const;
+  // "M1 (Home)", for messages.
+  [[nodiscard]] std::string described() const;
+};
+[[nodiscard]] Names namesOf(const BasicAccount& account);
+[[nodiscard]] Names namesOf(const accountsettings::Dictionary& properties);
+// A text among the properties; empty where there is none.
+[[nodiscard]] std::string textUnder(const accountsettings::Dictionary& properties, std::string_view key);
+
+// What the properties are an account of, as a key to compare: its user name with its host, or where none is told with
+// its name. Empty where there is no user name.
+[[nodiscard]] std::string serviceOf(const accountsettings::Dictionary& properties);
+
 // The indexed children of all top-level accounts by their parent, each parent's in order.
 using ChildrenByParent = std::unordered_map<const BasicAccount*, std::vector<Account>>;
 [[nodiscard]] ChildrenByParent childrenByParent(const AccountsManager& accounts);

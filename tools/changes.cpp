@@ -1,12 +1,12 @@
 #include <algorithm>
-#include <exception>
-#include <functional>
 #include <nlohmann/json.hpp>
+#include <utility>
 
 #include "platform/characters.h"
 #include "tools/account_view.h"
 #include "tools/commands.h"
 #include "tools/key_value.h"
+#include "tools/next_load.h"
 
 namespace tools {
 namespace {
@@ -18,40 +18,18 @@ using Dataclasses = BasicAccount::Dataclasses;
 
 [[noreturn]] void refuseUse(const std::string& message) { throw Failure{ExitStatus::wrongUse, message}; }
 
-std::string printedChange(const BasicAccount& account, bool asJson) {
-  return asJson ? Json{{"account", jsonOf(account)}}.dump(2) + "\n" : std::string{};
-}
-
-// A module may fail in its own way, too; whatever it throws, the message says what became of the change.
-void announceBefore(const Session& session, const BasicAccount& account, const Dataclasses& dataclasses) {
-  if (!session.opensModules()) return;
-  try {
-    for (const Text& each : dataclasses) AccountsManager::accountWillChange_forDataclass(account, each);
-  } catch (const std::exception& failure) {
-    throw Failure{ExitStatus::faultyInstallation, "nothing was changed: " + std::string{failure.what()}};
+// What a change prints: for machines the report, for people the line, or what a mere rehearsal would have done.
+std::string printedChange(const Options& options, Json report, const std::string& line, const std::string& rehearsed) {
+  if (options.printsJson) {
+    if (options.changesNothing) report["dryRun"] = true;
+    return report.dump(2) + "\n";
   }
+  return options.changesNothing ? "would " + rehearsed + "\n" : line;
 }
 
-void announceAfter(const Session& session, const BasicAccount& account, const Dataclasses& dataclasses) {
-  if (!session.opensModules()) return;
-  try {
-    for (const Text& each : dataclasses) AccountsManager::accountDidChange_forDataclass(account, each);
-  } catch (const std::exception& failure) {
-    throw Failure{ExitStatus::faultyInstallation,
-                  "the accounts were saved, but not announced: " + std::string{failure.what()}};
-  }
+std::string printedChange(const Options& options, const BasicAccount& account, const std::string& rehearsed) {
+  return printedChange(options, {{"account", jsonOf(account)}}, "", rehearsed);
 }
-
-// Changes an account in memory and saves it, telling those who follow its data classes before and after.
-void changeAndSave(Session& session, const Account& account, const Dataclasses& dataclasses,
-                   const std::function<void()>& change) {
-  announceBefore(session, *account, dataclasses);
-  change();
-  session.save();
-  announceAfter(session, *account, dataclasses);
-}
-
-Dataclasses enabledOf(const BasicAccount& account) { return account.enabledDataclasses().value_or(Dataclasses{}); }
 
 // The data class of those that the name means, in short or in full, in whatever case; null where it is none of them.
 const Text* dataclassNamed(const std::string& name, const Dataclasses& dataclasses) {
@@ -80,15 +58,22 @@ Text supportedDataclass(const BasicAccount& account, const std::string& name) {
             shortDataclass(*known));
 }
 
-std::string switchDataclass(Session& session, const Words& arguments, bool asJson, bool enabled) {
+std::string switchDataclass(Session& session, const Words& arguments, const Options& options, bool enabled) {
   session.beginChanges();
   const auto account = session.accountMeantBy(arguments[0]);
   const auto dataclass = supportedDataclass(*account, arguments[1]);
-  changeAndSave(session, account, {dataclass}, [&] {
+  session.changeAndSave({{account, {dataclass}}}, [&] {
     account->setEnabled_forDataclass(enabled, dataclass);
     Session::keepChanges(account);
   });
-  return printedChange(*account, asJson);
+  return printedChange(
+      options, *account,
+      (enabled ? "enable " : "disable ") + shortDataclass(dataclass) + " of " + namesOf(*account).described());
+}
+
+// Refuses a record that would not last, or only as another one.
+void requireLasting(const Dictionary& record) {
+  if (const auto fault = faultAtNextLoad(record); !fault.empty()) refuseUse("the next load would " + fault);
 }
 
 Dictionary typeAndClass(const std::string& type, const std::string& className) {
@@ -102,10 +87,11 @@ void setProperty(Dictionary& properties, const KeyValue& property, std::size_t p
   if (property.key == accountsettings::kAccountType || property.key == accountsettings::kAccountClass) {
     refuseUse(place + " sets " + property.key + ", which stands before the properties");
   }
-  const auto* const text = property.value.asText();
+  if (!property.value) refuseUse(place + " holds null, which is no value");
+  const auto* const text = property.value->asText();
   const bool hasText = text != nullptr && !text->empty();
   if (property.key == accountsettings::kAccountIdentifier && !hasText) refuseUse(place + " is no identifier");
-  properties.set(property.key, property.value);
+  properties.set(property.key, *property.value);
 }
 
 Account newAccount(const Words& arguments) {
@@ -113,7 +99,30 @@ Account newAccount(const Words& arguments) {
   for (std::size_t index = 2; index < arguments.size(); ++index) {
     setProperty(properties, parseKeyValue(arguments[index], index - 1), index - 1);
   }
+  requireLasting(properties);
   return BasicAccount::initWithProperties(properties);
+}
+
+// The properties that an account may be given afterwards are all but those that say which account it is.
+void change(BasicAccount& account, const KeyValue& property, std::size_t position) {
+  if (property.key == accountsettings::kAccountIdentifier || property.key == accountsettings::kAccountChildAccounts) {
+    refuseUse("property " + std::to_string(position) + " sets " + property.key + ", which stays as it is");
+  }
+  account._forcedSetAccountProperty_forKey(property.value, property.key);
+}
+
+// A child's record lasts as a part of its parent's.
+Dictionary recordOf(const BasicAccount& account) {
+  const auto& parent = account.parentAccount();
+  if (parent == nullptr) return account.properties();
+  Dictionary record = parent->properties();
+  record.set(accountsettings::kAccountChildAccounts, accountsettings::Array{account.properties()});
+  return record;
+}
+
+bool isDevicesOwn(const BasicAccount& account) {
+  const auto type = account.type();
+  return type && *type == accountsettings::kOnMyDeviceAccountType;
 }
 
 bool isRegistered(Session& session, const BasicAccount& account) {
@@ -137,24 +146,41 @@ void removeEveryRecord(AccountsManager& accounts, const Account& account) {
 }  // namespace
 
 Outcome enableDataclass(Session& session, const Words& arguments, const Options& options) {
-  return switchDataclass(session, arguments, options.printsJson, true);
+  return switchDataclass(session, arguments, options, true);
 }
 
 Outcome disableDataclass(Session& session, const Words& arguments, const Options& options) {
-  return switchDataclass(session, arguments, options.printsJson, false);
+  return switchDataclass(session, arguments, options, false);
 }
 
 Outcome renameAccount(Session& session, const Words& arguments, const Options& options) {
   if (arguments[1].empty()) refuseUse("an account's name cannot be empty");
   session.beginChanges();
   const auto account = session.accountMeantBy(arguments[0]);
-  const auto type = account->type();
-  if (type && *type == accountsettings::kOnMyDeviceAccountType) refuseUse("the device's own account has a fixed name");
-  changeAndSave(session, account, enabledOf(*account), [&] {
+  if (isDevicesOwn(*account)) refuseUse("the device's own account has a fixed name");
+  const auto before = namesOf(*account).described();
+  session.changeAndSave({{account, enabledOf(*account)}}, [&] {
     account->setDisplayName(arguments[1]);
     Session::keepChanges(account);
   });
-  return printedChange(*account, options.printsJson);
+  return printedChange(options, *account, "rename " + before + " to " + arguments[1]);
+}
+
+Outcome setProperties(Session& session, const Words& arguments, const Options& options) {
+  session.beginChanges();
+  const auto account = session.accountMeantBy(arguments[0]);
+  const auto dataclasses = enabledOf(*account);
+  const Dictionary before = account->properties();
+  for (std::size_t index = 1; index < arguments.size(); ++index) {
+    change(*account, parseKeyValue(arguments[index], index), index);
+  }
+  requireLasting(recordOf(*account));
+  const Dictionary after = std::exchange(account->properties(), before);
+  session.changeAndSave({{account, dataclasses}}, [&] {
+    account->properties() = after;
+    Session::keepChanges(account);
+  });
+  return printedChange(options, *account, "change " + namesOf(*account).described());
 }
 
 Outcome addAccount(Session& session, const Words& arguments, const Options& options) {
@@ -162,21 +188,25 @@ Outcome addAccount(Session& session, const Words& arguments, const Options& opti
   const auto account = newAccount(arguments);
   const auto identifier = account->identifier().value_or(Text{}).string();
   if (isRegistered(session, *account)) refuseUse("there is an account with the identifier " + identifier);
-  changeAndSave(session, account, enabledOf(*account), [&] { session.accounts().insertAccount(account); });
-  return options.printsJson ? printedChange(*account, true) : identifier + "\n";
+  session.changeAndSave({{account, enabledOf(*account)}}, [&] { session.accounts().insertAccount(account); });
+  return printedChange(options, {{"account", jsonOf(*account)}}, identifier + "\n",
+                       "add " + namesOf(*account).described());
 }
 
 Outcome removeAccount(Session& session, const Words& arguments, const Options& options) {
   session.beginChanges();
   const auto account = session.accountMeantBy(arguments[0]);
-  changeAndSave(session, account, enabledOf(*account), [&] { removeEveryRecord(session.accounts(), account); });
-  return options.printsJson ? Json{{"removed", jsonOf(*account)["identifier"]}}.dump(2) + "\n" : std::string{};
+  if (isDevicesOwn(*account)) refuseUse("the device's own account cannot be removed");
+  session.changeAndSave({{account, enabledOf(*account)}}, [&] { removeEveryRecord(session.accounts(), account); });
+  return printedChange(options, {{"removed", jsonOf(*account)["identifier"]}}, "",
+                       "remove " + namesOf(*account).described());
 }
 
 Outcome saveAccounts(Session& session, const Words&, const Options& options) {
   session.beginChanges();
   session.save();
-  return options.printsJson ? Json{{"saved", session.accounts().count()}}.dump(2) + "\n" : std::string{};
+  const auto count = session.accounts().count();
+  return printedChange(options, {{"saved", count}}, "", "save " + std::to_string(count) + " accounts");
 }
 
 }  // namespace tools

@@ -18,6 +18,20 @@ constexpr std::string_view kProperties =
     "TYPE is one that the command types lists, CLASS the name of the account's class. KEY=VALUE gives a property a "
     "text, "
     "KEY:=JSON any other value. Give no password so: other users of the machine see what stands on a command line.";
+constexpr std::string_view kChangedProperties =
+    "KEY=VALUE gives a property a text, KEY:=JSON any other value, KEY:=null takes it away. What the next load would "
+    "drop or repair is refused. Give no password so: other users of the machine see what stands on a command line.";
+
+constexpr std::string_view kDiff =
+    "A and B are files of accounts, snapshots, or the roots of devices; without B, the device's own accounts are "
+    "meant. "
+    "Exit status: 0 the same, 1 different, 2 trouble.";
+constexpr std::string_view kRecover =
+    "FROM is a file of accounts, a snapshot, or the root of a device; accountctl --file FROM list tells what is in it. "
+    "ACCOUNT is a place such as Accounts[2], or what show takes; without one, every account comes back that is not "
+    "there. --set KEY=VALUE repairs what is brought back. An account that is there is never doubled. A file of the "
+    "first "
+    "releases comes back as a file, for the next migration to convert.";
 
 }  // namespace
 
@@ -27,14 +41,20 @@ const std::vector<Command>& commands() {
        "On a terminal, long cells are shortened in the middle so that a line fits; --wide shortens nothing, --columns "
        "says "
        "which columns are shown.",
-       0, 0, listAccounts},
-      {"show", "ID", "one account with its properties", kId, 1, 1, showAccount},
+       0, 0, listAccounts, false, listFile},
+      {"show", "ID", "one account with its properties", kId, 1, 1, showAccount, false, showInFile},
       {"verify", "[FILE]", "what a migration would do about each fault",
-       "Without FILE, the device's own settings file is examined. Nothing is changed.", 0, 1, verifySettings},
+       "Without FILE, the device's own settings file is examined. Nothing is changed.", 0, 1, verifySettings, false,
+       verifyFiles},
+      {"diff", "A [B]", "what differs between two files, snapshots or devices", kDiff, 1, 2, compareAccounts},
+      {"recover", "FROM [ACCOUNT]...", "bring accounts back into the store", kRecover, 1, kAnyNumber, recoverAccounts,
+       true},
       {"types", "", "the account types, with their data classes", "", 0, 0, listTypes},
       {"enable", "ID DATACLASS", "switch a data class on", kIdAndDataclass, 2, 2, enableDataclass, true},
       {"disable", "ID DATACLASS", "switch a data class off", kIdAndDataclass, 2, 2, disableDataclass, true},
       {"rename", "ID NAME", "change what the account is called", kId, 2, 2, renameAccount, true},
+      {"set", "ID KEY=VALUE...", "give an account properties, or take some away", kChangedProperties, 2, kAnyNumber,
+       setProperties, true},
       {"add", "TYPE CLASS [KEY=VALUE]...", "add an account and print its identifier", kProperties, 2, kAnyNumber,
        addAccount, true},
       {"remove", "ID", "remove an account, with its children", kId, 1, 1, removeAccount, true},

@@ -30,6 +30,8 @@ struct Command {
   std::size_t mostArguments;
   Outcome (*run)(Session& session, const Words& arguments, const Options& options);
   bool changesAccounts = false;
+  // What is run in place of it where --file is given; null where that makes no sense.
+  Outcome (*runOnFile)(Session& session, const Words& arguments, const Options& options) = nullptr;
 };
 
 [[nodiscard]] const std::vector<Command>& commands();
@@ -41,6 +43,17 @@ struct Command {
 // How the command is written: "show ID".
 [[nodiscard]] std::string usageOf(const Command& command);
 Outcome helpOnCommand(Session& session, const Words& arguments, const Options& options);
+
+// file_reports.cpp; what stands elsewhere than in the device's store, as --file says.
+Outcome listFile(Session& session, const Words& arguments, const Options& options);
+Outcome showInFile(Session& session, const Words& arguments, const Options& options);
+Outcome verifyFiles(Session& session, const Words& arguments, const Options& options);
+
+// recover.cpp
+Outcome recoverAccounts(Session& session, const Words& arguments, const Options& options);
+
+// diff.cpp; has exit statuses of its own.
+Outcome compareAccounts(Session& session, const Words& arguments, const Options& options);
 
 // reports.cpp
 Outcome listAccounts(Session& session, const Words& arguments, const Options& options);
@@ -54,6 +67,7 @@ Outcome verifySettings(Session& session, const Words& arguments, const Options& 
 Outcome enableDataclass(Session& session, const Words& arguments, const Options& options);
 Outcome disableDataclass(Session& session, const Words& arguments, const Options& options);
 Outcome renameAccount(Session& session, const Words& arguments, const Options& options);
+Outcome setProperties(Session& session, const Words& arguments, const Options& options);
 Outcome addAccount(Session& session, const Words& arguments, const Options& options);
 Outcome removeAccount(Session& session, const Words& arguments, const Options& options);
 Outcome saveAccounts(Session& session, const Words& arguments, const Options& options);

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <optional>
 #include <string>
 #include <string_view>
 
@@ -7,10 +8,11 @@
 
 namespace tools {
 
-// A property as it is written on the command line: `KEY=VALUE` for a text, `KEY:=JSON` for any other value.
+// A property as it is written on the command line: `KEY=VALUE` for a text, `KEY:=JSON` for any other value, and
+// `KEY:=null` for none at all.
 struct KeyValue {
   std::string key;
-  platform::PropertyValue value;
+  std::optional<platform::PropertyValue> value;
 };
 
 // `position` is the argument's, counted from 1, for the message: the argument itself may hold a credential and is never

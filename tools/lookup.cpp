@@ -2,7 +2,6 @@
 
 #include <algorithm>
 
-#include "platform/characters.h"
 #include "tools/account_view.h"
 #include "tools/session.h"
 
@@ -14,26 +13,10 @@ using Accounts = std::vector<Account>;
 
 std::string identifierOf(const BasicAccount& account) { return account.identifier().value_or(Text{}).string(); }
 
-bool isCalled(const std::string& word, const std::string& name) {
-  return !name.empty() && platform::caseFolded(name) == word;
-}
-
-// Whether a person may mean the account by the word, whose case is folded.
-bool isMeant(const BasicAccount& account, const std::string& word) {
-  const std::string user = ownText(account, accountsettings::kAccountUsername);
-  const std::string host = ownText(account, kAccountHost);
-  return platform::caseFolded(identifierOf(account)).starts_with(word) || isCalled(word, ownName(account)) ||
-         isCalled(word, user) || (!user.empty() && isCalled(word, user + "@" + host));
-}
-
-std::string describe(const BasicAccount& account) {
-  const std::string name = ownName(account);
-  return identifierOf(account) + (name.empty() ? "" : " (" + name + ")");
-}
-
 [[noreturn]] void refuseAmbiguous(const std::string& word, const Accounts& candidates) {
   std::string message = "several accounts are meant by " + word + ": ";
-  for (const Account& each : candidates) message += (each == candidates.front() ? "" : ", ") + describe(*each);
+  for (const Account& each : candidates)
+    message += (each == candidates.front() ? "" : ", ") + namesOf(*each).described();
   throw Failure{ExitStatus::wrongUse, message};
 }
 
@@ -47,9 +30,8 @@ Account Session::accountMeantBy(const std::string& word) {
   const auto exact = std::ranges::find(all, word, [](const Account& each) { return identifierOf(*each); });
   if (exact != all.end()) return *exact;
   Accounts candidates;
-  const std::string folded = platform::caseFolded(word);
   std::ranges::copy_if(all, std::back_inserter(candidates),
-                       [&](const Account& each) { return !folded.empty() && isMeant(*each, folded); });
+                       [&](const Account& each) { return namesOf(*each).areMeantBy(word); });
   if (candidates.size() > 1) refuseAmbiguous(word, candidates);
   if (candidates.size() == 1) return candidates.front();
   throw Failure{ExitStatus::noSuchAccount, "no account has the identifier " + word};

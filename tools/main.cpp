@@ -10,11 +10,22 @@ using tools::Failure;
 
 constexpr std::string_view kProgram = "accountctl";
 
+// An option that means nothing for the command is a misunderstanding that had better be told.
+void checkOptions(const tools::Command& command, const tools::Options& options) {
+  const auto require = [](bool isSound, const char* message) {
+    if (!isSound) throw commandline::WrongUse{message};
+  };
+  const bool listsStore = command.run == tools::listAccounts && !options.file;
+  require(options.columns.empty() || listsStore, "--columns is for a list of the device's accounts");
+  require(!options.changesNothing || command.changesAccounts, "--dry-run is for commands that change accounts");
+  require(!options.file || command.runOnFile != nullptr, "--file is for list, show and verify");
+  require(options.settings.empty() || command.run == tools::recoverAccounts, "--set is for recover");
+}
+
 const tools::Command& commandOf(const tools::Options& options) {
   if (options.command.empty()) throw commandline::WrongUse{"no command is given"};
   const auto& command = tools::commandNamed(options.command);
-  if (!options.columns.empty() && command.run != tools::listAccounts)
-    throw commandline::WrongUse{"--columns is for list"};
+  checkOptions(command, options);
   const auto count = options.arguments.size();
   if (count >= command.fewestArguments && count <= command.mostArguments) return command;
   throw Failure{ExitStatus::wrongUse, "usage: accountctl " + tools::usageOf(command)};
@@ -25,10 +36,11 @@ tools::Outcome perform(std::span<const char* const> arguments) {
   if (options.printsHelp) return tools::help(options);
   if (options.printsVersion) return std::string{"accountctl " ACCOUNTCTL_VERSION "\n"};
   const auto& command = commandOf(options);
-  options.device.locks = command.changesAccounts ? tools::kLocksOfWriters : tools::kLocksOfReaders;
+  const bool isWriter = command.changesAccounts && !options.changesNothing;
+  options.device.locks = isWriter ? tools::kLocksOfWriters : tools::kLocksOfReaders;
   tools::Session session{options};
   try {
-    return command.run(session, options.arguments, options);
+    return (options.file ? command.runOnFile : command.run)(session, options.arguments, options);
   } catch (const accountsettings::AssertionFailure& failure) {
     throw Failure{ExitStatus::faultyInstallation, failure.what()};
   }

@@ -32,6 +32,11 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
        "open the account modules under another root, too, and tell them of changes; else nobody is told of a change "
        "there",
        &options.opensModulesOfOtherRoots},
+      {"--file", "FROM", "list, show or verify what a file, a snapshot or another device holds", &options.file},
+      {"--snapshots", "DIR", "where snapshots are looked for (default: /var/lib/account-settings/snapshots)",
+       &options.snapshots},
+      {"--set", "KEY=VALUE", "give what recover brings back this property; may be repeated", &options.settings},
+      {"--dry-run", "", "change nothing, and print what would be changed", &options.changesNothing},
       {"--json", "", "print JSON", &options.printsJson},
       {"--columns", "LIST", "of a list: identifier, type, class, name, user, host, enabled", &written.columns},
       {"--wide", "", "shorten nothing, however narrow the terminal is", &options.printsEverything},

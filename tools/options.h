@@ -1,5 +1,7 @@
 #pragma once
 
+#include <filesystem>
+#include <optional>
 #include <span>
 #include <string>
 #include <vector>
@@ -16,6 +18,8 @@ enum class ExitStatus : int {
   done = 0,
   failed = 1,              // the accounts could not be read or saved; the file is as it was
   findings = 1,            // a file that was to be verified has faults; for scripts as good as one that cannot be read
+  incomplete = 1,          // some of the accounts that were to come back are faulty; the others are back
+  different = 1,           // what was compared is not the same
   wrongUse = 2,            // what was asked makes no sense; nothing was changed
   noSuchAccount = 3,       // nothing was changed
   faultyInstallation = 4,  // the configuration or a module is at fault; the message says whether the change was saved
@@ -29,7 +33,11 @@ struct Options {
   platform::LinuxPlatformOptions device;
   bool opensModulesOfOtherRoots = false;
   bool printsJson = false;
-  bool printsEverything = false;  // however narrow the terminal is
+  bool changesNothing = false;      // a command that changes accounts is only tried
+  bool printsEverything = false;    // however narrow the terminal is
+  std::optional<std::string> file;  // what is listed, shown or verified in place of the device's accounts
+  std::optional<std::filesystem::path> snapshots;  // the directory of snapshots, where it is not the usual one
+  std::vector<std::string> settings;               // properties that recovered accounts are given, as they were written
   commandline::Colour colour = commandline::Colour::automatic;
   std::vector<std::string> columns;  // of a list of accounts; empty for the usual ones
   bool printsHelp = false;

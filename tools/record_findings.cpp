@@ -23,11 +23,6 @@ const Dictionary& propertiesIn(const PropertyValue& element) {
   return properties == nullptr ? none : *properties;
 }
 
-std::string textUnder(const Dictionary& properties, std::string_view key) {
-  const Text* const text = properties.text(key);
-  return text == nullptr ? std::string{} : text->string();
-}
-
 // A value as a clause: `Class is "MailAccount"`.
 std::string clauseOf(const Dictionary& properties, std::string_view key) {
   const PropertyValue* const value = properties.find(key);

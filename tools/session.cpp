@@ -16,6 +16,8 @@ namespace {
 
 using accountsettings::Array;
 
+constexpr const char* kSavedButNotAnnounced = "the accounts were saved, but not announced";
+
 // In the place of the device's loader while none of its modules may be opened.
 class ClosedModuleLoader final : public platform::ModuleLoader {
  public:
@@ -69,7 +71,8 @@ Array withChild(const Array& children, const BasicAccount& child) {
 
 }  // namespace
 
-Session::Session(const Options& options) : _opensModules{options.opensModules()} {
+Session::Session(const Options& options)
+    : _opensModules{options.opensModules()}, _changesNothing{options.changesNothing} {
   auto platform = platform::makeLinuxPlatform(options.device);
   if (!_opensModules) {
     platform.modules = std::make_shared<ClosedModuleLoader>();
@@ -110,16 +113,22 @@ void Session::loadAccounts() {
   _accounts = std::move(accounts);
 }
 
-void Session::beginExamination(const std::optional<platform::Path>& file) {
+void Session::beginLooking() {
   auto platform = platform::current();
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();
+  platform::setCurrent(std::move(platform));
+}
+
+void Session::beginExamination(const std::optional<platform::Path>& file) {
+  beginLooking();
+  auto platform = platform::current();
   if (file) platform.propertyLists = std::make_shared<SettingsFromElsewhere>(platform.propertyLists, *file);
   platform::setCurrent(std::move(platform));
   if (!file) waitForMigration();
 }
 
 void Session::beginChanges() {
-  platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
+  if (!_changesNothing) platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   const auto& store = accounts();
   if (AccountsManager::accountSettingsNeedsToBeMigrated()) {
     throw Failure{ExitStatus::failed, "the account settings have data version " + std::to_string(store.dataVersion()) +
@@ -136,15 +145,34 @@ void Session::keepChanges(const Account& account) {
   parent->setAccountProperty_forKey(withChild(*array, *account), accountsettings::kAccountChildAccounts);
 }
 
+// A module may fail in its own way, too; whatever it throws, the message says what became of the change.
+void Session::announce(const Concerned& concerned, Announcement announcement, const char* whatBecameOfTheChange) const {
+  if (!_opensModules || _changesNothing) return;
+  try {
+    for (const auto& [account, dataclasses] : concerned) {
+      for (const accountsettings::Text& each : dataclasses) announcement(*account, each);
+    }
+  } catch (const std::exception& failure) {
+    throw Failure{ExitStatus::faultyInstallation, std::string{whatBecameOfTheChange} + ": " + failure.what()};
+  }
+}
+
+void Session::changeAndSave(const Concerned& concerned, const std::function<void()>& change) {
+  announce(concerned, AccountsManager::accountWillChange_forDataclass, "nothing was changed");
+  change();
+  save();
+  announce(concerned, AccountsManager::accountDidChange_forDataclass, kSavedButNotAnnounced);
+}
+
 void Session::save() {
+  if (_changesNothing) return;
   try {
     accounts().saveAllAccounts();
   } catch (const std::bad_alloc&) {
     throw;  // before the file was written or after it
   } catch (const std::exception& failure) {
     if (!accounts().lastSaveOutcome().isSaved()) throw;
-    throw Failure{ExitStatus::faultyInstallation,
-                  "the accounts were saved, but not announced: " + std::string{failure.what()}};
+    throw Failure{ExitStatus::faultyInstallation, std::string{kSavedButNotAnnounced} + ": " + failure.what()};
   }
   const auto& outcome = accounts().lastSaveOutcome();
   if (outcome.isSaved()) return;

@@ -1,10 +1,13 @@
 #pragma once
 
 #include <cstddef>
+#include <functional>
 #include <memory>
 #include <optional>
 #include <string>
 #include <string_view>
+#include <utility>
+#include <vector>
 
 #include "accountsettings/accounts_manager.h"
 #include "tools/options.h"
@@ -36,7 +39,10 @@ class Session {
   // begins so or that is called so (lookup.cpp says how). Throws Failure where there is none, or more than one.
   [[nodiscard]] Account accountMeantBy(const std::string& word);
 
-  // Makes the session one that only looks and of which nobody is told, not even the log. The settings are read from
+  // Makes the session one that only looks and of which nobody is told, not even the log. To be called before anything
+  // else.
+  void beginLooking();
+  // The same, and the settings are read from
   // the file that is named, wherever it lies, else from the device's own once no migration is running. To be called
   // before anything else.
   void beginExamination(const std::optional<platform::Path>& file);
@@ -46,15 +52,23 @@ class Session {
   void beginChanges();
   // Keeps what was changed of the account: a child's record is a copy of what its parent holds.
   static void keepChanges(const Account& account);
-  // Writes the file. Throws Failure, with the cause, where it cannot be written, and where it was but nobody could be
-  // told.
+  // The accounts that a change concerns, each with the data classes that it concerns of it.
+  using Concerned = std::vector<std::pair<Account, BasicAccount::Dataclasses>>;
+  // Changes the accounts in memory and saves them, telling those who follow these data classes before and after. Throws
+  // Failure, which says what became of the change, where it cannot be saved or a module is at fault.
+  void changeAndSave(const Concerned& concerned, const std::function<void()>& change);
+  // Writes the file, unless the session changes nothing. Throws Failure, with the cause, where it cannot be written,
+  // and where it was but nobody could be told.
   void save();
 
  private:
+  using Announcement = void (*)(const BasicAccount& account, std::string_view dataclass);
+  void announce(const Concerned& concerned, Announcement announcement, const char* whatBecameOfTheChange) const;
   static void waitForMigration();
   void loadAccounts();
 
   bool _opensModules;
+  bool _changesNothing;  // what is asked for is only tried
   std::shared_ptr<AccountsManager> _accounts;
 };
 

@@ -39,7 +39,7 @@ class WrongUse(AccountctlTest):
         self.assert_wrong("unknown command: lst (see --help)", "lst")
         self.assert_wrong("unknown command: lst (see --help)", "help", "lst")
         self.assert_wrong("unknown column: nam (see --help)", "list", "--columns=nam")
-        self.assert_wrong("--columns is for list (see --help)", "types", "--columns=name")
+        self.assert_wrong("--columns is for a list of the device's accounts (see --help)", "types", "--columns=name")
         self.assert_wrong("usage: accountctl list", "list", "M1")
         self.assert_wrong("usage: accountctl show ID", "show")
         self.assert_wrong("usage: accountctl enable ID DATACLASS", "enable", "M1")

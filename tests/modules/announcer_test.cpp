@@ -143,12 +143,14 @@ TEST_F(Announcer, IsNotAskedUnderAnotherRoot) {
   EXPECT_THAT(subscriber.heard(), IsEmpty());
 }
 
-TEST_F(Announcer, LeavesItToTheMailApplicationsNoticeToTellOfARepairAndToNobodyUnderAnotherRoot) {
-  BusSubscriber mailApplication{"/com/vorlix/Notices", "com.vorlix.Notices1"};
-  const Texts repaired{"add", "Mail", "MailAccount", "AccountPath=Mail/IMAP-x"};
-  EXPECT_EQ(device.editWithoutModules(repaired), 0);
-  EXPECT_EQ(device.edit(repaired), 0);
-  EXPECT_THAT(mailApplication.heard(), ElementsAre("PreferencesChanged com.vorlix.mobilemail MailAccounts"));
+TEST_F(Announcer, TellsNothingOfARepairThatTheLoadMade) {
+  const std::string repairable = "<string>MailAccount</string><key>AccountPath</key><string>Mail/IMAP-x</string>";
+  std::string settings = kOneAccount;
+  settings.replace(settings.find("<string>IMAPAccount</string>"), std::strlen("<string>IMAPAccount</string>"),
+                   repairable);
+  device.put(kSettings, settings);
+  EXPECT_EQ(device.edit({"save"}), 0);
+  EXPECT_EQ(device.firstAccount().text("Class")->string(), "IMAPAccount");
   EXPECT_THAT(subscriber.heard(), IsEmpty());
 }
 

@@ -102,7 +102,7 @@ class Completion(AccountctlTest):
 
     def test_of_commands(self):
         self.assertEqual(re.findall(r"^  ([a-z]+) ", help_of(ACCOUNTCTL), re.MULTILINE), self.offered(ACCOUNTCTL, ""))
-        self.assertEqual(["remove", "rename"], sorted(self.offered(ACCOUNTCTL, "re")))
+        self.assertEqual(["recover", "remove", "rename"], sorted(self.offered(ACCOUNTCTL, "re")))
 
     def test_of_identifiers_of_the_device_that_is_meant(self):
         self.put(HOME_MAIL, CLOUD, {**DIRECTORY, "Identifier": "L 1"})
@@ -171,7 +171,7 @@ class CompletionOfOtherShells(AccountctlTest):
                 self.assertEqual(sorted(offers), sorted(set(shell(line))))
 
     def test_of_commands(self):
-        self.assert_offered(["remove", "rename"], "accountctl re")
+        self.assert_offered(["recover", "remove", "rename"], "accountctl re")
         self.assert_offered(["list"], "accountctl help l")
 
     def test_of_identifiers_of_the_device_that_is_meant(self):

@@ -50,6 +50,17 @@ TEST(Options, LeadToWholePaths) {
   EXPECT_EQ(options.device.resources, std::filesystem::current_path() / "there");
 }
 
+TEST(Options, ThatSetPropertiesMayBeRepeated) {
+  const auto options = parseArguments(Arguments{"recover", "--set", "A=1", "F", "--set=B:=null", "M1"});
+  EXPECT_EQ(options.settings, (std::vector<std::string>{"A=1", "B:=null"}));
+  EXPECT_EQ(options.arguments, (std::vector<std::string>{"F", "M1"}));
+}
+
+TEST(Options, ThatSetPropertiesNeedAValueEachTime) {
+  EXPECT_THROW(static_cast<void>(parseArguments(Arguments{"recover", "--set", "A=1", "--set"})), Failure);
+  EXPECT_THROW(static_cast<void>(parseArguments(Arguments{"recover", "--set=", "F"})), Failure);
+}
+
 TEST(Options, AreNotFoundInAnEmptyWord) {
   EXPECT_THROW(static_cast<void>(parseArguments(Arguments{"", "list"})), Failure);
 }

@@ -24,7 +24,7 @@ function __accountctl_words
             continue
         end
         switch $word
-            case --root --home --resources --columns
+            case --root --home --resources --columns --file --snapshots --set
                 set skips yes
             case '-*'
             case '*'
@@ -62,14 +62,19 @@ end
 complete -c accountctl -f
 complete -c accountctl -n __accountctl_needs_command -a '(__accountctl_commands)'
 complete -c accountctl -n '__accountctl_wants 1 help' -a '(__accountctl_commands)'
-complete -c accountctl -n '__accountctl_wants 1 show enable disable rename remove' -a '(__accountctl_identifiers)'
+complete -c accountctl -n '__accountctl_wants 1 show enable disable rename set remove' -a '(__accountctl_identifiers)'
 complete -c accountctl -n '__accountctl_wants 2 enable disable' -a '(__accountctl_dataclasses)'
 complete -c accountctl -n '__accountctl_wants 1 add' -a '(__accountctl_types)'
-complete -c accountctl -n '__accountctl_wants 1 verify' -F
+complete -c accountctl -n '__accountctl_wants 1 verify diff recover' -F
+complete -c accountctl -n '__accountctl_wants 2 diff' -F
 complete -c accountctl -l root -r -a '(__fish_complete_directories)'
 complete -c accountctl -l home -r -a '(__fish_complete_directories)'
 complete -c accountctl -l resources -r -a '(__fish_complete_directories)'
 complete -c accountctl -l modules
+complete -c accountctl -l file -r -F
+complete -c accountctl -l snapshots -r -a '(__fish_complete_directories)'
+complete -c accountctl -l set -x
+complete -c accountctl -l dry-run
 complete -c accountctl -l json
 complete -c accountctl -l columns -x -a 'identifier type class name user host enabled'
 complete -c accountctl -l wide

@@ -1,0 +1,140 @@
+// What a file, a snapshot or another device holds, for --file.
+
+#include <nlohmann/json.hpp>
+
+#include "commandline/table.h"
+#include "commandline/text.h"
+#include "tools/account_source.h"
+
+namespace tools {
+namespace {
+
+using Json = nlohmann::ordered_json;
+using Rows = std::vector<commandline::Row>;
+
+constexpr int kSchema = 1;
+
+Json orNull(const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); }
+
+Source examinedSource(Session& session, const Options& options) {
+  session.beginLooking();
+  return sourceNamed(*options.file, options);
+}
+
+std::string typeOf(const FoundAccount& account) { return textUnder(account.record, accountsettings::kAccountType); }
+std::string classOf(const FoundAccount& account) { return textUnder(account.record, accountsettings::kAccountClass); }
+
+// "/a/file: settings file, data version 7"
+std::string headOf(const AccountFile& file) {
+  const auto version = file.version();
+  const std::string told = version ? "data version " + std::to_string(*version) : "no data version";
+  return commandline::printable(file.path.string()) + ": " + std::string{nameOf(file.form)} +
+         (file.form == FileForm::settings ? ", " + told : "");
+}
+
+std::string listOf(const AccountFile& file, const commandline::Page& page) {
+  if (file.accounts.empty()) return headOf(file) + ", no accounts\n";
+  Rows rows{commandline::Row{{"PLACE", "IDENTIFIER", "TYPE", "CLASS", "NAME", "USER", "FAULT"},
+                             commandline::Emphasis::strong}};
+  for (const FoundAccount& account : file.accounts) {
+    const auto names = namesOf(account.record);
+    rows.push_back(
+        {account.place(), names.identifier, typeOf(account), classOf(account), names.name, names.user, account.fault});
+  }
+  return headOf(file) + "\n" + commandline::table(rows, page);
+}
+
+Json jsonOf(const FoundAccount& account) {
+  const auto names = namesOf(account.record);
+  return {{"place", account.place()},        {"identifier", orNull(names.identifier)},
+          {"type", orNull(typeOf(account))}, {"class", orNull(classOf(account))},
+          {"name", orNull(names.name)},      {"user", orNull(names.user)},
+          {"host", orNull(names.host)},      {"fault", orNull(account.fault)}};
+}
+
+Json jsonOf(const AccountFile& file) {
+  const auto version = file.version();
+  Json report{{"file", commandline::printable(file.path.string())},
+              {"form", codeOf(file.form)},
+              {"version", version ? Json(*version) : Json(nullptr)},
+              {"accounts", Json::array()}};
+  for (const FoundAccount& account : file.accounts) report["accounts"].push_back(jsonOf(account));
+  return report;
+}
+
+std::string printed(const Json& report) { return report.dump(2) + "\n"; }
+
+// A file of the first releases as verify tells of it: nothing is a finding there but what keeps it from being
+// converted.
+Outcome verifyLegacyFile(const AccountFile& file, const Options& options) {
+  std::string text = headOf(file) + "\n";
+  Json report{{"file", commandline::printable(file.path.string())},
+              {"accounts", file.accounts.size()},
+              {"findings", Json::array()}};
+  for (const FoundAccount& account : file.accounts) {
+    if (account.fault.empty()) continue;
+    const std::string migration = "a migration deletes the file all the same; see accountctl help recover";
+    text += commandline::printable(account.described() + ": " + account.fault) + "\n    " + migration + "\n";
+    report["findings"].push_back({{"kind", "refused-description"},
+                                  {"place", account.place()},
+                                  {"identifier", orNull(namesOf(account.record).identifier)},
+                                  {"what", account.fault},
+                                  {"migration", migration}});
+  }
+  return {options.printsJson ? printed(report) : text,
+          report["findings"].empty() ? ExitStatus::done : ExitStatus::findings};
+}
+
+Outcome verifyFile(Session& session, const AccountFile& file, const Options& options) {
+  if (file.form != FileForm::settings) return verifyLegacyFile(file, options);
+  return verifySettings(session, {file.path.string()}, options);
+}
+
+}  // namespace
+
+Outcome listFile(Session& session, const Words&, const Options& options) {
+  const auto source = examinedSource(session, options);
+  Json report{{"schema", kSchema}, {"files", Json::array()}};
+  std::string text;
+  for (const AccountFile& file : source.files) {
+    report["files"].push_back(jsonOf(file));
+    text += listOf(file, options.page());
+  }
+  return options.printsJson ? printed(report) : text;
+}
+
+Outcome showInFile(Session& session, const Words& arguments, const Options& options) {
+  const auto source = examinedSource(session, options);
+  const auto [file, account] = accountMeantBy(source, arguments[0]);
+  if (options.printsJson) {
+    Json report{{"schema", kSchema}, {"file", commandline::printable(file->path.string())}};
+    report.update(jsonOf(*account));
+    report["properties"] = tools::jsonOf(account->properties);
+    return printed(report);
+  }
+  const auto page = options.page();
+  Rows summary{{"File", file->path.string()}, {"Place", account->place()}};
+  if (!account->fault.empty()) summary.push_back({"Fault", account->fault});
+  Rows properties;
+  for (const auto& [key, value] : account->properties) properties.push_back({"  " + key.string(), lineOf(value, key)});
+  return commandline::table(summary, page) +
+         commandline::emphasised("Properties", commandline::Emphasis::strong, page) + "\n" +
+         commandline::table(properties, page);
+}
+
+Outcome verifyFiles(Session& session, const Words& arguments, const Options& options) {
+  if (!arguments.empty()) throw Failure{ExitStatus::wrongUse, "--file says already what is to be verified"};
+  const auto source = examinedSource(session, options);
+  Json report{{"schema", kSchema}, {"files", Json::array()}};
+  std::string text;
+  auto status = ExitStatus::done;
+  for (const AccountFile& file : source.files) {
+    const auto verified = verifyFile(session, file, options);
+    if (verified.status != ExitStatus::done) status = verified.status;
+    if (options.printsJson) report["files"].push_back(Json::parse(verified.output));
+    text += verified.output;
+  }
+  return {options.printsJson ? printed(report) : text, status};
+}
+
+}  // namespace tools

@@ -1,0 +1,69 @@
+#include "tools/next_load.h"
+
+#include "records/loss.h"
+#include "tools/account_view.h"
+
+namespace tools {
+namespace {
+
+using accountsettings::Array;
+using accountsettings::Dictionary;
+using accountsettings::PropertyValue;
+using accountsettings::WhyLeftOut;
+using records::LossCode;
+
+LossCode codeOf(WhyLeftOut why) {
+  switch (why) {
+    case WhyLeftOut::noRecord: return LossCode::droppedNoRecord;
+    case WhyLeftOut::noType: return LossCode::droppedNoType;
+    case WhyLeftOut::unknownType: return LossCode::droppedUnknownType;
+    case WhyLeftOut::noClass: return LossCode::droppedNoClass;
+    case WhyLeftOut::givenUp: break;
+  }
+  return LossCode::droppedUnknownClass;
+}
+
+std::string repairOf(const BasicAccount& loaded) {
+  for (const auto& [key, value] : loaded.properties()) {
+    const PropertyValue* const given = loaded.originalProperties().find(key);
+    const bool isRepair = given != nullptr && *given != value && key != accountsettings::kAccountIdentifier;
+    if (isRepair) return "set " + key.string() + " to " + lineOf(value, key);
+  }
+  return {};
+}
+
+std::string faultOfChildren(const Dictionary& record) {
+  const PropertyValue* const children = record.find(accountsettings::kAccountChildAccounts);
+  if (children == nullptr) return {};
+  const Array* const array = children->asArray();
+  if (array == nullptr) return "find none of its children: they are no array";
+  for (std::size_t index = 0; index < array->size(); ++index) {
+    const std::string fault = faultOfChild((*array)[index]);
+    if (!fault.empty()) return "not find its child " + std::to_string(index) + ": " + fault;
+  }
+  return {};
+}
+
+}  // namespace
+
+std::string_view reasonFor(WhyLeftOut why) { return records::meaningOf(codeOf(why)).text; }
+
+std::string faultOfChild(const PropertyValue& element) {
+  const auto* const child = element.asDictionary();
+  if (child == nullptr) return std::string{reasonFor(WhyLeftOut::noRecord)};
+  const auto alone = AccountsManager::initWithAccounsInfoArray({element});
+  for (const auto& each : alone->loadOutcome().leftOut) {
+    if (each.why != WhyLeftOut::givenUp) return std::string{reasonFor(each.why)};
+  }
+  return child->text(accountsettings::kAccountIdentifier) == nullptr ? "it has no identifier" : "";
+}
+
+std::string faultAtNextLoad(const Dictionary& record) {
+  const auto store = AccountsManager::initWithAccounsInfoArray({record});
+  const auto& leftOut = store->loadOutcome().leftOut;
+  if (!leftOut.empty()) return "drop it: " + std::string{reasonFor(leftOut.front().why)};
+  const std::string repair = repairOf(*store->allBasicAccounts().front());
+  return repair.empty() ? faultOfChildren(record) : repair;
+}
+
+}  // namespace tools

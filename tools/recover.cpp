@@ -1,0 +1,159 @@
+#include <algorithm>
+#include <array>
+#include <nlohmann/json.hpp>
+
+#include "commandline/text.h"
+#include "tools/recovery.h"
+
+namespace tools {
+namespace {
+
+using Json = nlohmann::ordered_json;
+
+constexpr int kSchema = 1;
+
+// --- Doing it ---
+
+using Concerned = Session::Concerned;
+
+Account accountOf(AccountsManager& store, const RecoveryStep& step) {
+  auto account = BasicAccount::initWithProperties(step.record);
+  if (step.parent) account->setParentAccount(store.accountWithIdentifier(*step.parent));
+  return account;
+}
+
+void bringBack(Session& session, const RecoveryPlan& plan) {
+  AccountsManager& store = session.accounts();
+  Concerned concerned;
+  for (const RecoveryStep& step : plan.steps()) {
+    if (step.kind != RecoveryStep::Kind::bringBack) continue;
+    const auto account = accountOf(store, step);
+    concerned.emplace_back(account, enabledOf(*account));
+  }
+  if (concerned.empty()) return;
+  session.changeAndSave(concerned, [&] {
+    for (const auto& [account, dataclasses] : concerned) {
+      if (const auto& parent = account->parentAccount()) {
+        store.addChild_toAccount(account, parent);
+      } else {
+        store.insertAccount(account);
+      }
+    }
+  });
+}
+
+// --- Telling it ---
+
+std::string lineOf(const RecoveryStep& step, const AccountFile& file, bool isTried) {
+  const std::string what = step.from->described();
+  const std::string why = step.why.empty() ? "" : ": " + step.why;
+  switch (step.kind) {
+    case RecoveryStep::Kind::leavePresent: return "already there: " + what + why;
+    case RecoveryStep::Kind::leaveFaulty: return "left: " + what + why;
+    case RecoveryStep::Kind::bringBack: break;
+  }
+  const std::string version = file.isOlder() ? "; what a migration from data version " +
+                                                   std::to_string(file.version().value_or(0)) +
+                                                   " does to such an account was not done"
+                                             : "";
+  return (isTried ? "would bring back: " : "brought back: ") + what + why + version;
+}
+
+Json jsonOf(const RecoveryStep& step) {
+  static constexpr std::array kOutcomes{"recovered", "present", "faulty"};
+  return {{"outcome", kOutcomes.at(static_cast<std::size_t>(step.kind))},
+          {"place", step.from->place()},
+          {"identifier", namesOf(step.record).identifier},
+          {"name", namesOf(step.record).name},
+          {"why", step.why.empty() ? Json(nullptr) : Json(step.why)}};
+}
+
+Outcome told(const RecoveryPlan& plan, const AccountFile& file, const Options& options) {
+  Json report{{"schema", kSchema}, {"dryRun", options.changesNothing}, {"accounts", Json::array()}};
+  std::string text;
+  bool isFaulty = false;
+  for (const RecoveryStep& step : plan.steps()) {
+    report["accounts"].push_back(jsonOf(step));
+    text += commandline::printable(lineOf(step, file, options.changesNothing)) + "\n";
+    isFaulty |= step.kind == RecoveryStep::Kind::leaveFaulty;
+  }
+  if (plan.steps().empty()) text = "there are no accounts\n";
+  return {options.printsJson ? report.dump(2) + "\n" : text, isFaulty ? ExitStatus::incomplete : ExitStatus::done};
+}
+
+void refuseFaulty(const RecoveryPlan& plan) {
+  for (const RecoveryStep& step : plan.steps()) {
+    if (step.kind != RecoveryStep::Kind::leaveFaulty) continue;
+    throw Failure{ExitStatus::failed, step.from->described() + " cannot be brought back: " + step.why};
+  }
+}
+
+// Of an earlier release's file, an account that is not there may have been folded into another one by the migration.
+void refuseUnnamed(const RecoveryPlan& plan, const AccountFile& file) {
+  std::string absent;
+  for (const RecoveryStep& step : plan.steps()) {
+    if (step.kind == RecoveryStep::Kind::bringBack) absent += (absent.empty() ? "" : "; ") + step.from->described();
+  }
+  if (absent.empty()) return;
+  throw Failure{ExitStatus::wrongUse,
+                file.path.string() + " is of data version " + std::to_string(file.version().value_or(0)) +
+                    ", and a migration may have folded what is missing now into other accounts; name what is to come "
+                    "back of: " +
+                    absent};
+}
+
+// Children come back with their parents, and by themselves only where the parent is there.
+bool comesWithParent(const FoundAccount& account, const RecoveryPlan& plan) {
+  if (!account.child) return false;
+  const auto parent = std::ranges::find_if(plan.steps().rbegin(), plan.steps().rend(),
+                                           [](const RecoveryStep& step) { return !step.from->child; });
+  return parent->kind != RecoveryStep::Kind::leavePresent;
+}
+
+Outcome recoverRecords(Session& session, const AccountFile& file, const std::vector<const FoundAccount*>& named,
+                       const Options& options) {
+  session.beginChanges();
+  RecoveryPlan plan{session.accounts()};
+  for (const FoundAccount* each : named) plan.add(file, *each, withProperties(each->properties, options.settings));
+  if (named.empty()) {
+    for (const FoundAccount& each : file.accounts) {
+      if (!comesWithParent(each, plan)) plan.add(file, each, each.properties);
+    }
+    if (file.isOlder()) refuseUnnamed(plan, file);
+  } else {
+    refuseFaulty(plan);
+  }
+  bringBack(session, plan);
+  return told(plan, file, options);
+}
+
+// The one file that the accounts are taken from: that of those that are named, else the only one, or the settings.
+const AccountFile& fileMeant(const Source& source, const std::vector<Chosen>& named) {
+  if (named.empty()) return source.files.front();
+  for (const Chosen& each : named) {
+    if (each.file == named.front().file) continue;
+    throw Failure{ExitStatus::wrongUse, "the accounts stand in several files: bring back those of one at a time"};
+  }
+  return *named.front().file;
+}
+
+}  // namespace
+
+Outcome recoverAccounts(Session& session, const Words& arguments, const Options& options) {
+  const bool isNamed = arguments.size() > 1;
+  if (!options.settings.empty() && !isNamed) {
+    throw Failure{ExitStatus::wrongUse, "--set is for accounts that are named"};
+  }
+  const auto source = sourceNamed(arguments[0], options);
+  std::vector<Chosen> chosen;
+  for (std::size_t index = 1; index < arguments.size(); ++index) {
+    chosen.push_back(accountMeantBy(source, arguments[index]));
+  }
+  const AccountFile& file = fileMeant(source, chosen);
+  std::vector<const FoundAccount*> named;
+  for (const Chosen& each : chosen) named.push_back(each.account);
+  if (file.form == FileForm::settings) return recoverRecords(session, file, named, options);
+  return recoverLegacyFile(session, file, named, options);
+}
+
+}  // namespace tools
