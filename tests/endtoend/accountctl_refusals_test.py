@@ -162,7 +162,7 @@ class FailedSaves(AccountctlTest):
 
     def test_for_want_of_a_mobile_user_say_so(self):
         self.tree.write("etc/passwd", "")
-        self.assert_not_saved(": Could not find the account mobile: .+")
+        self.assert_not_saved(": Could not find the account mobile for .+: .+")
 
     def test_where_the_directory_may_not_be_written(self):
         directory = self.tree.path(SETTINGS).parent
