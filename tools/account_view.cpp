@@ -145,10 +145,13 @@ Json jsonOf(const BasicAccount::Dataclasses& dataclasses) {
 
 Json jsonOf(const BasicAccount& account) {
   const auto enabled = account.enabledDataclasses();
+  const auto orNull = [](const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); };
   return {{"identifier", jsonOf(account.identifier())},
           {"type", jsonOf(account.type())},
           {"class", jsonOf(account.accountClass())},
-          {"name", nameOf(account)},
+          {"name", orNull(nameOf(account))},
+          {"user", orNull(ownText(account, accountsettings::kAccountUsername))},
+          {"host", orNull(ownText(account, kAccountHost))},
           {"parent", jsonOf(account.parentAccountIdentifier())},
           {"enabled", enabled ? jsonOf(*enabled) : Json(nullptr)},
           {"supported", jsonOf(account.supportedDataclasses())}};

@@ -43,9 +43,10 @@ const std::vector<Command>& commands() {
        "which columns are shown.",
        0, 0, listAccounts, false, listFile},
       {"show", "ID", "one account with its properties", kId, 1, 1, showAccount, false, showInFile},
-      {"verify", "[FILE]", "what a migration would do about each fault",
-       "Without FILE, the device's own settings file is examined. Nothing is changed.", 0, 1, verifySettings, false,
-       verifyFiles},
+      {"verify", "[FILE]", "what is wrong, what a migration does about it, and what to do",
+       "Without FILE, every file of the device is examined. Nothing is changed. The status is 0 where nothing was "
+       "found, 5 where something was, and 1 where a file could not be read.",
+       0, 1, verifySettings, false, verifyFiles},
       {"diff", "A [B]", "what differs between two files, snapshots or devices", kDiff, 1, 2, compareAccounts},
       {"recover", "FROM [ACCOUNT]...", "bring accounts back into the store", kRecover, 1, kAnyNumber, recoverAccounts,
        true},

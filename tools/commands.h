@@ -36,7 +36,7 @@ struct Command {
 
 [[nodiscard]] const std::vector<Command>& commands();
 
-// help.cpp
+// help.cpp; of the command alone where one is given beside --help.
 [[nodiscard]] std::string help(const Options& options);
 // The command of that name; throws WrongUse where there is none.
 [[nodiscard]] const Command& commandNamed(const std::string& name);

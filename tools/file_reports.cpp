@@ -64,32 +64,6 @@ Json jsonOf(const AccountFile& file) {
 
 std::string printed(const Json& report) { return report.dump(2) + "\n"; }
 
-// A file of the first releases as verify tells of it: nothing is a finding there but what keeps it from being
-// converted.
-Outcome verifyLegacyFile(const AccountFile& file, const Options& options) {
-  std::string text = headOf(file) + "\n";
-  Json report{{"file", commandline::printable(file.path.string())},
-              {"accounts", file.accounts.size()},
-              {"findings", Json::array()}};
-  for (const FoundAccount& account : file.accounts) {
-    if (account.fault.empty()) continue;
-    const std::string migration = "a migration deletes the file all the same; see accountctl help recover";
-    text += commandline::printable(account.described() + ": " + account.fault) + "\n    " + migration + "\n";
-    report["findings"].push_back({{"kind", "refused-description"},
-                                  {"place", account.place()},
-                                  {"identifier", orNull(namesOf(account.record).identifier)},
-                                  {"what", account.fault},
-                                  {"migration", migration}});
-  }
-  return {options.printsJson ? printed(report) : text,
-          report["findings"].empty() ? ExitStatus::done : ExitStatus::findings};
-}
-
-Outcome verifyFile(Session& session, const AccountFile& file, const Options& options) {
-  if (file.form != FileForm::settings) return verifyLegacyFile(file, options);
-  return verifySettings(session, {file.path.string()}, options);
-}
-
 }  // namespace
 
 Outcome listFile(Session& session, const Words&, const Options& options) {
@@ -129,7 +103,7 @@ Outcome verifyFiles(Session& session, const Words& arguments, const Options& opt
   std::string text;
   auto status = ExitStatus::done;
   for (const AccountFile& file : source.files) {
-    const auto verified = verifyFile(session, file, options);
+    const auto verified = verifySettings(session, {file.path.string()}, options);
     if (verified.status != ExitStatus::done) status = verified.status;
     if (options.printsJson) report["files"].push_back(Json::parse(verified.output));
     text += verified.output;

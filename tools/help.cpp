@@ -17,8 +17,8 @@ constexpr std::string_view kStatuses =
     "\n"
     "Credentials are never printed. accountctl help COMMAND tells more.\n"
     "\n"
-    "Exit status: 0 done, 1 failed or findings, 2 wrong use, 3 no such account,\n"
-    "4 the configuration or a module is at fault.\n";
+    "Exit status: 0 done, 1 failed, 2 wrong use, 3 no such account,\n"
+    "4 the configuration or a module is at fault, 5 verify has findings.\n";
 
 commandline::Page pageOf(const Options& options) {
   auto page = options.page();
@@ -26,10 +26,21 @@ commandline::Page pageOf(const Options& options) {
   return page;
 }
 
+std::string helpOf(const Command& command, const commandline::Page& page) {
+  std::string text = "Usage: accountctl [OPTION]... " + usageOf(command) + "\n\n";
+  for (const auto paragraph : {command.summary, command.details}) {
+    for (const std::string& line : commandline::wrapped(paragraph, *page.columns)) {
+      if (!line.empty()) text += line + "\n";
+    }
+  }
+  return text;
+}
+
 }  // namespace
 
 std::string help(const Options& options) {
   const auto page = pageOf(options);
+  if (!options.command.empty() && options.printsHelp) return helpOf(commandNamed(options.command), page);
   std::vector<commandline::Meaning> list;
   for (const Command& command : commands()) list.push_back({usageOf(command), std::string{command.summary}});
   return std::string{kUsage} + commandline::meanings(list, page) + "\n" + helpOfOptions(page) + std::string{kStatuses};
@@ -49,15 +60,7 @@ std::string usageOf(const Command& command) {
 }
 
 Outcome helpOnCommand(Session&, const Words& arguments, const Options& options) {
-  if (arguments.empty()) return help(options);
-  const Command& command = commandNamed(arguments[0]);
-  std::string text = "Usage: accountctl [OPTION]... " + usageOf(command) + "\n\n";
-  for (const auto paragraph : {command.summary, command.details}) {
-    for (const std::string& line : commandline::wrapped(paragraph, *pageOf(options).columns)) {
-      if (!line.empty()) text += line + "\n";
-    }
-  }
-  return text;
+  return arguments.empty() ? help(options) : helpOf(commandNamed(arguments[0]), pageOf(options));
 }
 
 }  // namespace tools

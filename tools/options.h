@@ -17,12 +17,12 @@ namespace tools {
 enum class ExitStatus : int {
   done = 0,
   failed = 1,              // the accounts could not be read or saved; the file is as it was
-  findings = 1,            // a file that was to be verified has faults; for scripts as good as one that cannot be read
   incomplete = 1,          // some of the accounts that were to come back are faulty; the others are back
   different = 1,           // what was compared is not the same
   wrongUse = 2,            // what was asked makes no sense; nothing was changed
   noSuchAccount = 3,       // nothing was changed
   faultyInstallation = 4,  // the configuration or a module is at fault; the message says whether the change was saved
+  findings = 5,            // what was to be verified could be read, and there is something to say about it
 };
 
 // Ends a command that cannot do what it was asked.

@@ -125,7 +125,7 @@ void Examination::addRepairs(const Dictionary& before, const Dictionary& after) 
     const PropertyValue* const given = before.find(key);
     const bool isRepair = given != nullptr && *given != value && key != accountsettings::kAccountIdentifier;
     if (!isRepair) continue;
-    add("unknown-class", before, clauseOf(before, key) + ", which the mail application does not know",
+    add("repairable-class", before, clauseOf(before, key) + ", which the mail application does not know",
         "a migration sets it to " + lineOf(value, key));
   }
 }

@@ -33,15 +33,16 @@ struct Column {
   std::string (*cell)(const BasicAccount& account);
 };
 
+std::string shownName(const BasicAccount& account) {
+  const std::string name = nameOf(account);
+  return name.empty() ? "(no name)" : name;
+}
+
 constexpr Column kColumns[] = {
     {"identifier", true, [](const BasicAccount& account) { return textOf(account.identifier()); }},
     {"type", true, [](const BasicAccount& account) { return textOf(account.type()); }},
     {"class", true, [](const BasicAccount& account) { return textOf(account.accountClass()); }},
-    {"name", true,
-     [](const BasicAccount& account) {
-       const std::string name = nameOf(account);
-       return name.empty() ? "(no name)" : name;
-     }},
+    {"name", true, shownName},
     {"user", true, [](const BasicAccount& account) { return ownText(account, accountsettings::kAccountUsername); }},
     {"host", false, [](const BasicAccount& account) { return ownText(account, kAccountHost); }},
     {"enabled", true,
@@ -74,22 +75,28 @@ commandline::Row rowOf(const std::vector<Column>& columns, const BasicAccount& a
   return commandline::Row{std::move(cells)};
 }
 
+std::string counted(std::size_t count, std::string_view what) {
+  return std::to_string(count) + " " + std::string{what} + (count == 1 ? "" : "s");
+}
+
 // "12 accounts, 2 of them in others"
 std::string tally(std::size_t accounts, std::size_t children) {
-  const std::size_t count = accounts + children;
-  const std::string all = std::to_string(count) + (count == 1 ? " account" : " accounts");
+  const std::string all = counted(accounts + children, "account");
   return children == 0 ? all : all + ", " + std::to_string(children) + " of them in others";
 }
 
 bool isThere(const platform::Path& path) { return platform::current().files->kindOf(path).isOk(); }
 
-// What a reader of the list cannot see in it.
-void sayWhatIsNotListed() {
-  const bool hasLegacyFiles = isThere(accountsettings::daAccountPath()) || isThere(accountsettings::mailAccountsPath());
-  if (hasLegacyFiles && !isThere(AccountsManager::fullPathToAccountSettingsPlist())) {
-    commandline::say("accountctl",
-                     "the device has account files of the first releases alone; a migration converts them");
+// What a reader of the list cannot see in it; empty where it has everything.
+std::string whatIsNotListed(const AccountsManager& accounts) {
+  const auto path = AccountsManager::fullPathToAccountSettingsPlist();
+  if (const std::size_t count = accounts.loadOutcome().leftOut.size(); count > 0) {
+    return counted(count, "record") + " of the settings file cannot be loaded; accountctl verify tells why";
   }
+  if (isThere(path)) return accounts.count() == 0 ? "the settings file has no accounts: " + path.string() : "";
+  const bool isLegacy = isThere(accountsettings::daAccountPath()) || isThere(accountsettings::mailAccountsPath());
+  return isLegacy ? "the device has account files of the first releases alone; a migration converts them"
+                  : "the device has no settings file: " + path.string();
 }
 
 // --- One account ---
@@ -129,7 +136,7 @@ Rows summaryOf(ChildrenByParent& byParent, const Account& account, const std::op
   Rows rows{{"Identifier", textOf(account->identifier())},
             {"Type", textOf(account->type())},
             {"Class", textOf(account->accountClass())},
-            {"Name", nameOf(*account)},
+            {"Name", shownName(*account)},
             {"Enabled", enabled ? joinedDataclasses(*enabled) : "(no list)"},
             {"Supported", joinedDataclasses(account->supportedDataclasses())}};
   if (service) rows.push_back({"Service", textOf(*service)});
@@ -165,7 +172,7 @@ Outcome listAccounts(Session& session, const Words&, const Options& options) {
     rows.push_back(rowOf(columns, *account, ""));
     for (const auto& child : byParent[account.get()]) rows.push_back(rowOf(columns, *child, "  "));
   }
-  sayWhatIsNotListed();
+  if (const auto told = whatIsNotListed(accounts); !told.empty()) commandline::say("accountctl", told);
   const auto page = options.page();
   const std::size_t top = accounts.allBasicAccounts().size();
   const bool isForPeople = ::isatty(STDOUT_FILENO) == 1;

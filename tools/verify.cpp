@@ -1,11 +1,16 @@
+#include <algorithm>
 #include <filesystem>
+#include <iterator>
 #include <nlohmann/json.hpp>
 #include <optional>
 
+#include "commandline/program.h"
+#include "commandline/table.h"
 #include "commandline/text.h"
 #include "platform/platform.h"
 #include "tools/commands.h"
 #include "tools/findings.h"
+#include "tools/remedies.h"
 
 namespace tools {
 namespace {
@@ -15,13 +20,22 @@ using accountsettings::Dictionary;
 using accountsettings::Text;
 using commandline::printable;
 using platform::Path;
+using platform::Result;
+using platform::Status;
 using Json = nlohmann::ordered_json;
 
-struct Examined {
+struct ExaminedFile {
   Path path;
-  bool exists = true;
-  std::size_t accounts = 0;
+  std::string_view form;                // "settings", "exchange", "mail" or "other", for scripts
+  std::optional<std::size_t> accounts;  // none where no accounts are looked for, or nothing stands there
   Findings findings;
+  bool isThere = true;
+};
+
+// What was looked at, and the files that could not be opened, each with the reason.
+struct Examination {
+  std::vector<ExaminedFile> files;
+  std::vector<std::string> unopened;
 };
 
 const Array& recordsIn(const Dictionary& file) {
@@ -34,34 +48,95 @@ void append(Findings& findings, Findings more) {
   findings.insert(findings.end(), std::make_move_iterator(more.begin()), std::make_move_iterator(more.end()));
 }
 
-Finding unreadable(const Path& path, const platform::Status& reading) {
-  if (reading.cause() == platform::Cause::other) {
-    const auto kind = platform::current().files->kindOf(path);
-    if (kind.isOk() && kind.value() != platform::FileKind::file) {
-      return {"unreadable", "", "", "there is something else than a file", "a migration cannot save"};
-    }
-    throw Failure{ExitStatus::failed, "the file cannot be opened: " + path.string() + ": " + reading.reason()};
+constexpr std::string_view formOf(LegacyForm form) { return form == LegacyForm::mail ? "mail" : "exchange"; }
+
+// Notes that the file could not be read, where something stands there and nothing has told of it yet.
+void noteUnread(const Status& reading, Part part, ExaminedFile& file, Examination& examination) {
+  if (reading.isOk() || reading.cause() == platform::Cause::missing) return;
+  const auto isNoFile = [](const Finding& each) { return each.kind == "no-file"; };
+  if (reading.cause() != platform::Cause::other) {
+    file.findings.push_back(unreadable(reading, part));
+  } else if (std::ranges::none_of(file.findings, isNoFile)) {
+    examination.unopened.push_back("the file cannot be opened: " + file.path.string() + ": " + reading.reason());
   }
-  const bool isPlanted = reading.cause() == platform::Cause::unsafe;
-  return {"unreadable", "", "",
-          isPlanted ? "somebody else may have put it there: " + reading.reason() : reading.reason(),
-          "a migration takes it for an empty one and saves a file without accounts in its place"};
 }
 
-Examined examine(const Path& path) {
-  const auto file =
-      platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist());
-  if (file.cause() == platform::Cause::missing) return {path, false, 0, {}};
-  if (!file.isOk()) return {path, true, 0, {unreadable(path, file.status())}};
-  const Dictionary& root = file.value();
-  Examined examined{path, true, recordsIn(root).size(), findingsOfRoot(root)};
-  append(examined.findings, findingsOfVersion(root));
-  append(examined.findings, findingsOfRecords(recordsIn(root)));
-  return examined;
+void examineSettings(const Path& path, Examination& examination) {
+  const auto settings = AccountsManager::fullPathToAccountSettingsPlist();
+  ExaminedFile file{path, "settings", {}, {}};
+  if (path == settings) file.findings = findingsOfStanding(path, Part::settings);
+  const auto read = platform::current().propertyLists->readDictionary(settings);
+  file.isThere = read.cause() != platform::Cause::missing;
+  noteUnread(read.status(), Part::settings, file, examination);
+  if (read.isOk()) {
+    file.accounts = recordsIn(read.value()).size();
+    append(file.findings, findingsOfRoot(read.value()));
+    append(file.findings, findingsOfVersion(read.value()));
+    append(file.findings, findingsOfRecords(recordsIn(read.value())));
+    for (const LegacyForm form : {LegacyForm::exchange, LegacyForm::mail}) {
+      if (path != settings || !platform::current().files->kindOf(pathOf(form)).isOk()) continue;
+      const auto legacy = platform::current().propertyLists->readDictionary(pathOf(form));
+      append(file.findings, findingsOfReplacement(form, legacy.valueOr({}), read.value()));
+    }
+  }
+  examination.files.push_back(std::move(file));
 }
+
+void examineLegacy(LegacyForm form, Examination& examination) {
+  ExaminedFile file{pathOf(form), formOf(form), {}, findingsOfStanding(pathOf(form), Part::legacy)};
+  const auto read = platform::current().propertyLists->readDictionary(file.path);
+  if (read.cause() == platform::Cause::missing && file.findings.empty()) return;
+  noteUnread(read.status(), Part::legacy, file, examination);
+  if (read.isOk()) {
+    file.accounts = countOfDescriptions(form, read.value());
+    append(file.findings, findingsOfConversion(form, read.value()));
+    append(file.findings, findingsOfDescriptions(form, read.value()));
+  }
+  examination.files.push_back(std::move(file));
+}
+
+Examination examineDevice() {
+  Examination examination;
+  examineSettings(AccountsManager::fullPathToAccountSettingsPlist(), examination);
+  examineLegacy(LegacyForm::exchange, examination);
+  examineLegacy(LegacyForm::mail, examination);
+  for (Leftover& each : leftoversOnDevice()) {
+    examination.files.push_back({std::move(each.path), "other", {}, {std::move(each.finding)}});
+  }
+  return examination;
+}
+
+// A file of the first releases by its keys, wherever it lies; any other as a settings file.
+Examination examineNamed(const Path& path) {
+  const auto read =
+      platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist());
+  if (read.cause() == platform::Cause::missing) throw Failure{ExitStatus::failed, "there is no file " + path.string()};
+  Examination examination;
+  const auto form = read.isOk() ? legacyFormOf(read.value()) : std::nullopt;
+  if (form) {
+    examination.files.push_back(
+        {path, formOf(*form), countOfDescriptions(*form, read.value()), findingsOfDescriptions(*form, read.value())});
+  } else {
+    examineSettings(path, examination);
+  }
+  return examination;
+}
+
+// --- The report ---
 
 std::string counted(std::size_t count, const std::string& what) {
   return (count == 0 ? "no" : std::to_string(count)) + " " + what + (count == 1 ? "" : "s");
+}
+
+std::string headOf(const ExaminedFile& file) {
+  std::string head = file.path.string() + ": ";
+  if (!file.isThere) {
+    head += "there is no settings file";
+    return head + (file.findings.empty() ? "" : ", " + counted(file.findings.size(), "finding"));
+  }
+  const std::string which = file.form == "settings" ? ", " : " of the first releases, ";
+  if (file.accounts) head += counted(*file.accounts, "account") + which;
+  return head + counted(file.findings.size(), "finding");
 }
 
 std::string headOf(const Finding& finding) {
@@ -69,31 +144,63 @@ std::string headOf(const Finding& finding) {
   return finding.place.empty() ? "" : finding.place + identifier + ": ";
 }
 
-std::string reportFor(const Examined& examined) {
-  std::string report = printable(examined.path.string()) + ": ";
-  if (!examined.exists) return report + "there is no settings file\n";
-  report += counted(examined.accounts, "account") + ", " + counted(examined.findings.size(), "finding") + "\n";
-  for (const Finding& each : examined.findings) {
-    report += printable(headOf(each) + each.what) + "\n    " + printable(each.migration) + "\n";
+// A paragraph that goes on below itself where the page is too narrow.
+std::string paragraph(const std::string& text, std::size_t indentation, const commandline::Page& page) {
+  const std::string shown = printable(text);
+  if (!page.columns) return std::string(indentation, ' ') + shown + "\n";
+  std::string lines;
+  for (const std::string& line :
+       commandline::wrapped(shown, *page.columns - std::min(indentation, *page.columns - 1))) {
+    lines += std::string(indentation, ' ') + line + "\n";
+  }
+  return lines;
+}
+
+std::string reportFor(const Examination& examination, const Options& options) {
+  constexpr std::size_t kIndentation = 4;
+  const auto page = options.page();
+  std::string report;
+  for (const ExaminedFile& file : examination.files) {
+    report += commandline::emphasised(printable(headOf(file)), commandline::Emphasis::strong, page) + "\n";
+    for (const Finding& each : file.findings) {
+      const auto [advice, command] = remedyFor(each, file.path, options);
+      report += paragraph(headOf(each) + each.what, 0, page) + paragraph(each.migration, kIndentation, page);
+      report += paragraph(advice + (command.empty() ? "" : ":"), kIndentation, page);
+      if (!command.empty()) report += std::string(2 * kIndentation, ' ') + printable(command) + "\n";
+    }
   }
   return report;
 }
 
-Json jsonOf(const Finding& finding) {
-  const auto orNull = [](const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); };
+Json orNull(const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); }
+
+Json jsonOf(const Finding& finding, const Path& file, const Options& options) {
+  const auto [advice, command] = remedyFor(finding, file, options);
   return {{"kind", finding.kind},
+          {"file", Text{file.string()}.string()},
           {"place", orNull(finding.place)},
           {"identifier", orNull(finding.identifier)},
           {"what", finding.what},
-          {"migration", finding.migration}};
+          {"migration", finding.migration},
+          {"advice", advice},
+          {"command", orNull(command)}};
 }
 
-std::string jsonFor(const Examined& examined) {
-  Json report{{"file", examined.exists ? Json(Text{examined.path.string()}.string()) : Json(nullptr)},
-              {"accounts", examined.accounts},
-              {"findings", Json::array()}};
-  for (const Finding& each : examined.findings) report["findings"].push_back(jsonOf(each));
+std::string jsonFor(const Examination& examination, const Options& options) {
+  Json report{{"files", Json::array()}, {"findings", Json::array()}};
+  for (const ExaminedFile& file : examination.files) {
+    report["files"].push_back({{"file", Text{file.path.string()}.string()},
+                               {"form", file.form},
+                               {"accounts", file.accounts ? Json(*file.accounts) : Json(nullptr)}});
+    for (const Finding& each : file.findings) report["findings"].push_back(jsonOf(each, file.path, options));
+  }
   return report.dump(2) + "\n";
+}
+
+ExitStatus statusOf(const Examination& examination) {
+  if (!examination.unopened.empty()) return ExitStatus::failed;
+  const bool isClean = std::ranges::all_of(examination.files, [](const auto& file) { return file.findings.empty(); });
+  return isClean ? ExitStatus::done : ExitStatus::findings;
 }
 
 }  // namespace
@@ -103,10 +210,9 @@ Outcome verifySettings(Session& session, const Words& arguments, const Options& 
   if (isNamed && arguments[0].empty()) throw Failure{ExitStatus::wrongUse, "the file to verify has no name"};
   const auto named = isNamed ? std::optional{std::filesystem::absolute(arguments[0])} : std::nullopt;
   session.beginExamination(named);
-  const auto examined = examine(named.value_or(AccountsManager::fullPathToAccountSettingsPlist()));
-  if (isNamed && !examined.exists) throw Failure{ExitStatus::failed, "there is no file " + named->string()};
-  const auto status = examined.findings.empty() ? ExitStatus::done : ExitStatus::findings;
-  return {options.printsJson ? jsonFor(examined) : reportFor(examined), status};
+  const auto examination = named ? examineNamed(*named) : examineDevice();
+  for (const std::string& each : examination.unopened) commandline::say("accountctl", each);
+  return {options.printsJson ? jsonFor(examination, options) : reportFor(examination, options), statusOf(examination)};
 }
 
 }  // namespace tools

@@ -3,6 +3,7 @@
 import os
 from pathlib import Path
 
+import schemas
 from device import CURRENT_VERSION, SETTINGS, TEMPORARY, Run, run_host
 from device_case import PLUGINS, DeviceTest
 
@@ -53,9 +54,12 @@ class AccountctlTest(DeviceTest):
         return self.tree.read_plist(SETTINGS)["Accounts"]
 
     def accountctl(self, *words, environment=None, **more) -> Run:
-        return run_host(
+        run = run_host(
             ACCOUNTCTL, "--root", self.tree.root, *words, environment={"LC_ALL": "C", **(environment or {})}, **more
         )
+        if "--json" in words and run.output:
+            schemas.check_accountctl(words, run.output)
+        return run
 
     def done(self, *words, **more):
         """The lines that a command prints which does what it was asked."""

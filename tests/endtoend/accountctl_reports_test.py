@@ -36,6 +36,8 @@ class Lists(AccountctlTest):
                 "type": "Mail",
                 "class": "IMAPAccount",
                 "name": "Home",
+                "user": "ines",
+                "host": "imap.example.com",
                 "parent": None,
                 "enabled": [MAIL, NOTES],
                 "supported": [MAIL, NOTES],
@@ -52,7 +54,9 @@ class Lists(AccountctlTest):
         self.assertEqual([None, []], [each["enabled"] for each in listed["accounts"]])
 
     def test_nothing_on_a_device_without_accounts(self):
-        self.assertEqual(["IDENTIFIER  TYPE  CLASS  NAME  USER  ENABLED"], self.done("list"))
+        run = self.accountctl("list")
+        told = f"accountctl: the device has no settings file: {self.tree.path(SETTINGS)}"
+        self.assertEqual((0, ["IDENTIFIER  TYPE  CLASS  NAME  USER  ENABLED"], [told]), (run.status, run.output, run.errors))
         self.assertEqual({"version": 0, "accounts": []}, json.loads("\n".join(self.done("list", "--json"))))
         self.assertFalse(self.tree.path(SETTINGS).exists())
 
@@ -105,6 +109,14 @@ class Lists(AccountctlTest):
         self.put(HOME_MAIL)
         self.assertEqual([], self.accountctl("list").errors)
 
+    def test_on_what_is_not_in_the_list_a_word(self):
+        self.put()
+        self.assertEqual([f"accountctl: the settings file has no accounts: {self.tree.path(SETTINGS)}"],
+                         self.accountctl("list").errors)
+        self.put(HOME_MAIL, changed(DIRECTORY, Type="Post"), 7)
+        self.assertEqual(["accountctl: 2 records of the settings file cannot be loaded; accountctl verify tells why"],
+                         self.accountctl("list").errors)
+
 
 class Shows(AccountctlTest):
     def setUp(self):
@@ -154,6 +166,10 @@ class Shows(AccountctlTest):
         shown = self.done("show", "C1")
         self.assertIn("Parent      V1", shown)
         self.assertIn("  Username    ines", shown)
+
+    def test_that_an_account_has_no_name(self):
+        self.assertIn("Name        (no name)", self.done("show", "L1"))
+        self.assertIsNone(json.loads("\n".join(self.done("show", "L1", "--json")))["name"])
 
     def test_that_an_account_has_no_list_of_data_classes(self):
         self.assertIn("Enabled     (no list)", self.done("show", "L1"))

@@ -10,9 +10,31 @@ LONG = "A name that nobody would give to an account who has ever seen it in a li
 WORK = changed(HOME_MAIL, Identifier="0B6C-4F1C", DisplayName="Büro", Username="ines.kern", Hostname="mail.example.org")
 
 
+# What a reader sees as one character, in columns of a terminal.
+SEEN = {
+    "\U0001f680": 2,  # a rocket
+    "\U0001f468\u200d\U0001f469\u200d\U0001f467\u200d\U0001f466": 2,  # a family
+    "\U0001f1e9\U0001f1ea": 2,  # a flag
+    "\U0001f44d\U0001f3fd": 2,  # a thumb with a colour
+    "\u2764\ufe0f": 2,  # a letter that is shown as a picture
+    "ดี": 1,
+    "ก็": 1,
+    "न": 1,
+    "ते": 1,
+    "ש": 1,
+    "ب": 1,
+    "日": 2,
+    "e\u0301": 1,
+}
+
+
 def columns_of(line):
-    """How wide a terminal shows a line of letters and East Asian characters."""
-    return sum(2 if unicodedata.east_asian_width(each) in "WF" else 1 for each in line)
+    """How wide a terminal shows the line."""
+    columns = 0
+    for seen, width in SEEN.items():
+        columns += width * line.count(seen)
+        line = line.replace(seen, "")
+    return columns + sum(2 if unicodedata.east_asian_width(each) in "WF" else 1 for each in line)
 
 
 class TerminalTest(AccountctlTest):
@@ -38,6 +60,16 @@ class Lists(TerminalTest):
                 with self.subTest(columns=columns, language=language):
                     lines = self.plain("list", columns=columns, environment={"LC_ALL": language})
                     self.assertEqual(7, len(lines))
+                    self.assertLessEqual(max(map(columns_of, lines)), columns)
+
+    def test_stay_in_line_whatever_script_the_names_are_in(self):
+        self.put(*(changed(WORK, DisplayName=seen * length) for seen in SEEN for length in (3, 120)))
+        for columns in (80, 200):
+            for language in LANGUAGES:
+                with self.subTest(columns=columns, language=language):
+                    lines = self.plain("list", columns=columns, environment={"LC_ALL": language})[1:-1]
+                    self.assertEqual(2 * len(SEEN), len(lines))
+                    self.assertEqual(1, len({columns_of(line[: line.index("ines")]) for line in lines}))
                     self.assertLessEqual(max(map(columns_of, lines)), columns)
 
     def test_shorten_long_cells_in_the_middle(self):
@@ -72,7 +104,7 @@ class Emphasis(TerminalTest):
     HEADING = "\x1b[1mIDENTIFIER  TYPE  CLASS  NAME  USER  ENABLED\x1b[0m"
 
     def heading(self, *words, **more):
-        return self.on_terminal("list", *words, **more)[1][0]
+        return next(line for line in self.on_terminal("list", *words, **more)[1] if "IDENTIFIER" in line)
 
     def test_stands_out_on_a_terminal(self):
         self.assertEqual(self.HEADING, self.heading())
@@ -84,9 +116,21 @@ class Emphasis(TerminalTest):
                 self.assertNotIn("\x1b", self.heading(*words, environment=environment))
 
     def test_reaches_a_pipe_only_on_request(self):
-        self.assertNotIn("\x1b", self.done("list")[0])
+        self.assertNotIn("\x1b", self.accountctl("list").output[0])
         for words in (["--color"], ["--color=always"]):
-            self.assertEqual(self.HEADING, self.done("list", *words, environment={"NO_COLOR": "1"})[0])
+            self.assertEqual(self.HEADING, self.accountctl("list", *words, environment={"NO_COLOR": "1"}).output[0])
+
+
+class Help(TerminalTest):
+    def test_of_a_command_is_had_in_three_ways(self):
+        for words in (["help", "enable"], ["enable", "--help"], ["enable", "-h"]):
+            lines = self.on_terminal(*words)[1]
+            self.assertEqual("Usage: accountctl [OPTION]... enable ID DATACLASS", lines[0])
+
+    def test_hints_at_the_command_that_was_meant(self):
+        for words in (["help", "enabel"], ["enabel", "--help"]):
+            status, lines = self.on_terminal(*words)
+            self.assertEqual((2, "accountctl: did you mean enable?"), (status, lines[-1]))
 
 
 class Hints(TerminalTest):

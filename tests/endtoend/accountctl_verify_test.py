@@ -4,11 +4,11 @@ import json
 import unittest
 
 from accountctl_case import CLOUD, DIRECTORY, HOME_MAIL, AccountctlTest, changed
-from device import CURRENT_VERSION, LEGACY_MAIL, SETTINGS
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS
 from device_case import HOST
 from failed_saves_test import CAP_DAC_OVERRIDE, without_capabilities
 
-CLEAN, FINDINGS, WRONG_USE = 0, 1, 2
+CLEAN, FAILED, WRONG_USE, FINDINGS = 0, 1, 2, 5
 CAP_DAC_READ_SEARCH = 2
 MISNAMED = changed(HOME_MAIL, Class="MailAccount", AccountPath="~/Library/Mail/IMAP-ines@imap.example.com")
 CHILD = CLOUD["ChildAccounts"][0]
@@ -21,6 +21,7 @@ def without(account, *keys):
 class VerifyTest(AccountctlTest):
     def found(self, *words):
         """The findings, each as its kind, place and identifier; what is verified stays as it is."""
+        self.close_to_others()
         before = self.standing()
         run = self.accountctl("verify", "--json", *words)
         self.assert_unchanged(before)
@@ -28,7 +29,14 @@ class VerifyTest(AccountctlTest):
         findings = self.report["findings"]
         self.assertEqual((FINDINGS if findings else CLEAN, []), (run.status, run.errors))
         self.said = [each["migration"] for each in findings]
+        self.commands = [each["command"] for each in findings]
         return [(each["kind"], each["place"], each["identifier"]) for each in findings]
+
+    def close_to_others(self):
+        """The files as a save leaves them; that they may be read by others is a finding of its own."""
+        for path in map(self.tree.path, (SETTINGS, LEGACY_EXCHANGE, LEGACY_MAIL)):
+            if path.is_file() and not path.is_symlink():
+                path.chmod(0o600)
 
     def migrated(self):
         self.assertEqual(0, self.tree.migrate(HOST).status)
@@ -40,12 +48,13 @@ class Clean(VerifyTest):
         self.put(HOME_MAIL, CLOUD, DIRECTORY)
         self.done("save")
         self.assertEqual([], self.found())
-        self.assertEqual(3, self.report["accounts"])
+        path = str(self.tree.path(SETTINGS))
+        self.assertEqual([{"file": path, "form": "settings", "accounts": 3}], self.report["files"])
         self.assertEqual([f"{self.tree.path(SETTINGS)}: 3 accounts, no findings"], self.done("verify"))
 
     def test_is_a_device_without_a_settings_file(self):
         self.assertEqual([], self.found())
-        self.assertIsNone(self.report["file"])
+        self.assertIsNone(self.report["files"][0]["accounts"])
         self.assertEqual([f"{self.tree.path(SETTINGS)}: there is no settings file"], self.done("verify"))
 
     def test_is_what_every_example_device_has_after_its_migration(self):
@@ -62,11 +71,6 @@ class Structure(VerifyTest):
             self.tree.write(SETTINGS, content)
             self.assertEqual([("unreadable", None, None)], self.found())
             self.assertEqual({"Accounts": [], "Version": CURRENT_VERSION}, self.migrated())
-
-    def test_that_is_a_directory_keeps_a_migration_from_saving(self):
-        self.tree.path(SETTINGS).mkdir()
-        self.assertEqual([("unreadable", None, None)], self.found())
-        self.assertIn("Failed to save accounts to filesystem.", self.tree.migrate(HOST).messages())
 
     def test_without_accounts(self):
         self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION})
@@ -114,8 +118,11 @@ class Versions(VerifyTest):
 
     def test_absent_beside_legacy_files_means_every_step(self):
         self.tree.write_plist(LEGACY_MAIL, {"MailAccounts": []})
-        self.assert_version(["version-absent"], True)
+        self.tree.write_plist(SETTINGS, {"Accounts": [self.UMBRELLA]})
+        replaced = ("replaced-with-type", "Accounts[0]", "G1")
+        self.assertEqual([("version-absent", "Version", None), replaced, ("legacy", None, None)], self.found())
         self.assertIn("unless there are legacy files to convert: then it runs every step", self.said[0])
+        self.assertNotEqual([self.UMBRELLA], self.migrated()["Accounts"])
 
 
 class Records(VerifyTest):
@@ -142,7 +149,7 @@ class Records(VerifyTest):
         self.assertEqual([], self.migrated()["Accounts"])
 
     def test_of_mail_with_an_unknown_class_are_repaired_after_their_directory(self):
-        self.assertEqual([("unknown-class", "Accounts[0]", "M1")], self.records(MISNAMED))
+        self.assertEqual([("repairable-class", "Accounts[0]", "M1")], self.records(MISNAMED))
         self.assertEqual(["a migration sets it to IMAPAccount"], self.said)
         self.assertEqual([changed(MISNAMED, Class="IMAPAccount")], self.migrated()["Accounts"])
 
@@ -243,6 +250,7 @@ class Children(VerifyTest):
 class Report(VerifyTest):
     def test_reads_as_sentences(self):
         self.put(MISNAMED, version=3)
+        self.close_to_others()
         run = self.accountctl("verify")
         self.assertEqual(FINDINGS, run.status)
         self.assertEqual(
@@ -250,8 +258,12 @@ class Report(VerifyTest):
                 f"{self.tree.path(SETTINGS)}: 1 account, 2 findings",
                 "Version: the data version is 3",
                 f"    a migration upgrades the accounts from there to {CURRENT_VERSION}",
+                "    see what it makes of each account before it runs:",
+                f"        migration-host --root {self.tree.root} --dry-run --explain",
                 "Accounts[0] (M1): Class is MailAccount, which the mail application does not know",
                 "    a migration sets it to IMAPAccount",
+                "    nothing need be done; every load repairs it, and this for good:",
+                f"        accountctl --root {self.tree.root} save",
             ],
             run.output,
         )
@@ -260,8 +272,9 @@ class Report(VerifyTest):
         self.put(HOME_MAIL)
         copy = self.scratch / "copy.plist"
         self.tree.write_plist(copy, {"Version": 3, "Accounts": [MISNAMED]})
-        self.assertEqual(["version-older", "unknown-class"], [kind for kind, *_ in self.found(copy)])
-        self.assertEqual((str(copy), 1), (self.report["file"], self.report["accounts"]))
+        copy.chmod(0o600)
+        self.assertEqual(["version-older", "repairable-class"], [kind for kind, *_ in self.found(copy)])
+        self.assertEqual([{"file": str(copy), "form": "settings", "accounts": 1}], self.report["files"])
         self.assertEqual([], self.found())
 
 
@@ -273,10 +286,11 @@ class Refusals(VerifyTest):
     def test_of_a_file_that_may_not_be_opened(self):
         self.put(HOME_MAIL)
         self.tree.path(SETTINGS).chmod(0)
-        self.assert_refused(
-            1, f"the file cannot be opened: {self.tree.path(SETTINGS)}: Permission denied (errno 13)", "verify",
-            prepare=without_capabilities(CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH),
-        )
+        self.tree.write_plist(LEGACY_MAIL, {"MailAccounts": []})
+        run = self.accountctl("verify", prepare=without_capabilities(CAP_DAC_OVERRIDE, CAP_DAC_READ_SEARCH))
+        told = f"accountctl: the file cannot be opened: {self.tree.path(SETTINGS)}: Permission denied (errno 13)"
+        self.assertEqual((FAILED, [told]), (run.status, run.errors))
+        self.assertIn("accounts of the first releases stand in it: 0", run.output)
 
     def test_of_wrong_use(self):
         self.assert_refused(WRONG_USE, "the file to verify has no name", "verify", "")

@@ -1,4 +1,4 @@
-"""What the host prints for machines is as the installed schemas say: held against them for every run of every test."""
+"""What the programs print for machines is as the installed schemas say: held against them for every run of every test."""
 
 import json
 from pathlib import Path
@@ -17,6 +17,19 @@ def validator(name):
 
 TRACE = validator("trace.schema.json")
 EXPLANATION = validator("explanation.schema.json")
+ACCOUNTCTL = json.loads((SCHEMAS / "accountctl.schema.json").read_text(encoding="utf-8"))
+
+COMMANDS = [name for name in ACCOUNTCTL["$defs"] if name != "account"]
+
+
+def check_accountctl(words, output):
+    """Holds the output of a command of accountctl against that command's part of the schema."""
+    command = next(word for word in words if word in COMMANDS)
+    if any(str(word).startswith("--file") for word in words):
+        command += " --file"
+    schema = {**ACCOUNTCTL, "$ref": f"#/$defs/{command}".replace(" ", "%20")}
+    jsonschema.Draft202012Validator.check_schema(schema)
+    jsonschema.Draft202012Validator(schema).validate(json.loads("\n".join(output)))
 
 
 def check(run):

@@ -101,4 +101,8 @@ Result<AccountNames::Owner> AccountNames::ownerOf(const std::filesystem::path& p
   return Owner{userNumber.value(), groupNumber.value()};
 }
 
+Result<uid_t> numberOfUser(const std::filesystem::path& systemRoot, const std::string& name) {
+  return AccountNames{systemRoot}.user(name);
+}
+
 }  // namespace platform

@@ -5,6 +5,7 @@
 #include <filesystem>
 #include <string>
 
+#include "platform/export.h"
 #include "platform/linux/files/path_resolution.h"
 #include "platform/status.h"
 
@@ -33,5 +34,9 @@ class AccountNames {
   std::filesystem::path _root;
   PathResolver _paths;
 };
+
+// The number of one user, as AccountNames has it.
+[[nodiscard]] ACCOUNT_EXPORT Result<uid_t> numberOfUser(const std::filesystem::path& systemRoot,
+                                                        const std::string& name);
 
 }  // namespace platform

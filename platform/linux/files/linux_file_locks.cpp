@@ -135,7 +135,7 @@ class LockFile {
     if (!S_ISREG(status.st_mode)) return "it was no regular file";
     if (status.st_nlink > 1) return "it had a second name";
     if (status.st_uid == 0) return {};
-    const Result<uid_t> mobile = AccountNames{_options.trees.systemRoot}.user("mobile");
+    const Result<uid_t> mobile = numberOfUser(_options.trees.systemRoot, "mobile");
     if (mobile.isOk() && mobile.value() == status.st_uid) return {};
     return "it belonged to the user " + std::to_string(status.st_uid);
   }

@@ -1,0 +1,175 @@
+// What stands where a file of the device should be, and beside it.
+
+#include <algorithm>
+#include <array>
+#include <cstdio>
+#include <filesystem>
+#include <system_error>
+
+#include "accountsettings/file_paths.h"
+#include "accountsettings/product_values.h"
+#include "platform/linux/files/account_names.h"
+#include "platform/linux/files/file_services.h"
+#include "platform/platform.h"
+#include "tools/findings.h"
+
+namespace tools {
+namespace {
+
+using accountsettings::AccountsManager;
+using platform::FileAttributes;
+using platform::FileKind;
+using platform::Path;
+
+constexpr std::uint32_t kOthersBits = 077;
+
+// What a migration does where something else than a regular file stands.
+struct Fates {
+  const char* link;
+  const char* deadLink;
+  const char* directory;
+  const char* otherKind;
+  const char* openToOthers;
+};
+
+constexpr Fates kFatesOfSettings{
+    "a migration reads what it leads to, and puts a new file in the place of the link",
+    "a migration reads no account, and puts a new file in the place of the link",
+    "a migration reads no account and cannot save",
+    "a migration reads no account, and puts a file without accounts in its place",
+    "a migration leaves a file that only its owner reads",
+};
+constexpr Fates kFatesOfLegacyFiles{
+    "a migration converts what it leads to, and deletes the link alone",
+    "a migration does not see it",
+    "a migration converts nothing, and deletes it with everything in it",
+    "a migration converts nothing, and deletes it",
+    "a migration deletes it",
+};
+
+platform::Result<FileAttributes> attributesOf(const Path& path) {
+  return platform::makeFileKeeper(*platform::current().directories)->attributesOf(path);
+}
+
+// Where a link leads to; empty where it is none.
+Path targetOf(const Path& path) {
+  std::error_code failure;
+  return std::filesystem::read_symlink(path, failure);
+}
+
+// What is followed is told of; what is not, the reading of the file tells.
+Findings findingsOfLink(const Path& path, const Path& target, const Fates& fates) {
+  const auto kind = platform::current().files->kindOf(path);
+  const std::string what = "it is a link to " + target.string();
+  if (kind.isOk() && kind.value() == FileKind::file) return {{"link", "", "", what, fates.link}};
+  if (kind.cause() == platform::Cause::missing) {
+    return {{"link", "", "", what + ", where nothing stands", fates.deadLink}};
+  }
+  return {};
+}
+
+Findings findingsOfOwner(const FileAttributes& attributes) {
+  const std::string owner{accountsettings::kSettingsOwner.view()};
+  const auto user = platform::numberOfUser(platform::current().directories->systemRoot(), owner);
+  if (!user.isOk()) {
+    return {{"no-owner", "", "", "the device has no user " + owner + ", to whom it should belong",
+             "a migration cannot save"}};
+  }
+  if (user.value() == attributes.owner) return {};
+  return {{"foreign-owner", "", "", "it belongs to the user " + std::to_string(attributes.owner) + ", not to " + owner,
+           "a migration leaves a file that belongs to " + owner}};
+}
+
+Findings findingsOfPermissions(const FileAttributes& attributes, const Fates& fates) {
+  if ((attributes.permissions & kOthersBits) == 0) return {};
+  std::array<char, 8> mode{};
+  std::snprintf(mode.data(), mode.size(), "%03o", attributes.permissions);
+  return {{"open-to-others", "", "", "others may read or change it: its mode is " + std::string{mode.data()},
+           fates.openToOthers}};
+}
+
+bool isTemporaryName(const std::string& name) {
+  constexpr std::string_view kBeginning = "file";
+  constexpr std::size_t kLetters = 6;
+  const bool isAlike = name.starts_with(kBeginning) && name.size() == kBeginning.size() + kLetters;
+  return isAlike &&
+         std::ranges::all_of(name, [](char letter) { return std::isalnum(static_cast<unsigned char>(letter)) != 0; });
+}
+
+std::vector<Path> temporaryFiles() {
+  const Path directory = platform::current().directories->systemRoot() / "var/mobile/tmp";
+  const auto keeper = platform::makeFileKeeper(*platform::current().directories);
+  std::vector<Path> files;
+  for (const std::string& name : keeper->entriesOf(directory).valueOr({})) {
+    if (isTemporaryName(name)) files.push_back(directory / name);
+  }
+  return files;
+}
+
+Path besideIt(const Path& path, std::string_view before, std::string_view behind) {
+  return path.parent_path() / (std::string{before} + path.filename().string() + std::string{behind});
+}
+
+Finding companionOf(const Path& legacy) {
+  const bool isConverted = platform::current().files->kindOf(legacy).isOk() && !isDeletionUnderWay();
+  return {"companion", "", "", "an earlier release left this copy of " + legacy.filename().string(),
+          isConverted ? "a migration deletes it with the file itself" : "a migration leaves it"};
+}
+
+}  // namespace
+
+Findings findingsOfStanding(const Path& path, Part part) {
+  const Fates& fates = part == Part::settings ? kFatesOfSettings : kFatesOfLegacyFiles;
+  const auto attributes = attributesOf(path);
+  if (!attributes.isOk()) return {};
+  if (const Path target = targetOf(path); !target.empty()) return findingsOfLink(path, target, fates);
+  if (attributes.value().kind == FileKind::directory)
+    return {{"no-file", "", "", "it is a directory", fates.directory}};
+  if (attributes.value().kind != FileKind::file) {
+    return {{"no-file", "", "", "it is a pipe, a socket or a device, and no file", fates.otherKind}};
+  }
+  Findings findings = findingsOfPermissions(attributes.value(), fates);
+  if (part == Part::settings) std::ranges::move(findingsOfOwner(attributes.value()), std::back_inserter(findings));
+  return findings;
+}
+
+Finding unreadable(const platform::Status& reading, Part part) {
+  if (reading.cause() == platform::Cause::unsafe) {
+    return {"unsafe", "", "", "somebody else may have put it there: " + reading.reason(),
+            "a migration is refused, and nothing is changed"};
+  }
+  return {"unreadable", "", "", reading.reason(),
+          part == Part::settings
+              ? "a migration takes it for an empty one and saves a file without accounts in its place"
+              : "a migration converts nothing from it, and deletes it"};
+}
+
+std::vector<Leftover> leftoversOnDevice() {
+  std::vector<Leftover> found;
+  const auto look = [&](const Path& path, const Finding& finding) {
+    if (attributesOf(path).isOk()) found.push_back({path, finding});
+  };
+  const Path settings = AccountsManager::fullPathToAccountSettingsPlist();
+  const Path exchange = pathOf(LegacyForm::exchange);
+  const Path mail = pathOf(LegacyForm::mail);
+  for (const Path& legacy : {exchange, mail}) look(besideIt(legacy, "", ".original"), companionOf(legacy));
+  look(accountsettings::removalSentinelPath(),
+       {"sentinel", "", "", "a run died while it deleted the files of the first releases",
+        "a migration finishes the deletion, converting nothing, and leaves the rest to the next one"});
+  const Path marker = accountsettings::mailAutoFetchMarkerPath();
+  if (const auto attributes = attributesOf(marker); attributes.isOk() && attributes.value().kind != FileKind::file) {
+    look(marker,
+         {"no-file", "", "", "the mail application's mark is no file", "a migration deletes it with everything in it"});
+  }
+  for (const Path& path : {settings, exchange, mail}) {
+    look(besideIt(path, ".restoring-", ""),
+         {"leftover", "", "", "a restore that died left this copy", "a migration leaves it"});
+  }
+  for (const Path& path : temporaryFiles()) {
+    look(path, {"leftover", "", "", "a program that died while it saved left it, with the accounts and their passwords",
+                "a migration leaves it"});
+  }
+  return found;
+}
+
+}  // namespace tools
