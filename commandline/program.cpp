@@ -24,6 +24,7 @@ void say(std::string_view program, std::string_view line) noexcept {
 }
 
 bool print(std::string_view text) {
+  progressLine().end();
   const bool isWritten = std::fwrite(text.data(), 1, text.size(), stdout) == text.size();
   return std::fflush(stdout) == 0 && isWritten;
 }

@@ -10,7 +10,7 @@ namespace commandline {
 // for that, it says so. A progress line gives way to it.
 void say(std::string_view program, std::string_view line) noexcept;
 
-// Prints the text, whole lines, on standard output; answers whether all of it was written.
+// Prints the text, whole lines, on standard output, in place of a progress line; answers whether all of it was written.
 [[nodiscard]] bool print(std::string_view text);
 
 // What a program's main function does: hands the arguments behind the program's name to the work and answers the exit

@@ -2,6 +2,7 @@
 #include <array>
 #include <nlohmann/json.hpp>
 
+#include "commandline/progress_line.h"
 #include "commandline/text.h"
 #include "tools/recovery.h"
 
@@ -112,8 +113,10 @@ bool comesWithParent(const FoundAccount& account, const RecoveryPlan& plan) {
 
 Outcome recoverRecords(Session& session, const AccountFile& file, const std::vector<const FoundAccount*>& named,
                        const Options& options) {
+  commandline::progressLine().show({"the device's accounts are read", 0.2, 0.4});
   session.beginChanges();
   RecoveryPlan plan{session.accounts()};
+  commandline::progressLine().show({"what is missing is looked for", 0.4, 0.5});
   for (const FoundAccount* each : named) plan.add(file, *each, withProperties(each->properties, options.settings));
   if (named.empty()) {
     for (const FoundAccount& each : file.accounts) {
@@ -123,6 +126,7 @@ Outcome recoverRecords(Session& session, const AccountFile& file, const std::vec
   } else {
     refuseFaulty(plan);
   }
+  commandline::progressLine().show({"the accounts are saved", 0.5, 1});
   bringBack(session, plan);
   return told(plan, file, options);
 }
@@ -144,6 +148,7 @@ Outcome recoverAccounts(Session& session, const Words& arguments, const Options&
   if (!options.settings.empty() && !isNamed) {
     throw Failure{ExitStatus::wrongUse, "--set is for accounts that are named"};
   }
+  commandline::progressLine().show({"what is to come back is read", 0, 0.2});
   const auto source = sourceNamed(arguments[0], options);
   std::vector<Chosen> chosen;
   for (std::size_t index = 1; index < arguments.size(); ++index) {

@@ -1,8 +1,10 @@
-"""The one line that says on a terminal how far a run, a rehearsal or a restore is."""
+"""The one line that says on a terminal how far a run, a rehearsal, a restore or a recovery is."""
 
 import re
 import unittest
 
+from accountctl_case import ACCOUNTCTL, DIRECTORY, HOME_MAIL, AccountctlTest
+from device import SETTINGS
 from device_case import HOST, PLUGINS, can_trace_calls, strace
 from snapshots_case import SnapshotsTest
 from terminal import LANGUAGES, on_terminal
@@ -60,6 +62,20 @@ class OfARestore(SnapshotsTest):
         self.assertEqual(0, status)
         self.assertRegex(shown, r"\d+ %, \d+ s left: the (present state is kept|files are brought back)")
         self.assertRegex(shown, r"\x1b\[Krestored snapshot \S+; the state before it is snapshot \S+\n$")
+
+
+@unittest.skipUnless(can_trace_calls(), "no strace here, or it may trace nothing")
+class OfARecovery(AccountctlTest):
+    def test_is_shown_where_it_takes_its_time(self):
+        self.put(HOME_MAIL, DIRECTORY)
+        copy = self.scratch / "copy.plist"
+        copy.write_bytes(self.tree.read(SETTINGS))
+        self.put(DIRECTORY)
+        slow = strace("-o", "/dev/null", "-e", "inject=fsync:delay_enter=700000")
+        status, shown = on_terminal(*slow, ACCOUNTCTL, "--root", self.tree.root, "recover", copy)
+        self.assertEqual(0, status)
+        self.assertRegex(shown, r"\d+ %, \d+ s left: the accounts are saved")
+        self.assertEqual(["L1", "M1"], sorted(account["Identifier"] for account in self.accounts()))
 
 
 if __name__ == "__main__":
