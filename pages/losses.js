@@ -1,4 +1,4 @@
-// What is lost, and the command that brings it back.
+// What is lost, and the commands that bring it back.
 
 const MOST_LOSSES = 100;
 const SETTINGS_IN_HOME = "/Library/Preferences/com.vorlix.accountsettings.plist";
@@ -16,7 +16,8 @@ function lossesOf(explanation, level) {
 function lossCard(loss, explanation, level) {
   return element("li", {}, heading(level + 1, lostOf(loss)),
     element("p", {}, sentence(loss.reason + (loss.detail ? `: ${loss.detail}` : "")), " ", element("code", { class: "faint" }, loss.code)),
-    loss.where ? element("p", {}, explanation.rehearsal ? "Its data would still be in " : "Its data are still in ", element("code", {}, loss.where)) : null);
+    loss.where ? element("p", {}, explanation.rehearsal ? "Its data would still be in " : "Its data are still in ", element("code", {}, loss.where)) : null,
+    recovery(loss, explanation));
 }
 
 const sentence = (text) => `${text[0].toUpperCase()}${text.slice(1)}.`;
@@ -25,6 +26,21 @@ const sentence = (text) => `${text[0].toUpperCase()}${text.slice(1)}.`;
 const lostOf = (loss) => ("type" in loss ? calledOf(loss) : loss.file || "The settings file");
 
 const commandBox = (command) => element("pre", { class: "command", tabindex: 0 }, element("code", {}, command));
+
+// What a record lacks that is left out, and has to be told for it to come back.
+const REPAIRS = { "dropped-no-type": "Type=Mail", "dropped-unknown-type": "Type=Mail", "dropped-no-class": "Class=IMAPAccount",
+  "dropped-unknown-class": "Class=IMAPAccount", "refused-description": "Class=IMAPAccount" };
+
+// The copy of the settings file, or a snapshot, is where an account can be had from; a rehearsal took nothing away. What
+// is not written as it is read makes no command.
+function recovery(loss, explanation) {
+  const account = loss.identifier || loss.name;
+  if (explanation.rehearsal || !loss.where || !account || /\p{C}/u.test(account)) return null;
+  const repair = REPAIRS[loss.code];
+  const words = ["accountctl", ...devicePlace(explanation), "recover", loss.where, account, ...(repair ? ["--set", repair] : [])];
+  return element("div", {}, commandBox(words.map(quoted).join(" ")),
+    repair ? element("p", { class: "faint" }, `Or another ${repair.split("=")[0].toLowerCase()}, where that is not the account's.`) : null);
+}
 
 function wayBackForAll(explanation) {
   if (explanation.rehearsal) {

@@ -72,9 +72,28 @@ class Page(BrowserTest):
         self.assertIn("1 account was lost.", self.texts(".verdict"))
         self.assertEqual("What is lost, and the way back", self.texts("h2")[0])
         command = next(text for text in self.texts(".command code") if text.startswith("migration-host "))
-        subprocess.run(["bash", "-c", command], env={**os.environ, "PATH": f"{HOST.parent}:{os.environ['PATH']}"}, check=True,
-                       stdout=subprocess.DEVNULL)
+        self.run_command(command)
         self.assertIn(UNFIXABLE, Device(root).read_plist(SETTINGS)["Accounts"])
+
+    def run_command(self, command):
+        path = f"{HOST.parent}:{os.environ['PATH']}"
+        subprocess.run(["bash", "-c", command], env={**os.environ, "PATH": path}, check=True, stdout=subprocess.DEVNULL)
+
+    def test_brings_an_account_back_by_the_command_beside_it(self):
+        page = self.page(KEPT, {**UNFIXABLE, "Note": "mine"}, options=("--snapshots", self.scratch / "snapshots"))
+        self.opened(page)
+        self.run_command(self.one(".cards .command code").text)
+        accounts = Device(self.scratch / "device").read_plist(SETTINGS)["Accounts"]
+        (found,) = [each for each in accounts if each["Identifier"] == UNFIXABLE["Identifier"]]
+        self.assertEqual(("IMAPAccount", "mine"), (found["Class"], found["Note"]))
+
+    def test_writes_commands_so_that_a_shell_reads_what_people_read(self):
+        names = ["it's; echo \"oops\" $(id)", "plain", "turned\u202ebackwards"]
+        self.opened(self.page(*({**UNFIXABLE, "Identifier": name} for name in names), options=()))
+        commands = self.texts(".cards .command code")
+        words = [subprocess.run(["bash", "-c", f'printf "%s\\n" {command}'], capture_output=True, text=True).stdout.splitlines()
+                 for command in commands]
+        self.assertEqual(names[:2], [each[-3] for each in words])
 
     def test_finds_accounts_by_words_and_by_what_happened(self):
         page = self.page(KEPT, UNFIXABLE, *({**MAIL, "Identifier": f"M{each}", "uniqueId": f"U{each}", "DisplayName": f"Quarry {each}"}
