@@ -55,10 +55,10 @@ endforeach()
 
 # The documents lie as they do in the source tree, so that what links to another one leads to it.
 install(FILES ${CMAKE_SOURCE_DIR}/LICENSE ${CMAKE_SOURCE_DIR}/README.md ${CMAKE_SOURCE_DIR}/CONTRIBUTING.md
-    ${CMAKE_SOURCE_DIR}/CHANGELOG.md
+    ${CMAKE_SOURCE_DIR}/CHANGELOG.md ${CMAKE_SOURCE_DIR}/packages.txt
   DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT documents)
 install(DIRECTORY ${CMAKE_SOURCE_DIR}/docs ${CMAKE_SOURCE_DIR}/examples
-  DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT documents PATTERN man EXCLUDE)
+  DESTINATION "${CMAKE_INSTALL_DOCDIR}" COMPONENT documents)
 
 # What the store, the plug-in and the tests share is not for other programs.
 set(internal_headers "/(file_paths|record_changes|change_tracker|equality_key)[.]h$")

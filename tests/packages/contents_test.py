@@ -2,6 +2,7 @@
 
 import fnmatch
 import os
+import re
 import subprocess
 import unittest
 from pathlib import Path
@@ -29,6 +30,15 @@ class Contents(DeviceTest):
                 unexpected = [file for file in files if not any(fnmatch.fnmatch(file, each) for each in patterns)]
                 missing = [each for each in patterns if not fnmatch.filter(files, each)]
                 self.assertEqual(([], []), (unexpected, missing))
+
+    def test_of_the_documents_have_links_that_lead_somewhere(self):
+        self.installed("--component", "documents")
+        documents = list((self.scratch / "prefix---component-documents").rglob("*.md"))
+        self.assertGreater(len(documents), 15)
+        for document in documents:
+            text = re.sub(r"^```.*?^```$", "", document.read_text(encoding="utf-8"), flags=re.M | re.S)
+            for target in re.findall(r"\]\((?!https?:)([^)#]+)", text):
+                self.assertTrue((document.parent / target).exists(), f"{document.name}: {target}")
 
     def test_of_all_components_are_everything_and_nothing_twice(self):
         parts = [self.installed("--component", reviewed.name) for reviewed in CONTENTS.iterdir()]

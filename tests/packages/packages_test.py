@@ -45,16 +45,6 @@ class Packages(unittest.TestCase):
             identifier = re.search(r"Build ID: (\w\w)(\w+)", run("readelf", "--notes", program))
             self.assertTrue((Path(scratch) / "accountctl/usr/lib/debug/.build-id" / identifier[1] / f"{identifier[2]}.debug").is_file())
 
-    def test_have_documents_whose_links_lead_somewhere(self):
-        with tempfile.TemporaryDirectory() as scratch:
-            run("dpkg-deb", "--extract", package_files()["account-settings-doc"], scratch)
-            documents = list((Path(scratch) / "usr/share/doc/account-settings").rglob("*.md"))
-            self.assertGreater(len(documents), 12)
-            for document in documents:
-                text = re.sub(r"^```.*?^```$", "", document.read_text(encoding="utf-8"), flags=re.M | re.S)
-                for target in re.findall(r"\]\((?!https?:)([^)#]+)", text):
-                    self.assertTrue((document.parent / target).exists(), f"{document.name}: {target}")
-
     def test_have_scripts_only_where_there_is_something_to_do(self):
         scripts = {"preinst", "postinst", "prerm", "postrm"}
         with tempfile.TemporaryDirectory() as scratch:
