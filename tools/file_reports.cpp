@@ -99,14 +99,16 @@ Outcome showInFile(Session& session, const Words& arguments, const Options& opti
 Outcome verifyFiles(Session& session, const Words& arguments, const Options& options) {
   if (!arguments.empty()) throw Failure{ExitStatus::wrongUse, "--file says already what is to be verified"};
   const auto source = examinedSource(session, options);
-  Json report{{"schema", kSchema}, {"files", Json::array()}};
+  Json report{{"files", Json::array()}, {"findings", Json::array()}};
   std::string text;
   auto status = ExitStatus::done;
   for (const AccountFile& file : source.files) {
     const auto verified = verifySettings(session, {file.path.string()}, options);
     if (verified.status != ExitStatus::done) status = verified.status;
-    if (options.printsJson) report["files"].push_back(Json::parse(verified.output));
     text += verified.output;
+    if (!options.printsJson) continue;
+    const Json part = Json::parse(verified.output);
+    for (auto& [key, list] : report.items()) list.insert(list.end(), part.at(key).begin(), part.at(key).end());
   }
   return {options.printsJson ? printed(report) : text, status};
 }

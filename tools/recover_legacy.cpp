@@ -10,7 +10,6 @@ namespace tools {
 namespace {
 
 using accountsettings::Array;
-using accountsettings::Dictionary;
 using platform::Path;
 using Json = nlohmann::ordered_json;
 

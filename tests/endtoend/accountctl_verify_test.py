@@ -272,7 +272,7 @@ class Report(VerifyTest):
         self.put(HOME_MAIL)
         copy = self.scratch / "copy.plist"
         self.tree.write_plist(copy, {"Version": 3, "Accounts": [MISNAMED]})
-        copy.chmod(0o600)
+        copy.chmod(0o644)
         self.assertEqual(["version-older", "repairable-class"], [kind for kind, *_ in self.found(copy)])
         self.assertEqual([{"file": str(copy), "form": "settings", "accounts": 1}], self.report["files"])
         self.assertEqual([], self.found())
