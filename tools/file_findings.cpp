@@ -167,7 +167,7 @@ std::vector<Leftover> leftoversOnDevice() {
   }
   for (const Path& path : temporaryFiles()) {
     look(path, {"leftover", "", "", "a program that died while it saved left it, with the accounts and their passwords",
-                "a migration leaves it"});
+                "a migration removes it where a save left it"});
   }
   return found;
 }

@@ -135,7 +135,7 @@ class BrokenDevices(AccountctlTest):
         self.tree.write_plist(LEGACY_MAIL, {"MailAccounts": [WHARF, QUAY]})
         self.boot()
         self.assertNotIn("Wharf", self.told("list"))
-        self.assertIn("MailAccounts[1] (Q1): ", self.told("--file", "latest", "verify"))
+        self.assertIn("MailAccounts[1] (Q1): there is no AccountType", self.told("--file", "latest", "verify"))
         self.run_host("--root", self.tree.root, "--snapshots", self.snapshots, "--undo")
         self.done("recover", self.tree.path(LEGACY_MAIL), "Quay", "--set", "Class=IMAPAccount")
         self.boot()
