@@ -126,7 +126,10 @@ void ChangeTracker::willBeFolded(const BasicAccount& account, const BasicAccount
 
 void ChangeTracker::comesFrom(const BasicAccount& account, const Dictionary& description, std::string place,
                               std::string file) {
-  attempt([&] { _origins.insert_or_assign(&account, Origin{std::move(place), std::move(file), description}); });
+  attempt([&] {
+    _origins.insert_or_assign(&account,
+                              Origin{nameOf(account.properties()), std::move(place), std::move(file), description});
+  });
 }
 
 // --- Changes ---
@@ -135,10 +138,23 @@ void ChangeTracker::look(const Accounts& accounts) {
   attempt([&] {
     StoreState present = stateOf(accounts);
     for (const Difference& difference : differencesBetween(_known, present)) tell(difference);
+    tellPassed(present);
     _known = std::move(present);
     _departures.clear();
     _origins.clear();
   });
+}
+
+// Accounts that were converted and made room again before anybody looked: no state has them, but a file had.
+void ChangeTracker::tellPassed(const StoreState& present) {
+  for (const RecordState& each : present) _origins.erase(each.account.get());
+  std::map<std::string, Lost> passed;
+  for (const auto& [account, origin] : _origins) {
+    const auto departure = _departures.find(account);
+    const LossCode code = departure == _departures.end() ? LossCode::removed : departure->second.code;
+    passed[origin.place] = {.code = code, .account = origin.name, .detail = origin.place, .file = origin.file};
+  }
+  for (const auto& [place, lost] : passed) _observer->told(lost);
 }
 
 void ChangeTracker::tell(const Difference& difference) {

@@ -58,6 +58,7 @@ class ChangeTracker {
     std::vector<records::Name> into{};
   };
   struct Origin {
+    records::Name name;
     std::string place;
     std::string file;
     Dictionary description;
@@ -68,6 +69,7 @@ class ChangeTracker {
   void attempt(const Action& action) noexcept;
   void tell(const Difference& difference);
   void tellGone(const records::Lost& lost, const BasicAccount* account);
+  void tellPassed(const StoreState& present);
   void tellConverted(const Difference& difference, const Origin& origin);
   [[nodiscard]] bool wasToldAtLastSave(std::size_t place) const;
 

@@ -1,6 +1,5 @@
 #include "migrator/legacy_conversion.h"
 
-#include <set>
 #include <tuple>
 #include <utility>
 
@@ -65,35 +64,34 @@ void tellRefused(const LegacySource& source, std::size_t refused) {
   }
 }
 
-// A step that gives accounts new identifiers leaves the former ones as those that they are synced by.
-void collectIdentifiers(const Array* records, std::set<std::string>& identifiers) {
+void collectSyncIdentifiers(const Array* records, std::multiset<std::string>& identifiers) {
   for (std::size_t index = 0; records != nullptr && index < records->size(); ++index) {
     const Dictionary* const record = (*records)[index].asDictionary();
     if (record == nullptr) continue;
-    for (const auto& key : {accountsettings::kAccountIdentifier, accountsettings::kAccountSyncIdentifier}) {
-      const Text* const identifier = record->text(key);
-      if (identifier != nullptr) identifiers.insert(identifier->string());
-    }
-    collectIdentifiers(record->array(accountsettings::kAccountChildAccounts), identifiers);
+    const Text* const identifier = record->text(accountsettings::kAccountSyncIdentifier);
+    if (identifier != nullptr) identifiers.insert(identifier->string());
+    collectSyncIdentifiers(record->array(accountsettings::kAccountChildAccounts), identifiers);
   }
-}
-
-std::set<std::string> savedIdentifiers() {
-  const auto settings =
-      platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist()).valueOr({});
-  std::set<std::string> identifiers;
-  collectIdentifiers(settings.array(accountsettings::kPlistAccountsKey), identifiers);
-  return identifiers;
 }
 
 }  // namespace
 
-void tellUnsaved(const LegacySource& source) {
-  const std::set<std::string> saved = savedIdentifiers();
+std::multiset<std::string> savedSyncIdentifiers() {
+  const auto settings =
+      platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist()).valueOr({});
+  std::multiset<std::string> identifiers;
+  collectSyncIdentifiers(settings.array(accountsettings::kPlistAccountsKey), identifiers);
+  return identifiers;
+}
+
+void tellUnsaved(const LegacySource& source, std::multiset<std::string>& saved) {
   const Array* const descriptions = source.contents.array(source.key);
   for (std::size_t index = 0; descriptions != nullptr && index < descriptions->size(); ++index) {
     records::Name name = nameOf((*descriptions)[index], source.renames);
-    if (saved.contains(name.identifier)) continue;
+    if (const auto found = saved.find(name.identifier); found != saved.end()) {
+      saved.erase(found);
+      continue;
+    }
     records::tellFact([&] {
       return Lost{.code = LossCode::notSaved,
                   .account = std::move(name),

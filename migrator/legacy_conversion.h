@@ -3,6 +3,7 @@
 #include <functional>
 #include <memory>
 #include <optional>
+#include <set>
 #include <span>
 #include <string>
 #include <string_view>
@@ -50,8 +51,10 @@ void noteOrigins(accountsettings::AccountsManager& store, const LegacySource& so
 // identifier the settings have no account, since that run had not saved it; or that the file cannot be read.
 void tellUnsavedMail();
 void tellUnsavedExchange();
-// The same of one array of a file.
-void tellUnsaved(const LegacySource& source);
+// The same of one array of a file. `saved` has the identifiers by which the accounts of the settings are synced, which
+// are those of their descriptions; each speaks for one description, and is taken out.
+void tellUnsaved(const LegacySource& source, std::multiset<std::string>& saved);
+[[nodiscard]] std::multiset<std::string> savedSyncIdentifiers();
 
 // What earlier releases left beside a legacy file: its copy under the same name with ".original" appended.
 [[nodiscard]] std::string originalCompanionOf(const std::string& legacyPath);

@@ -32,7 +32,8 @@ void tellUnsavedExchange() {
   const std::string path = daAccountPath();
   if (records::factObserver() == nullptr || !platform::current().files->kindOf(path).isOk()) return;
   const Dictionary legacyFile = readLegacyFile(path);
-  tellUnsaved({path, legacyFile, "DAAccountsKey", kRenames});
+  std::multiset<std::string> saved = savedSyncIdentifiers();
+  tellUnsaved({path, legacyFile, "DAAccountsKey", kRenames}, saved);
 }
 
 std::shared_ptr<BasicAccount> AccountsDataMigrator::_convertExchangeAccountDescription(const Dictionary& description) {

@@ -74,8 +74,9 @@ void tellUnsavedMail() {
   const std::string path = mailAccountsPath();
   if (records::factObserver() == nullptr || !platform::current().files->kindOf(path).isOk()) return;
   const Dictionary legacyFile = readLegacyFile(path);
-  tellUnsaved({path, legacyFile, "DeliveryAccounts", kRenames});
-  tellUnsaved({path, legacyFile, "MailAccounts", kRenames});
+  std::multiset<std::string> saved = savedSyncIdentifiers();
+  tellUnsaved({path, legacyFile, "DeliveryAccounts", kRenames}, saved);
+  tellUnsaved({path, legacyFile, "MailAccounts", kRenames}, saved);
 }
 
 Text AccountsDataMigrator::_accountTypeForMailAccountClass(std::string_view className) {

@@ -82,6 +82,13 @@ class Verdicts(LossesTest):
         kept = str(device.path(LEGACY_MAIL + ".unconverted-1"))
         self.assertEqual([("refused-file", "GOOD", kept), ("refused-description", "BAD", kept)], self.losses(device))
 
+    def test_name_an_account_that_makes_room_for_others_of_its_own_file(self):
+        device = self.device()
+        device.write_plist(LEGACY_MAIL, {"DeliveryAccounts": [{"AccountType": "IMAPAccount", "uniqueId": "MISPLACED"}],
+                                         "MailAccounts": [{"AccountType": "IMAPAccount", "uniqueId": "M"}]})
+        kept = str(device.path(LEGACY_MAIL + ".unsaved-1"))
+        self.assertEqual([("replaced-with-type", "MISPLACED", kept)], self.losses(device))
+
     def test_name_a_legacy_file_that_cannot_be_read(self):
         device = self.device()
         device.write(LEGACY_MAIL, "no property list")
