@@ -97,7 +97,8 @@ TEST_F(OpeningAccountSettings, LeavesEverythingOnTheDeviceAsItIs) {
 
 TEST_F(OpeningAccountSettings, OpensSeveralDevicesInOneProcess) {
   const RealDevice other;
-  other.put(kSettings, "<key>Accounts</key><array/><key>Version</key><integer>12</integer>");
+  other.put(kSettings, "<key>Accounts</key><array/><key>Version</key><integer>" +
+                           std::to_string(accountsettings::kCurrentVersion) + "</integer>");
   auto elsewhere = options();
   elsewhere.root = other.root.path();
   const AccountSettings first = opened();

@@ -8,6 +8,7 @@
 #include <utility>
 
 #include "accounts/account_settings.h"
+#include "accountsettings/accounts_manager.h"
 #include "tests/support/real_device.h"
 
 namespace tests {
@@ -41,7 +42,7 @@ class DeviceWithAccounts : public ::testing::Test {
     putAccounts(kAccounts);
   }
 
-  void putAccounts(const std::string& accounts, int version = 12) const {
+  void putAccounts(const std::string& accounts, int version = accountsettings::kCurrentVersion) const {
     device.put(kSettings, "<key>Accounts</key><array>" + accounts + "</array><key>Version</key><integer>" +
                               std::to_string(version) + "</integer>");
   }
@@ -54,7 +55,7 @@ class DeviceWithAccounts : public ::testing::Test {
   }
 
   // As an editor does that knows nothing of us: another file is moved onto the settings.
-  void replaceAccounts(const std::string& accounts, int version = 12) const {
+  void replaceAccounts(const std::string& accounts, int version = accountsettings::kCurrentVersion) const {
     const std::string kept = device.root.contents(kSettings);
     putAccounts(accounts, version);
     const std::string written = device.root.contents(kSettings);
