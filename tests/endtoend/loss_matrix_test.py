@@ -1,13 +1,17 @@
 """Every way of losing an account, as docs/RELIABILITY.md lists them: what is said, the status, where it still is, the way back."""
 
+import os
+import plistlib
 import re
+import shlex
 import unittest
 from pathlib import Path
 from typing import NamedTuple
 
-from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TREE
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, TREE, run_host
 from device_case import HOST, DeviceTest
 
+ACCOUNTCTL = Path(os.environ["ACCOUNTCTL"])
 MEANINGS = dict(re.findall(r'LossMeaning\{LossCode::\w+,\s*"([^"]+)",\s*"([^"]+)"\}',
                            (TREE / "records/loss.h").read_text(encoding="utf-8")))
 ROW = re.compile(r"^\| `([a-z-]+)` \| ([^|]+) \| ([^|]+) \| ([^|]+) \| ([^|]+) \|$", re.M)
@@ -39,22 +43,26 @@ def with_replaced_type(device):
 
 
 class Way(NamedTuple):
-    """A way of losing something: what makes a device on which it happens, the exit status, and the file that has it."""
+    """A way of losing something: what makes a device on which it happens, the file that has it, the exit status, and what
+    `accountctl recover` is told to bring it back from there."""
 
     fill: callable
     place: str = SETTINGS_COPY
     status: int = 0
+    back: tuple = ()
 
 
 REFUSED = [{"AccountType": "IMAPAccount", "uniqueId": "M"}, {"uniqueId": "BAD"}]
 WAYS = {
     "dropped-no-record": Way(settings(ACCOUNT, "no record")),
-    "dropped-no-type": Way(settings({"Class": "LDAPAccount", "Identifier": "X"})),
-    "dropped-unknown-type": Way(settings({**ACCOUNT, "Type": "Telegraph"})),
-    "dropped-no-class": Way(settings({"Type": "LDAP", "Identifier": "X"})),
-    "dropped-unknown-class": Way(settings({**MAIL, "Class": "Pigeon", "AccountPath": "says nothing"})),
-    "replaced-with-type": Way(with_replaced_type),
-    "replaced-duplicate": Way(settings(ACCOUNT, {**ACCOUNT, "DisplayName": "Another"})),
+    "dropped-no-type": Way(settings({"Class": "LDAPAccount", "Identifier": "X"}), back=("Accounts[0]", "--set", "Type=LDAP")),
+    "dropped-unknown-type": Way(settings({**ACCOUNT, "Type": "Telegraph"}), back=("Accounts[0]", "--set", "Type=LDAP")),
+    "dropped-no-class": Way(settings({"Type": "LDAP", "Identifier": "X"}), back=("Accounts[0]", "--set", "Class=LDAPAccount")),
+    "dropped-unknown-class": Way(settings({**MAIL, "Class": "Pigeon", "AccountPath": "says nothing"}),
+                                 back=("Accounts[0]", "--set", "Class=IMAPAccount")),
+    "replaced-with-type": Way(with_replaced_type, back=("Accounts[0]",)),
+    "replaced-duplicate": Way(settings(ACCOUNT, {**ACCOUNT, "DisplayName": "Another"}),
+                             back=("Accounts[0]", "--set", "Identifier:=null")),
     "refused-description": Way(legacy(REFUSED), LEGACY_MAIL + ".unconverted-1"),
     "refused-file": Way(legacy(REFUSED), LEGACY_MAIL + ".unconverted-1"),
     "unreadable-legacy-file": Way(lambda device: device.write(LEGACY_EXCHANGE, b"broken"), LEGACY_EXCHANGE + ".unreadable-1"),
@@ -83,7 +91,9 @@ class LossMatrix(DeviceTest):
         rows = {row[0]: row[1:] for row in ROW.findall(document[document.index("## Every way"):])}
         self.assertEqual(set(MEANINGS), set(rows) | ELSEWHERE)
         self.assertEqual(set(WAYS), set(rows))
-        for code, (_, status, place, _) in rows.items():
+        for code, (_, status, place, back) in rows.items():
+            if WAYS[code].back:
+                self.assertIn(f"`accountctl recover COPY {shlex.join(WAYS[code].back)}`", back)
             self.assertIn(str(WAYS[code].status), status, code)
             self.assertIn(f"`….{WAYS[code].place.rsplit('.', 1)[1]}`" if "-1" in WAYS[code].place else "the copy", place, code)
 
@@ -107,6 +117,18 @@ class LossMatrix(DeviceTest):
             self.assertEqual({str(device.path(way.place))}, {lost["where"] for lost in foretold})
             self.assertEqual(before, {path: device.read(path) for path in before})
             self.assertEqual(foretold, self.losses(device.migrate(HOST), code))
+
+    def test_each_account_comes_back_by_the_command_with_all_its_keys(self):
+        for code, way, device, before in self.each_way():
+            if not way.back:
+                continue
+            lost = plistlib.loads(before[SETTINGS])["Accounts"][0]
+            device.migrate(HOST)
+            back = run_host(ACCOUNTCTL, "--root", device.root, "recover", device.path(way.place), *way.back)
+            self.assertEqual(0, back.status, (code, back.errors))
+            set_again = {"Type", "Class", "Identifier"}
+            kept = {key: value for key, value in lost.items() if key not in set_again}
+            self.assertTrue(any(kept.items() <= account.items() for account in device.read_plist(SETTINGS)["Accounts"]), code)
 
     def test_each_is_undone_with_snapshots(self):
         for code, way, device, before in self.each_way():
