@@ -82,7 +82,7 @@ Findings findingsOfOwner(const FileAttributes& attributes) {
 
 Findings findingsOfPermissions(const FileAttributes& attributes, const Fates& fates) {
   if ((attributes.permissions & kOthersBits) == 0) return {};
-  std::array<char, 8> mode{};
+  std::array<char, 12> mode{};
   std::snprintf(mode.data(), mode.size(), "%03o", attributes.permissions);
   return {{"open-to-others", "", "", "others may read or change it: its mode is " + std::string{mode.data()},
            fates.openToOthers}};
