@@ -6,6 +6,7 @@ pkg_check_modules(libplist REQUIRED IMPORTED_TARGET libplist-2.0)
 pkg_check_modules(libsystemd REQUIRED IMPORTED_TARGET libsystemd)
 pkg_check_modules(libmd REQUIRED IMPORTED_TARGET libmd)
 pkg_check_modules(uuid REQUIRED IMPORTED_TARGET uuid)
+pkg_check_modules(xxhash REQUIRED libxxhash)  # its header alone, compiled in
 pkg_check_modules(utf8proc REQUIRED IMPORTED_TARGET libutf8proc)
 find_package(utf8cpp REQUIRED)
 find_package(CLI11 REQUIRED)

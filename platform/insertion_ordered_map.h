@@ -1,18 +1,24 @@
 #pragma once
 
+#include <cstddef>
 #include <list>
-#include <map>
 #include <string_view>
+#include <unordered_map>
 #include <utility>
 
+#include "platform/export.h"
 #include "platform/text.h"
 
 namespace platform {
 
+// A hash for texts that come from files: each process has a seed of its own, so nobody can choose texts that collide.
+struct SeededHash {
+  [[nodiscard]] ACCOUNT_EXPORT std::size_t operator()(std::string_view text) const;
+};
+
 // A map from text to Value that is walked in the order in which its keys were inserted; storing under a key that is
-// there keeps the key's place. Look-up, insertion and removal take time that grows with the logarithm of the size,
-// whatever the keys are: they come from files, and files can be made to collide in a table of hashes. References and
-// iterators stay good until their own entry is removed.
+// there keeps the key's place. Look-up, insertion and removal take constant time, whatever the size and the keys.
+// References and iterators stay good until their own entry is removed.
 template <typename Value>
 class InsertionOrderedMap {
  public:
@@ -78,7 +84,7 @@ class InsertionOrderedMap {
   }
 
   std::list<Entry> _entries;
-  std::map<std::string_view, typename std::list<Entry>::iterator> _places;
+  std::unordered_map<std::string_view, typename std::list<Entry>::iterator, SeededHash> _places;
 };
 
 }  // namespace platform

@@ -20,7 +20,6 @@ using accountsettings::Dictionary;
 using accountsettings::Text;
 using commandline::printable;
 using platform::Path;
-using platform::Result;
 using platform::Status;
 using Json = nlohmann::ordered_json;
 

@@ -132,16 +132,16 @@ class Again(RehearseTest):
         self.assertEqual([(2,)], self.rows("SELECT count(*) FROM releases"))
 
     def test_goes_on_where_it_was_killed(self):
-        images = self.fleet(40)
+        images = self.fleet(400)
         running = subprocess.Popen([REHEARSE, "--results", self.file, "--workers", "1", *images],
                                    stdout=subprocess.DEVNULL)
         self.wait_for_some_results()
         running.kill()
         running.wait()
         done = self.rows("SELECT count(*) FROM rehearsals")[0][0]
-        self.assertTrue(0 < done < 40, done)
-        self.assertIn(f"Rehearsed {40 - done} now", self.rehearse(*images, status=1))
-        self.assertEqual(40, len(self.verdicts()))
+        self.assertTrue(0 < done < 400, done)
+        self.assertIn(f"Rehearsed {400 - done} now", self.rehearse(*images, status=1))
+        self.assertEqual(400, len(self.verdicts()))
 
     def wait_for_some_results(self):
         deadline = time.monotonic() + 60

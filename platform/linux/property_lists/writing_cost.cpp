@@ -12,6 +12,8 @@ namespace platform {
 namespace {
 
 constexpr std::size_t kTableSize = 4096;
+constexpr std::size_t kSmall =
+    512;  // keys and values of which no choice takes long: those of most files but the accounts
 constexpr std::uint64_t kCheap = std::uint64_t{1} << 25U;  // comparisons: a fraction of a second
 constexpr std::uint64_t kMaxUnevenness = 8;                // times what evenly spread ones take
 
@@ -116,7 +118,7 @@ class Comparisons {
 }  // namespace
 
 bool isDearToWrite(const Dictionary& dictionary, std::size_t size) {
-  if (size * size <= kCheap) return false;
+  if (size <= kSmall) return false;
   Uses uses;
   Walk{uses}.visit(dictionary);
   if (uses.mostComparisons() <= kCheap) return false;
