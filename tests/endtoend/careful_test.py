@@ -46,6 +46,7 @@ class Careful(CarefulTest):
         ((reason,),) = self.kept_for()
         self.assertIn("[dropped-unknown-class]", reason)
 
+    @unittest.skipIf(os.environ["SANITIZE"], "a sanitizer looks for leaks in no traced program")
     @unittest.skipUnless(can_trace_calls(), "system calls cannot be traced here")
     def test_runs_whose_rehearsal_breaks_go_on_and_keep_their_snapshot(self):
         for number, (call, said) in enumerate((("setsid:signal=SIGSEGV", "the rehearsal was ended by signal 11"),

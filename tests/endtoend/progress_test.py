@@ -1,5 +1,6 @@
 """The one line that says on a terminal how far a run, a rehearsal, a restore or a recovery is."""
 
+import os
 import re
 import unittest
 
@@ -21,10 +22,11 @@ class OfARun(SnapshotsTest):
         return shown
 
     def test_is_shown_on_one_line_of_a_terminal_and_taken_away(self):
-        *lines, last = self.shown("work slowly").split(WIPE)[1:]
-        self.assertEqual("done\n", last)
+        _, *lines = self.shown("work slowly").split(WIPE)
+        self.assertEqual(1, lines.count("done\n"))
+        self.assertIn(lines[-1], ("done\n", ""))  # the end of the process may take its time, too
         for line in lines:
-            self.assertRegex(line, r"^(\d+ %, \d+ s left: slow)?$")
+            self.assertRegex(line, r"^(\d+ %, \d+ s left: slow|done\n)?$")
 
     def test_goes_on_while_nothing_is_told(self):
         shares = [int(share) for share in re.findall(r"(\d+) %", self.shown("work slowly"))]
@@ -49,6 +51,7 @@ class OfARun(SnapshotsTest):
         self.assertEqual(["done"], self.run_directed("work slowly", "--explain").errors)
 
 
+@unittest.skipIf(os.environ["SANITIZE"], "a sanitizer looks for leaks in no traced program")
 @unittest.skipUnless(can_trace_calls(), "no strace here, or it may trace nothing")
 class OfARestore(SnapshotsTest):
     host = HOST
@@ -64,6 +67,7 @@ class OfARestore(SnapshotsTest):
         self.assertRegex(shown, r"\x1b\[Krestored snapshot \S+; the state before it is snapshot \S+\n$")
 
 
+@unittest.skipIf(os.environ["SANITIZE"], "a sanitizer looks for leaks in no traced program")
 @unittest.skipUnless(can_trace_calls(), "no strace here, or it may trace nothing")
 class OfARecovery(AccountctlTest):
     def test_is_shown_where_it_takes_its_time(self):
