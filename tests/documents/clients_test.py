@@ -43,7 +43,8 @@ class Programs(DeviceTest):
         if language == "python":
             return [sys.executable, source, self.tree.root]
         program = source.with_suffix(".program")
-        sanitize = [f"-fsanitize={SANITIZE}"] if SANITIZE else []
+        # The library is C++, so its checks want the run time of C++ in a program in C, too.
+        sanitize = [f"-fsanitize={SANITIZE}", "-fsanitize-link-c++-runtime", "-lstdc++"] if SANITIZE else []
         subprocess.run(
             [*COMPILERS[language], *STRICT, *sanitize, *(f"-I{path}" for path in HEADERS), source, "-o", program,
              f"-L{LIBRARIES}", f"-Wl,-rpath-link,{LIBRARIES}", "-laccountsettings-client"], check=True,
