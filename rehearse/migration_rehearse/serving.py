@@ -3,6 +3,7 @@
 What comes of an image is the same as from a host that is started for it alone, at a fraction of the cost. A host that
 does not know how to serve, such as one of an earlier release, is started for each image."""
 
+import contextlib
 import json
 import os
 import selectors
@@ -41,7 +42,8 @@ class Server:
     def close(self):
         """Ends it, whatever it is at."""
         self._process.kill()
-        self._process.stdin.close()
+        with contextlib.suppress(BrokenPipeError):  # a request that it died before it took
+            self._process.stdin.close()
         self._process.stdout.close()
         self._process.wait()
 

@@ -1,5 +1,8 @@
 """Hosts that hang, crash, eat memory or talk without end, as a hostile image might make them: each ends as one row."""
 
+import os
+import signal
+import threading
 import unittest
 
 from device_case import HOST as REAL_HOST
@@ -74,6 +77,18 @@ class HostileImages(RehearseTest):
         self.addCleanup(serving.close)
         before = serving.rehearse(program, str(root), limits)
         serving._kept.server._process.kill()
+        serving._kept.server._process.wait()
+        after = serving.rehearse(program, str(root), limits)
+        self.assertEqual((0, before.errors), (after.status, after.errors))
+
+    def test_lose_nothing_to_a_host_that_dies_while_it_is_asked(self):
+        root = self.image("one")
+        program = host.Host(str(REAL_HOST))
+        limits = host.Limits()
+        self.addCleanup(serving.close)
+        before = serving.rehearse(program, str(root), limits)
+        os.kill(serving._kept.server._process.pid, signal.SIGSTOP)
+        threading.Timer(0.2, serving._kept.server._process.kill).start()
         after = serving.rehearse(program, str(root), limits)
         self.assertEqual((0, before.errors), (after.status, after.errors))
 
