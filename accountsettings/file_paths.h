@@ -1,6 +1,7 @@
 #pragma once
 
 #include <string>
+#include <string_view>
 
 #include "platform/export.h"
 #include "platform/file_system.h"
@@ -14,6 +15,10 @@ using platform::StringConstant;
 
 // The migration lock, by the name under which every process of the device takes it.
 inline constexpr StringConstant kMigrationLockName{"AccountMigrationInProgress"};
+
+// Where a migration puts its copy of the settings file, under that file's own name, below the shared resources, and its
+// reports, below the home.
+inline constexpr std::string_view kCrashReporterDirectory = "Library/Logs/CrashReporter";
 
 // What an interrupted deletion of the legacy files leaves behind: exists only while they are being deleted.
 [[nodiscard]] ACCOUNT_EXPORT platform::Path removalSentinelPath();

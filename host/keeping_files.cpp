@@ -25,6 +25,7 @@ using records::LossCode;
 constexpr std::size_t kLargest = std::size_t{256} << 20U;  // no larger property list can be read
 constexpr std::string_view kUnreadable = "unreadable";
 constexpr std::string_view kNewer = "newer";
+constexpr std::string_view kInterrupted = "interrupted";
 constexpr unsigned kDirectoryPermissions = 0755;
 
 Path settingsIn(const platform::MigrationFootprint& footprint) {
@@ -147,6 +148,26 @@ Status KeepingFiles::keepUnusableSettings() {
   if (_settings.empty() || _footprint.copyAside.empty()) return {};
   const platform::RunStage stage{"before the run"};
   return keepSettings(whyUnusable());
+}
+
+Status KeepingFiles::keepCopyOfKilledRun() {
+  constexpr std::string_view kMissing =
+      "the run before this one was killed while it saved: steps of it may be missing, and are not taken up again";
+  const platform::RunStage stage{"before the run"};
+  const Result<FileCopy> copy = _keeper->read(_footprint.copyAside, kLargest);
+  if (!copy.isOk()) {
+    say(std::string{kMissing});
+    return copy.cause() == platform::Cause::missing ? Status{} : copy.status();
+  }
+  const Result<Path> kept = keptAs(kInterrupted, copy.value());
+  if (!kept.isOk() && kept.status().errorNumber() != EEXIST) return kept.status();
+  if (!kept.isOk()) {
+    sayNoRoom(_footprint.copyAside, kInterrupted);
+    return {};
+  }
+  say(std::string{kMissing} + "; the settings from before it are kept as " + kept.value().string());
+  tellKept(_footprint.copyAside.string(), kept.value());
+  return {};
 }
 
 Status KeepingFiles::remove(const Path& path) {

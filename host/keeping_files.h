@@ -14,8 +14,8 @@ namespace host {
 // The device's files as the plug-in gets them where no snapshot is taken: before a run takes away accounts that stand
 // nowhere else, the file that has them is kept under a name of which no run makes use again. The settings are copied
 // beside the copy that the run makes of them, owner, permissions and time included; a legacy file stays in its
-// directory, under another name. The name ends in why, and a number: `.unreadable-1`, `.newer-1`, `.unconverted-1`,
-// `.unsaved-1`. Of one file and reason kMost are kept, the first ones; a further one goes as the rules require, with a
+// directory, under another name. The name ends in why, and a number: `.unreadable-1`, `.newer-1`, `.interrupted-1`,
+// `.unconverted-1`, `.unsaved-1`. Of one file and reason kMost are kept, the first ones; a further one goes as the rules require, with a
 // line. What cannot be kept does not go: the call fails.
 class KeepingFiles final : public snapshots::ForwardingFiles {
  public:
@@ -27,6 +27,8 @@ class KeepingFiles final : public snapshots::ForwardingFiles {
 
   // Keeps the settings file where it has a newer version or cannot be read, ahead of a run.
   platform::Status keepUnusableSettings();
+  // Keeps the copy aside that a run made before it was killed, ahead of the run that would put its own in that place.
+  platform::Status keepCopyOfKilledRun();
 
   platform::Status remove(const platform::Path& path) override;
   platform::Status rename(const platform::Path& from, const platform::Path& to) override;

@@ -18,6 +18,7 @@
 #include "host/migration_lock.h"
 #include "host/plugin.h"
 #include "host/rehearsal.h"
+#include "host/run_mark.h"
 #include "host/run_recorder.h"
 #include "host/say.h"
 #include "host/snapshot_steps.h"
@@ -213,18 +214,26 @@ std::size_t stepsAhead(const platform::MigrationFootprint& footprint) {
       std::clamp<std::int64_t>(footprint.currentVersion - stored, 0, footprint.currentVersion));
 }
 
-// Without snapshots the plug-in takes away no account that stands nowhere else. What cannot be kept ends the run.
-void keepWhatWouldGo(const platform::MigrationFootprint& footprint, const Options& options,
-                     const RunRecorder& recorder) {
-  if (options.snapshots.directory) return;
+void refuseUnkept(const char* what, const platform::Status& kept) {
+  if (kept.isOk()) return;
+  throw Ending{ExitStatus::refused,
+               what + std::string{", and cannot be kept: "} + kept.description() + "; the device was not touched"};
+}
+
+// No run takes away what one that was killed left to go back to, and without snapshots the plug-in takes away no
+// account that stands nowhere else. What cannot be kept ends the run.
+void keepWhatWouldGo(const platform::MigrationFootprint& footprint, const Options& options, const RunRecorder& recorder,
+                     RunMark& mark) {
+  const bool isAfterDeath = mark.isLeft() && mayMissSteps(footprint);
+  if (!isAfterDeath && options.snapshots.directory) return;
   snapshots::Storage storage = storageFor(options);
   const auto keeping = std::make_shared<KeepingFiles>(std::move(storage.files), std::move(storage.keeper), footprint,
                                                       recorder.explanation());
-  const platform::Status kept = keeping->keepUnusableSettings();
-  if (!kept.isOk()) {
-    throw Ending{ExitStatus::refused, "the settings file is of no use to this run, and cannot be kept: " +
-                                          kept.description() + "; the device was not touched"};
+  if (isAfterDeath) {
+    refuseUnkept("the copy of the settings is from before a run that was killed", keeping->keepCopyOfKilledRun());
   }
+  if (options.snapshots.directory) return;
+  refuseUnkept("the settings file is of no use to this run", keeping->keepUnusableSettings());
   platform::Platform services = platform::current();
   services.files = keeping;
   platform::setCurrent(std::move(services));
@@ -232,19 +241,21 @@ void keepWhatWouldGo(const platform::MigrationFootprint& footprint, const Option
 
 // Everything that may keep a run from beginning. Answers the session of its snapshots; null where there is none.
 std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMigrator& migrator, const Options& options,
-                                                    RunRecorder& recorder, Clock::time_point start) {
+                                                    RunRecorder& recorder, RunMark& mark, Clock::time_point start) {
   commandline::progressLine().show({"the device's files are looked at"});
   const platform::MigrationFootprint footprint = migrator.footprint();
-  recorder.expect(stepsAhead(footprint));
+  const std::size_t steps = stepsAhead(footprint);
+  recorder.expect(steps);
   auto session = beginRunWithSnapshots(options, migrator);
   const platform::Status held = holdMigrationLock(footprint.lockName);
   if (!held.isOk()) {
     if (session) static_cast<void>(session->end({}, options.snapshots.keep));
     throw Ending{ExitStatus::refused, held.description() + "; the device was not touched"};
   }
-  keepWhatWouldGo(footprint, options, recorder);
+  keepWhatWouldGo(footprint, options, recorder, mark);
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   sweepTemporaryFiles(storageFor(options), start);
+  if (steps > 0 && !session) mark.set();
   return session;
 }
 
@@ -262,8 +273,10 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
                    .time = universal(start)};
   if (onlookers.trace) onlookers.trace->start(run.version, run.root, options.given, run.time);
   const auto foretold = foretoldOf(migrator, options);
-  const auto session = prepare(migrator, options, *onlookers.recorder, start);
+  RunMark mark{storageFor(options)};
+  const auto session = prepare(migrator, options, *onlookers.recorder, mark, start);
   run.success = migrator.performMigration();
+  mark.remove();
   run.seconds = secondsOf(Clock::now() - start);
   commandline::progressLine().end();
 

@@ -7,6 +7,7 @@
 #include <string>
 
 #include "host/say.h"
+#include "platform/device_places.h"
 #include "platform/platform.h"
 #include "platform/run_observer.h"
 #include "records/fact_observer.h"
@@ -22,19 +23,7 @@ using platform::Result;
 
 constexpr std::size_t kLargest = std::size_t{256} << 20U;  // no larger property list is saved
 constexpr std::uint32_t kOwnerOnly = 0600;
-constexpr std::string_view kNameBegins = "file";
-constexpr std::size_t kLettersInName = 6;
 constexpr std::string_view kContentsBegin = "bplist00";
-
-bool isLetterOrDigit(char character) {
-  return (character >= '0' && character <= '9') || (character >= 'A' && character <= 'Z') ||
-         (character >= 'a' && character <= 'z');
-}
-
-bool isNameOfSave(const std::string& name) {
-  return name.size() == kNameBegins.size() + kLettersInName && name.starts_with(kNameBegins) &&
-         std::all_of(name.begin() + kNameBegins.size(), name.end(), &isLetterOrDigit);
-}
 
 // Where the process died early, there is a part of it, or nothing yet.
 bool beginsAsSave(const platform::Bytes& bytes) {
@@ -63,7 +52,7 @@ void sweep(platform::FileKeeper& keeper, const Path& path) {
 }  // namespace
 
 void sweepTemporaryFiles(const snapshots::Storage& storage, std::chrono::system_clock::time_point start) {
-  const Path directory = platform::current().directories->systemRoot() / "var/mobile/tmp";
+  const Path directory = platform::temporaryDirectoryOf(platform::current().directories->systemRoot());
   const char* const used = std::getenv("TMPDIR");
   if (used == nullptr || directory != used) return;
   const Result<FileAttributes> attributes = storage.keeper->attributesOf(directory);
@@ -71,7 +60,7 @@ void sweepTemporaryFiles(const snapshots::Storage& storage, std::chrono::system_
   if (!attributes.isOk() || !entries.isOk()) return;
   const platform::RunStage stage{"before the run"};
   for (const std::string& name : entries.value()) {
-    if (!isNameOfSave(name)) continue;
+    if (!platform::isNameOfSave(name)) continue;
     const Result<FileCopy> file = storage.keeper->read(directory / name, kLargest);
     if (file.isOk() && isLeftBySave(file.value(), attributes.value().owner, start)) {
       sweep(*storage.keeper, directory / name);

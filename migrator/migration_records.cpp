@@ -1,5 +1,6 @@
 #include <tuple>
 
+#include "accountsettings/file_paths.h"
 #include "migrator/accounts_data_migrator.h"
 #include "migrator/stored_names.h"
 #include "migrator/telling.h"
@@ -19,8 +20,6 @@ constexpr std::string_view kSwitchKey = "ASSaveMigrationInformation";
 constexpr unsigned kOpenToEverybody = 0777;
 // No minutes and no seconds: reports of one tenth of a second of one hour share a name, and the later one stays.
 constexpr std::string_view kReportTimePattern = "Y-M-d-H-M-S";
-
-constexpr std::string_view kLogs = "Library/Logs/CrashReporter";
 
 // Answers whether reports can be written there.
 bool prepareReportDirectory(const Path& directory) {
@@ -51,7 +50,7 @@ void writeReport(const Path& directory, const Dictionary& report) {
 }  // namespace
 
 Path AccountsDataMigrator::copyAsidePath() {
-  return platform::current().directories->sharedResources() / kLogs /
+  return platform::current().directories->sharedResources() / accountsettings::kCrashReporterDirectory /
          Path{AccountsManager::fullPathToAccountSettingsPlist()}.filename();
 }
 
@@ -88,7 +87,8 @@ void AccountsDataMigrator::_saveCollatedMigrationInformation() {
     _collatedMigrationData->set(kSavedSettingsKey,
                                 platform::current().propertyLists->readDictionary(settingsFile).valueOr({}));
   }
-  const Path directory = platform::current().directories->home() / kLogs / "AccountMigration";
+  const Path directory =
+      platform::current().directories->home() / accountsettings::kCrashReporterDirectory / "AccountMigration";
   // The directory is made also for a run that migrated nothing and so has nothing to report.
   if (prepareReportDirectory(directory) && _collatedMigrationData) writeReport(directory, *_collatedMigrationData);
 }

@@ -4,10 +4,12 @@
 #include <array>
 #include <cstdio>
 #include <filesystem>
+#include <functional>
 #include <system_error>
 
 #include "accountsettings/file_paths.h"
 #include "accountsettings/product_values.h"
+#include "platform/device_places.h"
 #include "platform/linux/files/account_names.h"
 #include "platform/linux/files/file_services.h"
 #include "platform/platform.h"
@@ -88,22 +90,28 @@ Findings findingsOfPermissions(const FileAttributes& attributes, const Fates& fa
            fates.openToOthers}};
 }
 
-bool isTemporaryName(const std::string& name) {
-  constexpr std::string_view kBeginning = "file";
-  constexpr std::size_t kLetters = 6;
-  const bool isAlike = name.starts_with(kBeginning) && name.size() == kBeginning.size() + kLetters;
-  return isAlike &&
-         std::ranges::all_of(name, [](char letter) { return std::isalnum(static_cast<unsigned char>(letter)) != 0; });
-}
-
-std::vector<Path> temporaryFiles() {
-  const Path directory = platform::current().directories->systemRoot() / "var/mobile/tmp";
+std::vector<Path> filesIn(const Path& directory, const std::function<bool(const std::string&)>& isMeant) {
   const auto keeper = platform::makeFileKeeper(*platform::current().directories);
   std::vector<Path> files;
   for (const std::string& name : keeper->entriesOf(directory).valueOr({})) {
-    if (isTemporaryName(name)) files.push_back(directory / name);
+    if (isMeant(name)) files.push_back(directory / name);
   }
   return files;
+}
+
+// What runs keep beside a file is named for why, and numbered: as in `.unreadable-1`.
+std::vector<Path> keptBeside(const Path& path) {
+  constexpr std::array<std::string_view, 5> kReasons{"unreadable", "newer", "interrupted", "unconverted", "unsaved"};
+  std::vector<Path> kept;
+  for (const std::string_view reason : kReasons) {
+    const std::string beginning = path.filename().string() + "." + std::string{reason} + "-";
+    std::ranges::move(filesIn(path.parent_path(),
+                              [&beginning](const std::string& name) {
+                                return name.size() == beginning.size() + 1 && name.starts_with(beginning);
+                              }),
+                      std::back_inserter(kept));
+  }
+  return kept;
 }
 
 Path besideIt(const Path& path, std::string_view before, std::string_view behind) {
@@ -114,6 +122,55 @@ Finding companionOf(const Path& legacy) {
   const bool isConverted = platform::current().files->kindOf(legacy).isOk() && !isDeletionUnderWay();
   return {"companion", "", "", "an earlier release left this copy of " + legacy.filename().string(),
           isConverted ? "a migration deletes it with the file itself" : "a migration leaves it"};
+}
+
+void addIfThere(const Path& path, const Finding& finding, std::vector<Leftover>& found) {
+  if (attributesOf(path).isOk()) found.push_back({path, finding});
+}
+
+// Copies that earlier releases made and runs kept, and what stands in the marker's place.
+void lookBesideTheFiles(std::vector<Leftover>& found) {
+  const Path exchange = pathOf(LegacyForm::exchange);
+  const Path mail = pathOf(LegacyForm::mail);
+  for (const Path& legacy : {exchange, mail}) addIfThere(besideIt(legacy, "", ".original"), companionOf(legacy), found);
+  const Path copyAside = platform::current().directories->sharedResources() / accountsettings::kCrashReporterDirectory /
+                         AccountsManager::fullPathToAccountSettingsPlist().filename();
+  const Finding kept{"kept-copy", "", "", "a run kept it: what stands in it may stand nowhere else",
+                     "a migration leaves it"};
+  for (const Path& path : {copyAside, exchange, mail}) {
+    for (const Path& each : keptBeside(path)) addIfThere(each, kept, found);
+  }
+  const Path marker = accountsettings::mailAutoFetchMarkerPath();
+  if (const auto attributes = attributesOf(marker); attributes.isOk() && attributes.value().kind != FileKind::file) {
+    found.push_back({marker,
+                     {"no-file", "", "", "the mail application's mark is no file",
+                      "a migration deletes it with everything in it"}});
+  }
+}
+
+// What runs, restores and saves leave that are killed.
+void lookForDeaths(std::vector<Leftover>& found) {
+  const Path root = platform::current().directories->systemRoot();
+  addIfThere(accountsettings::removalSentinelPath(),
+             {"sentinel", "", "", "a run died while it deleted the files of the first releases",
+              "a migration finishes the deletion, converting nothing, and leaves the rest to the next one"},
+             found);
+  addIfThere(platform::runMarkOf(root),
+             {"killed-run", "", "", "a run was killed while it worked: version steps of it may be missing",
+              "a migration takes up none that the settings file's version says are done, and keeps the copy from "
+              "before it"},
+             found);
+  for (const Path& path : {Path{AccountsManager::fullPathToAccountSettingsPlist()}, pathOf(LegacyForm::exchange),
+                           pathOf(LegacyForm::mail)}) {
+    addIfThere(besideIt(path, ".restoring-", ""),
+               {"leftover", "", "", "a restore that died left this copy", "a migration leaves it"}, found);
+  }
+  for (const Path& path : filesIn(platform::temporaryDirectoryOf(root), &platform::isNameOfSave)) {
+    addIfThere(path,
+               {"leftover", "", "", "a program that died while it saved left it, with the accounts and their passwords",
+                "a migration removes it where a save left it"},
+               found);
+  }
 }
 
 }  // namespace
@@ -146,29 +203,8 @@ Finding unreadable(const platform::Status& reading, Part part) {
 
 std::vector<Leftover> leftoversOnDevice() {
   std::vector<Leftover> found;
-  const auto look = [&](const Path& path, const Finding& finding) {
-    if (attributesOf(path).isOk()) found.push_back({path, finding});
-  };
-  const Path settings = AccountsManager::fullPathToAccountSettingsPlist();
-  const Path exchange = pathOf(LegacyForm::exchange);
-  const Path mail = pathOf(LegacyForm::mail);
-  for (const Path& legacy : {exchange, mail}) look(besideIt(legacy, "", ".original"), companionOf(legacy));
-  look(accountsettings::removalSentinelPath(),
-       {"sentinel", "", "", "a run died while it deleted the files of the first releases",
-        "a migration finishes the deletion, converting nothing, and leaves the rest to the next one"});
-  const Path marker = accountsettings::mailAutoFetchMarkerPath();
-  if (const auto attributes = attributesOf(marker); attributes.isOk() && attributes.value().kind != FileKind::file) {
-    look(marker,
-         {"no-file", "", "", "the mail application's mark is no file", "a migration deletes it with everything in it"});
-  }
-  for (const Path& path : {settings, exchange, mail}) {
-    look(besideIt(path, ".restoring-", ""),
-         {"leftover", "", "", "a restore that died left this copy", "a migration leaves it"});
-  }
-  for (const Path& path : temporaryFiles()) {
-    look(path, {"leftover", "", "", "a program that died while it saved left it, with the accounts and their passwords",
-                "a migration removes it where a save left it"});
-  }
+  lookBesideTheFiles(found);
+  lookForDeaths(found);
   return found;
 }
 

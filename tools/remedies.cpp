@@ -64,6 +64,9 @@ constexpr auto kRows = std::to_array<Row>({
     {"replaced-with-type", kKeepAndRecover, Act::keepCopy},
     {"companion", "see whether it has accounts that are nowhere else", Act::verify},
     {"sentinel", "see whether the accounts of those files are on the device before one runs", Act::list},
+    {"killed-run", "see what is still ahead; where steps are missing, put the copy from before it in place",
+     Act::rehearse},
+    {"kept-copy", "bring back what is missed with accountctl recover, and remove it when nothing is", Act::verify},
     {"leftover", "remove it, unless the settings file was lost", Act::remove},
 });
 

@@ -4,7 +4,7 @@ import json
 import unittest
 
 from accountctl_case import CLOUD, DIRECTORY, HOME_MAIL, AccountctlTest, changed
-from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS
+from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY
 from device_case import HOST
 from failed_saves_test import CAP_DAC_OVERRIDE, without_capabilities
 
@@ -43,6 +43,14 @@ class VerifyTest(AccountctlTest):
         return self.tree.read_plist(SETTINGS)
 
 
+    def assert_kept(self, why):
+        """That what the run kept of the settings is told of, until it is taken away as is advised."""
+        kept = self.tree.path(f"{SETTINGS_COPY}.{why}-1")
+        self.assertIn(("kept-copy", None, None), self.found())
+        self.assertTrue(self.commands[-1].endswith(f"verify {kept}"), self.commands)
+        kept.unlink()
+
+
 class Clean(VerifyTest):
     def test_is_what_a_save_of_this_release_leaves(self):
         self.put(HOME_MAIL, CLOUD, DIRECTORY)
@@ -71,6 +79,7 @@ class Structure(VerifyTest):
             self.tree.write(SETTINGS, content)
             self.assertEqual([("unreadable", None, None)], self.found())
             self.assertEqual({"Accounts": [], "Version": CURRENT_VERSION}, self.migrated())
+            self.assert_kept("unreadable")
 
     def test_without_accounts(self):
         self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION})
@@ -105,6 +114,8 @@ class Versions(VerifyTest):
     def test_newer(self):
         for version in (CURRENT_VERSION + 1, 2**40, -1, 2**64 - 1):
             self.assert_version(["version-newer"], False, Version=version)
+            if version in (CURRENT_VERSION + 1, 2**40):
+                self.assert_kept("newer")
 
     def test_absent_or_no_number(self):
         self.assert_version(["version-absent"], False)

@@ -120,10 +120,12 @@ class BrokenDevices(AccountctlTest):
         number = made.index(str(self.tree.path(SETTINGS))) + 1
         run = self.tree.migrate(HOST, "--plugin", MORTAL, environment={**how, "DIE_BEFORE": str(number)})
         self.assertEqual(-9, run.status)
-        return list(self.tree.path(TEMPORARY).iterdir())
+        return list(self.tree.path(TEMPORARY).glob("file??????"))
 
     def test_a_run_was_killed_without_snapshots(self):
         left = self.killed_while_it_saved()
+        self.assertEqual(1, len(left))
+        self.assertIn("a run was killed while it worked", self.told("verify"))
         self.assertIn("data version 11", self.told("--file", self.tree.root, "list"))
         for each in left:
             self.assertEqual("0 removed, 0 added, 0 changed, 3 the same", self.told("diff", each))
