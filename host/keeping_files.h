@@ -15,8 +15,8 @@ namespace host {
 // nowhere else, the file that has them is kept under a name of which no run makes use again. The settings are copied
 // beside the copy that the run makes of them, owner, permissions and time included; a legacy file stays in its
 // directory, under another name. The name ends in why, and a number: `.unreadable-1`, `.newer-1`, `.interrupted-1`,
-// `.unconverted-1`, `.unsaved-1`. Of one file and reason kMost are kept, the first ones; a further one goes as the rules require, with a
-// line. What cannot be kept does not go: the call fails.
+// `.unconverted-1`, `.unsaved-1`. Of one file and reason kMost are kept, the first ones; a further one goes as the
+// rules require, with a line. What cannot be kept does not go: the call fails.
 class KeepingFiles final : public snapshots::ForwardingFiles {
  public:
   static constexpr int kMost = 9;
