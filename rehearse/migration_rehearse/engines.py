@@ -5,82 +5,108 @@ than a few, and yields each with its result as it comes, in any order. A task wh
 comes with the result DIED.
 """
 
-import ctypes
 import importlib.util
-import os
-import signal
-from concurrent.futures import FIRST_COMPLETED, ProcessPoolExecutor, wait
-from concurrent.futures.process import BrokenProcessPool
+import itertools
+import pickle
+import tempfile
+from collections import deque
 from itertools import islice
+from typing import NamedTuple
+
+from migration_rehearse.pool import Pool, WorkerDied
 
 DIED = object()
 PACKAGE = __name__.partition(".")[0]
-PR_SET_PDEATHSIG = 1
-AHEAD = 4  # tasks given out for each worker, so that none waits for the next
+AHEAD = 16  # tasks given out for each worker of this machine, so that none waits for the next
+AHEAD_OF_CLUSTER = 4
 
 
 class EngineFault(Exception):
     """The engine that was asked for cannot be had."""
 
 
+class _Given(NamedTuple):
+    """A task that is not answered yet."""
+
+    message: bytes
+    answered: deque  # gets its number and the answer
+
+
 class LocalEngine:
-    """Processes of this machine."""
+    """Processes of this machine. What they keep in temporary directories goes when the engine is closed."""
 
     def __init__(self, workers):
         self.workers = workers
-        self._executor = _executor(workers)
+        self._scratch = _temporary_directory()
+        self._numbers = itertools.count(1)
+        self._given = {}  # by its number
+        self._pool = self._new_pool(workers)
 
     def close(self):
-        self._executor.shutdown(cancel_futures=True)
+        self._pool.close()
+        if self._scratch:
+            self._scratch.cleanup()
 
     def map(self, function, tasks):
-        waiting, tasks = {}, iter(tasks)
+        waiting, answered, tasks = {}, deque(), iter(tasks)
         while True:
             for task in islice(tasks, self.workers * AHEAD - len(waiting)):
-                executor = self._executor
-                waiting[self._submit(function, task)] = (executor, task)
+                waiting[self._give(function, task, answered)] = task
             if not waiting:
                 return
-            yield from self._finished(function, waiting)
+            while not answered:
+                self._hear()
+            number, answer = answered.popleft()
+            if isinstance(answer, Exception):
+                raise answer
+            yield waiting.pop(number), answer
 
-    def _submit(self, function, task):
+    def _new_pool(self, workers):
+        return Pool(workers, self._scratch and self._scratch.name)
+
+    def _give(self, function, task, answered):
+        number = next(self._numbers)
+        self._given[number] = _Given(pickle.dumps((number, function, task)), answered)
+        self._pool.give(self._given[number].message)
+        return number
+
+    def _hear(self):
         try:
-            return self._executor.submit(function, task)
-        except BrokenProcessPool:
-            self._executor = _executor(self.workers)
-            return self._executor.submit(function, task)
+            for number, answer in self._pool.hear():
+                self._given.pop(number).answered.append((number, answer))
+        except WorkerDied as died:
+            self._begin_anew(died.task)
 
-    def _finished(self, function, waiting):
-        for future in wait(waiting, return_when=FIRST_COMPLETED).done:
-            executor, task = waiting.pop(future)
-            try:
-                yield task, future.result()
-            except BrokenProcessPool:
-                if executor is self._executor:
-                    self._executor = _executor(self.workers)
-                yield task, alone(function, task)
+    def _begin_anew(self, suspect):
+        """The task that a worker died of, as it seems, is tried once more with nobody beside it; the others are given to
+        new workers, since which of them the old ones took is not known for certain."""
+        self._pool.close()
+        if suspect in self._given:
+            given = self._given.pop(suspect)
+            given.answered.append((suspect, self._alone(given.message)))
+        self._pool = self._new_pool(self.workers)
+        for given in self._given.values():
+            self._pool.give(given.message)
 
-
-def alone(function, task):
-    """A worker died, and any task that was under way may be why: each is tried with nobody beside it."""
-    with _executor(1) as executor:
+    def _alone(self, message):
+        pool = self._new_pool(1)
+        pool.give(message)
         try:
-            return executor.submit(function, task).result()
-        except BrokenProcessPool:
+            while not (heard := pool.hear()):
+                pass
+            return heard[0][1]
+        except WorkerDied:
             return DIED
+        finally:
+            pool.close()
 
 
-def _executor(workers):
-    return ProcessPoolExecutor(workers, initializer=_begin_worker, initargs=(os.getpid(),))
-
-
-def _begin_worker(parent):
-    """Workers end with the program, however that ends; what the keyboard interrupts is the program."""
-    signal.signal(signal.SIGINT, signal.SIG_IGN)
-    signal.signal(signal.SIGTERM, signal.SIG_DFL)
-    ctypes.CDLL(None).prctl(PR_SET_PDEATHSIG, signal.SIGKILL)
-    if os.getppid() != parent:
-        os._exit(0)
+def _temporary_directory():
+    """For all workers, so that it goes whatever becomes of them. Where none can be made, who needs one says so."""
+    try:
+        return tempfile.TemporaryDirectory(prefix="migration-rehearse-", ignore_cleanup_errors=True)
+    except OSError:
+        return None
 
 
 class DaskEngine:
@@ -127,7 +153,7 @@ class DaskEngine:
             yield waiting.pop(future.key), self._result(future)
 
     def _ahead(self):
-        return max(16, AHEAD * sum(self._client.nthreads().values()))
+        return max(16, AHEAD_OF_CLUSTER * sum(self._client.nthreads().values()))
 
     def _result(self, future):
         try:
