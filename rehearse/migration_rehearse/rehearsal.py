@@ -8,6 +8,7 @@ import os
 import platform
 import stat
 import tempfile
+import threading
 import zlib
 from typing import NamedTuple
 
@@ -121,13 +122,22 @@ def rehearse(task):
     try:
         if task.kind == DIRECTORY:
             return _rehearse_tree(task, os.path.abspath(task.path), task.identifiers)
-        with tempfile.TemporaryDirectory(prefix="migration-rehearse-", ignore_cleanup_errors=True) as scratch:
-            root = unpacking.unpack(task.path, scratch, task.bounds)
-            return _rehearse_tree(task, root, footprint.look_at(root).identifiers)
+        root = unpacking.unpack(task.path, scratch(), task.bounds)
+        return _rehearse_tree(task, root, footprint.look_at(root).identifiers)
     except Fault as fault:
         return unrehearsed(fault.cause, fault.detail)
     except OSError as failure:
         return unrehearsed("unpacking-failed", failure.strerror or "")
+
+
+_kept = threading.local()
+
+
+def scratch():
+    """Where this thread unpacks archive after archive."""
+    if not hasattr(_kept, "scratch"):
+        _kept.scratch = tempfile.TemporaryDirectory(prefix="migration-rehearse-", ignore_cleanup_errors=True)
+    return _kept.scratch.name
 
 
 @functools.cache

@@ -9,7 +9,6 @@ import json
 import os
 import resource
 import select
-import shutil
 import signal
 import stat
 import time
@@ -22,6 +21,8 @@ WANTED = (*FILES, *DIRECTORIES)
 # An entry is looked at more closely where its last two names are those of a file that a run reads: links may lead to it.
 TAILS = frozenset("/".join(path.split("/")[-2:]) for path in FILES)
 NAMES = frozenset(name for path in WANTED for name in path.split("/"))
+WANTED_NAMED = {name: [path for path in WANTED if path.endswith("/" + name)] for name in NAMES}
+IMPLIED_MODE = 0o755  # of a directory that the archive does not name
 KEPT_ENTRIES = 10_000  # links, directories and files that might matter; a device has a few dozen
 SMALL = 64 << 20  # what any archive may unpack to, whatever its size
 PAGE = os.sysconf("SC_PAGE_SIZE")
@@ -37,6 +38,12 @@ class Bounds(NamedTuple):
     seconds: float = 600
 
 
+def reader_of_archives():
+    import libarchive  # only who has archives needs it, and it takes long
+
+    return libarchive
+
+
 class Unpacking:
     """One pass through an archive."""
 
@@ -50,8 +57,7 @@ class Unpacking:
         self.found = {}  # what might matter: path to ("file", staged), ("directory", mode), ("link", target) or a fault
 
     def read(self):
-        import libarchive  # only who has archives needs it
-
+        libarchive = reader_of_archives()
         try:
             with libarchive.file_reader(self.archive, format_name=self._format()) as reader:
                 for entry in reader:
@@ -122,12 +128,13 @@ class Tree:
 
     def __init__(self, found):
         self.found = found
+        self.has_links = any(kind == "link" for kind, _ in found.values())
 
     def root(self):
         """Where the device's tree begins: the place below which most of what a run reads is found."""
         candidates = {}
         for path in self.found:
-            for wanted in WANTED:
+            for wanted in WANTED_NAMED.get(path.rpartition("/")[2], ()):
                 if path == wanted or path.endswith("/" + wanted):
                     prefix = path[: len(path) - len(wanted)].rstrip("/")
                     candidates.setdefault(prefix, None)
@@ -144,7 +151,7 @@ class Tree:
         """What a run reads, by its path on the device: the entry that it leads to."""
         places = {}
         for path in WANTED:
-            place = resolved(path, lambda below: self._target(prefix, below))
+            place = resolved(path, lambda below: self._target(prefix, below)) if self.has_links else path
             if place is None:
                 raise Fault("link-out", path)
             what = self.found.get(f"{prefix}/{place}" if prefix else place)
@@ -172,7 +179,9 @@ class Tree:
 
 
 def build(places, root):
-    """Puts the staged files and the directories of a device where a run looks for them."""
+    """Puts the staged files and the directories of a device where a run looks for them, and takes away what else is there:
+    most devices have the same directories, and to make and remove them is what costs most."""
+    _clear(root, places)
     for path, (kind, value) in places.items():
         place = os.path.join(root, path)
         if kind == "file":
@@ -183,12 +192,29 @@ def build(places, root):
             os.chmod(place, value | stat.S_IRWXU)
 
 
+def _clear(root, places):
+    """Leaves of what is below the root only the directories that these places need."""
+    needed = {"."} | {path for path, (kind, _) in places.items() if kind == "directory"}
+    for path in places:
+        while path := path.rpartition("/")[0]:
+            needed.add(path)
+    for directory, _, files in os.walk(root, topdown=False):
+        for file in files:
+            os.unlink(os.path.join(directory, file))
+        if os.path.relpath(directory, root) not in needed:
+            os.rmdir(directory)
+        else:
+            os.chmod(directory, IMPLIED_MODE)
+
+
 def unpack(archive, scratch, bounds=Bounds()):
-    """The root of the device in the archive, unpacked below the directory `scratch`, which must be empty. Raises Fault.
-    Works in a process of its own, which a damaged archive may crash or let run away."""
+    """The root of the device in the archive, unpacked below the directory `scratch`, where nothing is but what was unpacked
+    there before, which goes. Raises Fault. Works in a process of its own, which a damaged archive may crash or let run
+    away."""
+    reader_of_archives()  # here and not there, so that the next process has it, too
     staging, root = os.path.join(scratch, "staging"), os.path.join(scratch, "device")
-    os.mkdir(staging)
-    os.mkdir(root)
+    for directory in (staging, root):
+        os.makedirs(directory, exist_ok=True)
     told, telling = os.pipe()
     worker = os.fork()
     if worker == 0:
@@ -196,7 +222,8 @@ def unpack(archive, scratch, bounds=Bounds()):
         _work(archive, staging, root, bounds, telling)
     os.close(telling)
     fault = _what_became_of(worker, told, bounds.seconds)
-    shutil.rmtree(staging, ignore_errors=True)
+    for left in os.scandir(staging):
+        os.unlink(left)
     if fault:
         raise Fault(*fault)
     return root

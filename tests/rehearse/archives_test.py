@@ -5,9 +5,12 @@ import subprocess
 import tarfile
 import unittest
 import zipfile
+from pathlib import Path
 
 from device import PREFERENCES, SETTINGS, Device
 from rehearse_case import KEPT, UNFIXABLE, RehearseTest
+
+from migration_rehearse import rehearsal, unpacking
 
 PASSWD, GROUP = "etc/passwd", "etc/group"
 
@@ -76,6 +79,35 @@ class Forms(ArchiveTest):
                      for entry, content in self.files_of(self.root)]
             found = self.rehearsed(self.archive(*moved, member("var", kind=tarfile.SYMTYPE, link=target)))
             self.assertEqual("lost", found.verdict, found)
+
+
+class OneAfterAnother(ArchiveTest):
+    """They are unpacked in one place."""
+
+    def test_are_told_of_as_if_each_were_the_first(self):
+        full, bare = self.legacy_image("full"), self.image("bare")
+        (bare / PREFERENCES / "more").mkdir()
+        odd = member("etc/vorlix/device-info.plist", kind=tarfile.DIRTYPE)
+        archives = [self.archive(*self.files_of(full), name="1.tar.gz"), self.archive(*self.files_of(bare), name="2.tar.gz"),
+                    self.archive(*self.files_of(bare), odd, name="3.tar.gz")]
+        alone = [self.rehearsed_at_first(archive) for archive in archives]
+        for number in (0, 1, 2, 0, 2, 1, 0):
+            self.assertEqual(alone[number], self.rehearsed(archives[number]).document)
+
+    def rehearsed_at_first(self, archive):
+        rehearsal.scratch()
+        vars(rehearsal._kept).pop("scratch").cleanup()
+        return self.rehearsed(archive).document
+
+    def test_leave_nothing_but_directories(self):
+        scratch = self.scratch / "scratch"
+        scratch.mkdir()
+        unpacking.unpack(str(self.archive(*self.files_of(self.legacy_image("full")))), scratch)
+        root = Path(unpacking.unpack(str(self.archive(*self.files_of(self.image("bare")))), scratch))
+        self.assertEqual(["etc/group", "etc/passwd", SETTINGS],
+                         sorted(str(path.relative_to(root)) for path in root.rglob("*") if path.is_file()))
+        self.assertFalse((root / "var/mobile/Library/Mail").exists())
+        self.assertEqual([], list((scratch / "staging").iterdir()))
 
 
 class Faults(ArchiveTest):
