@@ -30,6 +30,7 @@ using Stopped = ForkedRun::Stopped;
 
 constexpr std::size_t kMaxErrors = std::size_t{1} << 20;
 constexpr double kSecondsToEnd = 1;  // after its last word
+constexpr int kMillisecondsBetweenErrors = 10;
 
 struct Pipe {
   Descriptor reader;
@@ -37,7 +38,7 @@ struct Pipe {
 
   [[nodiscard]] bool open() {
     std::array<int, 2> ends{};
-    if (::pipe2(ends.data(), O_CLOEXEC) != 0) return false;
+    if (::pipe2(ends.data(), O_CLOEXEC) != 0 || ::fcntl(ends[0], F_SETFL, O_NONBLOCK) != 0) return false;
     reader = Descriptor{ends[0]};
     writer = Descriptor{ends[1]};
     return true;
@@ -80,16 +81,19 @@ class Child {
         _limits{limits},
         _listener{listener.value_or(-1)} {}
 
-  // Answers whether there is still somebody to tell.
+  // Answers whether there is still somebody to tell. While there is output to come, this process is not woken by each
+  // line of errors, but takes what has gathered now and then.
   [[nodiscard]] bool hearOut() {
     while (_run.stopped == Stopped::no && (_output.isOpen() || _errors.isOpen())) {
-      std::array<pollfd, 3> ready{{{_output.number(), POLLIN, 0}, {_errors.number(), POLLIN, 0}, {_listener, 0, 0}}};
-      const int count = ::poll(ready.data(), ready.size(), millisecondsLeft());
+      const Descriptor& heard = _output.isOpen() ? _output : _errors;
+      std::array<pollfd, 2> ready{{{heard.number(), POLLIN, 0}, {_listener, 0, 0}}};
+      const int left = millisecondsLeft();
+      const int count = ::poll(ready.data(), ready.size(), std::min(left, kMillisecondsBetweenErrors));
       if (count < 0 && errno == EINTR) continue;
-      if (count <= 0) _run.stopped = Stopped::timeout;
-      if (ready[2].revents != 0) return false;
-      if (ready[0].revents != 0) take(_output, _run.output, SIZE_MAX);
-      if (ready[1].revents != 0) take(_errors, _run.errors, kMaxErrors);
+      if (count < 0 || left == 0) _run.stopped = Stopped::timeout;
+      if (ready[1].revents != 0) return false;
+      take(_output, _run.output, SIZE_MAX);
+      take(_errors, _run.errors, kMaxErrors);
       if (_limits.output && _run.output.size() > *_limits.output) _run.stopped = Stopped::tooMuchOutput;
     }
     return true;
@@ -120,16 +124,18 @@ class Child {
   }
 
   [[nodiscard]] int millisecondsLeft() const {
-    if (!_limits.seconds) return -1;
+    if (!_limits.seconds) return INT_MAX;
     return static_cast<int>(std::clamp(std::ceil((*_limits.seconds - seconds()) * 1000), 0.0, double{INT_MAX}));
   }
 
+  // What is there.
   static void take(Descriptor& from, std::string& text, std::size_t most) {
+    if (!from.isOpen()) return;
     std::array<char, std::size_t{1} << 16> block;  // NOLINT(cppcoreguidelines-pro-type-member-init): read fills it
     const ssize_t count = ::read(from.number(), block.data(), block.size());
     if (count > 0) {
       text.append(block.data(), std::min(static_cast<std::size_t>(count), most - text.size()));
-    } else if (count == 0 || errno != EINTR) {
+    } else if (count == 0 || (errno != EINTR && errno != EAGAIN)) {
       from = Descriptor{};
     }
   }
