@@ -6,9 +6,8 @@ import re
 from collections import Counter
 from typing import NamedTuple
 
-from migration_rehearse.footprint import UUID
+from migration_rehearse.footprint import identifiers_in
 
-NEW_UUID = re.compile(UUID.pattern.decode())
 TEMPORARY_NAME = re.compile(r"(/var/mobile/tmp/file)[A-Za-z0-9]{6}\b")
 COUNTED = ("kept", "changed", "added", "converted", "folded", "dropped", "lost")
 OF_THE_MOMENT = ("time", "root")  # members that say when and where, and nothing of the device
@@ -29,14 +28,14 @@ class Explained(NamedTuple):
 
 def lasting(text, root, identifiers):
     """The text without the root, and with identifiers that the device did not have numbered as they appear."""
-    names = {}
-
-    def label(match):
-        return match[0] if match[0] in identifiers else names.setdefault(match[0], f"(new {len(names) + 1})")
-
+    names, parts, end = {}, [], 0
     if root != "/":
         text = text.replace(json.dumps(root, ensure_ascii=False)[1:-1] + "/", "/")
-    return TEMPORARY_NAME.sub(r"\1(temporary)", NEW_UUID.sub(label, text))
+    for start, identifier in identifiers_in(text):
+        if identifier not in identifiers:
+            parts += [text[end:start], names.setdefault(identifier, f"(new {len(names) + 1})")]
+            end = start + len(identifier)
+    return TEMPORARY_NAME.sub(r"\1(temporary)", "".join([*parts, text[end:]]))
 
 
 def explained(document):

@@ -39,7 +39,11 @@ DIRECTORIES = (
     "var/mobile/tmp",
 )
 
-UUID = re.compile(rb"[0-9A-F]{8}-[0-9A-F]{4}-4[0-9A-F]{3}-[89AB][0-9A-F]{3}-[0-9A-F]{12}")
+# An identifier from its thirteenth character on, which a search finds at once since it begins with what is rare; and
+# the part before that.
+IDENTIFIER_END = re.compile(r"-4[0-9A-F]{3}-[89AB][0-9A-F]{3}-[0-9A-F]{12}")
+IDENTIFIER_BEGIN = re.compile(r"[0-9A-F]{8}-[0-9A-F]{4}")
+BEGIN_LENGTH = 13
 MAX_LINKS = 40
 MAX_HASHED = 256 << 20  # of one file; no reader of the run takes more
 BLOCK = 1 << 20
@@ -51,6 +55,16 @@ class Footprint(NamedTuple):
     digest: str
     identifiers: frozenset
     is_device: bool  # whether anything of a device is there at all
+
+
+def identifiers_in(text):
+    """The identifiers in a text, each with where it begins; of two that overlap, the first."""
+    end = 0
+    for match in IDENTIFIER_END.finditer(text):
+        start = match.start() - BEGIN_LENGTH
+        if start >= end and IDENTIFIER_BEGIN.fullmatch(text, start, match.start()):
+            end = match.end()
+            yield start, text[start:end]
 
 
 def target_of(root):
@@ -97,12 +111,18 @@ def look_at(root):
     """The footprint of the device whose file tree is in the directory `root`."""
     digest, identifiers, found = hashlib.sha256(), set(), 0
     target = target_of(root)
+
+    @functools.cache
+    def is_plain(path):
+        parent = path.rpartition("/")[0]
+        return (not parent or is_plain(parent)) and target(path) is None
+
     for path in (*FILES, *DIRECTORIES):
-        place = resolved(path, target)
+        place = path if is_plain(path) else resolved(path, target)
         kind, content = _what_stands_at(f"{root}/{place}") if place is not None else ("link", b"")
         digest.update(f"{path}\0{kind}\0{len(content)}\0".encode())
         digest.update(content)
-        identifiers.update(match.decode() for match in UUID.findall(content))
+        identifiers.update(identifier for _, identifier in identifiers_in(content.decode("latin-1")))
         found += path.startswith("var/mobile/") and kind != "missing"
     return Footprint(digest.hexdigest(), frozenset(identifiers), found > 0)
 

@@ -118,8 +118,10 @@ def own_libraries(binary):
 def as_mobile(root):
     """What to put before the host's command where the caller is not root: it then is, to itself, the mobile user of the
     device, who may own what a run saves. Nothing where there is no need, or no such user, or no way."""
+    if os.geteuid() == 0:
+        return []
     user, group = _number_of(root, USERS, "mobile"), _number_of(root, GROUPS, "mobile")
-    if os.geteuid() == 0 or user is None or group is None or (user, group) == (os.geteuid(), os.getegid()):
+    if user is None or group is None or (user, group) == (os.geteuid(), os.getegid()):
         return []
     return ["unshare", "--user", f"--map-user={user}", f"--map-group={group}", "--"] if may_unshare() else []
 

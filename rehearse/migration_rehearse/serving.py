@@ -6,13 +6,14 @@ does not know how to serve, such as one of an earlier release, is started for ea
 import contextlib
 import json
 import os
-import selectors
+import select
 import subprocess
 import threading
 import time
 
 from migration_rehearse import host
 
+ENVIRONMENT = {**host.ENVIRONMENT, "LD_BIND_NOW": "1"}  # what is looked up before the fork is looked up once
 SERVE = "--serve-rehearsals"
 GREETING = {"serves": "rehearsals", "protocol": 1}
 SECONDS_TO_GREET = 20
@@ -28,9 +29,11 @@ class Server:
 
     def __init__(self, command):
         self.command = command
-        self._process = subprocess.Popen(command, env=host.ENVIRONMENT, stdin=subprocess.PIPE, stdout=subprocess.PIPE,
+        self._process = subprocess.Popen(command, env=ENVIRONMENT, stdin=subprocess.PIPE, stdout=subprocess.PIPE,
                                          stderr=subprocess.DEVNULL, start_new_session=True)
         self._said = bytearray()
+        self._poll = select.poll()
+        self._poll.register(self._process.stdout, select.POLLIN)
         try:
             greeting = self._line(time.monotonic() + SECONDS_TO_GREET)
             if not isinstance(greeting, dict) or GREETING.items() - greeting.items():
@@ -81,10 +84,8 @@ class Server:
         return taken
 
     def _hear(self, deadline):
-        with selectors.DefaultSelector() as selector:
-            selector.register(self._process.stdout, selectors.EVENT_READ)
-            left = None if deadline is None else max(0, deadline - time.monotonic())
-            heard = os.read(self._process.stdout.fileno(), 1 << 20) if selector.select(left) else b""
+        left = None if deadline is None else max(0, deadline - time.monotonic()) * 1000
+        heard = os.read(self._process.stdout.fileno(), 1 << 20) if self._poll.poll(left) else b""
         if not heard:
             raise ServerLost("it says nothing")
         self._said += heard

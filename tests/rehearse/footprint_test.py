@@ -4,10 +4,11 @@ import os
 import re
 import subprocess
 import unittest
+from random import Random
 
 from device import LEGACY_EXCHANGE, PREFERENCES
 from device_case import HOST, can_trace_calls, strace
-from migration_rehearse.footprint import DIRECTORIES, FILES, look_at, resolved, target_of
+from migration_rehearse.footprint import DIRECTORIES, FILES, identifiers_in, look_at, resolved, target_of
 from rehearse_case import RehearseTest
 
 # What a rehearsal asks for and cannot depend on: whether another run holds its lock.
@@ -26,6 +27,16 @@ class Footprint(RehearseTest):
         known = {*FILES, *DIRECTORIES, LOCK}
         known |= {path.rsplit("/", number)[0] for path in known for number in range(1, path.count("/") + 1)}
         self.assertEqual(set(), opened - known)
+
+    def test_finds_the_identifiers_that_a_search_from_left_to_right_finds(self):
+        plainly = re.compile(r"[0-9A-F]{8}-[0-9A-F]{4}-4[0-9A-F]{3}-[89AB][0-9A-F]{3}-[0-9A-F]{12}")
+        one = "01234567-89AB-4CDE-8F01-23456789ABCD"
+        random = Random(1)
+        for _ in range(2000):
+            pieces = random.choices([one, one[:8], one[8:], one[13:], one[:24], "-4", "x", "é"], k=8)
+            text = "".join(pieces)
+            expected = [(match.start(), match[0]) for match in plainly.finditer(text)]
+            self.assertEqual(expected, list(identifiers_in(text)), text)
 
     def test_changes_with_every_file_that_is_in_it(self):
         root = self.image("device")
