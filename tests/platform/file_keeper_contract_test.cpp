@@ -8,7 +8,9 @@
 #include <atomic>
 #include <cerrno>
 #include <cstdio>
+#include <functional>
 #include <thread>
+#include <tuple>
 
 #include "platform/linux/files/file_services.h"
 #include "platform/linux/linux_platform.h"
@@ -171,15 +173,57 @@ TEST(LinuxFileKeeper, ReadsNoSecondNameThatSomebodyMayHavePlanted) {
   EXPECT_EQ(keeper->read(scratch / "second", 4).status().errorNumber(), EMLINK);
 }
 
+TEST(LinuxFileKeeper, ReadsRootsOnlyFileInTheDirectoryOfAnother) {
+  if (::getuid() != 0) GTEST_SKIP() << "only root has files in the directories of others";
+  const ScratchDirectory scratch;
+  scratch.put("file", "text");
+  ASSERT_EQ(::chmod((scratch / "file").c_str(), 0600), 0);
+  ASSERT_EQ(::chown(scratch.path().c_str(), 65534, 65534), 0);
+  const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
+  EXPECT_EQ(keeper->read(scratch / "file", 4).value().bytes, bytes("text"));
+}
+
+// Does something again and again, beside the test, as long as it stands.
+class Meanwhile {
+ public:
+  explicit Meanwhile(std::function<void()> work)
+      : _thread{[this, work = std::move(work)] {
+          while (!_isOver) work();
+        }} {}
+  Meanwhile(const Meanwhile&) = delete;
+  Meanwhile& operator=(const Meanwhile&) = delete;
+  ~Meanwhile() {
+    _isOver = true;
+    _thread.join();
+  }
+
+ private:
+  std::atomic<bool> _isOver = false;
+  std::thread _thread;
+};
+
+TEST(LinuxFileKeeper, ReadsNoSecondNameThatIsGoneAgainOnceItIsOpen) {
+  if (::getuid() != 0) GTEST_SKIP() << "only root reads for another what he may not";
+  const ScratchDirectory scratch;
+  scratch.put("secret", "secret");
+  ASSERT_EQ(::chmod((scratch / "secret").c_str(), 0600), 0);
+  const Path theirs = scratch / "theirs";
+  std::filesystem::create_directory(theirs);
+  ASSERT_EQ(::chown(theirs.c_str(), 65534, 65534), 0);
+  const Meanwhile planter{[&] {
+    std::ignore = ::link((scratch / "secret").c_str(), (theirs / "second").c_str());
+    std::ignore = ::unlink((theirs / "second").c_str());
+  }};
+  const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
+  for (int read = 0; read < 20'000; ++read) ASSERT_FALSE(keeper->read(theirs / "second", 10).isOk());
+}
+
 TEST(LinuxFileKeeper, ReadsAttributesAndBytesOfOneFileWhateverTakesItsPlace) {
   const ScratchDirectory scratch;
   scratch.put("file", "short");
   scratch.put("other", "something longer");
-  std::atomic<bool> isOver = false;
-  std::thread exchanger{[&] {
-    while (!isOver) {
-      ::renameat2(AT_FDCWD, (scratch / "file").c_str(), AT_FDCWD, (scratch / "other").c_str(), RENAME_EXCHANGE);
-    }
+  const Meanwhile exchanger{[&] {
+    ::renameat2(AT_FDCWD, (scratch / "file").c_str(), AT_FDCWD, (scratch / "other").c_str(), RENAME_EXCHANGE);
   }};
   const auto keeper = platform::makeFileKeeper(*platform::makeLinuxPlatform().directories);
   int torn = 0;
@@ -187,8 +231,6 @@ TEST(LinuxFileKeeper, ReadsAttributesAndBytesOfOneFileWhateverTakesItsPlace) {
     const auto file = keeper->read(scratch / "file", 100);
     torn += file.isOk() && file.value().attributes.size == file.value().bytes.size() ? 0 : 1;
   }
-  isOver = true;
-  exchanger.join();
   EXPECT_EQ(torn, 0);
 }
 

@@ -3,16 +3,43 @@
 #include <fcntl.h>
 
 #include <cerrno>
+#include <chrono>
+#include <ctime>
+#include <thread>
 
 #include "platform/linux/files/planting.h"
 
 namespace platform {
 namespace {
 
+std::chrono::nanoseconds sinceEpoch(const timespec& time) {
+  return std::chrono::seconds{time.tv_sec} + std::chrono::nanoseconds{time.tv_nsec};
+}
+
 bool isRegular(mode_t mode) {
   if (S_ISREG(mode)) return true;
   if (S_ISDIR(mode)) return failWith(EISDIR);
   return failWith(S_ISLNK(mode) ? ELOOP : EINVAL);
+}
+
+// Whether the file had one name and no other when its name was asked, as `status` has it. The kernel counts a name that
+// it is taking away no longer, and finds it for a moment more. It does so under the directory's lock, which a move of
+// the name onto itself waits for; after that the name is gone, or the file's time of change is another, unless that is
+// so young that the clock has not moved since.
+bool hasStoodAlone(const Place& place, const Descriptor& file, const struct stat& status) {
+  constexpr std::chrono::milliseconds kOldEnough{50};
+  const std::chrono::nanoseconds changed = sinceEpoch(status.st_ctim);
+  timespec now{};
+  if (::clock_gettime(CLOCK_REALTIME, &now) != 0) return false;
+  if (std::chrono::abs(sinceEpoch(now) - changed) < kOldEnough) {
+    std::this_thread::sleep_for(kOldEnough);
+    return false;
+  }
+  const int parent = place.parent.number();
+  const char* const name = place.leaf.c_str();
+  if (::renameat(parent, name, parent, name) != 0 && errno != EROFS) return false;
+  struct stat later {};
+  return statAtName(place, file, later) && sinceEpoch(later.st_ctim) == changed;
 }
 
 }  // namespace
@@ -39,12 +66,28 @@ Descriptor openRegularFile(const Place& place) {
   return file;
 }
 
+bool statAtName(const Place& place, const Descriptor& thing, struct stat& status) {
+  struct stat opened {};
+  if (::fstat(thing.number(), &opened) != 0) return false;
+  if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return false;
+  return (opened.st_dev == status.st_dev && opened.st_ino == status.st_ino) || failWith(ESTALE);
+}
+
 Descriptor openOwnFile(const Place& place) {
-  Descriptor file = openRegularFile(place);
-  struct stat status {};
-  struct stat holder {};
-  if (!file.isOpen() || ::fstat(file.number(), &status) != 0 || ::fstat(place.parent.number(), &holder) != 0) return {};
-  return mayBeRead(status, holder) || failWith(EMLINK) ? std::move(file) : Descriptor{};
+  constexpr int kAttempts = 100;  // a file that is replaced by a save is another one, and as good
+  for (int attempt = 0; attempt < kAttempts; ++attempt) {
+    Descriptor file = openRegularFile(place);
+    struct stat status {};
+    struct stat holder {};
+    if (!file.isOpen() || ::fstat(place.parent.number(), &holder) != 0) return {};
+    if (!statAtName(place, file, status)) continue;
+    if (!mayBeRead(status, holder)) break;
+    struct stat withSecondName = status;
+    withSecondName.st_nlink = 2;
+    if (mayBeRead(withSecondName, holder) || hasStoodAlone(place, file, status)) return file;
+  }
+  errno = EMLINK;
+  return {};
 }
 
 Descriptor makeFile(const Place& place) {

@@ -38,8 +38,12 @@ struct Place {
 // ELOOP or EINVAL), unopened where that can be told before, and nothing waits for the other side of a pipe or a device.
 [[nodiscard]] Descriptor openRegularFile(const Place& place);
 
+// What stands at the name, where that is the opened thing (ESTALE where it is not). How many names the thing itself
+// tells of is no answer: whoever planted one may have removed it again once it was open.
+[[nodiscard]] bool statAtName(const Place& place, const Descriptor& thing, struct stat& status);
+
 // The same for a file whose contents are to be used. One with a second name elsewhere is refused (EMLINK) as planting.h
-// has it.
+// has it, and so is one that is exchanged time and again.
 [[nodiscard]] Descriptor openOwnFile(const Place& place);
 
 // Makes a new file, mode 0600 whatever the umask, open for writing.

@@ -10,6 +10,7 @@
 #include <cstdlib>
 #include <deque>
 #include <mutex>
+#include <tuple>
 
 #include "platform/linux/files/account_names.h"
 #include "platform/linux/files/directory_trees.h"
@@ -85,9 +86,9 @@ bool isSame(const Descriptor& one, const Descriptor& other) {
 
 // Gives away the very thing that is open, and only a file that has no second name elsewhere, and brings its new owner
 // to stable storage. `made` is the thing where this process made it, not open where it did not.
-bool giveAway(const Place& place, const Descriptor& thing, Descriptor made, const AccountNames::Owner& owner) {
+bool giveAway(const Place& place, const Descriptor& thing, const Descriptor& made, const AccountNames::Owner& owner) {
   struct stat status {};
-  if (!thing.isOpen() || ::fstat(thing.number(), &status) != 0) return false;
+  if (!thing.isOpen() || !statAtName(place, thing, status)) return false;
   if (made.isOpen() && !isSame(thing, made)) return failWith(ESTALE);
   if (S_ISLNK(status.st_mode)) return failWith(ELOOP);
   if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return failWith(EMLINK);
@@ -95,11 +96,13 @@ bool giveAway(const Place& place, const Descriptor& thing, Descriptor made, cons
   if (isTheirs || (!S_ISDIR(status.st_mode) && !S_ISREG(status.st_mode))) {
     return ::fchownat(thing.number(), "", owner.user, owner.group, AT_EMPTY_PATH) == 0;
   }
+  Descriptor opened;
   if (!made.isOpen()) {
-    made = openAt(place, O_RDONLY | O_NONBLOCK | O_NOCTTY);
-    if (made.isOpen() && !isSame(made, thing)) return failWith(ESTALE);
+    opened = openAt(place, O_RDONLY | O_NONBLOCK | O_NOCTTY);
+    if (opened.isOpen() && !isSame(opened, thing)) return failWith(ESTALE);
   }
-  return made.isOpen() && ::fchown(made.number(), owner.user, owner.group) == 0 && sync(made);
+  const Descriptor& theirs = made.isOpen() ? made : opened;
+  return theirs.isOpen() && ::fchown(theirs.number(), owner.user, owner.group) == 0 && sync(theirs);
 }
 
 // The files and directories that were made and may still be given away, kept open: somebody who writes in their
@@ -218,9 +221,14 @@ class LinuxFileSystem final : public FileSystem {
   Status setOwner(const Path& path, std::string_view owner, std::string_view group) override {
     const Result<AccountNames::Owner> numbers = _accounts.ownerOf(path, std::string{owner}, std::string{group});
     if (!numbers.isOk()) return numbers.status();
-    return at(path, "set the owner of", [&](const Place& place) {
-      return giveAway(place, openAt(place, O_PATH), _made.take(path), numbers.value());
+    const Descriptor made = _made.take(path);
+    Status given = at(path, "set the owner of", [&](const Place& place) {
+      return giveAway(place, openAt(place, O_PATH), made, numbers.value());
     });
+    // Whoever took it from its place gets it: a file of ours that stayed with him would hold his bytes.
+    const auto [user, theirGroup] = numbers.value();
+    if (!given.isOk() && made.isOpen()) std::ignore = ::fchown(made.number(), user, theirGroup);
+    return given;
   }
 
   Result<Path> temporaryName() override {
