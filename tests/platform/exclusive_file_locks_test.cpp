@@ -241,7 +241,7 @@ constexpr Planted kPlanted[] = {
     {"it belonged to the user 65534",
      [](const fs::path& file) {
        ::close(::open(file.c_str(), O_CREAT | O_WRONLY, 0644));
-       ::lchown(file.c_str(), somebodyElse, somebodyElse);
+       EXPECT_EQ(0, ::lchown(file.c_str(), somebodyElse, somebodyElse));
      }},
 };
 

@@ -35,6 +35,12 @@ Descriptor makeLockFile(const Place& place) {
   return file;
 }
 
+// Whether a step met what it does where somebody exchanged the entry since it was looked at.
+bool meansExchanged(int cause) {
+  constexpr std::array kCauses{ENOENT, ENOTDIR, EISDIR, ENOTEMPTY, ELOOP, EINVAL, EAGAIN};
+  return std::ranges::find(kCauses, cause) != kCauses.end();
+}
+
 // As the kernel names it in its list of locks.
 std::string deviceAndNode(const struct stat& file) {
   std::array<char, 64> text{};
@@ -118,12 +124,13 @@ class LockFile {
       _file = makeLockFile(_place);
       return _file.isOpen() || isToBeTriedAgain(errno == EEXIST);
     }
-    const std::string flaw = ::geteuid() == 0 ? flawOf(status) : std::string{};
+    const bool isRoot = ::geteuid() == 0;
+    const std::string flaw = isRoot ? flawOf(status) : std::string{};
     if (!flaw.empty()) return isShared() || (replace(flaw) && isToBeTriedAgain(true));
     _file = openRegularFile(_place);
-    if (!_file.isOpen()) return isToBeTriedAgain(errno == ENOENT);
+    if (!_file.isOpen()) return isToBeTriedAgain(isRoot ? meansExchanged(errno) : errno == ENOENT);
     if (::fstat(_file.number(), &status) != 0) return false;
-    return ::geteuid() != 0 || flawOf(status).empty() || isToBeTriedAgain(true);
+    return !isRoot || flawOf(status).empty() || isToBeTriedAgain(true);
   }
 
   static bool isToBeTriedAgain(bool isSo) { return isSo && failWith(EAGAIN); }
@@ -141,7 +148,7 @@ class LockFile {
   }
 
   bool replace(const std::string& flaw) {
-    if (!removeTree(_place) && errno != ENOENT) return false;
+    if (!removeTree(_place) && !meansExchanged(errno)) return false;
     if (!std::exchange(_hasSaidReplacement, true)) {
       say("the lock file " + _path.string() + " was replaced, since " + flaw);
     }
