@@ -37,7 +37,9 @@ class RecordingDisk:
         return self.mount_point / NAME
 
     def close(self):
-        subprocess.run(["umount", self.mount_point], check=True)
+        """The kernel gives the loop device back some time after its file system is gone; until then the file is in use."""
+        while subprocess.run(["umount", self.mount_point], check=False, capture_output=True).returncode != 0:
+            time.sleep(0.1)
         if self.server.wait(timeout=30) != 0:
             raise ChildProcessError("the recording disk failed")
 
