@@ -97,8 +97,8 @@ class Headers(unittest.TestCase):
     def test_compile_alone_without_a_warning(self):
         for compiler in ("g++", "clang++-16"):
             for header in sorted(path for directory in HEADERS for path in directory.rglob("*.h")):
-                for standard in ("c++17", "c++20", *(["c11"] if header.name == "account-settings.h" else [])):
-                    language = "c" if standard == "c11" else "c++"
+                for standard in ("c++17", "c++20", *(["c11", "c17"] if header.name == "account-settings.h" else [])):
+                    language = "c++" if standard.startswith("c++") else "c"
                     subprocess.run(
                         [compiler, f"-std={standard}", *STRICT, "-fsyntax-only", *(f"-I{path}" for path in HEADERS),
                          "-include", header, "-x", language, os.devnull], check=True,

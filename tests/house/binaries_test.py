@@ -51,8 +51,9 @@ def is_program(path):
 
 
 def exported_by(path):
+    """Signatures, with the version that brought each; that of the first release of a library in C++ goes without saying."""
     lines = output_of("nm", "-DC", "--defined-only", path).splitlines()
-    return sorted({line.split(" ", 2)[2] for line in lines})
+    return sorted({re.sub(r"(@@|^)ACCOUNT(PLATFORM|SETTINGS)_1$", "", line.split(" ", 2)[2]) for line in lines} - {""})
 
 
 def imported_by(path):

@@ -58,7 +58,7 @@ class InstalledHeaders(unittest.TestCase):
         cls.client.write_text("".join(f'#include "{header}"\n' for header in headers), encoding="utf-8")
         libraries = [cls.build_tree / cls.library_directory / f"lib{name}.so"
                      for name in ("accountplatform", "accountsettings")]
-        cls.exported = {line.split()[-1] for path in libraries
+        cls.exported = {line.split()[-1].split("@")[0] for path in libraries
                         for line in output_of("nm", "-D", "--defined-only", path).splitlines()}
 
     def declared_in(self, namespace):
