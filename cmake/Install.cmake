@@ -1,6 +1,6 @@
 # What `cmake --install` leaves behind: a tree in which everything finds everything else from wherever the tree stands.
 # Each file belongs to one component: library (what programs that use accounts need to run), development (what they need
-# to build), host (what a device needs to migrate), tools, rehearse, python, documents. The packages are made of them.
+# to build), host (what a device needs to migrate), tools, rehearse, python, documents, reference. The packages are made of them.
 
 include(CMakePackageConfigHelpers)
 

@@ -8,7 +8,7 @@ set(CPACK_PACKAGE_DIRECTORY "${CMAKE_BINARY_DIR}/packages")
 set(CPACK_PACKAGING_INSTALL_PREFIX /usr)
 set(CPACK_DEBIAN_DEBUGINFO_PACKAGE ON)  # strips, too, and puts the symbols into packages of their own
 set(CPACK_VERBATIM_VARIABLES ON)
-set(CPACK_COMPONENTS_ALL library development host tools rehearse python documents)
+set(CPACK_COMPONENTS_ALL library development host tools rehearse python documents reference)
 set(CPACK_PRE_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/FinishPackages.cmake")
 set(CPACK_POST_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/TrimPackages.cmake")
 set(CPACK_PACKAGING_SOURCES "${CMAKE_SOURCE_DIR}/packaging")
@@ -40,6 +40,7 @@ type and announce changes, and the configuration of account types.")
 debian_package(DEVELOPMENT libaccountsettings-dev libdevel "${same_library}" "accounts of a device - development files
 The account-settings library loads, edits, merges and saves the accounts of a
 device. This package has what is needed to build programs that use it.")
+set(CPACK_DEBIAN_DEVELOPMENT_PACKAGE_SUGGESTS libaccountsettings-doc)
 debian_package(HOST migration-host admin
   "${same_library}, systemd | systemd-standalone-sysusers, systemd | systemd-standalone-tmpfiles"
   "accounts of a device - upgrade after a system update
@@ -62,6 +63,10 @@ What the upgrade of the account settings does step by step, how it is put into
 a device and operated, and how programs and modules are written for it, with
 example devices, an example program and an example module.")
 set(CPACK_DEBIAN_DOCUMENTS_PACKAGE_ARCHITECTURE all)
+debian_package(REFERENCE libaccountsettings-doc doc "" "accounts of a device - reference of the library
+What the headers of libaccountsettings-dev declare for programs that list,
+change and watch the accounts of a device, in C++ and in C.")
+set(CPACK_DEBIAN_REFERENCE_PACKAGE_ARCHITECTURE all)
 debian_package(PYTHON python3-account-settings python
   "${library_package} (>= ${PROJECT_VERSION}), python3 (>= 3.11)" "accounts of a device - Python module
 The module account_settings lists, changes and watches the accounts of a

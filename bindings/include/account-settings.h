@@ -23,6 +23,7 @@ extern "C" {
 
 #define ACCOUNT_SETTINGS_API __attribute__((visibility("default")))
 
+/* What the functions below hand out and take. */
 typedef struct account_settings account_settings;
 typedef struct account_settings_error account_settings_error;
 typedef struct account_settings_account account_settings_account;
@@ -58,8 +59,10 @@ enum {
   ACCOUNT_SETTINGS_NO_MEMORY = 22            /* there is not enough memory */
 };
 
+/* One of the codes above, and why, for people, in English. */
 ACCOUNT_SETTINGS_API int32_t account_settings_error_code(const account_settings_error* error);
 ACCOUNT_SETTINGS_API const char* account_settings_error_sentence(const account_settings_error* error);
+/* As every function of this name: gives the handle back. */
 ACCOUNT_SETTINGS_API void account_settings_error_free(account_settings_error* error);
 
 /* --- Open --- */
@@ -139,6 +142,7 @@ enum {
   ACCOUNT_SETTINGS_OTHER /* nobody reads it; it may be passed on */
 };
 
+/* One of those above. */
 ACCOUNT_SETTINGS_API int32_t account_settings_value_kind(const account_settings_value* value);
 /* Of another kind: NULL, false or 0. */
 ACCOUNT_SETTINGS_API const char* account_settings_value_text(const account_settings_value* value);
@@ -204,6 +208,8 @@ ACCOUNT_SETTINGS_API void account_settings_edit_free(account_settings_edit* edit
 
 enum { ACCOUNT_SETTINGS_ADDED, ACCOUNT_SETTINGS_CHANGED, ACCOUNT_SETTINGS_REMOVED };
 
+/* What became of how many accounts: of each, one of the kinds above, and the account as it is afterwards; one that was
+ * removed, as it was before. */
 ACCOUNT_SETTINGS_API size_t account_settings_changes_count(const account_settings_changes* changes);
 ACCOUNT_SETTINGS_API int32_t account_settings_changes_kind(const account_settings_changes* changes, size_t place);
 ACCOUNT_SETTINGS_API account_settings_account* account_settings_changes_account(const account_settings_changes* changes,

@@ -7,7 +7,8 @@ from pathlib import Path
 SOURCES = Path(os.environ["SOURCE_TREE"])
 PACKAGES = SOURCES / "build" / "package" / "packages"
 NAMES = [
-    "account-settings-doc", "accountctl", "libaccountsettings-dev", "libaccountsettings1", "migration-host", "migration-rehearse",
+    "account-settings-doc", "accountctl", "libaccountsettings-dev", "libaccountsettings-doc", "libaccountsettings1",
+    "migration-host", "migration-rehearse",
     "python3-account-settings",
 ]
 

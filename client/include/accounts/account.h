@@ -18,12 +18,13 @@ namespace accounts {
 // What a child account does not have itself it has of its parent, in all reads but `keys` and `ownProperties`.
 class ACCOUNTS_API Account {
  public:
+  // Empty, or nothing, where the account has none.
   [[nodiscard]] std::string identifier() const;  // empty while the file gives it none; its next save does
   [[nodiscard]] std::string type() const;        // such as "Mail"
   [[nodiscard]] std::string accountClass() const;
   [[nodiscard]] std::optional<std::string> displayName() const;
-  [[nodiscard]] std::optional<std::string> username() const;
-  [[nodiscard]] std::optional<std::string> syncIdentifier() const;
+  [[nodiscard]] std::optional<std::string> username() const;        // at the service
+  [[nodiscard]] std::optional<std::string> syncIdentifier() const;  // by which those who sync it know it
 
   // Empty for a top-level account.
   [[nodiscard]] std::string parentIdentifier() const;
@@ -81,8 +82,9 @@ class ACCOUNTS_API Accounts {
 
 // What became of one account.
 struct Change {
+  // Whether it came, changed or went.
   enum class Kind : std::int32_t { added, changed, removed };
-  Kind kind;
+  Kind kind;                      // which of these
   Account account;                // as it is afterwards; one that was removed, as it was before
   std::vector<std::string> keys;  // of one that was changed: its own properties that came, changed or went
 };

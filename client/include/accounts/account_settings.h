@@ -13,6 +13,7 @@
 
 namespace accounts {
 
+// Which device is opened, and how.
 struct OpenOptions {
   // The root of the device's file tree; empty for the device that the program runs on. Nobody is told of changes below
   // another root than "/".

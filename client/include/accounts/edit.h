@@ -32,6 +32,7 @@ struct Saved {
 // it asks nobody a question and waits for nothing. The process must not fork before it is gone.
 class ACCOUNTS_API Edit {
  public:
+  // Can be moved, and not copied; what was moved from is over.
   Edit(Edit&&) noexcept;
   Edit& operator=(Edit&&) noexcept;
   ~Edit();  // lets go of the lock

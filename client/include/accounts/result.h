@@ -5,6 +5,7 @@
 #include <utility>
 #include <variant>
 
+// The mark of what the library exports.
 #define ACCOUNTS_API __attribute__((visibility("default")))
 
 namespace accounts {
@@ -34,8 +35,9 @@ enum class Code : std::int32_t {
   brokenInstallation = 21  // the library's own configuration or modules are missing or damaged
 };
 
+// Why something was not done, for programs and for people.
 struct Error {
-  Code code;
+  Code code;             // what a program decides by
   std::string sentence;  // for people, in English, without a full stop
 };
 
@@ -43,9 +45,11 @@ struct Error {
 template <typename Value>
 class [[nodiscard]] Result {
  public:
+  // Holds the one or the other.
   Result(Value value) : _outcome{std::in_place_index<0>, std::move(value)} {}
   Result(Error error) : _outcome{std::in_place_index<1>, std::move(error)} {}
 
+  // Whether there is a value.
   [[nodiscard]] bool isOk() const noexcept { return _outcome.index() == 0; }
   explicit operator bool() const noexcept { return isOk(); }
 
@@ -55,6 +59,7 @@ class [[nodiscard]] Result {
   [[nodiscard]] Value&& value() && noexcept { return std::get<0>(std::move(_outcome)); }
   [[nodiscard]] const Error& error() const noexcept { return std::get<1>(_outcome); }
 
+  // As `value`.
   const Value& operator*() const noexcept { return value(); }
   const Value* operator->() const noexcept { return &value(); }
   Value* operator->() noexcept { return &value(); }

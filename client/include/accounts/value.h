@@ -14,7 +14,7 @@ namespace accounts {
 
 // A point in time: seconds since 2001-01-01 00:00:00 UTC, fractions and earlier times included.
 struct Date {
-  double secondsSince2001 = 0;
+  double secondsSince2001 = 0;  // negative before that
 };
 
 // The value of a property. It never changes, copies share what they hold, and any thread may read it.
@@ -29,7 +29,8 @@ class ACCOUNTS_API Value {
   using List = std::vector<Value>;
   using Dictionary = std::vector<std::pair<std::string, Value>>;  // in the file's order; of one key the last counts
 
-  Value();  // an empty text
+  // An empty text, or a value of the kind that the argument has.
+  Value();
   Value(const char* text);
   Value(std::string_view text);
   Value(const std::string& text);
@@ -44,6 +45,7 @@ class ACCOUNTS_API Value {
   Value(const Dictionary& dictionary);
   Value(const void*) = delete;
 
+  // Of which kind it is, and what it is; nothing of another kind.
   [[nodiscard]] Kind kind() const;
   [[nodiscard]] std::optional<std::string> text() const;
   [[nodiscard]] std::optional<std::int64_t> integer() const;           // nothing above the signed range

@@ -20,6 +20,7 @@ class ACCOUNTS_API Watch {
   // Who calls the callback: a thread of the watch's own, or whoever calls `dispatch`.
   enum class Caller : std::int32_t { ownThread, eventLoop };
 
+  // Can be moved, and not copied; what was moved from watches nothing.
   Watch(Watch&&) noexcept;
   Watch& operator=(Watch&&) noexcept;
   // From then on nothing is called; waits for a call that is under way, unless it is made by that call itself.
