@@ -90,35 +90,41 @@ bool isAmong(std::string_view word, Words words) { return std::ranges::find(word
 
 Bytes secretBytes() { return {FuzzedDevice::kSecret.begin(), FuzzedDevice::kSecret.end()}; }
 
-// The library keeps the first log that it meets for the life of the process: one that writes to the device of the
-// moment.
-class PresentLog final : public platform::SystemLog {
- public:
-  [[nodiscard]] bool hasReaders() const override { return device->hasReaders(); }
-  void write(const platform::LogRecord& record) override { device->write(record); }
-
-  std::shared_ptr<tests::FakeSystemLog> device;
-};
-
-std::shared_ptr<PresentLog> presentLog() {
-  static const auto log = std::make_shared<PresentLog>();
-  return log;
-}
-
 }  // namespace
 
-FuzzedDevice::FuzzedDevice(Input& input) : _input{input}, _store{platform::makeLibplistPropertyListStore(files)} {
+FuzzedDevice::FuzzedDevice() : _store{platform::makeLibplistPropertyListStore(files)} {
   for (const char* const name : {"AccountTypesProperties", "DataclassesProperties", "AccountCreators"}) {
     const Path path = Path{"/resources"} / (std::string{name} + ".plist");
     putReal(path, dictionaryAt(path));
   }
-  presentLog()->device = systemLog;
-  changePlatform([this](platform::Platform& services) {
-    services.propertyLists = _store;
-    services.systemLog = presentLog();
-  });
+  changePlatform([this](platform::Platform& services) { services.propertyLists = _store; });
   switchRecordsOn();
+  _ownFiles = files->nodes;
+}
+
+void FuzzedDevice::fill(Input& input) {
+  _input = &input;
+  _identifiers = 0;
+  _markers = 0;
+  files->nodes = _ownFiles;
+  files->failing.clear();
+  files->hasTemporaryNames = true;
+  identifiers->made = 0;
+  forget();
   putFiles();
+}
+
+void FuzzedDevice::forget() {
+  outputs.clear();
+  files->calls.clear();
+  console->lines.clear();
+  systemLog->lines.clear();
+  locks->calls.clear();
+  deviceInfo->asked.clear();
+  restrictions->asked.clear();
+  tetheredSync->asked.clear();
+  modules->opened.clear();
+  clock->patterns.clear();
 }
 
 std::optional<Dictionary> FuzzedDevice::settings() const {
@@ -131,43 +137,43 @@ std::optional<Bytes> FuzzedDevice::settingsBytes() const {
 }
 
 PropertyValue FuzzedDevice::anything(int depth) {
-  const std::size_t choice = _input.below(10);
-  if (choice == 0 && depth > 0) return Dictionary{{_input.oneOf(kKeys), anything(depth - 1)}};
+  const std::size_t choice = _input->below(10);
+  if (choice == 0 && depth > 0) return Dictionary{{_input->oneOf(kKeys), anything(depth - 1)}};
   if (choice == 1 && depth > 0) return Array{anything(depth - 1), anything(depth - 1)};
   if (choice == 2) return secretBytes();
-  return scalarFrom(_input, kTexts);
+  return scalarFrom(*_input, kTexts);
 }
 
 PropertyValue FuzzedDevice::identifier() {
   if (areIdentifiersUnique) return "Identifier " + std::to_string(++_identifiers);
-  return "Identifier " + std::to_string(_input.below(4));
+  return "Identifier " + std::to_string(_input->below(4));
 }
 
 // What stands under the key on an honest device.
 PropertyValue FuzzedDevice::usual(std::string_view key, int depth) {
   if (isAmong(key, kCredentials)) return kSecret;
-  if (key == "Type") return _input.oneOf(kTypes);
-  if (key == "Class" || key == "AccountType" || key == "DAAccountConfigurationClass") return _input.oneOf(kClasses);
+  if (key == "Type") return _input->oneOf(kTypes);
+  if (key == "Class" || key == "AccountType" || key == "DAAccountConfigurationClass") return _input->oneOf(kClasses);
   if (key == "Identifier" || key == "uniqueId" || key == "DAAccountConfigurationAccountID") return identifier();
   if (key == "ChildAccounts") return accounts(depth - 1);
   if (key == "CalDAVPrincipalConfiguration") {
-    return Dictionary{{"Login_Key", _input.oneOf(kTexts)}, {"CalDAV_Server_Key", _input.oneOf(kHosts)}};
+    return Dictionary{{"Login_Key", _input->oneOf(kTexts)}, {"CalDAV_Server_Key", _input->oneOf(kHosts)}};
   }
-  if (key == "CalDAVAccountConfiguration") return Dictionary{{"CalDAV_PrincipalPath_Key", _input.oneOf(kPrincipals)}};
+  if (key == "CalDAVAccountConfiguration") return Dictionary{{"CalDAV_PrincipalPath_Key", _input->oneOf(kPrincipals)}};
   if (key.ends_with("Dataclasses")) {
     Array names;
-    for (std::size_t count = _input.below(6); count > 0; --count) names.emplace_back(_input.oneOf(kDataclasses));
+    for (std::size_t count = _input->below(6); count > 0; --count) names.emplace_back(_input->oneOf(kDataclasses));
     return names;
   }
-  if (key == "hostedServiceStatus") return static_cast<int>(_input.below(4));
-  return scalarFrom(_input, kTexts);
+  if (key == "hostedServiceStatus") return static_cast<int>(_input->below(4));
+  return scalarFrom(*_input, kTexts);
 }
 
 Dictionary FuzzedDevice::described(Words keys) {
   Dictionary properties;
-  for (std::size_t count = _input.below(12); count > 0; --count) {
-    const std::string_view key = _input.oneOf(keys);
-    const bool isOdd = _input.below(8) == 7 && !isAmong(key, kCredentials);
+  for (std::size_t count = _input->below(12); count > 0; --count) {
+    const std::string_view key = _input->oneOf(keys);
+    const bool isOdd = _input->below(8) == 7 && !isAmong(key, kCredentials);
     properties.set(key, isOdd ? anything(2) : usual(key, 1));
   }
   properties.set(kMarker, ++_markers);
@@ -176,11 +182,11 @@ Dictionary FuzzedDevice::described(Words keys) {
 
 Dictionary FuzzedDevice::account(int depth) {
   Dictionary properties;
-  if (_input.below(16) != 15) properties.set("Type", usual("Type", 0));
-  if (_input.below(16) != 15) properties.set("Class", usual("Class", 0));
-  for (std::size_t count = _input.below(10); count > 0; --count) {
-    const std::string_view key = _input.oneOf(kKeys);
-    const bool isOdd = _input.below(8) == 7 && !isAmong(key, kCredentials);
+  if (_input->below(16) != 15) properties.set("Type", usual("Type", 0));
+  if (_input->below(16) != 15) properties.set("Class", usual("Class", 0));
+  for (std::size_t count = _input->below(10); count > 0; --count) {
+    const std::string_view key = _input->oneOf(kKeys);
+    const bool isOdd = _input->below(8) == 7 && !isAmong(key, kCredentials);
     properties.set(key, isOdd ? anything(2) : usual(key, depth));
   }
   if (areIdentifiersUnique) properties.set("Identifier", identifier());
@@ -191,8 +197,8 @@ Dictionary FuzzedDevice::account(int depth) {
 Array FuzzedDevice::accounts(int depth) {
   Array accounts;
   if (depth < 0) return accounts;
-  for (std::size_t count = _input.below(6); count > 0; --count) {
-    accounts.push_back(_input.below(16) == 15 ? anything(2) : PropertyValue{account(depth)});
+  for (std::size_t count = _input->below(6); count > 0; --count) {
+    accounts.push_back(_input->below(16) == 15 ? anything(2) : PropertyValue{account(depth)});
   }
   return accounts;
 }
@@ -202,30 +208,30 @@ void FuzzedDevice::putReal(const Path& path, const Dictionary& contents) const {
 }
 
 void FuzzedDevice::putFile(const Path& path, const Dictionary& contents) {
-  const std::size_t form = _input.below(16);
+  const std::size_t form = _input->below(16);
   if (form == 15) return files->putDirectory(path);
-  if (form == 14) return files->put(path, _input.bytes(20));
+  if (form == 14) return files->put(path, _input->bytes(20));
   putReal(path, contents);
 }
 
 void FuzzedDevice::putFiles() {
-  const std::size_t has = _input.byte();
+  const std::size_t has = _input->byte();
   areIdentifiersUnique = (has & 1U) != 0;
   hasLegacyMail = (has & 2U) != 0;
   hasLegacyExchange = (has & 4U) != 0;
   hasSentinel = (has & 0x38U) == 0x38U;
   hasFaults = (has & 0xC0U) == 0xC0U;
   systemLog->readers = (has & 0x40U) != 0;
-  const std::int64_t version = static_cast<std::int64_t>(_input.below(15)) - 1;
-  const std::size_t isOdd = _input.below(8);
+  const std::int64_t version = static_cast<std::int64_t>(_input->below(15)) - 1;
+  const std::size_t isOdd = _input->below(8);
   Dictionary contents;
   if (version >= 0) contents.set("Version", isOdd == 7 ? anything(1) : PropertyValue{version});
   contents.set("Accounts", isOdd == 6 ? anything(2) : PropertyValue{accounts(1)});
   if (isOdd != 5) putFile(tests::kSettingsFile, contents);
   const auto descriptions = [this](Words keys) {
     Array array;
-    for (std::size_t count = _input.below(5); count > 0; --count) array.emplace_back(described(keys));
-    return _input.below(16) == 15 ? anything(2) : PropertyValue{array};
+    for (std::size_t count = _input->below(5); count > 0; --count) array.emplace_back(described(keys));
+    return _input->below(16) == 15 ? anything(2) : PropertyValue{array};
   };
   if (hasLegacyMail) {
     const PropertyValue delivery = descriptions(kMailKeys);
@@ -239,9 +245,9 @@ void FuzzedDevice::putFiles() {
 void FuzzedDevice::addFaults() {
   for (const char* const verb :
        {"read", "create", "replace", "copy", "remove", "createDirectories", "setOwner", "rename"}) {
-    if (_input.below(4) == 3) files->failing.insert(verb);
+    if (_input->below(4) == 3) files->failing.insert(verb);
   }
-  if (_input.below(4) == 3) files->hasTemporaryNames = false;
+  if (_input->below(4) == 3) files->hasTemporaryNames = false;
 }
 
 }  // namespace fuzz

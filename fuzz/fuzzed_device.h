@@ -1,5 +1,6 @@
 #pragma once
 
+#include <map>
 #include <optional>
 #include <string>
 
@@ -10,10 +11,14 @@ namespace fuzz {
 
 // A device in memory that reads and writes its files with the device's own property lists, filled from an input: a
 // settings file of any version, legacy mail and Exchange accounts, the removal sentinel, files that are no property
-// lists, operations that fail.
+// lists, operations that fail. Making one takes long and filling it again does not; there is one in a process, since
+// the library keeps the log of the first.
 class FuzzedDevice : public tests::MigrationDevice {
  public:
-  explicit FuzzedDevice(Input& input);
+  FuzzedDevice();
+
+  // Makes it what the input says, with nothing left of what it was.
+  void fill(Input& input);
 
   static constexpr std::string_view kSecret = "S3CR3T";  // in every credential and every blob, and nowhere else
   static constexpr std::string_view kMarker = "Marker";  // an integer of its own in each account
@@ -38,9 +43,11 @@ class FuzzedDevice : public tests::MigrationDevice {
   void putFile(const tests::Path& path, const tests::Dictionary& contents);
   void putFiles();
   void addFaults();
+  void forget();  // what the fakes recorded
 
-  Input& _input;
+  Input* _input = nullptr;  // while it is filled
   std::shared_ptr<platform::PropertyListStore> _store;
+  std::map<tests::Path, tests::FakeFileSystem::Node> _ownFiles;  // before it is filled
   int _identifiers = 0;
   int _markers = 0;
 };

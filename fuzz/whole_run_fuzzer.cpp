@@ -119,7 +119,8 @@ void checkAgain(FuzzedDevice& device) {
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size) {
   fuzz::Input input{data, size};
-  FuzzedDevice device{input};
+  static FuzzedDevice device;
+  device.fill(input);
   const auto bytesBefore = device.settingsBytes();
   const auto before = accountsOf(device.settings(), false);
   const Losses losses{device};
