@@ -5,7 +5,7 @@ import signal
 import sys
 import time
 
-from migration_rehearse import anonymise, campaign, compare, engines, host, options, report, telling
+from migration_rehearse import anonymise, campaign, compare, engines, host, options, rehearsal, report, telling
 from migration_rehearse.listing import Listing
 from migration_rehearse.results import ResultFault, Results
 
@@ -52,7 +52,7 @@ def run(arguments, version):
         return say(f"{failure.filename}: {failure.strerror}", WRONG_USE)
     with Results(asked.results) as results:
         rehearsing = host.Host(asked.host, asked.plugin, asked.resources).found()
-        release = results.release(rehearsing.version(), rehearsing.digest())
+        release = results.release(rehearsing.version(), rehearsal.digest_here(rehearsing))
         how = campaign.Campaign(release, rehearsing, options.limits_of(asked), options.bounds_of(asked), asked.again)
         engine = engines.DaskEngine(asked.scheduler) if asked.scheduler else engines.LocalEngine(asked.workers)
         try:

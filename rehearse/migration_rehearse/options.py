@@ -26,25 +26,35 @@ Rehearses a release of the account migration over many device images, none of wh
 UNITS = {"": 1, "k": 1 << 10, "m": 1 << 20, "g": 1 << 30, "t": 1 << 40}
 
 
+def wrong(text, what):
+    return argparse.ArgumentTypeError(f"{text} is no {what}")
+
+
 def size(text):
     """A number of bytes, with K, M, G or T after it."""
     unit = text[-1:].lower()
     number, factor = (text[:-1], UNITS[unit]) if unit in UNITS and unit else (text, 1)
     if not number.isdigit():
-        raise argparse.ArgumentTypeError(f"{text} is no size; examples are 512M and 2G")
+        raise wrong(text, "size; examples are 512M and 2G")
     return int(number) * factor
+
+
+def as_size(number):
+    """What `size` reads as this number."""
+    unit, factor = max((each for each in UNITS.items() if number % each[1] == 0), key=lambda each: each[1])
+    return f"{number // factor}{unit.upper()}"
 
 
 def shard(text):
     number, slash, shards = text.partition("/")
     if not slash or not number.isdigit() or not shards.isdigit() or not 1 <= int(number) <= int(shards):
-        raise argparse.ArgumentTypeError(f"{text} is no shard; examples are 1/8 and 8/8")
+        raise wrong(text, "shard; examples are 1/8 and 8/8")
     return int(number), int(shards)
 
 
 def positive(text):
     if not text.isdigit() or int(text) < 1:
-        raise argparse.ArgumentTypeError(f"{text} is no number from 1")
+        raise wrong(text, "number from 1")
     return int(text)
 
 
@@ -54,7 +64,7 @@ def seconds(text):
     except ValueError:
         number = -1
     if not 0 <= number < 1e9:
-        raise argparse.ArgumentTypeError(f"{text} is no number of seconds")
+        raise wrong(text, "number of seconds")
     return number
 
 
@@ -110,18 +120,15 @@ def run_parser(version):
 def _add_limits(made):
     limits, bounds = Limits(), Bounds()
     group = made.add_argument_group("limits, for each image")
-    group.add_argument("--timeout", metavar="SECONDS", type=seconds, default=limits.seconds,
-                       help="of one rehearsal (default: %(default)s; 0: none)")
-    group.add_argument("--memory", metavar="SIZE", type=size, default=limits.memory,
-                       help="of one rehearsal (default: 2G; 0: none)")
-    group.add_argument("--max-output", metavar="SIZE", type=size, default=limits.output,
-                       help="of one explanation (default: 64M; 0: none)")
-    group.add_argument("--max-entries", metavar="N", type=positive, default=bounds.entries,
-                       help="of an archive (default: %(default)s)")
-    group.add_argument("--max-size", metavar="SIZE", type=size, default=bounds.size,
-                       help="of an archive, unpacked (default: 64G)")
-    group.add_argument("--max-ratio", metavar="N", type=positive, default=bounds.ratio,
-                       help="of an archive's size unpacked to its own (default: %(default)s)")
+    for name, metavar, reader, default, of_what in (
+            ("--timeout", "SECONDS", seconds, limits.seconds, "of one rehearsal (default: {}; 0: none)"),
+            ("--memory", "SIZE", size, limits.memory, "of one rehearsal (default: {}; 0: none)"),
+            ("--max-output", "SIZE", size, limits.output, "of one explanation (default: {}; 0: none)"),
+            ("--max-entries", "N", positive, bounds.entries, "of an archive (default: {})"),
+            ("--max-size", "SIZE", size, bounds.size, "of an archive, unpacked (default: {})"),
+            ("--max-ratio", "N", positive, bounds.ratio, "of an archive's size unpacked to its own (default: {})")):
+        told = of_what.format(as_size(default) if reader is size else default)
+        group.add_argument(name, metavar=metavar, type=reader, default=default, help=told)
 
 
 def limits_of(options):
