@@ -3,9 +3,8 @@
 find_package(PkgConfig REQUIRED)
 find_package(Threads REQUIRED)
 pkg_check_modules(libplist REQUIRED IMPORTED_TARGET libplist-2.0)
-pkg_check_modules(libsystemd REQUIRED IMPORTED_TARGET libsystemd)
+pkg_check_modules(libsystemd REQUIRED IMPORTED_TARGET libsystemd)  # its header alone: it is opened where there is a bus
 pkg_check_modules(libmd REQUIRED IMPORTED_TARGET libmd)
-pkg_check_modules(uuid REQUIRED IMPORTED_TARGET uuid)
 pkg_check_modules(xxhash REQUIRED libxxhash)  # its header alone, compiled in
 pkg_check_modules(utf8proc REQUIRED IMPORTED_TARGET libutf8proc)
 find_package(utf8cpp REQUIRED)

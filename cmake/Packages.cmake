@@ -33,7 +33,8 @@ macro(debian_package component name section depends description)
   set(CPACK_DEBIAN_${component}_DESCRIPTION "${description}")
 endmacro()
 
-debian_package(LIBRARY "${library_package}" libs "" "accounts of a device - library
+# The bus library is opened where there is a bus, so nothing that is linked tells of it.
+debian_package(LIBRARY "${library_package}" libs "libsystemd0 (>= 241)" "accounts of a device - library
 The account-settings library loads, edits, merges and saves the accounts of a
 device. This package has the library, the modules that make accounts of each
 type and announce changes, and the configuration of account types.")

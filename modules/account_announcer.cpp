@@ -1,8 +1,6 @@
 // Tells every program on the device of account changes, by signals on the system bus. com.vorlix.Accounts1.xml
 // describes them.
 
-#include <systemd/sd-bus.h>
-
 #include <chrono>
 #include <cstdint>
 #include <memory>
@@ -18,6 +16,7 @@ namespace modules {
 namespace {
 
 using accountsettings::AccountClassInfo;
+using platform::busLibrary;
 using platform::Dictionary;
 using platform::PropertyValue;
 using std::chrono::microseconds;
@@ -27,7 +26,7 @@ constexpr const char* kInterface = "com.vorlix.Accounts1";
 constexpr microseconds kPatience = std::chrono::seconds{1};
 
 struct MessageReleaser {
-  void operator()(sd_bus_message* message) const { ::sd_bus_message_unref(message); }
+  void operator()(sd_bus_message* message) const { busLibrary()->unref(message); }
 };
 using Message = std::unique_ptr<sd_bus_message, MessageReleaser>;
 
@@ -35,12 +34,12 @@ using Message = std::unique_ptr<sd_bus_message, MessageReleaser>;
 // next one, and none is lost when the process ends.
 void waitForBus(sd_bus& bus) {
   sd_bus_message* made = nullptr;
-  ::sd_bus_message_new_method_call(&bus, &made, "org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus",
-                                   "GetId");
+  busLibrary()->newMethodCall(&bus, &made, "org.freedesktop.DBus", "/org/freedesktop/DBus", "org.freedesktop.DBus",
+                              "GetId");
   const Message question{made};
   if (question == nullptr) return;
   sd_bus_message* reply = nullptr;
-  ::sd_bus_call(&bus, question.get(), static_cast<std::uint64_t>(kPatience.count()), nullptr, &reply);
+  busLibrary()->call(&bus, question.get(), static_cast<std::uint64_t>(kPatience.count()), nullptr, &reply);
   const Message released{reply};
 }
 
@@ -50,10 +49,10 @@ class Arguments {
  public:
   explicit Arguments(sd_bus_message& signal) : _signal{signal} {}
 
-  void open(char kind, const char* contents) { attempt(&::sd_bus_message_open_container, kind, contents); }
-  void close() { attempt(&::sd_bus_message_close_container); }
-  void add(const std::string& text) { attempt(&::sd_bus_message_append_basic, SD_BUS_TYPE_STRING, text.c_str()); }
-  void add(std::int32_t number) { attempt(&::sd_bus_message_append_basic, SD_BUS_TYPE_INT32, &number); }
+  void open(char kind, const char* contents) { attempt(busLibrary()->openContainer, kind, contents); }
+  void close() { attempt(busLibrary()->closeContainer); }
+  void add(const std::string& text) { attempt(busLibrary()->appendBasic, SD_BUS_TYPE_STRING, text.c_str()); }
+  void add(std::int32_t number) { attempt(busLibrary()->appendBasic, SD_BUS_TYPE_INT32, &number); }
   [[nodiscard]] bool areComplete() const { return _areComplete; }
 
  private:
@@ -73,12 +72,12 @@ void announce(const char* name, const Fill& fill) try {
   const auto bus = platform::openSystemBus();
   if (bus == nullptr) return;
   sd_bus_message* made = nullptr;  // and stays so where none can be made
-  ::sd_bus_message_new_signal(bus.get(), &made, kPath, kInterface, name);
+  busLibrary()->newSignal(bus.get(), &made, kPath, kInterface, name);
   const Message signal{made};
   if (signal == nullptr) return;
   Arguments arguments{*signal};
   fill(arguments);
-  if (arguments.areComplete() && ::sd_bus_send(bus.get(), signal.get(), nullptr) >= 0) waitForBus(*bus);
+  if (arguments.areComplete() && busLibrary()->send(bus.get(), signal.get(), nullptr) >= 0) waitForBus(*bus);
 } catch (...) {  // NOLINT(bugprone-empty-catch): an account change never fails for want of listeners, or of memory
 }
 

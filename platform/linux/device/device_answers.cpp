@@ -1,7 +1,8 @@
+#include <sys/random.h>
 #include <sys/utsname.h>
-#include <uuid/uuid.h>
 
 #include <array>
+#include <cerrno>
 #include <map>
 #include <string>
 
@@ -176,11 +177,20 @@ class LinuxPreferencesStore final : public Configured<PreferencesStore> {
 class LinuxUniqueIdentifiers final : public UniqueIdentifiers {
  public:
   Result<std::string> makeUuid() override {
-    std::array<unsigned char, 16> uuid{};
-    ::uuid_generate_random(uuid.data());
-    std::array<char, UUID_STR_LEN> text{};
-    ::uuid_unparse_upper(uuid.data(), text.data());
-    return std::string{text.data()};
+    std::array<unsigned char, 16> bytes{};
+    if (::getrandom(bytes.data(), bytes.size(), 0) != static_cast<ssize_t>(bytes.size())) {
+      const int cause = errno;
+      return Status::failure(cause, "make an identifier");
+    }
+    bytes[6] = static_cast<unsigned char>((bytes[6] & 0x0FU) | 0x40U);  // version 4: made of random numbers
+    bytes[8] = static_cast<unsigned char>((bytes[8] & 0x3FU) | 0x80U);
+    std::string text;
+    for (const unsigned char byte : bytes) {
+      if (text.size() == 8 || text.size() == 13 || text.size() == 18 || text.size() == 23) text += '-';
+      text += "0123456789ABCDEF"[byte >> 4U];
+      text += "0123456789ABCDEF"[byte & 15U];
+    }
+    return text;
   }
 };
 

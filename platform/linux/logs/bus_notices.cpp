@@ -30,7 +30,7 @@ class SystemBus {
     if (_connection == nullptr) _connection = openSystemBus();
     if (_connection == nullptr) return false;
     const int sent =
-        ::sd_bus_emit_signal(_connection.get(), kNoticesPath, kNoticesInterface, member, types, arguments...);
+        busLibrary()->emitSignal(_connection.get(), kNoticesPath, kNoticesInterface, member, types, arguments...);
     if (sent < 0) _connection.reset();
     return sent >= 0;
   }

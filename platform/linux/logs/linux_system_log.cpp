@@ -1,9 +1,6 @@
 #include "platform/linux/logs/logs_and_notices.h"
 
-#define SD_JOURNAL_SUPPRESS_LOCATION
-#include <sys/uio.h>
 #include <syslog.h>
-#include <systemd/sd-journal.h>
 #include <unistd.h>
 
 #include <atomic>
@@ -12,18 +9,12 @@
 #include <exception>
 
 #include "platform/characters.h"
+#include "platform/linux/logs/journal.h"
 
 namespace platform {
 namespace {
 
 constexpr int kDefaultLevel = LOG_NOTICE;
-
-void sendFields(const std::vector<std::string>& fields) {
-  std::vector<iovec> vectors;
-  vectors.reserve(fields.size());
-  for (const std::string& field : fields) vectors.push_back({const_cast<char*>(field.data()), field.size()});
-  ::sd_journal_sendv(vectors.data(), static_cast<int>(vectors.size()));
-}
 
 std::string field(const char* name, std::string_view value) {
   std::string text{name};
@@ -60,7 +51,7 @@ class Presence {
 };
 
 bool hasJournal() {
-  static const Presence socket{"/run/systemd/journal/socket"};
+  static const Presence socket{kJournalSocket};
   return socket();
 }
 
@@ -98,7 +89,7 @@ class LinuxSystemLog final : public SystemLog {
 
 LogSinks systemLogSinks() {
   return {.hasJournal = &hasJournal,
-          .sendToJournal = &sendFields,
+          .sendToJournal = [](const auto& fields) { platform::sendToJournal(kJournalSocket, fields); },
           .hasSyslog = &hasSyslog,
           .sendToSyslog = [](const std::string& line) { ::syslog(LOG_USER | kDefaultLevel, "%s", line.c_str()); }};
 }
