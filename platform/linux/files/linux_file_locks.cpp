@@ -1,7 +1,9 @@
 #include "platform/linux/files/file_services.h"
 
 #include <fcntl.h>
+#include <poll.h>
 #include <sys/file.h>
+#include <sys/inotify.h>
 #include <sys/sysmacros.h>
 
 #include <algorithm>
@@ -10,7 +12,6 @@
 #include <cstdio>
 #include <fstream>
 #include <sstream>
-#include <thread>
 
 #include "platform/linux/files/account_names.h"
 #include "platform/linux/files/directory_trees.h"
@@ -24,7 +25,9 @@ using std::chrono::steady_clock;
 constexpr mode_t kReadableByAll = 0644;
 constexpr unsigned kOpenToAll = 01777;
 constexpr milliseconds kLongWait{1000};
-constexpr milliseconds kBetweenTries{10};
+constexpr milliseconds kShortestPause{1};
+constexpr milliseconds kLongestPause{100};
+constexpr milliseconds kBetweenTries{10};  // where the kernel tells of nothing
 // The file may come and go between two steps only if somebody plays with it; then there is no lock to be had.
 constexpr int kAttempts = 100;
 
@@ -163,20 +166,51 @@ class LockFile {
   bool _hasSaidReplacement = false;
 };
 
+// Lets who waits sleep until there may be a lock to be had. Whoever gives one back closes the file, which the kernel
+// tells; of who gives it back otherwise it tells nothing, and of who dies a moment early, so there is a next try
+// anyway.
+class Closings {
+ public:
+  explicit Closings(const Descriptor& file) : _notices{::inotify_init1(IN_NONBLOCK | IN_CLOEXEC)} {
+    const std::string path = "/proc/self/fd/" + std::to_string(file.number());
+    constexpr std::uint32_t kWatched = IN_CLOSE | IN_ATTRIB | IN_DELETE_SELF | IN_MOVE_SELF;
+    _isTold = _notices.isOpen() && ::inotify_add_watch(_notices.number(), path.c_str(), kWatched) >= 0;
+  }
+
+  void await(milliseconds atMost) {
+    pollfd notice{_notices.number(), POLLIN, 0};
+    const milliseconds pause = std::min(_isTold ? _pause : kBetweenTries, atMost);
+    const bool isClosed = ::poll(&notice, _isTold ? 1 : 0, static_cast<int>(pause.count())) > 0;
+    _pause = isClosed ? kShortestPause : std::min(2 * _pause, kLongestPause);
+    std::array<char, 4096> ignored{};
+    while (isClosed && ::read(_notices.number(), ignored.data(), ignored.size()) > 0) continue;
+  }
+
+ private:
+  Descriptor _notices;
+  bool _isTold = false;
+  milliseconds _pause = kShortestPause;
+};
+
 class LinuxFileLock final : public ExclusiveFileLock {
  public:
   explicit LinuxFileLock(LockFile file) : _file{std::move(file)} {}
+  LinuxFileLock(const LinuxFileLock&) = delete;
+  LinuxFileLock& operator=(const LinuxFileLock&) = delete;
+  ~LinuxFileLock() override { LinuxFileLock::unlock(); }  // before the closing that others are told of
 
   // A file that was removed or replaced meanwhile locks nobody out, so the one that now stands there is tried.
   Status lock() override {
     const auto began = steady_clock::now();
     bool hasSaid = false;
+    std::optional<Closings> closings;
     for (int replaced = 0; replaced < kAttempts;) {
       if (!_file.isOpen()) return {};
       const bool isTaken = tryToTake();
       if (!isTaken && errno != EWOULDBLOCK && errno != EINTR) return failureOf("take the lock", _file.path());
       if (!_file.isAtItsPlace()) {
         ++replaced;
+        closings.reset();
         if (!_file.open()) return failureOf("open the lock file", _file.path());
         continue;
       }
@@ -184,7 +218,8 @@ class LinuxFileLock final : public ExclusiveFileLock {
       const auto waited = steady_clock::now() - began;
       if (_file.timeLimit() && waited >= *_file.timeLimit()) return timedOut();
       if (waited >= kLongWait && !std::exchange(hasSaid, true)) _file.say("waiting for " + holder());
-      std::this_thread::sleep_for(pause(waited));
+      // What was given back before anybody listened is found by the next try.
+      closings ? closings->await(remaining(waited)) : static_cast<void>(closings.emplace(_file.descriptor()));
     }
     return Status::failure(EAGAIN, "take the lock " + _file.path().string());
   }
@@ -204,9 +239,9 @@ class LinuxFileLock final : public ExclusiveFileLock {
 
   [[nodiscard]] Status timedOut() const { return Status::failure(ETIMEDOUT, "wait any longer for " + holder()); }
 
-  [[nodiscard]] steady_clock::duration pause(steady_clock::duration waited) const {
-    if (!_file.timeLimit()) return kBetweenTries;
-    return std::min<steady_clock::duration>(kBetweenTries, *_file.timeLimit() - waited);
+  [[nodiscard]] milliseconds remaining(steady_clock::duration waited) const {
+    if (!_file.timeLimit()) return kLongestPause;
+    return std::chrono::ceil<milliseconds>(*_file.timeLimit() - waited);
   }
 
   LockFile _file;
