@@ -21,6 +21,13 @@ account_settings_edit* account_settings_edit_begin(const account_settings* setti
   });
 }
 
+account_settings_edit* account_settings_trial_begin(const account_settings* settings, account_settings_error** error) {
+  return made(error, [&]() -> account_settings_edit* {
+    auto edit = settings->settings.trial();
+    return isDone(edit, error) ? new account_settings_edit{std::move(edit).value()} : nullptr;
+  });
+}
+
 account_settings_accounts* account_settings_edit_accounts(const account_settings_edit* edit) {
   return orElse(static_cast<account_settings_accounts*>(nullptr), [&] {
     return new account_settings_accounts{edit->edit.accounts(), std::nullopt};
@@ -62,6 +69,8 @@ bool account_settings_edit_set_enabled(account_settings_edit* edit, const char* 
   return made(error, [&] { return isDone(edit->edit.setEnabled(identifier, dataclass, enabled), error); });
 }
 
+void account_settings_edit_rewrite(account_settings_edit* edit) { edit->edit.rewrite(); }
+
 account_settings_changes* account_settings_edit_save(account_settings_edit* edit, account_settings_error** error) {
   return made(error, [&]() -> account_settings_changes* {
     auto saved = edit->edit.save();
@@ -71,6 +80,16 @@ account_settings_changes* account_settings_edit_save(account_settings_edit* edit
 }
 
 void account_settings_edit_free(account_settings_edit* edit) { delete edit; }
+
+bool account_settings_will_change(const account_settings* settings, const account_settings_account* account,
+                                  const char* dataclass, account_settings_error** error) {
+  return made(error, [&] { return isDone(settings->settings.willChange(account->account, dataclass), error); });
+}
+
+bool account_settings_did_change(const account_settings* settings, const account_settings_account* account,
+                                 const char* dataclass, account_settings_error** error) {
+  return made(error, [&] { return isDone(settings->settings.didChange(account->account, dataclass), error); });
+}
 
 size_t account_settings_changes_count(const account_settings_changes* changes) { return changes->changes.size(); }
 

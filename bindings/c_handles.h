@@ -2,6 +2,7 @@
 
 #include <exception>
 #include <memory>
+#include <mutex>
 #include <new>
 #include <optional>
 #include <string>
@@ -58,6 +59,8 @@ struct account_settings_account {
   std::optional<std::string> username;
   std::optional<std::string> syncIdentifier;
   std::string parent;
+  mutable std::once_flag serviceAsked = {};  // which opens a module
+  mutable std::optional<accounts::Service> service = std::nullopt;
 };
 
 struct account_settings_accounts {

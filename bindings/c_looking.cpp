@@ -69,8 +69,20 @@ account_settings* account_settings_open(const char* root, int64_t time_limit_ms,
     options.timeLimit = std::chrono::milliseconds{time_limit_ms};
     options.mayBeMissing = (flags & ACCOUNT_SETTINGS_MAY_BE_MISSING) != 0;
     options.mayDropUnreadable = (flags & ACCOUNT_SETTINGS_MAY_DROP_UNREADABLE) != 0;
+    options.mayBeOfOtherRelease = (flags & ACCOUNT_SETTINGS_MAY_BE_OF_OTHER_RELEASE) != 0;
+    options.mayBeMigrating = (flags & ACCOUNT_SETTINGS_MAY_BE_MIGRATING) != 0;
+    options.opensModules = (flags & ACCOUNT_SETTINGS_OPENS_MODULES) != 0;
     auto settings = accounts::AccountSettings::open(options);
     return isDone(settings, error) ? new account_settings{std::move(settings).value()} : nullptr;
+  });
+}
+
+bool account_settings_wait_for_migration(const char* root, int64_t time_limit_ms, account_settings_error** error) {
+  return made(error, [&] {
+    accounts::OpenOptions options;
+    options.root = root == nullptr ? "" : root;
+    options.timeLimit = std::chrono::milliseconds{time_limit_ms};
+    return isDone(accounts::AccountSettings::waitForMigration(options), error);
   });
 }
 
@@ -118,6 +130,14 @@ account_settings_accounts* account_settings_accounts_with_dataclass(const accoun
                 [&] { return all(*accounts, [&](const Account& account) { return account.isEnabled(dataclass); }); });
 }
 
+uint64_t account_settings_accounts_version(const account_settings_accounts* accounts) {
+  return accounts->whole ? accounts->whole->dataVersion() : 0;
+}
+
+size_t account_settings_accounts_unreadable(const account_settings_accounts* accounts) {
+  return accounts->whole ? accounts->whole->unreadable() : 0;
+}
+
 void account_settings_accounts_free(account_settings_accounts* accounts) { delete accounts; }
 
 const char* account_settings_account_identifier(const account_settings_account* account) {
@@ -152,6 +172,18 @@ account_settings_value* account_settings_account_enabled(const account_settings_
 
 bool account_settings_account_is_enabled(const account_settings_account* account, const char* dataclass) {
   return orElse(false, [&] { return account->account.isEnabled(dataclass); });
+}
+
+bool account_settings_account_service(const account_settings_account* account, const char** host, uint16_t* port,
+                                      bool* is_secure) {
+  return orElse(false, [&] {
+    std::call_once(account->serviceAsked, [&] { account->service = account->account.service(); });
+    if (!account->service) return false;
+    if (host != nullptr) *host = account->service->host.c_str();
+    if (port != nullptr) *port = account->service->port;
+    if (is_secure != nullptr) *is_secure = account->service->isSecure;
+    return true;
+  });
 }
 
 account_settings_value* account_settings_account_property(const account_settings_account* account, const char* key) {

@@ -3,6 +3,8 @@
 #include <algorithm>
 #include <utility>
 
+#include "accountsettings/device_local_account.h"
+#include "accountsettings/service_objects.h"
 #include "client/contents.h"
 
 namespace accounts {
@@ -52,7 +54,13 @@ std::string Account::identifier() const {
 
 std::string Account::type() const { return copied(content().record->type()).value_or(""); }
 std::string Account::accountClass() const { return copied(content().record->accountClass()).value_or(""); }
-std::optional<std::string> Account::displayName() const { return copied(content().record->displayName()); }
+
+std::optional<std::string> Account::displayName() const {
+  if (type() != accountsettings::kOnMyDeviceAccountType) return copied(content().record->displayName());
+  const Within within{*content().device};
+  return accountsettings::DeviceLocalAccount::class_typeString();
+}
+
 std::optional<std::string> Account::username() const { return text(accountsettings::kAccountUsername); }
 std::optional<std::string> Account::syncIdentifier() const { return copied(content().record->syncStoreIdentifier()); }
 bool Account::isChild() const { return content().record->parentAccount() != nullptr; }
@@ -93,6 +101,25 @@ bool Account::isEnabled(std::string_view dataclass) const {
   return content().record->isEnabledForDataclass(dataclass);
 }
 
+bool Account::listsDataclasses() const {
+  const Within within{*content().device};
+  return content().record->enabledDataclasses().has_value();
+}
+
+// An account whose module is at fault can be looked at all the same.
+std::optional<Service> Account::service() const {
+  if (!content().device->opensModules()) return std::nullopt;
+  const auto known = answerOf([this]() -> Result<std::optional<Service>> {
+    const Within within{*content().device};
+    const auto full = content().record->fullAccountUsingLoader(nullptr);
+    const auto* const object = dynamic_cast<const accountsettings::ServiceAccountObject*>(full.get());
+    const auto address = object == nullptr ? std::nullopt : object->service();
+    if (!address) return std::optional<Service>{};
+    return std::optional{Service{address->host, address->port, address->isSecure}};
+  });
+  return known ? *known : std::nullopt;
+}
+
 std::optional<Value> Account::property(std::string_view key) const {
   std::optional<PropertyValue> value = content().record->accountPropertyForKey(key);
   return value ? std::optional{valueOf(*std::move(value))} : std::nullopt;
@@ -120,6 +147,11 @@ std::vector<std::string> Account::keys() const {
   return keys;
 }
 
+std::optional<std::string> Account::ownText(std::string_view key) const {
+  const Text* const text = std::as_const(*content().record).properties().text(key);
+  return text == nullptr ? std::nullopt : std::optional{text->string()};
+}
+
 Value::Dictionary Account::ownProperties() const {
   return *valueOf(std::as_const(*content().record).properties()).dictionary();
 }
@@ -127,6 +159,9 @@ Value::Dictionary Account::ownProperties() const {
 Accounts::Accounts(std::shared_ptr<const Content> content) : _content{std::move(content)} {}
 
 const std::vector<Account>& Accounts::all() const { return content().topLevel; }
+
+std::uint64_t Accounts::dataVersion() const { return content().store->dataVersion(); }
+std::size_t Accounts::unreadable() const { return content().store->loadOutcome().leftOut.size(); }
 
 std::optional<Account> Accounts::withIdentifier(std::string_view identifier) const {
   const Record record = content().store->accountWithIdentifier(identifier);

@@ -45,7 +45,8 @@ struct Accounts::Content {
       std::make_shared<const Accounts::Content>(Accounts::Content{device, std::move(store), std::move(topLevel)})};
 }
 
-[[nodiscard]] Result<Edit> beginEdit(std::shared_ptr<const Device> device);
+enum class Manner : std::uint8_t { change, trial };
+[[nodiscard]] Result<Edit> beginEdit(std::shared_ptr<const Device> device, Manner manner);
 [[nodiscard]] Result<Watch> beginWatch(std::shared_ptr<const Device> device, const Accounts& since,
                                        Watch::Callback callback, Watch::Caller caller);
 

@@ -62,16 +62,36 @@ class FilesOnOneVolume final : public platform::FileSystem {
   Path _directory;
 };
 
+// Those of a device that is merely mounted somewhere are foreign code.
+class ClosedModules final : public platform::ModuleLoader {
+ public:
+  Status open(const std::string&) override {
+    return Status::failure(platform::Cause::unsafe, "open a module",
+                           "modules under another root are opened only where that is asked for");
+  }
+};
+
+bool mayOpenModules(const OpenOptions& options, const platform::Platform& services) {
+  return options.opensModules || options.root.empty() || services.directories->systemRoot() == "/";
+}
+
+platform::Platform ownServices(const OpenOptions& options) {
+  if (options.root.empty() && options.home.empty() && options.resources.empty()) return platform::current();
+  const auto given = [](const std::string& path) { return path.empty() ? std::nullopt : std::optional<Path>{path}; };
+  return platform::makeLinuxPlatform(
+      {.systemRoot = given(options.root), .home = given(options.home), .resources = given(options.resources)});
+}
+
 Path temporaryDirectory(const platform::Platform& services) {
   return services.directories->systemRoot() / "var/mobile/tmp";
 }
 
 platform::Platform servicesFor(const OpenOptions& options) {
-  platform::Platform services =
-      options.root.empty() ? platform::current() : platform::makeLinuxPlatform({.systemRoot = options.root});
+  platform::Platform services = ownServices(options);
   services.files = std::make_shared<FilesOnOneVolume>(services.files, temporaryDirectory(services));
   services.console = std::make_shared<platform::SilentConsoleLog>();
-  if (services.directories->systemRoot() != "/") {
+  if (!mayOpenModules(options, services)) {
+    services.modules = std::make_shared<ClosedModules>();
     services.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
   }
   return services;
@@ -85,7 +105,7 @@ std::recursive_mutex& turns() {
 bool isForbidden(const Status& status) { return status.errorNumber() == EACCES || status.errorNumber() == EPERM; }
 
 Error unreadFile(const Path& path, const Status& reading) {
-  const std::string sentence = "the accounts in " + path.string() + " cannot be read: " + reading.reason();
+  const std::string sentence = "the account settings cannot be read: " + path.string() + ": " + reading.reason();
   if (reading.cause() == platform::Cause::unsafe) return {Code::refused, sentence};
   return {isForbidden(reading) ? Code::noPermission : Code::unreadable, sentence};
 }
@@ -112,7 +132,7 @@ Device::Device(OpenOptions options) : _options{std::move(options)} {
   _settingsFile = AccountsManager::fullPathToAccountSettingsPlist();
 }
 
-bool Device::isAnnounced() const { return _services.directories->systemRoot() == "/" || _options.root.empty(); }
+bool Device::opensModules() const { return mayOpenModules(_options, _services); }
 
 Outcome Device::waitForMigration() const {
   const auto end = steady_clock::now() + _options.timeLimit;
@@ -140,8 +160,11 @@ Result<HeldLocks> Device::takeLocks() const {
 
 Result<HeldLock> Device::takeLock(const Path& name, platform::LockManner manner) const {
   const Path directory = _services.directories->systemRoot() / "tmp";
+  const auto say = [this](std::string_view line) {
+    if (_options.whileWaiting) _options.whileWaiting(std::string{line});
+  };
   const auto locks = platform::makeFileLocks(
-      {.directory = directory, .trees = platform::treesOf(*_services.directories), .manner = manner});
+      {.directory = directory, .trees = platform::treesOf(*_services.directories), .manner = manner, .say = say});
   auto made = locks->lockNamed(name.native());
   if (!made.isOk()) {
     return Error{isForbidden(made.status()) ? Code::noPermission : Code::refused, made.status().description()};
@@ -172,32 +195,35 @@ void Device::prepareSaving() const {
   static_cast<void>(_services.files->setOwner(directory, kOwner, kOwner));
 }
 
-Result<Store> Device::load() const {
-  return answerOf([this]() -> Result<Store> {
+Result<Store> Device::load(Use use) const {
+  return answerOf([&]() -> Result<Store> {
     const Within within{*this};
     static_cast<void>(accountsettings::BasicAccount::accountTypes());  // which fails where there is no configuration
     Store store = AccountsManager::init();
-    if (const std::optional<Error> found = fault(store->loadOutcome())) return *found;
+    if (const std::optional<Error> found = fault(store->loadOutcome(), use)) return *found;
     return store;
   });
 }
 
-std::optional<Error> Device::fault(const LoadOutcome& outcome) const {
+std::optional<Error> Device::fault(const LoadOutcome& outcome, Use use) const {
   const std::string path = _settingsFile.string();
+  const bool mayBeOther = use == Use::look && _options.mayBeOfOtherRelease;
   if (outcome.hasUnreadFile()) return unreadFile(_settingsFile, outcome.reading);
   if (!outcome.reading.isOk()) {
     const bool isLegacy =
         AccountsManager::_oldMailAccountsInformationFound() || AccountsManager::_oldDAAccountsInformationFound();
-    if (isLegacy) return Error{Code::notMigrated, "the accounts are still in files of the first releases"};
-    if (_options.mayBeMissing) return std::nullopt;
+    if (isLegacy && !mayBeOther) {
+      return Error{Code::notMigrated, "the accounts are still in files of the first releases"};
+    }
+    if (isLegacy || _options.mayBeMissing) return std::nullopt;
     return Error{Code::missing, "there are no accounts: " + path + " does not exist"};
   }
-  if (!outcome.storedVersion) return std::nullopt;
+  if (!outcome.storedVersion || mayBeOther) return std::nullopt;
   const auto version = static_cast<std::uint64_t>(*outcome.storedVersion);
   if (version == AccountsManager::currentVersion()) return std::nullopt;
-  const std::string stands = path + " has data version " + std::to_string(*outcome.storedVersion);
+  const std::string stands = "the account settings have data version " + std::to_string(*outcome.storedVersion);
   if (version > AccountsManager::currentVersion()) return Error{Code::newer, stands + ", a later release's"};
-  return Error{Code::notMigrated, stands + " and has yet to be migrated"};
+  return Error{Code::notMigrated, stands + " and must be migrated before they are changed"};
 }
 
 }  // namespace accounts

@@ -46,11 +46,12 @@ class Device {
 
   [[nodiscard]] const OpenOptions& options() const { return _options; }
   [[nodiscard]] const platform::Path& settingsFile() const { return _settingsFile; }
-  // Whether those who listen on this machine are told of this device's changes.
-  [[nodiscard]] bool isAnnounced() const;
+  // Whether its modules may be opened, and so whether anybody is told of its changes.
+  [[nodiscard]] bool opensModules() const;
 
-  // The store, loaded from the file as it is now, or why a program is not to use it.
-  [[nodiscard]] Result<Store> load() const;
+  // The store, loaded from the file as it is now, or why a program is not to use it so.
+  enum class Use : std::uint8_t { look, change };
+  [[nodiscard]] Result<Store> load(Use use = Use::look) const;
   // Returns once no migration is running, or nobody can tell whether one is. A client's change is not waited for.
   [[nodiscard]] Outcome waitForMigration() const;
   // Both locks, held until they go. A lock file that another user of the machine may have put there is refused.
@@ -62,7 +63,7 @@ class Device {
   friend class Within;
   [[nodiscard]] Result<HeldLock> takeLock(const platform::Path& name, platform::LockManner manner) const;
   [[nodiscard]] bool isTrusted(const platform::Path& lockFile) const;
-  [[nodiscard]] std::optional<Error> fault(const accountsettings::LoadOutcome& outcome) const;
+  [[nodiscard]] std::optional<Error> fault(const accountsettings::LoadOutcome& outcome, Use use) const;
 
   OpenOptions _options;
   platform::Platform _services;

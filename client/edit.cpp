@@ -23,7 +23,7 @@ Outcome done() { return std::monostate{}; }
 Outcome failed(Code code, std::string sentence) { return Error{code, std::move(sentence)}; }
 
 Error unknownAccount(std::string_view identifier) {
-  return {Code::unknownAccount, "there is no account " + std::string{identifier}};
+  return {Code::unknownAccount, "no account has the identifier " + std::string{identifier}};
 }
 
 Error finished() { return {Code::finished, "the edit is over"}; }
@@ -88,6 +88,14 @@ Dictionary propertiesOf(const Target& target) {
   return target.child ? *(*own.array(kAccountChildAccounts))[*target.child].asDictionary() : own;
 }
 
+// The store takes out one record at a time, and several may have the identifier.
+void deleteEvery(AccountsManager& store, const Record& record) {
+  for (std::size_t before = store.count() + 1; store.count() < before;) {
+    before = store.count();
+    store.deleteAccount(record);
+  }
+}
+
 // --- Bringing a change into another store ---
 
 Outcome bringInto(AccountsManager& store, const Pair& pair) {
@@ -95,7 +103,7 @@ Outcome bringInto(AccountsManager& store, const Pair& pair) {
   const Target target = targetIn(store, *named.text(kAccountIdentifier));
   const bool isThere = target.record != nullptr;
   if (pair.after == nullptr) {
-    if (isThere && !target.child) store.deleteAccount(target.record);
+    if (isThere && !target.child) deleteEvery(store, target.record);
     return done();
   }
   if (pair.before == nullptr) {
@@ -144,9 +152,10 @@ Outcome examine(const AccountsManager& store, const Pair& pair) {
   return done();
 }
 
-Error failureOf(const accountsettings::SaveOutcome& outcome) {
+Error failureOf(const platform::Path& file, const accountsettings::SaveOutcome& outcome) {
   const int cause = outcome.status.errorNumber();
-  const std::string sentence = "the accounts were not saved: " + outcome.status.description();
+  const std::string sentence =
+      "the accounts could not be saved to " + file.string() + ": " + outcome.status.description();
   if (cause == ENOSPC || cause == EDQUOT) return {Code::noSpace, sentence};
   const bool isForbidden = cause == EACCES || cause == EPERM || cause == EROFS;
   return {isForbidden ? Code::noPermission : Code::notSaved, sentence};
@@ -166,18 +175,29 @@ void saveSilently(AccountsManager& store) {
 
 struct Edit::Content {
   std::shared_ptr<const Device> device;
-  std::unique_ptr<ChangingThread> thread;
-  std::optional<HeldLocks> locks;
+  Manner manner;
+  std::unique_ptr<ChangingThread> thread = nullptr;
+  std::optional<HeldLocks> locks = std::nullopt;
+  bool isOver = false;
+  bool rewrites = false;
   FileIdentity file = {};
   Store store = nullptr;
   Records before = {};
 
-  [[nodiscard]] bool isOver() const { return !locks; }
+  Outcome begin() {
+    if (manner == Manner::trial) return read();
+    thread = std::make_unique<ChangingThread>(device->settingsFile());
+    if (!thread->isFirst()) return failed(Code::nested, "this thread is changing the accounts already");
+    Result<HeldLocks> taken = device->takeLocks();
+    if (!taken) return taken.error();
+    locks = std::move(taken).value();
+    return read();
+  }
 
   // The store is read after its file was looked at: what is written in between is noticed, at worst needlessly.
   Outcome read() {
     file = FileIdentity::of(device->settingsFile());
-    Result<Store> loaded = device->load();
+    Result<Store> loaded = device->load(Device::Use::change);
     if (!loaded.isOk()) return loaded.error();
     store = std::move(loaded).value();
     if (!store->loadOutcome().leftOut.empty() && !device->options().mayDropUnreadable) {
@@ -209,16 +229,17 @@ struct Edit::Content {
     for (const Pair& pair : pairs) {
       if (const Outcome sound = examine(*store, pair); !sound.isOk()) return sound.error();
     }
-    if (pairs.empty()) return Saved{};
+    if (pairs.empty() && !rewrites) return Saved{};
     Saved saved{changesBetween(before, after, device), std::nullopt};
+    if (manner == Manner::trial) return saved;
     device->prepareSaving();
     saveSilently(*store);
     const auto& outcome = store->lastSaveOutcome();
-    return outcome.isSaved() ? Result<Saved>{std::move(saved)} : failureOf(outcome);
+    return outcome.isSaved() ? Result<Saved>{std::move(saved)} : failureOf(device->settingsFile(), outcome);
   }
 
   [[nodiscard]] std::optional<Error> announce() const {
-    if (!device->isAnnounced()) return std::nullopt;
+    if (!device->opensModules() || manner == Manner::trial) return std::nullopt;
     const Outcome told = answerOf([this]() -> Outcome {
       const Within within{*device};
       if (!AccountsManager::shouldSkipNotifications()) store->_sendNotificationsForChangedAccounts();
@@ -229,6 +250,7 @@ struct Edit::Content {
   }
 
   void letGo() {
+    isOver = true;
     locks.reset();
     thread.reset();
   }
@@ -236,7 +258,7 @@ struct Edit::Content {
   // Changes the properties of one account by the function, which answers them.
   template <typename Function>
   Outcome alter(std::string_view identifier, const Function& altered) {
-    if (isOver()) return finished();
+    if (isOver) return finished();
     return answerOf([&]() -> Outcome {
       const Within within{*device};
       const Target target = targetIn(*store, identifier);
@@ -266,14 +288,9 @@ Edit::Edit(Edit&&) noexcept = default;
 Edit& Edit::operator=(Edit&&) noexcept = default;
 Edit::~Edit() = default;
 
-Result<Edit> beginEdit(std::shared_ptr<const Device> device) {
-  auto thread = std::make_unique<ChangingThread>(device->settingsFile());
-  if (!thread->isFirst()) return Error{Code::nested, "this thread is changing the accounts already"};
-  Result<HeldLocks> locks = device->takeLocks();
-  if (!locks.isOk()) return locks.error();
-  auto content =
-      std::make_unique<Edit::Content>(Edit::Content{std::move(device), std::move(thread), std::move(locks).value()});
-  if (const Outcome loaded = content->read(); !loaded.isOk()) return loaded.error();
+Result<Edit> beginEdit(std::shared_ptr<const Device> device, Manner manner) {
+  auto content = std::make_unique<Edit::Content>(Edit::Content{std::move(device), manner});
+  if (const Outcome begun = content->begin(); !begun) return begun.error();
   return Edit{std::move(content)};
 }
 
@@ -295,11 +312,12 @@ std::optional<Account> Edit::account(std::string_view identifier) const {
 }
 
 Result<Account> Edit::add(const NewAccount& account) {
-  if (_content->isOver()) return finished();
+  if (_content->isOver) return finished();
   return answerOf([&]() -> Result<Account> {
     const Within within{*_content->device};
-    Dictionary properties{{accountsettings::kAccountType, account.type},
-                          {accountsettings::kAccountClass, account.accountClass}};
+    Dictionary properties;
+    if (!account.type.empty()) properties.set(accountsettings::kAccountType, account.type);
+    if (!account.accountClass.empty()) properties.set(accountsettings::kAccountClass, account.accountClass);
     for (const auto& [key, value] : account.properties) properties.set(key, value.content().value);
     const Record record = BasicAccount::initWithProperties(properties);
     if (record == nullptr || !record->identifier()) {
@@ -308,14 +326,14 @@ Result<Account> Edit::add(const NewAccount& account) {
     }
     const Text identifier = *record->identifier();
     if (targetIn(*_content->store, identifier).record != nullptr) {
-      return Error{Code::alreadyThere, "there is an account " + identifier.string() + " already"};
+      return Error{Code::alreadyThere, "there is an account with the identifier " + identifier.string()};
     }
     return _content->addTo(account.parentIdentifier, record);
   });
 }
 
 Outcome Edit::remove(std::string_view identifier) {
-  if (_content->isOver()) return finished();
+  if (_content->isOver) return finished();
   return answerOf([&]() -> Outcome {
     const Within within{*_content->device};
     const Target target = targetIn(*_content->store, identifier);
@@ -323,7 +341,7 @@ Outcome Edit::remove(std::string_view identifier) {
     if (target.child) {
       _content->store->removeChildWithIdentifier_fromAccount(identifier, target.record);
     } else {
-      _content->store->deleteAccount(target.record);
+      deleteEvery(*_content->store, target.record);
     }
     return done();
   });
@@ -367,11 +385,14 @@ Outcome Edit::setEnabled(std::string_view identifier, std::string_view dataclass
   });
 }
 
+void Edit::rewrite() { _content->rewrites = true; }
+
 Result<Saved> Edit::save() {
-  if (_content->isOver()) return finished();
+  if (_content->isOver) return finished();
   Result<Saved> saved = answerOf([this] { return _content->write(); });
   _content->letGo();
-  if (saved.isOk() && !saved.value().changes.empty()) saved.value().notAnnounced = _content->announce();
+  const bool isWritten = saved && (_content->rewrites || !saved->changes.empty());
+  if (isWritten) saved.value().notAnnounced = _content->announce();
   return saved;
 }
 

@@ -45,6 +45,7 @@ Value::Value(std::uint64_t integer) : _content{holding(integer)} {}
 Value::Value(double real) : _content{holding(real)} {}
 Value::Value(Date date) : _content{holding(platform::Date{date.secondsSince2001})} {}
 Value::Value(Data data) : _content{holding(std::move(data))} {}
+Value::Value(Reference reference) : _content{holding(platform::Uid{reference.number})} {}
 Value::Value(const List& list) : _content{holding(arrayOf(list))} {}
 Value::Value(const Dictionary& dictionary) : _content{holding(dictionaryOf(dictionary))} {}
 Value::Value(std::shared_ptr<const Content> content) : _content{std::move(content)} {}
@@ -85,6 +86,11 @@ std::optional<std::uint64_t> Value::unsignedInteger() const {
 std::optional<double> Value::real() const { return copied(content().value.asReal()); }
 std::optional<bool> Value::boolean() const { return copied(content().value.asBoolean()); }
 std::optional<Value::Data> Value::data() const { return copied(content().value.asData()); }
+
+std::optional<Reference> Value::reference() const {
+  const platform::Uid* const uid = content().value.asUid();
+  return uid == nullptr ? std::nullopt : std::optional{Reference{uid->number}};
+}
 
 std::optional<Date> Value::date() const {
   const platform::Date* const date = content().value.asDate();

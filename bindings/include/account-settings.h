@@ -68,14 +68,20 @@ ACCOUNT_SETTINGS_API void account_settings_error_free(account_settings_error* er
 /* --- Open --- */
 
 enum {
-  ACCOUNT_SETTINGS_MAY_BE_MISSING = 1,     /* a device without accounts has an empty list of them */
-  ACCOUNT_SETTINGS_MAY_DROP_UNREADABLE = 2 /* a change may remove records that this release cannot load */
+  ACCOUNT_SETTINGS_MAY_BE_MISSING = 1,          /* a device without accounts has an empty list of them */
+  ACCOUNT_SETTINGS_MAY_DROP_UNREADABLE = 2,     /* a change may remove records that this release cannot load */
+  ACCOUNT_SETTINGS_MAY_BE_OF_OTHER_RELEASE = 4, /* an earlier or later release's can be looked at, never changed */
+  ACCOUNT_SETTINGS_MAY_BE_MIGRATING = 8,        /* opening waits for no migration, though a change does */
+  ACCOUNT_SETTINGS_OPENS_MODULES = 16           /* below another root, too, its account modules run in this process */
 };
 
 /* The accounts of the device whose file tree stands at `root`; NULL is the device that the program runs on. Waits for a
  * migration, and each change for another program's, no longer than the time limit. `flags` are those above, or 0. */
 ACCOUNT_SETTINGS_API account_settings* account_settings_open(const char* root, int64_t time_limit_ms, uint32_t flags,
                                                              account_settings_error** error);
+/* Whether no migration is under way, once that is so; false when the time limit is over. */
+ACCOUNT_SETTINGS_API bool account_settings_wait_for_migration(const char* root, int64_t time_limit_ms,
+                                                              account_settings_error** error);
 ACCOUNT_SETTINGS_API void account_settings_free(account_settings* settings);
 
 /* --- Look --- */
@@ -97,6 +103,10 @@ ACCOUNT_SETTINGS_API account_settings_accounts* account_settings_accounts_of_typ
     const account_settings_accounts* accounts, const char* type);
 ACCOUNT_SETTINGS_API account_settings_accounts* account_settings_accounts_with_dataclass(
     const account_settings_accounts* accounts, const char* dataclass);
+/* Of what account_settings_look answers, the data version of the file and the number of its records that this release
+ * cannot load; of other lists, 0. */
+ACCOUNT_SETTINGS_API uint64_t account_settings_accounts_version(const account_settings_accounts* accounts);
+ACCOUNT_SETTINGS_API size_t account_settings_accounts_unreadable(const account_settings_accounts* accounts);
 ACCOUNT_SETTINGS_API void account_settings_accounts_free(account_settings_accounts* accounts);
 
 /* NULL where the account has none; a child has its parent's. */
@@ -116,6 +126,9 @@ ACCOUNT_SETTINGS_API account_settings_value* account_settings_account_supported(
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_account_enabled(const account_settings_account* account);
 ACCOUNT_SETTINGS_API bool account_settings_account_is_enabled(const account_settings_account* account,
                                                               const char* dataclass);
+/* Whether the account's module knows where its service is reached. Each place may be NULL. */
+ACCOUNT_SETTINGS_API bool account_settings_account_service(const account_settings_account* account, const char** host,
+                                                           uint16_t* port, bool* is_secure);
 /* NULL, or false, where there is none of that kind. */
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_account_property(const account_settings_account* account,
                                                                                const char* key);
@@ -181,6 +194,9 @@ ACCOUNT_SETTINGS_API void account_settings_value_free(account_settings_value* va
  * reaches the file before it is saved; freeing it gives the lock back. The process must not fork in between. */
 ACCOUNT_SETTINGS_API account_settings_edit* account_settings_edit_begin(const account_settings* settings,
                                                                         account_settings_error** error);
+/* To see what a change would do: takes no lock, and saving it writes nothing. */
+ACCOUNT_SETTINGS_API account_settings_edit* account_settings_trial_begin(const account_settings* settings,
+                                                                         account_settings_error** error);
 /* With what was changed so far. */
 ACCOUNT_SETTINGS_API account_settings_accounts* account_settings_edit_accounts(const account_settings_edit* edit);
 ACCOUNT_SETTINGS_API account_settings_account* account_settings_edit_find(const account_settings_edit* edit,
@@ -201,10 +217,21 @@ ACCOUNT_SETTINGS_API bool account_settings_edit_erase(account_settings_edit* edi
 ACCOUNT_SETTINGS_API bool account_settings_edit_set_enabled(account_settings_edit* edit, const char* identifier,
                                                             const char* dataclass, bool enabled,
                                                             account_settings_error** error);
+/* Has the save write the file even where nothing was changed, so that what loading repaired stands in it. */
+ACCOUNT_SETTINGS_API void account_settings_edit_rewrite(account_settings_edit* edit);
 /* What was saved. The edit is over then, whatever is answered, and is still to be freed. */
 ACCOUNT_SETTINGS_API account_settings_changes* account_settings_edit_save(account_settings_edit* edit,
                                                                           account_settings_error** error);
 ACCOUNT_SETTINGS_API void account_settings_edit_free(account_settings_edit* edit);
+
+/* Tell the modules that follow the data class that the account is about to change, before the edit begins, and that it
+ * has, after it was saved. */
+ACCOUNT_SETTINGS_API bool account_settings_will_change(const account_settings* settings,
+                                                       const account_settings_account* account, const char* dataclass,
+                                                       account_settings_error** error);
+ACCOUNT_SETTINGS_API bool account_settings_did_change(const account_settings* settings,
+                                                      const account_settings_account* account, const char* dataclass,
+                                                      account_settings_error** error);
 
 enum { ACCOUNT_SETTINGS_ADDED, ACCOUNT_SETTINGS_CHANGED, ACCOUNT_SETTINGS_REMOVED };
 

@@ -38,9 +38,10 @@ class ChangingAccounts : public DeviceWithAccounts {
     return status.st_ino;
   }
 
-  [[nodiscard]] accounts::Result<accounts::Saved> setPort(const Value& port) const {
-    return opened().change([&](Edit& edit) { return edit.set("M1", "Port", port).isOk(); });
+  [[nodiscard]] accounts::Result<accounts::Saved> setPort(const Value& port, const accounts::OpenOptions& how) const {
+    return opened(how).change([&](Edit& edit) { return edit.set("M1", "Port", port).isOk(); });
   }
+  [[nodiscard]] accounts::Result<accounts::Saved> setPort(const Value& port) const { return setPort(port, options()); }
 };
 
 TEST_F(ChangingAccounts, SavesAProperty) {
@@ -89,6 +90,41 @@ TEST_F(ChangingAccounts, SwitchesDataclasses) {
   });
   EXPECT_THAT(told(saved), ElementsAre("changed M1 Enabled Dataclasses"));
   EXPECT_THAT(looked().withIdentifier("M1")->enabledDataclasses(), ElementsAre(kNotes));
+}
+
+TEST_F(ChangingAccounts, RemovesEveryAccountOfTheIdentifier) {
+  putAccounts(account("L1") + account("L2") + account("L1"));
+  const auto saved = opened().change([](Edit& edit) { return edit.remove("L1").isOk(); });
+  EXPECT_THAT(told(saved), ElementsAre("removed L1"));
+  EXPECT_EQ(looked().size(), 1U);
+}
+
+TEST_F(ChangingAccounts, AddsARecordAsItIsInItsOrder) {
+  const Value::Dictionary record{{"Port", 1}, {"Class", "LDAPAccount"}, {"Identifier", "L1"}, {"Type", "LDAP"}};
+  ASSERT_TRUE(opened().change([&](Edit& edit) { return edit.add({"", "", record, ""}).isOk(); }).isOk());
+  EXPECT_THAT(looked().withIdentifier("L1")->keys(), ElementsAre("Port", "Class", "Identifier", "Type"));
+}
+
+TEST_F(ChangingAccounts, RewritesTheFileWithWhatLoadingRepaired) {
+  putAccounts(account("M1", "Mail", "<key>AccountPath</key><string>~/Library/Mail/IMAP-a@b</string>"));
+  ASSERT_TRUE(opened()
+                  .change([](Edit& edit) {
+                    edit.rewrite();
+                    return true;
+                  })
+                  .isOk());
+  EXPECT_THAT(device.root.contents(kSettings), testing::HasSubstr("IMAPAccount"));
+}
+
+TEST_F(ChangingAccounts, AreTriedWithoutALockOrATrace) {
+  const std::string before = device.root.contents(kSettings);
+  const auto settings = opened();
+  auto edit = settings.edit();
+  auto trial = settings.trial();
+  ASSERT_TRUE(trial->set("M1", "Port", 1).isOk());
+  EXPECT_THAT(told(trial->save()), ElementsAre("changed M1 Port"));
+  ASSERT_TRUE(edit->save().isOk());
+  EXPECT_EQ(device.root.contents(kSettings), before);
 }
 
 TEST_F(ChangingAccounts, ShowsWhatWasChangedSoFar) {
@@ -232,6 +268,37 @@ TEST_F(ChangingAccounts, SaysThatTheFileCouldNotBeReplaced) {
   const ino_t before = node();
   EXPECT_EQ(codeOf(setPort(1)), Code::notSaved);
   EXPECT_EQ(node(), before);
+}
+
+TEST_F(ChangingAccounts, SaysThatTheDiskIsFullWhicheverStepOfTheSaveFinds) {
+  int failures = 0;
+  for (int operation = 1; operation < 100; ++operation) {
+    const auto files = fillDiskAt(operation);
+    const auto settings = accounts::AccountSettings::open();
+    if (!settings) continue;  // found before there was anything to save
+    const auto saved = settings->change([&](Edit& edit) { return edit.set("M1", "Port", operation).isOk(); });
+    if (files->mishapAt().empty()) break;
+    if (saved.isOk()) continue;  // what could be done without
+    EXPECT_EQ(saved.error().code, Code::noSpace) << files->mishapAt() << ": " << saved.error().sentence;
+    ++failures;
+  }
+  EXPECT_GT(failures, 2);
+}
+
+TEST_F(ChangingAccounts, SaysThatTheUserMayNotSave) {
+  const auto settings = opened();
+  const Code code = asStranger([&] { return codeOf(settings.edit()); });
+  EXPECT_EQ(code, Code::noPermission);
+}
+
+TEST_F(ChangingAccounts, SaysThatThoseWhoListenCouldNotBeTold) {
+  auto opens = options();
+  opens.opensModules = true;
+  const auto saved = setPort(1, opens);
+  ASSERT_TRUE(saved.isOk());
+  EXPECT_EQ(saved->notAnnounced->code, Code::notAnnounced);
+  EXPECT_THAT(looked().withIdentifier("M1")->integer("Port"), Optional(1));
+  EXPECT_EQ(codeOf(opened(opens).willChange(*looked().withIdentifier("M1"), kMail)), Code::notAnnounced);
 }
 
 TEST_F(ChangingAccounts, MakesTheFirstFileOfADevice) {

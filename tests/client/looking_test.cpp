@@ -56,6 +56,33 @@ TEST_F(LookingAtAccounts, FindsThemBySyncIdentifierTypeAndDataclass) {
   EXPECT_EQ(accounts.withIdentifier("unknown"), std::nullopt);
 }
 
+TEST_F(LookingAtAccounts, TellsWhatAChildHasItself) {
+  const Account child = *looked().withIdentifier("C1");
+  EXPECT_EQ(child.ownText("DisplayName"), std::nullopt);
+  EXPECT_THAT(child.ownText("Class"), Optional(std::string{"CalDAVAccount"}));
+}
+
+TEST_F(LookingAtAccounts, TellsAnEmptyListOfDataclassesFromNone) {
+  putAccounts(account("L1") + account("L2", "LDAP", "<key>Enabled Dataclasses</key><array/>"));
+  EXPECT_FALSE(looked().withIdentifier("L1")->listsDataclasses());
+  EXPECT_TRUE(looked().withIdentifier("L2")->listsDataclasses());
+}
+
+TEST_F(LookingAtAccounts, CallsTheDevicesOwnAccountAsTheDeviceDoes) {
+  putAccounts(account("O", "OnMyDevice", "<key>DisplayName</key><string>Mine</string>"));
+  EXPECT_THAT(looked().withIdentifier("O")->displayName(), Optional(testing::StartsWith("On My ")));
+}
+
+TEST_F(LookingAtAccounts, CountsTheRecordsThatItCannotLoad) {
+  putAccounts(kAccounts + account("later", "A type to come"));
+  EXPECT_EQ(looked().unreadable(), 1U);
+  EXPECT_EQ(looked().dataVersion(), accountsettings::kCurrentVersion);
+}
+
+TEST_F(LookingAtAccounts, AsksNoModuleOfAnotherDeviceForAService) {
+  EXPECT_FALSE(looked().withIdentifier("M1")->service().has_value());
+}
+
 TEST_F(LookingAtAccounts, KeepsWhatWasSeenWhateverBecomesOfTheFile) {
   std::optional<Account> child;
   {
@@ -80,6 +107,7 @@ TEST_F(LookingAtAccounts, CarriesEveryKindOfValue) {
                                   {"boolean", true},
                                   {"date", accounts::Date{0.25}},
                                   {"data", Value::Data{0, 1}},
+                                  {"reference", accounts::Reference{7}},
                                   {"list", Value::List{1, "b"}}};
   const auto read = *Value{entries}.dictionary();
   ASSERT_EQ(read.size(), entries.size());
@@ -88,6 +116,8 @@ TEST_F(LookingAtAccounts, CarriesEveryKindOfValue) {
   EXPECT_THAT(read[2].second.unsignedInteger(), Optional(UINT64_MAX));
   EXPECT_EQ(read[1].second.unsignedInteger(), std::nullopt);
   EXPECT_EQ(read[5].second.date()->secondsSince2001, 0.25);
+  EXPECT_EQ(read[7].second.kind(), Value::Kind::other);
+  EXPECT_EQ(read[7].second.reference()->number, 7U);
   EXPECT_NE(Value{1}, Value{1.0});
 }
 

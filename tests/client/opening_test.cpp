@@ -63,10 +63,42 @@ TEST_F(OpeningAccountSettings, RefusesAFileThatAnybodyMayHavePlanted) {
   EXPECT_EQ(whyNot(), Code::refused);
 }
 
-TEST_F(OpeningAccountSettings, SaysHowTheFileIsCalledAndWhatIsWrong) {
+TEST_F(OpeningAccountSettings, SaysWhatIsWrong) {
   putAccounts(kAccounts, 13);
   const auto result = AccountSettings::open(options());
-  EXPECT_EQ(result.error().sentence, (device.root / kSettings).string() + " has data version 13, a later release's");
+  EXPECT_EQ(result.error().sentence, "the account settings have data version 13, a later release's");
+}
+
+TEST_F(OpeningAccountSettings, SaysThatTheUserMayNotReadTheFile) {
+  EXPECT_EQ(asStranger([this] { return whyNot(); }), Code::noPermission);
+}
+
+TEST_F(OpeningAccountSettings, ShowsTheAccountsOfAnotherReleaseWhereItMayButChangesNone) {
+  auto may = options();
+  may.mayBeOfOtherRelease = true;
+  for (const auto& [version, code] : {std::pair{11, Code::notMigrated}, {13, Code::newer}}) {
+    putAccounts(kAccounts, version);
+    const AccountSettings settings = opened(may);
+    EXPECT_EQ(settings.accounts()->dataVersion(), static_cast<std::uint64_t>(version));
+    EXPECT_EQ(codeOf(settings.edit()), code);
+    EXPECT_EQ(codeOf(settings.trial()), code);
+  }
+}
+
+TEST_F(OpeningAccountSettings, WaitsForNoMigrationWhereItMayBeOne) {
+  const int lock = heldLock();
+  auto may = options();
+  may.mayBeMigrating = true;
+  EXPECT_EQ(opened(may).accounts()->size(), 2U);
+  EXPECT_EQ(codeOf(AccountSettings::waitForMigration(may)), Code::busy);
+  ::close(lock);
+  EXPECT_TRUE(AccountSettings::waitForMigration(may).isOk());
+}
+
+TEST_F(OpeningAccountSettings, LooksAtTheFileAsItIsByThen) {
+  const AccountSettings settings = opened();
+  replaceAccounts(account("A"));
+  EXPECT_TRUE(settings.accounts()->withIdentifier("A").has_value());
 }
 
 TEST_F(OpeningAccountSettings, GivesAMigrationNoMoreThanTheTimeLimit) {

@@ -1,11 +1,15 @@
 """The Python module, and through it the C interface: values, changes, and each failure that can show."""
 
+import ctypes
+import errno
 import fcntl
 import os
 import pydoc
 import select
+import struct
 import sys
 import threading
+import traceback
 import unittest
 from datetime import datetime, timezone
 from pathlib import Path
@@ -27,6 +31,23 @@ from device import CURRENT_VERSION, SETTINGS, exactly  # noqa: E402
 from device_case import DeviceTest  # noqa: E402
 
 
+PR_SET_NO_NEW_PRIVS, PR_SET_SECCOMP, SECCOMP_MODE_FILTER = 38, 22, 2
+LOAD_CALL, JUMP_UNLESS, RETURN = 0x20, 0x15, 0x06
+FAIL_WITH, ALLOW = 0x00050000, 0x7FFF0000
+FSYNC = {"x86_64": 74, "aarch64": 82}
+
+
+def refuse_to_sync():
+    """From now on the kernel says of every file that its disk is full when it is to be on stable storage."""
+    rows = ((LOAD_CALL, 0, 0, 0), (JUMP_UNLESS, 0, 1, FSYNC[os.uname().machine]),
+            (RETURN, 0, 0, FAIL_WITH | errno.ENOSPC), (RETURN, 0, 0, ALLOW))
+    filters = ctypes.create_string_buffer(b"".join(struct.pack("HBBI", *row) for row in rows))
+    program = struct.pack("HxxxxxxP", len(rows), ctypes.addressof(filters))
+    libc = ctypes.CDLL(None, use_errno=True)
+    if libc.prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) or libc.prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, program, 0, 0):
+        raise OSError(ctypes.get_errno(), "no filter of system calls")
+
+
 class PythonModule(DeviceTest):
     def setUp(self):
         super().setUp()
@@ -40,6 +61,18 @@ class PythonModule(DeviceTest):
             function()
         self.assertEqual(code, caught.exception.code)
         self.assertRegex(str(caught.exception), "^[^ ].*[^.]$")
+
+    def assert_passes_in_child(self, function):
+        """In a process of its own, which may become another one than this."""
+        child = os.fork()
+        if child == 0:
+            try:
+                function()
+                os._exit(0)
+            except BaseException:
+                traceback.print_exc()
+                os._exit(1)
+        self.assertEqual(0, os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]))
 
     def accounts(self):
         return self.tree.read_plist(SETTINGS)["Accounts"]
@@ -71,11 +104,36 @@ class Looking(PythonModule):
         self.assert_fails(Code.MISSING, self.settings)
         self.assertEqual([], list(self.settings(may_be_missing=True).accounts))
 
+    def test_says_that_somebody_may_have_planted_the_file(self):
+        settings = self.tree.path(SETTINGS)
+        settings.parent.chmod(0o777)
+        os.link(settings, self.tree.path("second"))
+        self.assert_fails(Code.REFUSED, self.settings)
+
+    def test_says_that_the_user_may_not_read_the_file(self):
+        def fail_to_open():
+            if os.geteuid() == 0:
+                os.seteuid(12346)
+            self.assert_fails(Code.NO_PERMISSION, self.settings)
+
+        for path in (self.scratch, self.tree.root):
+            path.chmod(0o755)
+        self.tree.path(SETTINGS).chmod(0)
+        self.assert_passes_in_child(fail_to_open)
+
+    def test_shows_the_accounts_of_another_release_where_it_may(self):
+        self.tree.write_plist(SETTINGS, {"Accounts": [HOME_MAIL, 7], "Version": 3})
+        settings = self.settings(may_be_of_other_release=True)
+        self.assertEqual((3, 1, None), (settings.accounts.version, settings.accounts.unreadable, settings.accounts["M1"].service))
+        self.assert_fails(Code.NOT_MIGRATED, settings.edit)
+
     def test_waits_for_a_migration_no_longer_than_it_may(self):
         self.tree.write("tmp/AccountMigrationInProgress", "")
         with self.tree.path("tmp/AccountMigrationInProgress").open("rb") as lock:
             fcntl.flock(lock, fcntl.LOCK_EX)
             self.assert_fails(Code.BUSY, self.settings)
+            self.assert_fails(Code.BUSY, lambda: AccountSettings.wait_for_migration(self.tree.root, time_limit=0))
+            self.assertEqual(2, len(self.settings(may_be_migrating=True).accounts))
 
     def test_is_worth_reading_in_help(self):
         page = pydoc.plain(pydoc.render_doc(account_settings))
@@ -144,6 +202,32 @@ class Changing(PythonModule):
         self.assert_fails(Code.NOT_SAVED, edit.save)
         self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": [{**CLOUD, "Type": "To come"}]})
         self.assert_fails(Code.WOULD_DROP_OTHERS, self.settings().edit)
+
+    def test_says_that_the_disk_is_full(self):
+        def fail_to_save():
+            refuse_to_sync()
+            edit = self.settings().edit()
+            edit["M1"]["Port"] = 1
+            self.assert_fails(Code.NO_SPACE, edit.save)
+
+        before = self.accounts()
+        self.assert_passes_in_child(fail_to_save)
+        self.assertEqual(before, self.accounts())
+
+    def test_says_that_those_who_listen_could_not_be_told(self):
+        settings = self.settings(opens_modules=True)
+        self.assert_fails(Code.NOT_ANNOUNCED, lambda: settings.will_change(settings.accounts["M1"], MAIL))
+        with settings.edit() as edit:
+            edit["M1"]["Port"] = 1
+        self.assertIn("saved, but not announced", edit.not_announced)
+        self.assertEqual(1, self.accounts()[0]["Port"])
+
+    def test_tries_without_writing(self):
+        before = self.accounts()
+        with self.settings().trial() as trial:
+            trial["M1"]["Port"] = 1
+        self.assertEqual([("Port",)], [each.keys for each in trial.changes])
+        self.assertEqual(before, self.accounts())
 
     def test_waits_for_another_but_not_for_itself(self):
         settings, codes = self.settings(), []

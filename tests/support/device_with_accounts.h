@@ -9,6 +9,8 @@
 
 #include "accounts/account_settings.h"
 #include "accountsettings/accounts_manager.h"
+#include "platform/platform.h"
+#include "tests/support/mishap_file_system.h"
 #include "tests/support/real_device.h"
 
 namespace tests {
@@ -78,6 +80,29 @@ class DeviceWithAccounts : public ::testing::Test {
   [[nodiscard]] accounts::AccountSettings opened() const { return opened(options()); }
 
   [[nodiscard]] accounts::Accounts looked() const { return opened().accounts().value(); }
+
+  // What the function answers to a user who may not read the settings.
+  template <typename Function>
+  auto asStranger(const Function& function) const -> decltype(function()) {
+    std::filesystem::permissions(device.root.path(), std::filesystem::perms::all);
+    std::filesystem::permissions(device.root / kSettings, std::filesystem::perms::none);
+    const uid_t user = ::geteuid();
+    EXPECT_EQ(::seteuid(user == 0 ? 12346 : user), 0);
+    const auto answer = function();
+    EXPECT_EQ(::seteuid(user), 0);
+    return answer;
+  }
+
+  // Makes the process's platform this device, of which nobody is told and whose disk is full at that operation.
+  [[nodiscard]] std::shared_ptr<MishapFileSystem> fillDiskAt(int operation) const {
+    accountsettings::AccountsManager::_setShouldSkipNotifications(true);
+    platform::Platform services = platform::makeLinuxPlatform({.systemRoot = device.root.path()});
+    const Mishap full{.kind = Mishap::Kind::failsOnce, .operation = operation, .errorNumber = ENOSPC};
+    const auto files = std::make_shared<MishapFileSystem>(services.files, full, [] {});
+    services.files = files;
+    platform::setCurrent(std::move(services));
+    return files;
+  }
 
   RealDevice device;
 };

@@ -31,8 +31,17 @@ from ._library import AccountSettingsError, Code, Property
 
 __all__ = [
     "Account", "AccountSettings", "AccountSettingsError", "Accounts", "Change", "Code", "Edit", "EditedAccount", "Kind",
-    "Property", "Watch",
+    "Property", "Service", "Watch",
 ]
+
+
+@dataclass(frozen=True)
+class Service:
+    """Where the service behind an account is reached."""
+
+    host: str
+    port: int
+    is_secure: bool
 
 
 class Account(Mapping[str, Property]):
@@ -95,6 +104,15 @@ class Account(Mapping[str, Property]):
         """Whether the data class is switched on."""
         return _c.call("account_is_enabled", self._handle, _c.encoded(dataclass))
 
+    @property
+    def service(self) -> Service | None:
+        """What the account's module knows of its service; None where no module may be opened, or none can tell."""
+        host, port, is_secure = ctypes.c_char_p(), ctypes.c_uint16(), ctypes.c_bool()
+        places = (ctypes.byref(each) for each in (host, port, is_secure))
+        if not _c.call("account_service", self._handle, *places):
+            return None
+        return Service((host.value or b"").decode(), port.value, is_secure.value)
+
     def property(self, key: str) -> Property | None:
         """The value of a property; a child has its parent's where it has none itself. None where there is none."""
         value = _c.call("account_property", self._handle, _c.encoded(key))
@@ -152,6 +170,16 @@ class Accounts:
 
     def __contains__(self, identifier: object) -> bool:
         return isinstance(identifier, str) and self.get(identifier) is not None
+
+    @property
+    def version(self) -> int:
+        """The data version of the file; 0 where there is none."""
+        return _c.call("accounts_version", self._handle)
+
+    @property
+    def unreadable(self) -> int:
+        """How many records of the file this release cannot load, and so are not among these."""
+        return _c.call("accounts_unreadable", self._handle)
 
     def get(self, identifier: str, default: Any = None) -> Account | Any:
         """The account or child account of this identifier, or the default."""
@@ -258,10 +286,11 @@ class Edit:
     #: Why those who listen for changes could not be told, or None.
     not_announced: str | None
 
-    def __init__(self, settings: _c.Handle):
+    def __init__(self, settings: _c.Handle, *, is_trial: bool = False):
         self.changes = []
         self.not_announced = None
-        self._handle: _c.Handle | None = _c.handle("edit", _c.attempt("edit_begin", settings))
+        begun = _c.attempt("trial_begin" if is_trial else "edit_begin", settings)
+        self._handle: _c.Handle | None = _c.handle("edit", begun)
 
     @property
     def handle(self) -> _c.Handle:
@@ -301,6 +330,10 @@ class Edit:
                 None if parent is None else _c.encoded(parent),
             )
         return EditedAccount(_c.handle("account", account), self)
+
+    def rewrite(self) -> None:
+        """Has the save write the file even where nothing was changed, so that what loading repaired stands in it."""
+        _c.call("edit_rewrite", self.handle)
 
     def save(self) -> list[Change]:
         """Saves the changes, gives the lock back and tells those who listen. The edit is over then, also if it fails."""
@@ -369,15 +402,20 @@ class AccountSettings:
     time_limit: the seconds for which a migration, or another program's change, is waited for.
     may_be_missing: a device without accounts has an empty list of them, and the first change makes the file.
     may_drop_unreadable: a change may remove records from the file that this release cannot load.
+    may_be_of_other_release: the accounts of an earlier or later release can be looked at; a change of them still fails.
+    may_be_migrating: opening waits for no migration, which may replace what is looked at. A change still waits.
+    opens_modules: below another root than "/", too, its account modules run in this process and are told of changes.
     """
 
     def __init__(
         self, root: str | PathLike[str] | None = None, *, time_limit: float = 30, may_be_missing: bool = False,
-        may_drop_unreadable: bool = False,
+        may_drop_unreadable: bool = False, may_be_of_other_release: bool = False, may_be_migrating: bool = False,
+        opens_modules: bool = False,
     ):
+        flags = (may_be_missing, may_drop_unreadable, may_be_of_other_release, may_be_migrating, opens_modules)
         self._handle = _c.handle("", _c.attempt(
             "open", None if root is None else _c.encoded(fspath(root)), int(time_limit * 1000),
-            may_be_missing * 1 + may_drop_unreadable * 2,
+            sum(flag << place for place, flag in enumerate(flags)),
         ))
 
     @property
@@ -388,6 +426,24 @@ class AccountSettings:
     def edit(self) -> Edit:
         """The accounts, to be changed: `with settings.edit() as edit: ...` saves at its end."""
         return Edit(self._handle)
+
+    def trial(self) -> Edit:
+        """To see what a change would do: it takes no lock, and saving it answers the changes and writes nothing."""
+        return Edit(self._handle, is_trial=True)
+
+    def will_change(self, account: Account, dataclass: str) -> None:
+        """Tells the modules that follow the data class that the account is about to change, before the edit begins."""
+        _c.attempt("will_change", self._handle, account._handle, _c.encoded(dataclass))
+
+    def did_change(self, account: Account, dataclass: str) -> None:
+        """Tells the modules that follow the data class that the account has changed, after it was saved."""
+        _c.attempt("did_change", self._handle, account._handle, _c.encoded(dataclass))
+
+    @staticmethod
+    def wait_for_migration(root: str | PathLike[str] | None = None, *, time_limit: float = 30) -> None:
+        """Returns once no migration is under way."""
+        path = None if root is None else _c.encoded(fspath(root))
+        _c.attempt("wait_for_migration", path, int(time_limit * 1000))
 
     def watch(
         self, callback: Callable[[Change], object], *, since: Accounts | None = None, own_thread: bool = True

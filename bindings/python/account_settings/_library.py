@@ -5,7 +5,7 @@ from __future__ import annotations
 import ctypes
 from collections.abc import Iterator, Mapping
 from contextlib import contextmanager
-from ctypes import POINTER, byref, c_bool, c_char_p, c_double, c_int, c_int32, c_int64, c_size_t, c_uint32, c_uint64, c_void_p
+from ctypes import POINTER, byref, c_bool, c_char_p, c_double, c_int, c_int32, c_int64, c_size_t, c_uint16, c_uint32, c_uint64, c_void_p
 from datetime import datetime, timedelta, timezone
 from enum import IntEnum
 from typing import Any, Union
@@ -64,6 +64,8 @@ _PLAIN = {
     **{f"account_{name}": (_TEXT, _HANDLE) for name in (
         "identifier", "type", "class", "display_name", "username", "sync_identifier", "parent")},
     **{f"account_{name}": (_HANDLE, _HANDLE) for name in ("children", "supported", "enabled", "properties")},
+    "accounts_version": (c_uint64, _HANDLE), "accounts_unreadable": (_SIZE, _HANDLE),
+    "account_service": (c_bool, _HANDLE, POINTER(c_char_p), POINTER(c_uint16), POINTER(c_bool)),
     "account_is_enabled": (c_bool, _HANDLE, _TEXT), "account_property": (_HANDLE, _HANDLE, _TEXT),
     "account_integer": (c_bool, _HANDLE, _TEXT, POINTER(c_int64)),
     "account_boolean": (c_bool, _HANDLE, _TEXT, POINTER(c_bool)),
@@ -76,7 +78,7 @@ _PLAIN = {
     "value_of_real": (_HANDLE, c_double), "value_of_boolean": (_HANDLE, c_bool), "value_of_date": (_HANDLE, c_double),
     "value_of_data": (_HANDLE, _TEXT, _SIZE), "value_of_list": (_HANDLE,), "value_of_dictionary": (_HANDLE,),
     "value_append": (c_bool, _HANDLE, _HANDLE), "value_set": (c_bool, _HANDLE, _TEXT, _HANDLE),
-    "edit_accounts": (_HANDLE, _HANDLE), "edit_find": (_HANDLE, _HANDLE, _TEXT),
+    "edit_accounts": (_HANDLE, _HANDLE), "edit_find": (_HANDLE, _HANDLE, _TEXT), "edit_rewrite": (None, _HANDLE),
     "changes_count": (_SIZE, _HANDLE), "changes_kind": (c_int32, _HANDLE, _SIZE),
     "changes_account": (_HANDLE, _HANDLE, _SIZE), "changes_key": (_TEXT, _HANDLE, _SIZE, _SIZE),
     "changes_not_announced": (_TEXT, _HANDLE),
@@ -86,6 +88,8 @@ _PLAIN = {
 }
 _FAILING = {
     "open": (_HANDLE, _TEXT, c_int64, c_uint32), "look": (_HANDLE, _HANDLE), "edit_begin": (_HANDLE, _HANDLE),
+    "trial_begin": (_HANDLE, _HANDLE), "wait_for_migration": (c_bool, _TEXT, c_int64),
+    "will_change": (c_bool, _HANDLE, _HANDLE, _TEXT), "did_change": (c_bool, _HANDLE, _HANDLE, _TEXT),
     "edit_add": (_HANDLE, _HANDLE, _TEXT, _TEXT, _HANDLE, _TEXT), "edit_remove": (c_bool, _HANDLE, _TEXT),
     "edit_set": (c_bool, _HANDLE, _TEXT, _TEXT, _HANDLE), "edit_erase": (c_bool, _HANDLE, _TEXT, _TEXT),
     "edit_set_enabled": (c_bool, _HANDLE, _TEXT, _TEXT, c_bool), "edit_save": (_HANDLE, _HANDLE),

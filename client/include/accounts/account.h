@@ -12,16 +12,24 @@
 
 namespace accounts {
 
+// Where the service behind an account is reached.
+struct Service {
+  std::string host;
+  std::uint16_t port = 0;
+  bool isSecure = true;
+};
+
 // An account as it was when it was looked at. It never changes, copies share what they hold, it outlives whatever it
 // came from, and any thread may read it.
 //
-// What a child account does not have itself it has of its parent, in all reads but `keys` and `ownProperties`.
+// What a child account does not have itself it has of its parent, in all reads but `keys` and those of its own.
 class ACCOUNTS_API Account {
  public:
   // Empty, or nothing, where the account has none.
   [[nodiscard]] std::string identifier() const;  // empty while the file gives it none; its next save does
   [[nodiscard]] std::string type() const;        // such as "Mail"
   [[nodiscard]] std::string accountClass() const;
+  // The name that the user gave it; of the account of what is on the device alone, the name that the device gives it.
   [[nodiscard]] std::optional<std::string> displayName() const;
   [[nodiscard]] std::optional<std::string> username() const;        // at the service
   [[nodiscard]] std::optional<std::string> syncIdentifier() const;  // by which those who sync it know it
@@ -37,6 +45,11 @@ class ACCOUNTS_API Account {
   [[nodiscard]] std::vector<std::string> supportedDataclasses() const;
   [[nodiscard]] std::vector<std::string> enabledDataclasses() const;
   [[nodiscard]] bool isEnabled(std::string_view dataclass) const;
+  // Whether there is a list of those that are switched on, be it an empty one.
+  [[nodiscard]] bool listsDataclasses() const;
+
+  // What the account's module knows of its service; nothing where none may be opened, or none can tell.
+  [[nodiscard]] std::optional<Service> service() const;
 
   // Nothing where there is none. The typed ones also read a number from a text that begins with one, and a boolean from
   // a number or from "yes" and "true"; nothing for a value of a kind that gives none.
@@ -45,6 +58,7 @@ class ACCOUNTS_API Account {
   [[nodiscard]] std::optional<std::int64_t> integer(std::string_view key) const;
   [[nodiscard]] std::optional<bool> boolean(std::string_view key) const;
   [[nodiscard]] std::vector<std::string> keys() const;
+  [[nodiscard]] std::optional<std::string> ownText(std::string_view key) const;
   [[nodiscard]] Value::Dictionary ownProperties() const;
 
   struct Content;  // internal
@@ -64,6 +78,10 @@ class ACCOUNTS_API Accounts {
   [[nodiscard]] std::vector<Account>::const_iterator end() const { return all().end(); }
   [[nodiscard]] std::size_t size() const { return all().size(); }
   [[nodiscard]] bool empty() const { return all().empty(); }
+  // The data version of the file; 0 where there is none.
+  [[nodiscard]] std::uint64_t dataVersion() const;
+  // How many top-level records of the file this release cannot load, and so are not among these.
+  [[nodiscard]] std::size_t unreadable() const;
 
   // Children are found, too, and stand behind their parent in the lists. Of several accounts with one identifier the
   // last is found.

@@ -12,9 +12,9 @@ namespace accounts {
 
 // An account to be.
 struct NewAccount {
-  std::string type;          // one that the device knows, such as "Mail"
-  std::string accountClass;  // the class of its full account, such as "IMAPAccount"
-  // The rest. A text under "Identifier" is kept; else a new identifier is made.
+  std::string type;          // one that the device knows, such as "Mail"; empty where the properties tell it
+  std::string accountClass;  // the class of its full account, such as "IMAPAccount"; empty likewise
+  // The rest, in their order. A text under "Identifier" is kept; else a new identifier is made.
   Value::Dictionary properties;
   std::string parentIdentifier;  // of the top-level account that it becomes a child of; empty for a top-level account
 };
@@ -44,11 +44,15 @@ class ACCOUNTS_API Edit {
   // Each names a top-level account or a child. "Identifier" and "ChildAccounts" cannot be set or erased (unsuitable).
   // A type or class that cannot be is found by `save`.
   Result<Account> add(const NewAccount& account);
-  Outcome remove(std::string_view identifier);  // with its children
+  Outcome remove(std::string_view identifier);  // with its children; of several of this identifier, all
   Outcome set(std::string_view identifier, std::string_view key, const Value& value);
   Outcome erase(std::string_view identifier, std::string_view key);
   // One that accounts of this type cannot have is unsuitable.
   Outcome setEnabled(std::string_view identifier, std::string_view dataclass, bool enabled);
+
+  // Has `save` write the file even where nothing was changed here: what loading repaired stands in it then, though not
+  // among the changes that are answered.
+  void rewrite();
 
   // Replaces the file, lets go of the lock, then tells those who listen. Where somebody who takes no lock replaced the
   // file since it was read, what was changed here is brought into that file. Whatever it answers, the edit is over; a

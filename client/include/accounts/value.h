@@ -17,13 +17,18 @@ struct Date {
   double secondsSince2001 = 0;  // negative before that
 };
 
+// A number by which one part of an archived object names another.
+struct Reference {
+  std::uint64_t number = 0;
+};
+
 // The value of a property. It never changes, copies share what they hold, and any thread may read it.
 //
 // Reads are total: they answer nothing for a value of another kind. Text is UTF-8; what is malformed, and NUL, is
 // replaced by U+FFFD.
 class ACCOUNTS_API Value {
  public:
-  // `other` is a kind that files may hold and nobody reads; it may be passed on.
+  // `other` is a kind that files may hold and hardly anybody reads: a reference.
   enum class Kind : std::int32_t { text, integer, real, boolean, date, data, list, dictionary, other };
   using Data = std::vector<std::uint8_t>;
   using List = std::vector<Value>;
@@ -41,6 +46,7 @@ class ACCOUNTS_API Value {
   Value(double real);
   Value(Date date);
   Value(Data data);
+  Value(Reference reference);
   Value(const List& list);
   Value(const Dictionary& dictionary);
   Value(const void*) = delete;
@@ -54,6 +60,7 @@ class ACCOUNTS_API Value {
   [[nodiscard]] std::optional<bool> boolean() const;
   [[nodiscard]] std::optional<Date> date() const;
   [[nodiscard]] std::optional<Data> data() const;
+  [[nodiscard]] std::optional<Reference> reference() const;
   [[nodiscard]] std::optional<List> list() const;
   [[nodiscard]] std::optional<Dictionary> dictionary() const;
 

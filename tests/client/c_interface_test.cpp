@@ -1,0 +1,186 @@
+// Each failure of the interface as programs in C see it. None of them can be `cancelled`: who gives an edit up frees
+// it.
+
+#include <fcntl.h>
+#include <sys/file.h>
+
+#include <functional>
+#include <memory>
+#include <set>
+#include <string>
+
+#include "account-settings.h"
+#include "tests/support/device_with_accounts.h"
+
+namespace tests {
+namespace {
+
+using Call = std::function<bool(account_settings_error** error)>;
+
+struct Freed {
+  void operator()(account_settings* settings) const { account_settings_free(settings); }
+  void operator()(account_settings_edit* edit) const { account_settings_edit_free(edit); }
+  void operator()(account_settings_account* account) const { account_settings_account_free(account); }
+  void operator()(account_settings_accounts* accounts) const { account_settings_accounts_free(accounts); }
+  void operator()(account_settings_changes* changes) const { account_settings_changes_free(changes); }
+  void operator()(account_settings_value* value) const { account_settings_value_free(value); }
+};
+template <typename Handle>
+std::unique_ptr<Handle, Freed> owned(Handle* handle) {
+  return std::unique_ptr<Handle, Freed>{handle};
+}
+
+class FailuresInC : public DeviceWithAccounts {
+ protected:
+  // The code of the error, which has a sentence; 0 where the call answers that it was done.
+  static std::int32_t codeOf(const Call& call) {
+    account_settings_error* error = nullptr;
+    const bool isDone = call(&error);
+    EXPECT_EQ(isDone, error == nullptr);
+    if (error == nullptr) return 0;
+    const std::int32_t code = account_settings_error_code(error);
+    EXPECT_STRNE(account_settings_error_sentence(error), "");
+    account_settings_error_free(error);
+    return code;
+  }
+
+  [[nodiscard]] auto opened(std::uint32_t flags = 0, account_settings_error** error = nullptr) const {
+    return owned(account_settings_open(device.root.path().c_str(), 100, flags, error));
+  }
+  [[nodiscard]] std::int32_t whyNotOpened() const {
+    return codeOf([this](auto** error) { return opened(0, error) != nullptr; });
+  }
+
+  [[nodiscard]] static auto begun(const account_settings* settings, account_settings_error** error = nullptr) {
+    return owned(account_settings_edit_begin(settings, error));
+  }
+  [[nodiscard]] std::int32_t whyNotBegun() const {
+    const auto settings = opened();
+    return codeOf([&](auto** error) { return begun(settings.get(), error) != nullptr; });
+  }
+
+  static bool set(account_settings_edit* edit, const char* identifier, const char* key,
+                  account_settings_error** error = nullptr) {
+    const auto value = owned(account_settings_value_of_text("1"));
+    return account_settings_edit_set(edit, identifier, key, value.get(), error);
+  }
+  static std::int32_t whyNotSaved(account_settings_edit* edit) {
+    return codeOf([edit](auto** error) { return owned(account_settings_edit_save(edit, error)) != nullptr; });
+  }
+};
+
+TEST_F(FailuresInC, OfOpeningSayWhatTheFileIsLike) {
+  std::filesystem::permissions((device.root / kSettings).parent_path(), std::filesystem::perms::all);
+  std::filesystem::create_hard_link(device.root / kSettings, device.root / "second");
+  EXPECT_EQ(whyNotOpened(), ACCOUNT_SETTINGS_REFUSED);
+  putAccounts(kAccounts, 3);
+  std::filesystem::remove(device.root / "second");
+  EXPECT_EQ(whyNotOpened(), ACCOUNT_SETTINGS_NOT_MIGRATED);
+  putAccounts(kAccounts, 99);
+  EXPECT_EQ(whyNotOpened(), ACCOUNT_SETTINGS_NEWER);
+  device.root.put(kSettings, "no property list");
+  EXPECT_EQ(whyNotOpened(), ACCOUNT_SETTINGS_UNREADABLE);
+  EXPECT_EQ(asStranger([this] { return whyNotOpened(); }), ACCOUNT_SETTINGS_NO_PERMISSION);
+  std::filesystem::remove(device.root / kSettings);
+  EXPECT_EQ(whyNotOpened(), ACCOUNT_SETTINGS_MISSING);
+  EXPECT_NE(opened(ACCOUNT_SETTINGS_MAY_BE_MISSING), nullptr);
+}
+
+TEST_F(FailuresInC, SayThatTheConfigurationIsMissing) {
+  platform::setCurrent(
+      platform::makeLinuxPlatform({.systemRoot = device.root.path(), .resources = device.root.path()}));
+  EXPECT_EQ(codeOf([](auto** error) { return owned(account_settings_open(nullptr, 0, 0, error)) != nullptr; }),
+            ACCOUNT_SETTINGS_BROKEN_INSTALLATION);
+}
+
+TEST_F(FailuresInC, OfWaitingSayThatAMigrationRuns) {
+  device.root.put(kLock, "");
+  const int lock = ::open((device.root / kLock).c_str(), O_RDONLY | O_CLOEXEC);
+  ::flock(lock, LOCK_EX);
+  EXPECT_EQ(whyNotOpened(), ACCOUNT_SETTINGS_BUSY);
+  EXPECT_NE(opened(ACCOUNT_SETTINGS_MAY_BE_MIGRATING), nullptr);
+  ::close(lock);
+}
+
+TEST_F(FailuresInC, OfBeginningSayWhyThereIsNoEdit) {
+  const auto settings = opened();
+  const auto edit = begun(settings.get());
+  EXPECT_EQ(whyNotBegun(), ACCOUNT_SETTINGS_NESTED);
+  putAccounts(kAccounts + account("later", "A type to come"));
+  EXPECT_EQ(codeOf([&](auto** error) { return owned(account_settings_trial_begin(settings.get(), error)) != nullptr; }),
+            ACCOUNT_SETTINGS_WOULD_DROP_OTHERS);
+}
+
+TEST_F(FailuresInC, OfOneStepSayWhatItCannotDo) {
+  const auto settings = opened();
+  const auto edit = begun(settings.get());
+  EXPECT_EQ(codeOf([&](auto** error) { return set(edit.get(), "X", "Port", error); }),
+            ACCOUNT_SETTINGS_UNKNOWN_ACCOUNT);
+  EXPECT_EQ(codeOf([&](auto** error) { return set(edit.get(), "M1", "Identifier", error); }),
+            ACCOUNT_SETTINGS_UNSUITABLE);
+  const auto properties = owned(account_settings_value_of_dictionary());
+  const auto taken = owned(account_settings_value_of_text("C1"));
+  ASSERT_TRUE(account_settings_value_set(properties.get(), "Identifier", taken.get()));
+  EXPECT_EQ(codeOf([&](auto** error) {
+              return owned(account_settings_edit_add(edit.get(), "LDAP", "A", properties.get(), nullptr, error)) !=
+                     nullptr;
+            }),
+            ACCOUNT_SETTINGS_ALREADY_THERE);
+}
+
+TEST_F(FailuresInC, OfSavingSayWhyNothingWasSaved) {
+  const auto settings = opened();
+  auto edit = begun(settings.get());
+  ASSERT_TRUE(set(edit.get(), "M1", "Type"));
+  EXPECT_EQ(whyNotSaved(edit.get()), ACCOUNT_SETTINGS_WOULD_BE_DROPPED);
+  EXPECT_EQ(whyNotSaved(edit.get()), ACCOUNT_SETTINGS_FINISHED);
+  edit = begun(settings.get());
+  ASSERT_TRUE(set(edit.get(), "M1", "Port"));
+  replaceAccounts(account("E1"));
+  EXPECT_EQ(whyNotSaved(edit.get()), ACCOUNT_SETTINGS_CONFLICT);
+  edit = begun(settings.get());
+  ASSERT_TRUE(set(edit.get(), "E1", "Port"));
+  device.root.put("var/mobile/tmp", "a file where the new one is to be made");
+  EXPECT_EQ(whyNotSaved(edit.get()), ACCOUNT_SETTINGS_NOT_SAVED);
+}
+
+TEST_F(FailuresInC, OfSavingSayThatTheDiskIsFull) {
+  std::set<std::int32_t> codes;
+  for (int operation = 1; operation < 100; ++operation) {
+    const auto files = fillDiskAt(operation);
+    const auto settings = owned(account_settings_open(nullptr, 0, 0, nullptr));
+    const auto edit = settings == nullptr ? nullptr : begun(settings.get());
+    if (edit == nullptr) continue;
+    ASSERT_TRUE(set(edit.get(), "M1", std::to_string(operation).c_str()));
+    codes.insert(whyNotSaved(edit.get()));
+    if (files->mishapAt().empty()) break;
+  }
+  EXPECT_THAT(codes, testing::UnorderedElementsAre(0, ACCOUNT_SETTINGS_NO_SPACE));
+}
+
+TEST_F(FailuresInC, SayThatThoseWhoListenCouldNotBeTold) {
+  const auto settings = opened(ACCOUNT_SETTINGS_OPENS_MODULES);
+  const auto seen = owned(account_settings_look(settings.get(), nullptr));
+  const auto account = owned(account_settings_accounts_find(seen.get(), "M1"));
+  EXPECT_EQ(
+      codeOf([&](auto** error) { return account_settings_will_change(settings.get(), account.get(), kMail, error); }),
+      ACCOUNT_SETTINGS_NOT_ANNOUNCED);
+  const auto edit = begun(settings.get());
+  ASSERT_TRUE(set(edit.get(), "M1", "Port"));
+  const auto saved = owned(account_settings_edit_save(edit.get(), nullptr));
+  EXPECT_STRNE(account_settings_changes_not_announced(saved.get()), nullptr);
+}
+
+TEST_F(FailuresInC, SayThatNothingCanBeWatched) {
+  const auto settings = opened();
+  const auto seen = owned(account_settings_look(settings.get(), nullptr));
+  std::filesystem::rename(device.root / "var/mobile/Library", device.root / "elsewhere");
+  EXPECT_EQ(codeOf([&](auto** error) {
+              return account_settings_watch_begin(settings.get(), seen.get(), nullptr, nullptr,
+                                                  ACCOUNT_SETTINGS_EVENT_LOOP, error) != nullptr;
+            }),
+            ACCOUNT_SETTINGS_NOT_WATCHED);
+}
+
+}  // namespace
+}  // namespace tests
