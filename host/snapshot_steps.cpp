@@ -18,7 +18,6 @@ namespace {
 using Listing = SnapshotOptions::Listing;
 using platform::Path;
 using snapshots::Missing;
-using snapshots::Problem;
 using snapshots::SnapshotSession;
 
 snapshots::Storage storage() {
@@ -42,18 +41,13 @@ snapshots::SessionPlace placeFor(const Options& options, platform::MigrationFoot
               }};
 }
 
-std::unique_ptr<SnapshotSession> rehearse(snapshots::SessionPlace place) {
-  SnapshotSession{std::move(place), Missing::isAccepted}.rehearse();
-  return nullptr;
-}
-
 std::string explanationOf(const SnapshotOptions& options, Explain explain) {
   static_cast<void>(requireOwnDirectory(storage(), *options.directory, Missing::isRefused));
   const snapshots::SnapshotStore store{storage(), *options.directory};
   const std::string id = store.identifierMeantBy(*options.explained);
   const auto text =
       store.record(id, explain == Explain::text ? snapshots::kExplanation : snapshots::kExplanationAsJson);
-  if (!text) throw Problem{Problem::Kind::wrongUse, "snapshot " + id + " has no explanation"};
+  if (!text) snapshots::failWrongUse("snapshot " + id + " has no explanation");
   switch (explain) {
     case Explain::json: return *text;
     case Explain::html: return pageOf(*text, {});
@@ -73,7 +67,10 @@ std::unique_ptr<SnapshotSession> beginRunWithSnapshots(const Options& options,
                                                        const platform::DataClassMigrator& migrator) {
   if (!options.snapshots.directory) return nullptr;
   snapshots::SessionPlace place = placeFor(options, migrator.footprint());
-  if (options.isRehearsal) return rehearse(std::move(place));
+  if (options.isRehearsal) {
+    SnapshotSession{std::move(place), Missing::isAccepted}.rehearse();
+    return nullptr;
+  }
   auto session = std::make_unique<SnapshotSession>(std::move(place), Missing::isMade);
   platform::Platform watched = platform::current();
   watched.files = session->begin();

@@ -7,6 +7,7 @@
 #include <cerrno>
 
 #include "host/snapshots/problem.h"
+#include "platform/linux/property_lists/libplist_conversion.h"
 
 namespace host::snapshots {
 namespace {
@@ -14,50 +15,35 @@ namespace {
 using platform::FileAttributes;
 using platform::FileKind;
 
-constexpr std::size_t kMaxSizeWithAccounts = std::size_t{256} << 20U;  // no larger property list can be read
 constexpr std::size_t kMaxSizeOfOthers = std::size_t{16} << 20U;
 constexpr std::uint32_t kOrdinaryPermissions = 0777;
-
-// Failures that whoever owns the directory can bring about, unlike those of the machine.
-bool isOfSomebodysMaking(const platform::Status& status) {
-  switch (status.errorNumber()) {
-    case EFBIG:
-    case EINVAL:
-    case EISDIR:
-    case ELOOP:
-    case EMLINK:
-    case ENXIO: return true;
-    default: return false;
-  }
-}
 
 FileState unkept(std::string why) {
   return {.contents = kUnkept, .attributes = {}, .bytes = {}, .whyUnkept = std::move(why)};
 }
 
-FileState unkeptOrFailed(const platform::Status& status) {
-  if (status.errorNumber() == ENOENT || status.errorNumber() == ENOTDIR) {
-    return {.contents = kAbsent, .attributes = {}, .bytes = {}, .whyUnkept = {}};
+// What whoever owns the directory can bring about keeps a file from being kept; what the machine does is a failure.
+FileState stateAfter(const platform::Status& failure) {
+  switch (failure.errorNumber()) {
+    case ENOENT:
+    case ENOTDIR: return {.contents = kAbsent, .attributes = {}, .bytes = {}, .whyUnkept = {}};
+    case EFBIG:
+    case EINVAL:
+    case EISDIR:
+    case ELOOP:
+    case EMLINK:
+    case ENXIO: return unkept(failure.description());
+    default: fail(failure.description());
   }
-  if (!isOfSomebodysMaking(status)) require(status);
-  return unkept(status.description());
-}
-
-FileAttributes ordinary(FileAttributes attributes) {
-  attributes.permissions &= kOrdinaryPermissions;
-  return attributes;
-}
-
-FileState markerAt(const Storage& storage, const Path& path) {
-  const platform::Result<FileAttributes> found = storage.keeper->attributesOf(path);
-  if (!found.isOk()) return unkeptOrFailed(found.status());
-  if (found.value().kind != FileKind::file) return unkept(path.string() + " is no regular file");
-  FileState state{.contents = kPresent, .attributes = ordinary(found.value()), .bytes = {}, .whyUnkept = {}};
-  state.attributes.size = 0;
-  return state;
 }
 
 }  // namespace
+
+std::span<const std::uint8_t> bytesOf(std::string_view text) {
+  return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
+}
+
+std::string textIn(const platform::Bytes& bytes) { return {bytes.begin(), bytes.end()}; }
 
 std::string checksum(std::span<const std::uint8_t> bytes) {
   SHA2_CTX state;
@@ -73,21 +59,25 @@ std::string checksum(std::span<const std::uint8_t> bytes) {
   return digits;
 }
 
-std::string checksum(std::string_view text) {
-  return checksum(std::span{reinterpret_cast<const std::uint8_t*>(text.data()), text.size()});
-}
-
 FileState stateAt(const Storage& storage, const Path& path, Part part) {
-  if (part == Part::marker) return markerAt(storage, path);
-  const std::size_t limit = holdsAccounts(part) ? kMaxSizeWithAccounts : kMaxSizeOfOthers;
-  platform::Result<platform::FileCopy> read = storage.keeper->read(path, limit);
-  if (!read.isOk()) return unkeptOrFailed(read.status());
-  platform::FileCopy file = read.take();
+  platform::FileCopy file;
+  if (part == Part::marker) {
+    const platform::Result<FileAttributes> found = storage.keeper->attributesOf(path);
+    if (!found.isOk()) return stateAfter(found.status());
+    file.attributes = found.value();
+    file.attributes.size = 0;
+  } else {
+    const std::size_t limit = holdsAccounts(part) ? platform::kMaxPropertyListSize : kMaxSizeOfOthers;
+    platform::Result<platform::FileCopy> read = storage.keeper->read(path, limit);
+    if (!read.isOk()) return stateAfter(read.status());
+    file = read.take();
+  }
   if (file.attributes.kind != FileKind::file) return unkept(path.string() + " is no regular file");
-  FileState state{
-      .contents = checksum(file.bytes), .attributes = ordinary(file.attributes), .bytes = {}, .whyUnkept = {}};
-  state.bytes = std::move(file.bytes);
-  return state;
+  file.attributes.permissions &= kOrdinaryPermissions;
+  return {.contents = part == Part::marker ? kPresent : checksum(file.bytes),
+          .attributes = file.attributes,
+          .bytes = std::move(file.bytes),
+          .whyUnkept = {}};
 }
 
 bool KeptFile::isExactly(const FileState& present) const {

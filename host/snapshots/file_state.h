@@ -21,9 +21,13 @@ struct Storage {
   std::shared_ptr<platform::FileKeeper> keeper;
 };
 
+// The same bytes as text and the other way round; neither looks at what they mean.
+[[nodiscard]] std::span<const std::uint8_t> bytesOf(std::string_view text);
+[[nodiscard]] std::string textIn(const platform::Bytes& bytes);
+
 // The SHA-256 checksum, as 64 hexadecimal digits in lower case.
 [[nodiscard]] std::string checksum(std::span<const std::uint8_t> bytes);
-[[nodiscard]] std::string checksum(std::string_view text);
+[[nodiscard]] inline std::string checksum(std::string_view text) { return checksum(bytesOf(text)); }
 
 // What may stand at a path, by its contents: the checksum of a file, or one of these.
 inline constexpr const char* kAbsent = "absent";

@@ -41,24 +41,20 @@ std::string stateOf(const Entry& entry) {
   return entry.isRunning ? "running" : "unfinished";
 }
 
-std::string filesIn(const Manifest& manifest) {
-  std::string text;
-  for (const KeptFile& file : manifest.files) {
-    if (file.isPresent()) text += (text.empty() ? "" : " ") + file.path.filename().string();
-  }
-  return text.empty() ? "none" : text;
-}
-
 Row rowOf(const Entry& entry) {
   if (!entry.manifest) return {entry.id, "-", "-", "-", stateOf(entry), "-"};
   const Manifest& manifest = *entry.manifest;
+  std::string files;
+  for (const KeptFile& file : manifest.files) {
+    if (file.isPresent()) files += (files.empty() ? "" : " ") + file.path.filename().string();
+  }
   const std::string state = stateOf(entry) == "finished" ? *manifest.outcome : stateOf(entry);
   return {entry.id,
           manifest.taken,
           manifest.reason,
           manifest.dataVersion ? std::to_string(*manifest.dataVersion) : "-",
           state + (manifest.isKept() ? ", kept" : ""),
-          filesIn(manifest)};
+          files.empty() ? "none" : files};
 }
 
 }  // namespace

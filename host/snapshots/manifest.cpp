@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <array>
+#include <cstdio>
 #include <nlohmann/json.hpp>
 #include <stdexcept>
 
@@ -102,24 +103,20 @@ Json jsonOf(const Manifest& manifest) {
           {"files", std::move(files)}};
 }
 
-Manifest manifestFromJson(const Json& json) {
-  Manifest manifest{.id = json.at("id"),
-                    .taken = json.at("taken"),
-                    .release = json.at("release"),
-                    .reason = json.at("reason"),
-                    .device = {.root = json.at("root"), .home = json.at("home")},
-                    .lockName = json.at("lock"),
-                    .versionKey = json.at("versionKey"),
-                    .dataVersion = optionalAt<std::int64_t>(json, "dataVersion"),
-                    .outcome = optionalAt<std::string>(json, "outcome"),
-                    .keptFor = json.value("keptFor", std::vector<std::string>{}),
-                    .files = {}};
-  if (json.at("kept") && !manifest.isKept()) manifest.keptFor.emplace_back(kKeptByAnEarlierRelease);
-  for (const Json& file : json.at("files")) manifest.files.push_back(fileFrom(file));
-  return manifest;
-}
-
 }  // namespace
+
+// By the calendar alone: no table of time zones is read for it.
+std::string universalTime(std::chrono::system_clock::time_point time) {
+  const auto day = std::chrono::floor<std::chrono::days>(time);
+  const std::chrono::year_month_day date{day};
+  const std::chrono::hh_mm_ss clock{std::chrono::floor<std::chrono::seconds>(time - day)};
+  std::array<char, 40> text{};
+  std::snprintf(text.data(), text.size(), "%04d-%02u-%02uT%02d:%02d:%02dZ", static_cast<int>(date.year()),
+                static_cast<unsigned>(date.month()), static_cast<unsigned>(date.day()),
+                static_cast<int>(clock.hours().count()), static_cast<int>(clock.minutes().count()),
+                static_cast<int>(clock.seconds().count()));
+  return text.data();
+}
 
 std::string nameOf(Part part) { return kParts.at(static_cast<std::size_t>(part)); }
 
@@ -129,16 +126,29 @@ std::string textOf(const Manifest& manifest) {
     const std::string sum = checksum(json.dump());
     return Json{{"manifest", std::move(json)}, {"sha256", sum}}.dump() + '\n';
   } catch (const Json::exception& thrown) {
-    throw Problem{Problem::Kind::failed, std::string{"the manifest cannot be written: "} + thrown.what()};
+    fail(std::string{"the manifest cannot be written: "} + thrown.what());
   }
 }
 
 std::optional<Manifest> manifestFrom(std::string_view text) {
   try {
-    const Json json = Json::parse(text);
-    const Json& manifest = json.at("manifest");
-    if (json.at("sha256") != checksum(manifest.dump()) || manifest.at("format") != kFormat) return std::nullopt;
-    return manifestFromJson(manifest);
+    const Json whole = Json::parse(text);
+    const Json& json = whole.at("manifest");
+    if (whole.at("sha256") != checksum(json.dump()) || json.at("format") != kFormat) return std::nullopt;
+    Manifest manifest{.id = json.at("id"),
+                      .taken = json.at("taken"),
+                      .release = json.at("release"),
+                      .reason = json.at("reason"),
+                      .device = {.root = json.at("root"), .home = json.at("home")},
+                      .lockName = json.at("lock"),
+                      .versionKey = json.at("versionKey"),
+                      .dataVersion = optionalAt<std::int64_t>(json, "dataVersion"),
+                      .outcome = optionalAt<std::string>(json, "outcome"),
+                      .keptFor = json.value("keptFor", std::vector<std::string>{}),
+                      .files = {}};
+    if (json.at("kept") && !manifest.isKept()) manifest.keptFor.emplace_back(kKeptByAnEarlierRelease);
+    for (const Json& file : json.at("files")) manifest.files.push_back(fileFrom(file));
+    return manifest;
   } catch (const Json::exception&) {
     return std::nullopt;
   } catch (const std::invalid_argument&) {

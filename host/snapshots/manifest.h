@@ -1,5 +1,6 @@
 #pragma once
 
+#include <chrono>
 #include <cstdint>
 #include <optional>
 #include <string>
@@ -9,6 +10,9 @@
 #include "host/snapshots/file_state.h"
 
 namespace host::snapshots {
+
+// The time as manifests, traces and explanations have it: in UTC, as in 2026-03-07T10:15:00Z.
+[[nodiscard]] std::string universalTime(std::chrono::system_clock::time_point time);
 
 // The device that a snapshot belongs to.
 struct DevicePlace {
@@ -21,7 +25,7 @@ struct DevicePlace {
 // What a snapshot is: everything but the bytes of the files.
 struct Manifest {
   std::string id;
-  std::string taken;    // the time in UTC
+  std::string taken;    // the universal time
   std::string release;  // of the host
   std::string reason;   // kRun, kRestore
   DevicePlace device;

@@ -21,9 +21,12 @@ class Problem : public commandline::Ending {
   Problem(Kind kind, const std::string& text) : Ending{kind, text} {}
 };
 
+[[noreturn]] inline void fail(const std::string& text) { throw Problem{Problem::Kind::failed, text}; }
+[[noreturn]] inline void failWrongUse(const std::string& text) { throw Problem{Problem::Kind::wrongUse, text}; }
+
 // Throws where the call failed, with its description.
 inline void require(const platform::Status& status) {
-  if (!status.isOk()) throw Problem{Problem::Kind::failed, status.description()};
+  if (!status.isOk()) fail(status.description());
 }
 
 // The value; throws where there is none.

@@ -17,7 +17,7 @@ constexpr std::size_t kMaxSize = std::size_t{1} << 16U;
 
 std::string textAt(platform::FileSystem& files, const Path& path) {
   const platform::Result<platform::Bytes> read = files.read(path, kMaxSize);
-  return read.isOk() ? std::string{read.value().begin(), read.value().end()} : std::string{};
+  return read.isOk() ? textIn(read.value()) : std::string{};
 }
 
 // The last one, as the shell that reads such a file has it; empty where there is none.
@@ -85,7 +85,7 @@ void setStamp(platform::FileSystem& files, const Path& directory, const Stamp& s
                   {"version", stamp.release.versionId},
                   {"endedWell", stamp.endedWell}};
   const std::string text = json.dump(-1, ' ', false, Json::error_handler_t::replace) + '\n';
-  require(files.replace(directory / kStampName, {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()}));
+  require(files.replace(directory / kStampName, bytesOf(text)));
 }
 
 bool isRunNeeded(const Storage& storage, const Path& directory, const platform::Platform& services,

@@ -12,15 +12,11 @@ using Json = nlohmann::ordered_json;
 
 constexpr std::size_t kMaxSize = std::size_t{1} << 26U;
 
-std::span<const std::uint8_t> bytesOf(const std::string& text) {
-  return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
-}
-
 std::string lineOf(const Json& json) {
   try {
     return json.dump() + '\n';
   } catch (const Json::exception& thrown) {
-    throw Problem{Problem::Kind::failed, std::string{"the mark cannot be written: "} + thrown.what()};
+    fail(std::string{"the mark cannot be written: "} + thrown.what());
   }
 }
 
@@ -40,7 +36,7 @@ RunMark markFrom(const std::string& text) {
       if (line.contains("made")) mark.made.insert(path);
     }
   }
-  if (start == 0) throw Problem{Problem::Kind::failed, "it is empty"};
+  if (start == 0) fail("it is empty");
   return mark;
 }
 
@@ -68,9 +64,9 @@ std::optional<RunMark> RunJournal::read() const {
   if (bytes.status().errorNumber() == ENOENT) return std::nullopt;
   require(bytes.status());
   try {
-    return markFrom({bytes.value().begin(), bytes.value().end()});
+    return markFrom(textIn(bytes.value()));
   } catch (const std::exception& thrown) {
-    throw Problem{Problem::Kind::failed, "the mark " + _mark.string() + " is damaged: " + thrown.what()};
+    fail("the mark " + _mark.string() + " is damaged: " + thrown.what());
   }
 }
 

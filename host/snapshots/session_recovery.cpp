@@ -10,8 +10,6 @@ namespace {
 
 constexpr const char* kRestored = "restored";
 
-[[noreturn]] void fail(const std::string& text) { throw Problem{Problem::Kind::failed, text}; }
-
 void addContents(const Manifest& manifest, KnownContents& known) {
   for (const KeptFile& file : manifest.files) known[file.path].insert(file.contents);
 }

@@ -30,7 +30,7 @@ constexpr std::size_t kNumberDigits = 6;
 constexpr std::string_view kTime = "ddddddddTddddddZ";
 
 [[noreturn]] void cannotHold(const Path& directory, const std::string& reason) {
-  throw Problem{Problem::Kind::wrongUse, directory.string() + " cannot hold snapshots: " + reason};
+  failWrongUse(directory.string() + " cannot hold snapshots: " + reason);
 }
 
 bool isWritableByOthers(const FileAttributes& attributes) { return (attributes.permissions & kWritableByOthers) != 0; }
@@ -56,18 +56,12 @@ bool isDigit(char character) { return character >= '0' && character <= '9'; }
 std::optional<std::string> ownMarkIn(const Storage& storage, const Path& directory) {
   const platform::Result<platform::Bytes> read = storage.files->read(directory / kOwnMark, kOwnMarkText.size());
   if (!read.isOk()) return std::nullopt;
-  return std::string{read.value().begin(), read.value().end()};
+  return textIn(read.value());
 }
 
 bool isOwnName(const std::string& name) {
   static const std::set<std::string> kNames{kOwnMark, kLock, RunJournal::kName, kFormerJournal, kStampName};
   return kNames.contains(name) || isIdentifier(name) || isPassing(name);
-}
-
-// A name alone is no proof: every host made the lock first, and it is empty.
-bool isOfAnEarlierHost(const Storage& storage, const Path& directory) {
-  const platform::Result<FileAttributes> lock = storage.keeper->attributesOf(directory / kLock);
-  return lock.isOk() && lock.value().kind == FileKind::file && lock.value().size == 0;
 }
 
 void requireSnapshotsOrNothing(const Storage& storage, const Path& directory) {
@@ -79,8 +73,10 @@ void requireSnapshotsOrNothing(const Storage& storage, const Path& directory) {
   if (mark ? !kOwnMarkText.starts_with(*mark) : std::ranges::find(names, kOwnMark) != names.end()) {
     cannotHold(directory, std::string{"it holds something else: "} + kOwnMark);
   }
-  const bool isOfADeadMaker = std::ranges::all_of(names, [](const std::string& name) { return name == kOwnMark; });
-  if (!isOfADeadMaker && !isOfAnEarlierHost(storage, directory)) {
+  if (std::ranges::all_of(names, [](const std::string& name) { return name == kOwnMark; })) return;  // its maker died
+  // A name alone is no proof of an earlier host: every host made the lock first, and it is empty.
+  const platform::Result<FileAttributes> lock = storage.keeper->attributesOf(directory / kLock);
+  if (!lock.isOk() || lock.value().kind != FileKind::file || lock.value().size != 0) {
     cannotHold(directory, "it holds something else: " + names.front());
   }
 }
@@ -103,8 +99,7 @@ bool isPassing(const std::string& name) {
 
 void markAsOwn(const Storage& storage, const Path& directory) {
   if (ownMarkIn(storage, directory) == kOwnMarkText) return;
-  require(storage.files->replace(directory / kOwnMark,
-                                 {reinterpret_cast<const std::uint8_t*>(kOwnMarkText.data()), kOwnMarkText.size()}));
+  require(storage.files->replace(directory / kOwnMark, bytesOf(kOwnMarkText)));
 }
 
 bool requireOwnDirectory(const Storage& storage, const Path& directory, Missing missing) {

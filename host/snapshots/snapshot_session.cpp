@@ -11,12 +11,6 @@ namespace {
 constexpr const char* kMigrated = "migrated";
 constexpr const char* kNotMigrated = "not migrated";
 
-[[noreturn]] void fail(const std::string& text) { throw Problem{Problem::Kind::failed, text}; }
-
-bool hasSamePaths(const Manifest& one, const Manifest& other) {
-  return std::ranges::equal(one.files, other.files, {}, &KeptFile::path, &KeptFile::path);
-}
-
 }  // namespace
 
 SnapshotSession::SnapshotSession(SessionPlace place, Missing missing)
@@ -44,8 +38,8 @@ void SnapshotSession::requireSameDevice() const {
   for (const std::string& id : _store.identifiers()) {
     const std::optional<Manifest> manifest = _store.undamagedManifest(id);
     if (!manifest || manifest->device == _device) continue;
-    throw Problem{Problem::Kind::wrongUse, _place.directory.string() + " belongs to another device: --root " +
-                                               manifest->device.root + " --home " + manifest->device.home};
+    failWrongUse(_place.directory.string() + " belongs to another device: --root " + manifest->device.root +
+                 " --home " + manifest->device.home);
   }
 }
 
@@ -75,7 +69,8 @@ Manifest SnapshotSession::description(const char* reason) const {
 // The snapshot of a run that did not end, with nothing changed since: the same state need not be kept twice, and the
 // one from before the first attempt stays the newest.
 bool SnapshotSession::isStillTrue(const Manifest& newest, const Manifest& description) const {
-  if (newest.outcome || newest.isKept() || !hasSamePaths(newest, description)) return false;
+  if (newest.outcome || newest.isKept()) return false;
+  if (!std::ranges::equal(newest.files, description.files, {}, &KeptFile::path, &KeptFile::path)) return false;
   const bool isUnchanged = std::ranges::all_of(
       newest.files, [this](const KeptFile& file) { return file.isExactly(stateAt(_storage, file.path, file.part)); });
   return isUnchanged && _store.damageOf(newest).empty();
@@ -199,7 +194,7 @@ void SnapshotSession::boundKept() const {
 
 void SnapshotSession::release(const std::string& id) const {
   Manifest manifest = _store.manifest(id);
-  if (!manifest.isKept()) throw Problem{Problem::Kind::wrongUse, "snapshot " + id + " is not kept beyond the count"};
+  if (!manifest.isKept()) failWrongUse("snapshot " + id + " is not kept beyond the count");
   manifest.keptFor.clear();
   _store.rewrite(manifest);
 }
@@ -211,7 +206,7 @@ std::string SnapshotSession::identifierMeantBy(const std::optional<std::string>&
     const std::optional<Manifest> manifest = _store.undamagedManifest(id);
     return !manifest || manifest->reason != Manifest::kRun;
   });
-  if (known.empty()) throw Problem{Problem::Kind::wrongUse, "no snapshot is from before a run"};
+  if (known.empty()) failWrongUse("no snapshot is from before a run");
   return known.back();
 }
 

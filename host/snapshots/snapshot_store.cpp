@@ -1,13 +1,13 @@
 #include "host/snapshots/snapshot_store.h"
 
 #include <algorithm>
-#include <array>
 #include <cerrno>
 #include <charconv>
-#include <ctime>
+#include <chrono>
 
 #include "host/snapshots/problem.h"
 #include "host/snapshots/snapshot_directory.h"
+#include "platform/linux/property_lists/libplist_conversion.h"
 
 namespace host::snapshots {
 namespace {
@@ -15,31 +15,14 @@ namespace {
 constexpr const char* kManifest = "manifest";
 constexpr unsigned kOwnerAlone = 0700;
 constexpr std::size_t kMaxSizeOfManifest = std::size_t{1} << 24U;
-constexpr std::size_t kMaxSizeOfCopy = std::size_t{256} << 20U;
 constexpr const char* kLatest = "latest";
 constexpr std::size_t kDigits = 6;
-
-std::string timeNow() {
-  const std::time_t now = std::time(nullptr);
-  std::tm parts{};
-  std::array<char, 32> text{};
-  ::gmtime_r(&now, &parts);
-  return {text.data(), std::strftime(text.data(), text.size(), "%Y-%m-%dT%H:%M:%SZ", &parts)};
-}
 
 std::uint64_t numberOf(const std::string& id) {
   std::uint64_t number = 0;
   std::from_chars(id.data(), id.data() + id.size(), number);
   return number;
 }
-
-std::span<const std::uint8_t> bytesOf(std::string_view text) {
-  return {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()};
-}
-
-[[noreturn]] void failWrongUse(const std::string& text) { throw Problem{Problem::Kind::wrongUse, text}; }
-
-[[noreturn]] void fail(const std::string& text) { throw Problem{Problem::Kind::failed, text}; }
 
 }  // namespace
 
@@ -115,7 +98,7 @@ void SnapshotStore::keepCopy(KeptFile& file, std::size_t number,
   file.copy = std::to_string(number);
   const Path copy = _directory / kBeingMade / file.copy;
   require(_storage.files->create(copy, state.bytes));
-  if (checksum(required(_storage.files->read(copy, kMaxSizeOfCopy))) != file.contents) {
+  if (checksum(required(_storage.files->read(copy, platform::kMaxPropertyListSize))) != file.contents) {
     fail("the copy of " + file.path.string() + " is not like it");
   }
 }
@@ -130,7 +113,7 @@ void SnapshotStore::build(Manifest& manifest, const std::function<void(const std
 }
 
 Manifest SnapshotStore::take(Manifest description, const std::function<void(const std::string&)>& warn) const {
-  description.taken = timeNow();
+  description.taken = universalTime(std::chrono::system_clock::now());
   description.id = nextIdentifier(description.taken);
   try {
     build(description, warn);
@@ -148,14 +131,16 @@ void SnapshotStore::keepRecord(const std::string& id, const std::string& name, s
 }
 
 std::optional<std::string> SnapshotStore::record(const std::string& id, const std::string& name) const {
-  const platform::Result<platform::Bytes> read = _storage.files->read(_directory / id / name, kMaxSizeOfCopy);
+  const platform::Result<platform::Bytes> read =
+      _storage.files->read(_directory / id / name, platform::kMaxPropertyListSize);
   if (read.status().errorNumber() == ENOENT) return std::nullopt;
   require(read.status());
-  return std::string{read.value().begin(), read.value().end()};
+  return textIn(read.value());
 }
 
 platform::Bytes SnapshotStore::copyOf(const Manifest& manifest, const KeptFile& file) const {
-  platform::Bytes bytes = required(_storage.files->read(_directory / manifest.id / file.copy, kMaxSizeOfCopy));
+  platform::Bytes bytes =
+      required(_storage.files->read(_directory / manifest.id / file.copy, platform::kMaxPropertyListSize));
   if (checksum(bytes) != file.contents) {
     fail("the copy of " + file.path.string() + " in snapshot " + manifest.id + " is damaged");
   }
