@@ -10,26 +10,19 @@ namespace {
 
 using Json = nlohmann::ordered_json;
 
-// How many accounts of which version the settings file had and has, as far as the run told.
-void addState(const Explanation& explanation, Json& result) {
-  const auto put = [&result](std::size_t accounts, std::uint64_t version) {
-    result["accounts"] = accounts;
-    result["version"] = version;
-  };
-  explanation.forEachFact([&](const records::Fact& fact) {
-    if (const auto* const loaded = std::get_if<records::Loaded>(&fact)) result["storedVersion"] = loaded->version;
-    if (const auto* const saved = std::get_if<records::Saved>(&fact)) put(saved->accounts, saved->version);
-  });
-}
-
 Json jsonOfResult(const Explanation& explanation, const Verdict& verdict, const ExplainedRun& run) {
   Json json{{"dataClass", run.dataClass}, {"success", run.success}};
   addVerdict(verdict, json);
-  addState(explanation, json);
-  const Counts counts = countsOf(explanation, verdict);
-  json["counts"] = {{"kept", counts.kept},           {"changed", counts.changed}, {"added", counts.added},
-                    {"converted", counts.converted}, {"moved", counts.moved},     {"folded", counts.folded},
-                    {"dropped", counts.dropped},     {"lost", counts.lost}};
+  // How many accounts of which version the settings file had and has, as far as the run told.
+  explanation.forEachFact([&json](const records::Fact& fact) {
+    if (const auto* const loaded = std::get_if<records::Loaded>(&fact)) json["storedVersion"] = loaded->version;
+    if (const auto* const saved = std::get_if<records::Saved>(&fact)) {
+      json["accounts"] = saved->accounts;
+      json["version"] = saved->version;
+    }
+  });
+  json["counts"] = Json::object();
+  for (const auto& [name, count] : countsOf(explanation, verdict).named()) json["counts"][std::string{name}] = count;
   return json;
 }
 

@@ -57,16 +57,14 @@ std::string listChange(const Change& change) {
 }
 
 // A list of names, such as data classes, is never cut: what is left out of it is what people look for.
-bool isListOfTexts(const PropertyValue& value) {
-  const Array* const array = value.asArray();
-  return array != nullptr &&
-         std::ranges::all_of(*array, [](const PropertyValue& each) { return each.asText() != nullptr; });
-}
-
 std::string shownValue(const Change& change, const std::optional<PropertyValue>& value) {
   if (!value) return "nothing";
   std::string text = descriptionUnder(keyForShowing(change), *value);
-  return isListOfTexts(*value) ? text : shortened(std::move(text));
+  const Array* const array = value->asArray();
+  const bool isListOfTexts = array != nullptr && std::ranges::all_of(*array, [](const PropertyValue& each) {
+                               return each.asText() != nullptr;
+                             });
+  return isListOfTexts ? text : shortened(std::move(text));
 }
 
 std::string shown(const Change& change) {
@@ -104,49 +102,44 @@ std::string conversionOf(const std::vector<Change>& changes) {
   return text + keysOf(changes, "added", &isAdded) + keysOf(changes, "removed", &isRemoved);
 }
 
-std::string changesOf(const std::vector<Change>& changes) {
-  std::string text;
-  for (const Change& change : changes) text += lineOf(4, shown(change));
-  return text;
-}
-
 // --- Facts ---
 
 std::string line(std::string_view kind, const std::string& rest) { return lineOf(2, std::string{kind} + ": " + rest); }
 
 // What is told of by the result or by another fact has no line of its own.
-std::string shown(const Fact& fact) {
-  return std::visit(
-      Visitor{[](const Loaded&) { return std::string{}; }, [](const CopiedAside&) { return std::string{}; },
-              [](const KeptAside& it) {
-                return line("kept aside", (it.file.empty() ? "the settings file" : it.file) + ", as " + it.where);
-              },
-              [](const Swept& it) { return line("swept", it.file + ", which a program that was killed had left"); },
-              [](const Added& it) { return line("added", shown(it.account)); },
-              [](const Converted& it) {
-                const std::string instead = it.isReplacement ? ", in place of the account with this identifier" : "";
-                return line("converted", shown(it.account) + " from " + it.from + instead) + conversionOf(it.changes);
-              },
-              [](const Changed& it) { return lineOf(2, shown(it.account)) + changesOf(it.changes); },
-              [](const Moved& it) {
-                Name account = it.account;
-                account.parent.clear();
-                return line("moved", shown(account) + (it.into ? " into " + shown(*it.into) : " out of its parent"));
-              },
-              [](const Folded& it) {
-                std::string into;
-                for (const Name& name : it.into) into += (into.empty() ? "" : " and ") + shown(name);
-                return line("folded", shown(it.account) + " into " + into + ": " + it.reason);
-              },
-              [](const Lost& it) { return line("lost", textOf(it)); },
-              [](const Repeated& it) { return line("repeated", shown(it.account) + " stands there once more"); },
-              [](const Unrepaired& it) { return line("kept as it is", shown(it.account) + ": " + it.reason); },
-              [](const Saved&) { return std::string{}; },
-              [](const SaveFailed& it) { return line("NOT SAVED", it.cause); },
-              [](const FileRemoved& it) { return line("removed", it.file); },
-              [](const FileNotRemoved& it) { return line("not removed", it.file + ": " + it.cause); }},
-      fact);
+std::string shown(const Loaded& /*it*/) { return {}; }
+std::string shown(const CopiedAside& /*it*/) { return {}; }
+std::string shown(const KeptAside& it) {
+  return line("kept aside", (it.file.empty() ? "the settings file" : it.file) + ", as " + it.where);
 }
+std::string shown(const Swept& it) { return line("swept", it.file + ", which a program that was killed had left"); }
+std::string shown(const Added& it) { return line("added", shown(it.account)); }
+std::string shown(const Converted& it) {
+  const std::string instead = it.isReplacement ? ", in place of the account with this identifier" : "";
+  return line("converted", shown(it.account) + " from " + it.from + instead) + conversionOf(it.changes);
+}
+std::string shown(const Changed& it) {
+  std::string text = lineOf(2, shown(it.account));
+  for (const Change& change : it.changes) text += lineOf(4, shown(change));
+  return text;
+}
+std::string shown(const Moved& it) {
+  Name account = it.account;
+  account.parent.clear();
+  return line("moved", shown(account) + (it.into ? " into " + shown(*it.into) : " out of its parent"));
+}
+std::string shown(const Folded& it) {
+  std::string into;
+  for (const Name& name : it.into) into += (into.empty() ? "" : " and ") + shown(name);
+  return line("folded", shown(it.account) + " into " + into + ": " + it.reason);
+}
+std::string shown(const Lost& it) { return line("lost", textOf(it)); }
+std::string shown(const Repeated& it) { return line("repeated", shown(it.account) + " stands there once more"); }
+std::string shown(const Unrepaired& it) { return line("kept as it is", shown(it.account) + ": " + it.reason); }
+std::string shown(const Saved& /*it*/) { return {}; }
+std::string shown(const SaveFailed& it) { return line("NOT SAVED", it.cause); }
+std::string shown(const FileRemoved& it) { return line("removed", it.file); }
+std::string shown(const FileNotRemoved& it) { return line("not removed", it.file + ": " + it.cause); }
 
 // The stage's facts under its title, such as
 //
@@ -158,7 +151,7 @@ std::string shown(const Explanation::Stage& stage) {
   std::size_t changed = 0;
   for (const Fact& fact : stage.facts) {
     if (std::holds_alternative<Changed>(fact) && ++changed > kMaxChangedAccounts) continue;
-    text += shown(fact);
+    text += std::visit([](const auto& each) { return shown(each); }, fact);
   }
   if (changed > kMaxChangedAccounts) {
     text += lineOf(2, "and " + std::to_string(changed - kMaxChangedAccounts) + " more accounts with other values");
@@ -170,22 +163,6 @@ std::string shown(const Explanation::Stage& stage) {
 }
 
 // --- The whole ---
-
-std::string tally(const Counts& counts) {
-  std::string text;
-  const auto put = [&text](std::size_t count, std::string_view what) {
-    if (count > 0) text += (text.empty() ? "" : ", ") + std::to_string(count) + " " + std::string{what};
-  };
-  put(counts.kept, "kept");
-  put(counts.changed, "changed");
-  put(counts.added, "added");
-  put(counts.converted, "converted");
-  put(counts.moved, "moved");
-  put(counts.folded, "folded");
-  put(counts.dropped, "dropped");
-  put(counts.lost, "lost");
-  return text.empty() ? "none" : text;
-}
 
 // How the settings file was and is.
 std::string stateOf(const Explanation& explanation) {
@@ -212,18 +189,6 @@ std::string ending(const Verdict& verdict) {
   return {};
 }
 
-// What was lost, with a colon; empty where the meaning of the code says it.
-std::string subjectOf(const Lost& lost) {
-  const bool isSaidByCode = lost.code == LossCode::unreadableSettingsFile || lost.code == LossCode::newerSettingsFile ||
-                            lost.code == LossCode::failedStep;
-  if (isSaidByCode) return {};
-  return (lost.account == Name{} && !lost.file.empty() ? lost.file : shown(lost.account)) + ": ";
-}
-
-std::string whereOf(const Lost& lost) {
-  return lost.where.empty() ? "its data is nowhere else on the device" : "its data is still in " + lost.where;
-}
-
 std::string warnings(const Explanation& explanation, const Verdict& verdict) {
   std::string text;
   for (const std::string& warning : warningsOf(verdict)) text += lineOf(0, "WARNING: " + warning);
@@ -237,14 +202,20 @@ std::string warnings(const Explanation& explanation, const Verdict& verdict) {
 
 std::string textOf(const Lost& lost) {
   const LossMeaning& meaning = meaningOf(lost.code);
-  return subjectOf(lost) + std::string{meaning.text} + (lost.detail.empty() ? "" : ": " + lost.detail) + " [" +
-         std::string{meaning.name} + "]";
+  const bool isSubjectSaidByCode = lost.code == LossCode::unreadableSettingsFile ||
+                                   lost.code == LossCode::newerSettingsFile || lost.code == LossCode::failedStep;
+  const std::string subject = lost.account == Name{} && !lost.file.empty() ? lost.file : shown(lost.account);
+  return (isSubjectSaidByCode ? "" : subject + ": ") + std::string{meaning.text} +
+         (lost.detail.empty() ? "" : ": " + lost.detail) + " [" + std::string{meaning.name} + "]";
 }
 
 std::vector<std::string> warningsOf(const Verdict& verdict) {
   std::vector<std::string> warnings;
   if (verdict.kind == Verdict::Kind::notSaved) warnings.push_back("the accounts were not saved: " + verdict.cause);
-  for (const Lost& lost : verdict.lost) warnings.push_back("lost: " + textOf(lost) + "; " + whereOf(lost));
+  for (const Lost& lost : verdict.lost) {
+    warnings.push_back("lost: " + textOf(lost) + "; its data is " +
+                       (lost.where.empty() ? "nowhere else on the device" : "still in " + lost.where));
+  }
   return warnings;
 }
 
@@ -252,13 +223,17 @@ std::string textOf(const Explanation& explanation, const Verdict& verdict, const
   std::string stages;
   for (const Explanation::Stage& stage : explanation.stages()) stages += shown(stage);
   if (stages.empty()) stages = "\nNo account was changed.\n";
+  std::string tally;
+  for (const auto& [name, count] : countsOf(explanation, verdict).named()) {
+    if (count > 0) tally += (tally.empty() ? "" : ", ") + std::to_string(count) + " " + std::string{name};
+  }
   const std::string heading = run.isRehearsal
                                   ? "What a run would do (this was a rehearsal: nothing on the device was changed)\n"
                                   : "What the run did\n";
   return heading + stages + "\n" +
          lineOf(0, "result: " + std::string{run.success ? "success" : "failure"} + ending(verdict) +
                        stateOf(explanation)) +
-         lineOf(0, "accounts: " + tally(countsOf(explanation, verdict))) +
+         lineOf(0, "accounts: " + (tally.empty() ? "none" : tally)) +
          lineOf(0, "run: migration-host " + std::string{run.version} + " on " + run.root + " at " + run.time) +
          warnings(explanation, verdict);
 }

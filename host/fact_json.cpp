@@ -11,13 +11,11 @@ namespace {
 using Json = nlohmann::ordered_json;
 using namespace records;  // the facts
 
-Json jsonOfInteger(PropertyValue::Integer integer) {
-  return integer.isAboveInt64 ? Json(integer.bits) : Json(static_cast<std::int64_t>(integer.bits));
-}
-
 Json jsonOfShown(const PropertyValue& value) {
   if (const auto* const text = value.asText()) return text->string();
-  if (const auto integer = value.asInteger()) return jsonOfInteger(*integer);
+  if (const auto integer = value.asInteger()) {
+    return integer->isAboveInt64 ? Json(integer->bits) : Json(static_cast<std::int64_t>(integer->bits));
+  }
   if (const auto* const real = value.asReal()) {
     return std::isfinite(*real) ? Json(*real) : Json(records::description(value));
   }
@@ -57,88 +55,50 @@ void addUnlessEmpty(const char* member, const std::string& text, Json& json) {
   if (!text.empty()) json[member] = text;
 }
 
-Json membersOf(const Lost& lost) {
-  const LossMeaning& meaning = meaningOf(lost.code);
-  Json json{{"code", meaning.name}, {"reason", meaning.text}};
-  addUnlessEmpty("detail", lost.detail, json);
-  if (lost.account != Name{}) json["account"] = jsonOfName(lost.account);
-  addUnlessEmpty("file", lost.file, json);
-  addUnlessEmpty("where", lost.where, json);
-  return json;
-}
-
 Json ofAccount(const Name& account, const Json& members = Json::object()) {
   Json json{{"account", jsonOfName(account)}};
   json.update(members);
   return json;
 }
 
-Json ofConversion(const Converted& converted) {
-  return ofAccount(converted.account, {{"from", converted.from},
-                                       {"file", converted.file},
-                                       {"replaces", converted.isReplacement},
-                                       {"changes", jsonOfChanges(converted.changes)}});
-}
-
-Json ofMove(const Moved& moved) {
-  return ofAccount(moved.account, moved.into ? Json{{"into", Json::array({jsonOfName(*moved.into)})}} : Json::object());
-}
-
-Json ofKeptFile(const KeptAside& kept) {
+// What each fact has beside its name.
+Json membersOf(const Loaded& it) { return Json{{"accounts", it.accounts}, {"version", it.version}}; }
+Json membersOf(const CopiedAside& it) { return Json{{"file", it.file}}; }
+Json membersOf(const KeptAside& it) {
   Json json = Json::object();
-  addUnlessEmpty("file", kept.file, json);
-  json["where"] = kept.where;
+  addUnlessEmpty("file", it.file, json);
+  json["where"] = it.where;
   return json;
 }
-
-Json membersOf(const Fact& fact) {
-  return std::visit(
-      Visitor{[](const Loaded& it) {
-                return Json{{"accounts", it.accounts}, {"version", it.version}};
-              },
-              [](const CopiedAside& it) {
-                return Json{{"file", it.file}};
-              },
-              [](const KeptAside& it) { return ofKeptFile(it); },
-              [](const Swept& it) {
-                return Json{{"file", it.file}};
-              },
-              [](const Added& it) { return ofAccount(it.account); },
-              [](const Converted& it) { return ofConversion(it); },
-              [](const Changed& it) {
-                return ofAccount(it.account, {{"changes", jsonOfChanges(it.changes)}});
-              },
-              [](const Moved& it) { return ofMove(it); },
-              [](const Folded& it) {
-                return ofAccount(it.account, {{"into", jsonOf(it.into)}, {"reason", it.reason}});
-              },
-              [](const Lost& it) { return membersOf(it); }, [](const Repeated& it) { return ofAccount(it.account); },
-              [](const Unrepaired& it) {
-                return ofAccount(it.account, {{"reason", it.reason}});
-              },
-              [](const Saved& it) {
-                return Json{{"file", it.file}, {"accounts", it.accounts}, {"version", it.version}};
-              },
-              [](const SaveFailed& it) {
-                return Json{{"file", it.file}, {"cause", it.cause}, {"accounts", it.accounts}, {"version", it.version}};
-              },
-              [](const FileRemoved& it) {
-                return Json{{"file", it.file}};
-              },
-              [](const FileNotRemoved& it) {
-                return Json{{"file", it.file}, {"cause", it.cause}};
-              }},
-      fact);
+Json membersOf(const Swept& it) { return Json{{"file", it.file}}; }
+Json membersOf(const Added& it) { return ofAccount(it.account); }
+Json membersOf(const Converted& it) {
+  return ofAccount(
+      it.account,
+      {{"from", it.from}, {"file", it.file}, {"replaces", it.isReplacement}, {"changes", jsonOfChanges(it.changes)}});
 }
-
-// An account that is lost, with its own members beside the code.
-Json jsonOfLoss(const Lost& lost) {
-  Json json = membersOf(lost);
-  json.erase("account");
-  if (lost.account == Name{}) return json;
-  json.update(jsonOfName(lost.account));
+Json membersOf(const Changed& it) { return ofAccount(it.account, {{"changes", jsonOfChanges(it.changes)}}); }
+Json membersOf(const Moved& it) {
+  return ofAccount(it.account, it.into ? Json{{"into", Json::array({jsonOfName(*it.into)})}} : Json::object());
+}
+Json membersOf(const Folded& it) { return ofAccount(it.account, {{"into", jsonOf(it.into)}, {"reason", it.reason}}); }
+Json membersOf(const Lost& it) {
+  const LossMeaning& meaning = meaningOf(it.code);
+  Json json{{"code", meaning.name}, {"reason", meaning.text}};
+  addUnlessEmpty("detail", it.detail, json);
+  if (it.account != Name{}) json["account"] = jsonOfName(it.account);
+  addUnlessEmpty("file", it.file, json);
+  addUnlessEmpty("where", it.where, json);
   return json;
 }
+Json membersOf(const Repeated& it) { return ofAccount(it.account); }
+Json membersOf(const Unrepaired& it) { return ofAccount(it.account, {{"reason", it.reason}}); }
+Json membersOf(const Saved& it) { return Json{{"file", it.file}, {"accounts", it.accounts}, {"version", it.version}}; }
+Json membersOf(const SaveFailed& it) {
+  return Json{{"file", it.file}, {"cause", it.cause}, {"accounts", it.accounts}, {"version", it.version}};
+}
+Json membersOf(const FileRemoved& it) { return Json{{"file", it.file}}; }
+Json membersOf(const FileNotRemoved& it) { return Json{{"file", it.file}, {"cause", it.cause}}; }
 
 }  // namespace
 
@@ -154,7 +114,7 @@ nlohmann::ordered_json jsonOf(const std::vector<Name>& accounts) {
 
 nlohmann::ordered_json jsonOf(const Fact& fact) {
   Json json{{"fact", nameOf(fact)}};
-  json.update(membersOf(fact));
+  json.update(std::visit([](const auto& each) { return membersOf(each); }, fact));
   return json;
 }
 
@@ -163,7 +123,12 @@ void addVerdict(const Verdict& verdict, nlohmann::ordered_json& result) {
   if (verdict.kind == Verdict::Kind::notSaved) result["cause"] = verdict.cause;
   if (verdict.lost.empty()) return;
   result["lost"] = Json::array();
-  for (const Lost& lost : verdict.lost) result["lost"].push_back(jsonOfLoss(lost));
+  for (const Lost& lost : verdict.lost) {
+    Json json = membersOf(lost);
+    json.erase("account");  // its members stand beside the code
+    if (lost.account != Name{}) json.update(jsonOfName(lost.account));
+    result["lost"].push_back(std::move(json));
+  }
 }
 
 }  // namespace host

@@ -8,6 +8,7 @@
 #include <cstdio>
 #include <utility>
 
+#include "host/snapshots/file_state.h"
 #include "platform/linux/files/file_services.h"
 
 namespace host {
@@ -61,46 +62,32 @@ class Family {
   std::string _text;
 };
 
-std::string verdictFamily(const Verdict& verdict) {
-  Family family{"verdict", "stateset", "What the run came to."};
-  for (const auto kind : {Verdict::Kind::kept, Verdict::Kind::lost, Verdict::Kind::notSaved}) {
-    family.add({{family.name(), nameOf(kind)}}, kind == verdict.kind ? 1 : 0);
-  }
-  return family.text();
-}
-
-std::string accountsFamily(const Counts& counts) {
-  Family family{"accounts", "gauge", "How many accounts went which way."};
-  family.add({{"went", "kept"}}, counts.kept).add({{"went", "changed"}}, counts.changed);
-  family.add({{"went", "added"}}, counts.added).add({{"went", "converted"}}, counts.converted);
-  family.add({{"went", "moved"}}, counts.moved).add({{"went", "folded"}}, counts.folded);
-  return family.add({{"went", "dropped"}}, counts.dropped).add({{"went", "lost"}}, counts.lost).text();
-}
-
-// Also those of which there are none, so that whoever watches sees the first one come.
-std::string lossesFamily(const Verdict& verdict) {
-  Family family{"losses", "gauge", "What was lost, by the code of the loss."};
-  for (const records::LossMeaning& meaning : records::kLossMeanings) {
-    const auto count = std::ranges::count(verdict.lost, meaning.code, &records::Lost::code);
-    family.add({{"code", meaning.name}}, static_cast<std::size_t>(count));
-  }
-  return family.text();
-}
-
 }  // namespace
 
 std::string metricsOf(const Explanation& explanation, const Verdict& verdict, const ExplainedRun& run, double endTime) {
   Family about{"", "info", "The run of migration-host that this is about."};
   about.add({{"version", run.version}, {"root", run.root}, {"rehearsal", run.isRehearsal ? "true" : "false"}}, "1",
             "_info");
+  Family verdicts{"verdict", "stateset", "What the run came to."};
+  for (const auto kind : {Verdict::Kind::kept, Verdict::Kind::lost, Verdict::Kind::notSaved}) {
+    verdicts.add({{verdicts.name(), nameOf(kind)}}, kind == verdict.kind ? 1 : 0);
+  }
   Family success{"success", "gauge", "1 where the plug-in answered true."};
   success.add({}, run.success ? 1 : 0);
+  Family accounts{"accounts", "gauge", "How many accounts went which way."};
+  for (const auto& [way, count] : countsOf(explanation, verdict).named()) accounts.add({{"went", way}}, count);
+  // Also those of which there are none, so that whoever watches sees the first one come.
+  Family losses{"losses", "gauge", "What was lost, by the code of the loss."};
+  for (const records::LossMeaning& meaning : records::kLossMeanings) {
+    const auto count = std::ranges::count(verdict.lost, meaning.code, &records::Lost::code);
+    losses.add({{"code", meaning.name}}, static_cast<std::size_t>(count));
+  }
   Family duration{"duration_seconds", "gauge", "How long the run took.", "seconds"};
   duration.add({}, numberOf(run.seconds));
   Family end{"end_time_seconds", "gauge", "When the run ended, since the epoch.", "seconds"};
   end.add({}, numberOf(endTime));
-  return about.text() + verdictFamily(verdict) + success.text() + accountsFamily(countsOf(explanation, verdict)) +
-         lossesFamily(verdict) + duration.text() + end.text() + "# EOF\n";
+  return about.text() + verdicts.text() + success.text() + accounts.text() + losses.text() + duration.text() +
+         end.text() + "# EOF\n";
 }
 
 platform::Status writeMetrics(const std::filesystem::path& file, const std::string& text,
@@ -111,8 +98,7 @@ platform::Status writeMetrics(const std::filesystem::path& file, const std::stri
   attributes.group = ::getegid();
   attributes.permissions = kReadableByAll;
   attributes.modifiedSeconds = std::chrono::duration_cast<std::chrono::seconds>(now).count();
-  return platform::makeFileKeeper(directories)
-      ->restore(file, {reinterpret_cast<const std::uint8_t*>(text.data()), text.size()}, attributes);
+  return platform::makeFileKeeper(directories)->restore(file, snapshots::bytesOf(text), attributes);
 }
 
 }  // namespace host

@@ -141,12 +141,11 @@ class Tally {
   Identifiers _converted;
 };
 
-void follow(const Explanation& explanation, Judge& judge) {
+template <typename Listener>
+void tell(const Explanation& explanation, Listener& listener) {
   explanation.forEachFact(
-      [&judge](const Fact& fact) { std::visit([&judge](const auto& each) { judge.hear(each); }, fact); });
+      [&listener](const Fact& fact) { std::visit([&listener](const auto& each) { listener.hear(each); }, fact); });
 }
-
-bool isDropped(const Lost& lost) { return meaningOf(lost.code).name.starts_with("dropped-"); }
 
 }  // namespace
 
@@ -161,13 +160,13 @@ std::string_view nameOf(Verdict::Kind kind) {
 
 Verdict verdictOf(const Explanation& explanation, std::string_view snapshot) {
   Judge judge{snapshot};
-  follow(explanation, judge);
+  tell(explanation, judge);
   return std::move(judge).verdict();
 }
 
 Losses lossesFrom(const std::string& file, const Explanation& explanation, const Fact& next) {
   Judge judge{{}};
-  follow(explanation, judge);
+  tell(explanation, judge);
   std::visit([&judge](const auto& each) { judge.hear(each); }, next);
   Losses losses = std::move(judge).verdict().lost;
   std::erase_if(losses, [&file](const Lost& lost) { return lost.file != file; });
@@ -176,12 +175,22 @@ Losses lossesFrom(const std::string& file, const Explanation& explanation, const
 
 Counts countsOf(const Explanation& explanation, const Verdict& verdict) {
   Tally tally;
-  explanation.forEachFact(
-      [&tally](const Fact& fact) { std::visit([&tally](const auto& each) { tally.hear(each); }, fact); });
+  tell(explanation, tally);
   Counts counts = tally.counts();
-  counts.dropped = static_cast<std::size_t>(std::ranges::count_if(verdict.lost, &isDropped));
+  for (const Lost& lost : verdict.lost) counts.dropped += meaningOf(lost.code).name.starts_with("dropped-") ? 1U : 0U;
   counts.lost = verdict.lost.size();
   return counts;
+}
+
+std::array<std::pair<std::string_view, std::size_t>, 8> Counts::named() const {
+  return {{{"kept", kept},
+           {"changed", changed},
+           {"added", added},
+           {"converted", converted},
+           {"moved", moved},
+           {"folded", folded},
+           {"dropped", dropped},
+           {"lost", lost}}};
 }
 
 }  // namespace host

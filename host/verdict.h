@@ -1,9 +1,11 @@
 #pragma once
 
+#include <array>
 #include <cstddef>
 #include <cstdint>
 #include <string>
 #include <string_view>
+#include <utility>
 #include <vector>
 
 #include "host/explanation.h"
@@ -40,6 +42,9 @@ struct Counts {
   std::size_t folded = 0;
   std::size_t dropped = 0;  // of the losses, the records that the required rules leave out
   std::size_t lost = 0;     // all losses
+
+  // Each with its name, as people and machines read them, in this order.
+  [[nodiscard]] std::array<std::pair<std::string_view, std::size_t>, 8> named() const;
 };
 
 [[nodiscard]] Counts countsOf(const Explanation& explanation, const Verdict& verdict);
