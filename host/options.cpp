@@ -2,9 +2,11 @@
 
 #include <unistd.h>
 
-#include <array>
+#include <algorithm>
 #include <charconv>
 #include <chrono>
+#include <cstdint>
+#include <iterator>
 #include <string_view>
 #include <vector>
 
@@ -34,11 +36,12 @@ constexpr std::string_view kStatuses =
     "explanation, trace or metrics could not be written.\n";
 
 constexpr std::size_t kUsualColumns = 80;
+constexpr std::size_t kSecondsOfADay = 86400;
 
 // What is taken as it is written, to be looked at when everything is known.
 struct Written {
   std::optional<std::string> explain;
-  std::optional<std::string> dryRun;
+  std::optional<std::string> rehearsal;
   std::optional<std::string> lockTimeout;
   std::optional<std::string> keep;
   std::optional<std::string> listing;
@@ -48,7 +51,7 @@ struct Written {
   bool isVersionAsked = false;
 };
 
-std::vector<commandline::Option> optionsInto(Options& options, Written& written) {
+std::vector<commandline::Option> runOptions(Options& options, Written& written) {
   return {
       {"--root", "DIR", "the root of the device's file tree (default: /)", &options.device.systemRoot},
       {"--home", "DIR", "the mobile user's home directory (default: the process's; under --root, var/mobile in it)",
@@ -61,7 +64,7 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--metrics", "FILE", "replace this file by the run in numbers, as OpenMetrics text", &options.metrics},
       {"--explain", "", "print what the run did to which account; =json for machines, =html as a page for a browser",
        Form{&written.explain, {"text", "json", "html"}}},
-      {"--dry-run", "", "rehearse the run: the device stays as it is", Form{&written.dryRun, {}}},
+      {"--dry-run", "", "rehearse the run: the device stays as it is", Form{&written.rehearsal, {}}},
       {"--serve-rehearsals", "", "in place of a run, rehearse the devices that standard input names, each in a child",
        &options.isServer},
       {"--strict", "", "exit with 7 where accounts were lost", &options.isStrict},
@@ -69,8 +72,12 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
        &options.isCareful},
       {"--refuse-loss", "", "rehearse before the run, and do not run where a loss is foretold", &options.refusesLoss},
       {"--lock-timeout", "SECONDS", "give up where another program holds a lock for longer", &written.lockTimeout},
-      {"--snapshots", "DIR", "before the run, keep copies in DIR of the files that it may change",
-       &options.snapshots.directory},
+  };
+}
+
+std::vector<commandline::Option> snapshotOptions(SnapshotOptions& options, Written& written) {
+  return {
+      {"--snapshots", "DIR", "before the run, keep copies in DIR of the files that it may change", &options.directory},
       {"--keep", "N", "keep the newest N snapshots (default: 5)", &written.keep},
       {"--list-snapshots", "", "in place of a run, list the snapshots in DIR; =json for machines",
        Form{&written.listing, {"json"}}},
@@ -79,22 +86,12 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
       {"--restore", "ID",
        "in place of a run, bring the device back to this snapshot in DIR; an unmistakable beginning will do, or: "
        "latest",
-       &options.snapshots.restore},
+       &options.restore},
       {"--undo", "", "in place of a run, go back to before the last run that changed something",
        Form{&written.undo, {}}},
-      {"--release", "ID", "in place of a run, keep this snapshot no longer than the others",
-       &options.snapshots.release},
-      {"--of", "ID", "with --explain, in place of a run: what the run of this snapshot did",
-       &options.snapshots.explained},
-      {"--help,-h", "", "print this text", &written.isHelpAsked},
-      {"--version", "", "print the version", &written.isVersionAsked},
+      {"--release", "ID", "in place of a run, keep this snapshot no longer than the others", &options.release},
+      {"--of", "ID", "with --explain, in place of a run: what the run of this snapshot did", &options.explained},
   };
-}
-
-std::string help(const std::vector<commandline::Option>& options) {
-  auto page = commandline::pageOn(STDOUT_FILENO);
-  page.columns = page.columns.value_or(kUsualColumns);
-  return std::string{kUsage} + commandline::helpOf(options, page) + std::string{kStatuses};
 }
 
 // The options as they were given; those that the trace tells of otherwise are left out.
@@ -112,40 +109,31 @@ std::vector<std::string> givenIn(std::span<const char* const> arguments) {
   return given;
 }
 
-std::optional<std::size_t> numberIn(const std::string& text) {
+// What the option needs is said where the text is no number from `min` to `max`.
+std::size_t numberIn(const std::string& text, std::size_t min, std::size_t max, const std::string& need) {
   std::size_t number = 0;
   const char* const end = text.data() + text.size();
   const auto [stop, error] = std::from_chars(text.data(), end, number);
-  return error == std::errc{} && stop == end ? std::optional{number} : std::nullopt;
+  if (error == std::errc{} && stop == end && number >= min && number <= max) return number;
+  throw WrongUse{need + ": " + text};
 }
 
-std::size_t countIn(const std::string& text) {
-  const auto count = numberIn(text);
-  if (count && *count > 0) return *count;
-  throw WrongUse{"--keep needs a number of snapshots, at least 1: " + text};
-}
-
-// A rehearsal holds what it looks at together with other rehearsals.
-void settleLocks(const Written& written, Options& options) {
-  constexpr std::size_t kMaxSeconds = 86400;
-  options.device.locks.isShared = options.isRehearsal;
-  if (!written.lockTimeout) return;
-  const auto seconds = numberIn(*written.lockTimeout);
-  if (!seconds || *seconds > kMaxSeconds) {
-    throw WrongUse{"--lock-timeout needs a number of seconds, at most a day: " + *written.lockTimeout};
+// Those of the options that are given.
+std::vector<std::string> givenOf(std::initializer_list<std::pair<const char*, bool>> options) {
+  std::vector<std::string> given;
+  for (const auto& [name, isGiven] : options) {
+    if (isGiven) given.emplace_back(name);
   }
-  options.device.locks.timeLimit = std::chrono::seconds{*seconds};
+  return given;
 }
 
 // What is asked for in place of a run, each by its option.
 std::vector<std::string> insteadOfARun(const SnapshotOptions& snapshots) {
-  std::vector<std::string> asked;
-  if (snapshots.restore) asked.emplace_back("--restore");
-  if (snapshots.isUndo) asked.emplace_back("--undo");
-  if (snapshots.release) asked.emplace_back("--release");
-  if (snapshots.listing != SnapshotOptions::Listing::none) asked.emplace_back("--list-snapshots");
-  if (snapshots.explained) asked.emplace_back("--of");
-  return asked;
+  return givenOf({{"--restore", snapshots.restore.has_value()},
+                  {"--undo", snapshots.isUndo},
+                  {"--release", snapshots.release.has_value()},
+                  {"--list-snapshots", snapshots.listing != SnapshotOptions::Listing::none},
+                  {"--of", snapshots.explained.has_value()}});
 }
 
 void settleSnapshots(const Written& written, SnapshotOptions& snapshots) {
@@ -164,52 +152,49 @@ void settleSnapshots(const Written& written, SnapshotOptions& snapshots) {
   if (written.keep && !instead.empty()) throw WrongUse{"--keep is for a run: only a run removes snapshots"};
   if (written.ifNeeded && !instead.empty()) throw WrongUse{"--if-needed is for a run, and this is none"};
   if (!snapshots.directory->has_filename()) snapshots.directory = snapshots.directory->parent_path();
-  if (written.keep) snapshots.keep = countIn(*written.keep);
-}
-
-// A page is of no use on a terminal, and the run would be over before anybody saw that.
-Explain explainIn(const std::string& form) {
-  if (form == "json") return Explain::json;
-  if (form != "html") return Explain::text;
-  if (::isatty(STDOUT_FILENO) != 0) {
-    throw WrongUse{"--explain=html makes a page for a browser: send it to a file, as in --explain=html > page.html"};
-  }
-  return Explain::html;
+  if (!written.keep) return;
+  snapshots.keep = numberIn(*written.keep, 1, SIZE_MAX, "--keep needs a number of snapshots, at least 1");
 }
 
 // What is done in place of a run is no run to rehearse or to explain, but for what a snapshot has of one.
 void settleRun(const Written& written, Options& options) {
-  const bool isRun = insteadOfARun(options.snapshots).empty();
-  options.isRehearsal = written.dryRun.has_value();
-  if (options.snapshots.explained && !written.explain) throw WrongUse{"--of needs --explain"};
-  if (options.isRehearsal && !isRun) throw WrongUse{"--dry-run is for a run, and this is none"};
-  if (options.metrics && !isRun) throw WrongUse{"--metrics is for a run, and this is none"};
-  if (options.isStrict && !isRun) throw WrongUse{"--strict is for a run, and this is none"};
-  if (options.isCareful && !isRun) throw WrongUse{"--careful is for a run, and this is none"};
-  if (options.refusesLoss && !isRun) throw WrongUse{"--refuse-loss is for a run, and this is none"};
+  options.isRehearsal = written.rehearsal.has_value();
+  const bool isExplained = written.explain.has_value();
+  if (options.snapshots.explained && !isExplained) throw WrongUse{"--of needs --explain"};
+  const std::vector<std::string> ofRun = givenOf({{"--dry-run", options.isRehearsal},
+                                                  {"--metrics", options.metrics.has_value()},
+                                                  {"--strict", options.isStrict},
+                                                  {"--careful", options.isCareful},
+                                                  {"--refuse-loss", options.refusesLoss},
+                                                  {"--explain", isExplained && !options.snapshots.explained}});
+  if (!ofRun.empty() && !insteadOfARun(options.snapshots).empty()) {
+    throw WrongUse{ofRun.front() + " is for a run, and this is none"};
+  }
   if (options.isCareful && !options.snapshots.directory) throw WrongUse{"--careful needs --snapshots"};
-  if (!written.explain) return;
-  if (!isRun && !options.snapshots.explained) throw WrongUse{"--explain is for a run, and this is none"};
-  options.explain = explainIn(*written.explain);
+  if (!isExplained) return;
+  options.explain = *written.explain == "json"   ? Explain::json
+                    : *written.explain == "html" ? Explain::html
+                                                 : Explain::text;
+  if (options.explain == Explain::html && ::isatty(STDOUT_FILENO) != 0) {
+    // A page is of no use there, and the run would be over before anybody saw that.
+    throw WrongUse{"--explain=html makes a page for a browser: send it to a file, as in --explain=html > page.html"};
+  }
 }
 
 // A server's options are those of each of its rehearsals, which have no root of their own and nothing to keep.
 void settleServer(const Written& written, const Options& options) {
-  if (!options.isServer) return;
-  const std::array<std::pair<bool, const char*>, 10> excluded{
-      {{options.device.systemRoot.has_value(), "--root"},
-       {options.device.home.has_value(), "--home"},
-       {options.trace.has_value(), "--trace"},
-       {options.metrics.has_value(), "--metrics"},
-       {written.explain.has_value(), "--explain"},
-       {options.isRehearsal, "--dry-run"},
-       {options.isStrict, "--strict"},
-       {options.isCareful, "--careful"},
-       {options.refusesLoss, "--refuse-loss"},
-       {options.snapshots.directory.has_value(), "--snapshots"}}};
-  for (const auto& [isGiven, name] : excluded) {
-    if (isGiven) throw WrongUse{"--serve-rehearsals and " + std::string{name} + " exclude each other"};
-  }
+  const std::vector<std::string> excluded = givenOf({{"--root", options.device.systemRoot.has_value()},
+                                                     {"--home", options.device.home.has_value()},
+                                                     {"--trace", options.trace.has_value()},
+                                                     {"--metrics", options.metrics.has_value()},
+                                                     {"--explain", written.explain.has_value()},
+                                                     {"--dry-run", options.isRehearsal},
+                                                     {"--strict", options.isStrict},
+                                                     {"--careful", options.isCareful},
+                                                     {"--refuse-loss", options.refusesLoss},
+                                                     {"--snapshots", options.snapshots.directory.has_value()}});
+  if (!options.isServer || excluded.empty()) return;
+  throw WrongUse{"--serve-rehearsals and " + excluded.front() + " exclude each other"};
 }
 
 void requireDirectory(const std::optional<std::filesystem::path>& root) {
@@ -223,16 +208,27 @@ void requireDirectory(const std::optional<std::filesystem::path>& root) {
 std::variant<Options, Answer> parseArguments(std::span<const char* const> arguments) {
   Options options;
   Written written;
-  const auto declared = optionsInto(options, written);
+  std::vector<commandline::Option> declared = runOptions(options, written);
+  std::ranges::move(snapshotOptions(options.snapshots, written), std::back_inserter(declared));
+  declared.push_back({"--help,-h", "", "print this text", &written.isHelpAsked});
+  declared.push_back({"--version", "", "print the version", &written.isVersionAsked});
   const auto words = commandline::readOptions(declared, arguments);
-  if (written.isHelpAsked) return Answer{help(declared)};
+  if (written.isHelpAsked) {
+    auto page = commandline::pageOn(STDOUT_FILENO);
+    page.columns = page.columns.value_or(kUsualColumns);
+    return Answer{std::string{kUsage} + commandline::helpOf(declared, page) + std::string{kStatuses}};
+  }
   if (written.isVersionAsked) return Answer{"migration-host " HOST_VERSION "\n"};
   if (!words.empty()) throw WrongUse{"unexpected argument: " + words.front()};
   options.given = givenIn(arguments);
   settleSnapshots(written, options.snapshots);
   settleRun(written, options);
   settleServer(written, options);
-  settleLocks(written, options);
+  options.device.locks.isShared = options.isRehearsal;  // with other rehearsals
+  if (written.lockTimeout) {
+    options.device.locks.timeLimit = std::chrono::seconds{
+        numberIn(*written.lockTimeout, 0, kSecondsOfADay, "--lock-timeout needs a number of seconds, at most a day")};
+  }
   requireDirectory(options.device.systemRoot);
   return options;
 }
