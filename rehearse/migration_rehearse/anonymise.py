@@ -11,7 +11,7 @@ import tarfile
 import tempfile
 from typing import NamedTuple
 
-from migration_rehearse import host, rehearsal, unpacking
+from migration_rehearse import host, rehearsal, unpacker, unpacking
 from migration_rehearse.faults import Fault
 from migration_rehearse.footprint import DIRECTORIES, FILES, GROUPS, USERS, read_file, resolved, target_of
 from migration_rehearse.replacing import Replacer
@@ -60,7 +60,7 @@ def anonymise(image, key, output, program):
     with tempfile.TemporaryDirectory(prefix="migration-rehearse-", dir=os.path.dirname(os.path.abspath(output))) as scratch:
         replacer = Replacer(key, product_texts(program))
         try:
-            root = image if os.path.isdir(image) else unpacking.unpack(image, _made(scratch, "original"))
+            root = image if os.path.isdir(image) else unpacker.unpack(image, _made(scratch, "original"))
         except Fault as fault:
             raise CannotAnonymise(f"{image}: {fault}") from fault
         pieces = list(pieces_of(root, replacer))

@@ -113,14 +113,19 @@ class _Worker:
         return answers
 
 
-def _work(parent, tasks, telling, taken, place, scratch):
-    """The whole life of a worker, which ends with the program, however that ends. What the keyboard interrupts is the
-    program."""
+def end_with(parent):
+    """This process, which the one of this number has just made, ends with it, however that ends. What the keyboard
+    interrupts is the program."""
     signal.signal(signal.SIGINT, signal.SIG_IGN)
     signal.signal(signal.SIGTERM, signal.SIG_DFL)
     ctypes.CDLL(None).prctl(PR_SET_PDEATHSIG, signal.SIGKILL)
     if os.getppid() != parent:
         os._exit(0)
+
+
+def _work(parent, tasks, telling, taken, place, scratch):
+    """The whole life of a worker."""
+    end_with(parent)
     tempfile.tempdir = scratch or tempfile.tempdir
     with open(telling, "wb") as answers:
         while message := _message_from(tasks):

@@ -12,7 +12,7 @@ import threading
 import zlib
 from typing import NamedTuple
 
-from migration_rehearse import explained, footprint, host, serving, unpacking
+from migration_rehearse import explained, footprint, host, serving, unpacker, unpacking
 from migration_rehearse.faults import Fault
 
 DIRECTORY, ARCHIVE = "directory", "archive"
@@ -123,7 +123,7 @@ def rehearse(task):
     try:
         if task.kind == DIRECTORY:
             return _rehearse_tree(task, os.path.abspath(task.path), task.identifiers)
-        root = unpacking.unpack(task.path, scratch(), task.bounds)
+        root = unpacker.unpack(task.path, scratch(), task.bounds)
         return _rehearse_tree(task, root, footprint.look_at(root).identifiers)
     except Fault as fault:
         return unrehearsed(fault.cause, fault.detail)

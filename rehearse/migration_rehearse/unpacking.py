@@ -1,17 +1,12 @@
 """An archive of a device, unpacked as far as a run reads it, into a directory that is this program's own.
 
-Nothing of an archive is believed. It is read in one pass by a process of its own, under limits; only the files that a
-run reads are written, each under a name that this program chose, and they are put into the device's tree once all
-paths and links are known. Owners are not kept, and modes only as far as the owner keeps his rights.
+Nothing of an archive is believed. It is read in one pass; only the files that a run reads are written, each under a name
+that this program chose, and they are put into the device's tree once all paths and links are known. Owners are not
+kept, and modes only as far as the owner keeps his rights.
 """
 
-import json
 import os
-import resource
-import select
-import signal
 import stat
-import time
 from typing import NamedTuple
 
 from migration_rehearse.faults import Fault
@@ -25,7 +20,7 @@ WANTED_NAMED = {name: [path for path in WANTED if path.endswith("/" + name)] for
 IMPLIED_MODE = 0o755  # of a directory that the archive does not name
 KEPT_ENTRIES = 10_000  # links, directories and files that might matter; a device has a few dozen
 SMALL = 64 << 20  # what any archive may unpack to, whatever its size
-PAGE = os.sysconf("SC_PAGE_SIZE")
+STAGING, DEVICE = "staging", "device"  # below the directory in which archives are unpacked
 
 
 class Bounds(NamedTuple):
@@ -34,14 +29,8 @@ class Bounds(NamedTuple):
     entries: int = 1_000_000
     size: int = 64 << 30  # unpacked bytes, those that are passed over included
     ratio: int = 2_000  # unpacked bytes to those of the archive
-    memory: int = 1 << 30
+    memory: int = 1 << 30  # of the process that reads it
     seconds: float = 600
-
-
-def reader_of_archives():
-    import libarchive  # only who has archives needs it, and it takes long
-
-    return libarchive
 
 
 class Unpacking:
@@ -57,7 +46,8 @@ class Unpacking:
         self.found = {}  # what might matter: path to ("file", staged), ("directory", mode), ("link", target) or a fault
 
     def read(self):
-        libarchive = reader_of_archives()
+        import libarchive  # only who has archives needs it, and it takes long
+
         try:
             with libarchive.file_reader(self.archive, format_name=self._format()) as reader:
                 for entry in reader:
@@ -207,72 +197,11 @@ def _clear(root, places):
             os.chmod(directory, IMPLIED_MODE)
 
 
-def unpack(archive, scratch, bounds=Bounds()):
-    """The root of the device in the archive, unpacked below the directory `scratch`, where nothing is but what was unpacked
-    there before, which goes. Raises Fault. Works in a process of its own, which a damaged archive may crash or let run
-    away."""
-    reader_of_archives()  # here and not there, so that the next process has it, too
-    staging, root = os.path.join(scratch, "staging"), os.path.join(scratch, "device")
-    for directory in (staging, root):
-        os.makedirs(directory, exist_ok=True)
-    told, telling = os.pipe()
-    worker = os.fork()
-    if worker == 0:
-        os.close(told)
-        _work(archive, staging, root, bounds, telling)
-    os.close(telling)
-    fault = _what_became_of(worker, told, bounds.seconds)
-    for left in os.scandir(staging):
-        os.unlink(left)
-    if fault:
-        raise Fault(*fault)
-    return root
-
-
-def _work(archive, staging, root, bounds, telling):
-    """The whole life of the process that unpacks."""
-    fault = None
-    try:
-        _limit(bounds)
-        unpacking = Unpacking(archive, staging, bounds)
-        unpacking.read()
-        tree = Tree(unpacking.found)
-        build(tree.places(tree.root()), root)
-    except Fault as raised:
-        fault = (raised.cause, raised.detail)
-    except MemoryError:
-        fault = ("damaged-archive", "unpacking it takes too much memory")
-    except OSError as failure:
-        fault = ("unpacking-failed", failure.strerror or "")
-    except BaseException as failure:  # this process has nobody to tell but by this answer
-        fault = ("damaged-archive", repr(failure))
-    try:
-        os.write(telling, json.dumps([fault]).encode()[: select.PIPE_BUF])
-    finally:
-        os._exit(0)
-
-
-def _limit(bounds):
-    signal.signal(signal.SIGINT, signal.SIG_IGN)
-    with open("/proc/self/statm", encoding="ascii") as file:
-        mine = int(file.read().split()[0]) * PAGE
-    for what, most in ((resource.RLIMIT_AS, mine + bounds.memory), (resource.RLIMIT_CORE, 0),
-                       (resource.RLIMIT_CPU, int(bounds.seconds) + 1)):
-        hard = resource.getrlimit(what)[1]
-        resource.setrlimit(what, (most, hard) if hard == resource.RLIM_INFINITY or hard > most else (hard, hard))
-
-
-def _what_became_of(worker, told, seconds):
-    """The fault that the worker tells of, or died of; None where it succeeded."""
-    deadline = time.monotonic() + seconds
-    with open(told, "rb", buffering=0) as answers:
-        ready, _, _ = select.select([answers], [], [], max(0, deadline - time.monotonic()))
-        answer = answers.read(select.PIPE_BUF) if ready else None
-    if answer is None:
-        os.kill(worker, signal.SIGKILL)
-    os.waitpid(worker, 0)
-    if answer is None:
-        return ("timeout", "while it was unpacked")
-    if not answer:
-        return ("damaged-archive", "unpacking it crashed")
-    return json.loads(answer)[0]
+def unpack_here(archive, scratch, bounds):
+    """Unpacks it below the directory `scratch`, where nothing is but what was unpacked there before, which goes. Raises Fault,
+    and whatever else a damaged archive brings about."""
+    staging = os.path.join(scratch, STAGING)
+    unpacking = Unpacking(archive, staging, bounds)
+    unpacking.read()
+    tree = Tree(unpacking.found)
+    build(tree.places(tree.root()), os.path.join(scratch, DEVICE))

@@ -1,6 +1,8 @@
 """Archives of devices: in whatever form they come, the same as the directory; whatever is wrong with one is its own row."""
 
 import io
+import os
+import signal
 import subprocess
 import tarfile
 import unittest
@@ -10,7 +12,7 @@ from pathlib import Path
 from device import PREFERENCES, SETTINGS, Device
 from rehearse_case import KEPT, UNFIXABLE, RehearseTest
 
-from migration_rehearse import rehearsal, unpacking
+from migration_rehearse import rehearsal, unpacker
 
 PASSWD, GROUP = "etc/passwd", "etc/group"
 
@@ -102,12 +104,49 @@ class OneAfterAnother(ArchiveTest):
     def test_leave_nothing_but_directories(self):
         scratch = self.scratch / "scratch"
         scratch.mkdir()
-        unpacking.unpack(str(self.archive(*self.files_of(self.legacy_image("full")))), scratch)
-        root = Path(unpacking.unpack(str(self.archive(*self.files_of(self.image("bare")))), scratch))
+        unpacker.unpack(str(self.archive(*self.files_of(self.legacy_image("full")))), scratch)
+        root = Path(unpacker.unpack(str(self.archive(*self.files_of(self.image("bare")))), scratch))
         self.assertEqual(["etc/group", "etc/passwd", SETTINGS],
                          sorted(str(path.relative_to(root)) for path in root.rglob("*") if path.is_file()))
         self.assertFalse((root / "var/mobile/Library/Mail").exists())
         self.assertEqual([], list((scratch / "staging").iterdir()))
+
+
+class TheProcessThatUnpacks(ArchiveTest):
+    def setUp(self):
+        super().setUp()
+        self.whole = self.archive(*self.files_of(self.image("device")), name="whole.tar.gz")
+        self.expected = self.rehearsed(self.whole).document
+
+    def process(self):
+        """Of the last archive; the next is as it would be without it."""
+        number = unpacker._kept.unpacker and unpacker._kept.unpacker._process
+        self.assertEqual(self.expected, self.rehearsed(self.whole).document)
+        return number
+
+    def test_stays_for_the_next_archive(self):
+        self.assertEqual(self.process(), self.process())
+
+    def test_goes_with_an_archive_that_is_damaged(self):
+        (self.scratch / "none").write_bytes(b"nothing of the kind" * 100)
+        self.assertEqual("damaged-archive", self.rehearsed(self.scratch / "none").cause)
+        self.assertIsNone(self.process())
+
+    def test_is_ended_where_it_takes_too_long(self):
+        self.assertEqual("timeout", self.rehearsed(self.whole, seconds=0).cause)
+        self.assertIsNone(self.process())
+
+    def test_is_replaced_where_somebody_kills_it(self):
+        killed = self.process()
+        os.kill(killed, signal.SIGKILL)
+        os.waitid(os.P_PID, killed, os.WEXITED | os.WNOWAIT)
+        self.assertEqual(self.expected, self.rehearsed(self.whole).document)
+        self.assertNotEqual(killed, self.process())
+
+    def test_tells_of_long_names_in_short(self):
+        found = self.rehearsed(self.archive(member("../" + "x" * 9000)))
+        self.assertEqual("path-out", found.cause)
+        self.assertLess(len(found.detail), 1000)
 
 
 class Faults(ArchiveTest):
