@@ -6,6 +6,7 @@
 
 #include "host/say.h"
 #include "host/verdict.h"
+#include "platform/linux/property_lists/libplist_conversion.h"
 #include "platform/platform.h"
 #include "platform/run_observer.h"
 #include "records/fact_observer.h"
@@ -22,16 +23,10 @@ using platform::Result;
 using platform::Status;
 using records::LossCode;
 
-constexpr std::size_t kLargest = std::size_t{256} << 20U;  // no larger property list can be read
 constexpr std::string_view kUnreadable = "unreadable";
 constexpr std::string_view kNewer = "newer";
 constexpr std::string_view kInterrupted = "interrupted";
 constexpr unsigned kDirectoryPermissions = 0755;
-
-Path settingsIn(const platform::MigrationFootprint& footprint) {
-  const auto found = std::ranges::find(footprint.files, MigrationFile::Part::settings, &MigrationFile::part);
-  return found == footprint.files.end() ? Path{} : found->path;
-}
 
 std::string_view whyGone(LossCode code) {
   switch (code) {
@@ -51,11 +46,16 @@ void tellKept(const std::string& file, const Path& where) {
 }
 
 void sayNoRoom(const Path& place, std::string_view why) {
-  say(numbered(place, why, 1).string() + " to " + std::to_string(KeepingFiles::kMost) +
+  say(numbered(place, why, 1).string() + " to " + std::to_string(KeepingFiles::kMaxKept) +
       " are kept already; a further one is not, and goes as the rules require");
 }
 
 }  // namespace
+
+Path settingsIn(const platform::MigrationFootprint& footprint) {
+  const auto found = std::ranges::find(footprint.files, MigrationFile::Part::settings, &MigrationFile::part);
+  return found == footprint.files.end() ? Path{} : found->path;
+}
 
 KeepingFiles::KeepingFiles(std::shared_ptr<platform::FileSystem> files, std::shared_ptr<platform::FileKeeper> keeper,
                            platform::MigrationFootprint footprint, const Explanation& explanation)
@@ -87,10 +87,10 @@ std::string_view KeepingFiles::whyToldUnusable() const {
 // A link that is followed has no attributes that would do for a file.
 Result<FileCopy> KeepingFiles::settings() {
   constexpr std::uint32_t kOwnerOnly = 0600;
-  Result<FileCopy> own = _keeper->read(_settings, kLargest);
+  Result<FileCopy> own = _keeper->read(_settings, platform::kMaxPropertyListSize);
   if (!own.isOk() || own.value().attributes.kind == FileKind::file) return own;
   FileCopy followed = own.take();
-  Result<platform::Bytes> bytes = read(_settings, kLargest);
+  Result<platform::Bytes> bytes = read(_settings, platform::kMaxPropertyListSize);
   if (!bytes.isOk()) return bytes.status();
   followed.bytes = bytes.take();
   followed.attributes.kind = FileKind::file;
@@ -99,7 +99,7 @@ Result<FileCopy> KeepingFiles::settings() {
 }
 
 Result<Path> KeepingFiles::freeName(const Path& place, std::string_view why) {
-  for (int number = 1; number <= kMost; ++number) {
+  for (int number = 1; number <= kMaxKept; ++number) {
     Path name = numbered(place, why, number);
     const Status there = _keeper->attributesOf(name).status();
     if (there.cause() == platform::Cause::missing) return name;
@@ -110,7 +110,7 @@ Result<Path> KeepingFiles::freeName(const Path& place, std::string_view why) {
 
 // A run that could not save finds the same file again: that is kept once.
 Result<Path> KeepingFiles::keptAs(std::string_view why, const FileCopy& settings) {
-  for (int number = 1; number <= kMost; ++number) {
+  for (int number = 1; number <= kMaxKept; ++number) {
     Path name = numbered(_footprint.copyAside, why, number);
     const Result<FileCopy> kept = _keeper->read(name, settings.bytes.size());
     if (kept.isOk() && kept.value().attributes.kind == FileKind::file && kept.value().bytes == settings.bytes)
@@ -154,7 +154,7 @@ Status KeepingFiles::keepCopyOfKilledRun() {
   constexpr std::string_view kMissing =
       "the run before this one was killed while it saved: steps of it may be missing, and are not taken up again";
   const platform::RunStage stage{"before the run"};
-  const Result<FileCopy> copy = _keeper->read(_footprint.copyAside, kLargest);
+  const Result<FileCopy> copy = _keeper->read(_footprint.copyAside, platform::kMaxPropertyListSize);
   if (!copy.isOk()) {
     say(std::string{kMissing});
     return copy.cause() == platform::Cause::missing ? Status{} : copy.status();

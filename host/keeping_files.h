@@ -11,15 +11,18 @@
 
 namespace host {
 
+// The settings among the files that a run may change; empty where the plug-in tells of none.
+[[nodiscard]] platform::Path settingsIn(const platform::MigrationFootprint& footprint);
+
 // The device's files as the plug-in gets them where no snapshot is taken: before a run takes away accounts that stand
 // nowhere else, the file that has them is kept under a name of which no run makes use again. The settings are copied
 // beside the copy that the run makes of them, owner, permissions and time included; a legacy file stays in its
 // directory, under another name. The name ends in why, and a number: `.unreadable-1`, `.newer-1`, `.interrupted-1`,
-// `.unconverted-1`, `.unsaved-1`. Of one file and reason kMost are kept, the first ones; a further one goes as the
+// `.unconverted-1`, `.unsaved-1`. Of one file and reason kMaxKept are kept, the first ones; a further one goes as the
 // rules require, with a line. What cannot be kept does not go: the call fails.
 class KeepingFiles final : public snapshots::ForwardingFiles {
  public:
-  static constexpr int kMost = 9;
+  static constexpr int kMaxKept = 9;
 
   // `explanation` is the run's, as far as it is told; it outlives this object.
   KeepingFiles(std::shared_ptr<platform::FileSystem> files, std::shared_ptr<platform::FileKeeper> keeper,

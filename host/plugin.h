@@ -2,19 +2,16 @@
 
 #include <filesystem>
 #include <memory>
-#include <string>
-#include <variant>
+#include <optional>
 
 #include "platform/data_class_migrator.h"
 #include "platform/platform.h"
 
 namespace host {
 
-// Where the plug-in lies that was built or installed together with this program.
-[[nodiscard]] std::filesystem::path installedPlugin();
-
-// Opens the plug-in and makes its migrator, or says in one line why that cannot be.
-[[nodiscard]] std::variant<std::unique_ptr<platform::DataClassMigrator>, std::string> loadMigrator(
-    const platform::Platform& platform, const std::filesystem::path& plugin);
+// Opens the plug-in (where none is given, the one that was built or installed together with this program) and makes its
+// migrator. The reason of a failure is one line that is a sentence of its own.
+[[nodiscard]] platform::Result<std::unique_ptr<platform::DataClassMigrator>> loadMigrator(
+    const platform::Platform& platform, const std::optional<std::filesystem::path>& given);
 
 }  // namespace host

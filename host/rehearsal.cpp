@@ -97,6 +97,10 @@ void rehearseOn(platform::Platform& platform) {
   platform.propertyLists = platform::makeLibplistPropertyListStore(platform.files);
   if (keptLists) platform.propertyLists = std::make_shared<KeepingPropertyListStore>(platform.propertyLists);
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();
+  silenceNotices(platform);
+}
+
+void silenceNotices(platform::Platform& platform) {
   platform.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
   platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();
 }

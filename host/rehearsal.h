@@ -10,6 +10,9 @@ namespace host {
 // its options say. What modules do by themselves, without the platform's services, is not held back.
 void rehearseOn(platform::Platform& platform);
 
+// The programs that run on this machine hear nothing of what is done on this platform.
+void silenceNotices(platform::Platform& platform);
+
 // Reads the product's own property lists, which are in the platform's resources and the same for every device, once for
 // all platforms that are made to rehearse from now on. Whoever replaces one of them is not heeded then.
 void keepResources(const platform::Platform& platform);

@@ -75,8 +75,8 @@ platform::Result<ForkedRun> answered(const Request& request, const Options& opti
 // What no device has a say in.
 void loadForAll(const Options& options) {
   platform::setCurrent(platform::makeLinuxPlatform(options.device));
-  const auto loaded = loadMigrator(platform::current(), options.plugin.value_or(installedPlugin()));
-  if (const auto* const error = std::get_if<std::string>(&loaded)) throw Ending{ExitStatus::noPlugin, *error};
+  const auto loaded = loadMigrator(platform::current(), options.plugin);
+  if (!loaded.isOk()) throw Ending{ExitStatus::noPlugin, loaded.status().reason()};
   keepResources(platform::current());
 }
 

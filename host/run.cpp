@@ -1,9 +1,7 @@
 #include "host/run.h"
 
 #include <algorithm>
-#include <array>
 #include <chrono>
-#include <ctime>
 #include <memory>
 #include <utility>
 
@@ -26,7 +24,6 @@
 #include "host/trace.h"
 #include "host/verdict.h"
 #include "platform/base_directories.h"
-#include "platform/logs_and_notices.h"
 
 namespace host {
 namespace {
@@ -42,36 +39,19 @@ struct Onlookers {
   std::shared_ptr<RunRecorder> recorder;
 };
 
-// As in 2026-03-07T10:15:00Z.
-std::string universal(Clock::time_point time) {
-  const std::time_t seconds = Clock::to_time_t(time);
-  std::tm utc{};
-  gmtime_r(&seconds, &utc);
-  std::array<char, 32> text{};
-  return {text.data(), std::strftime(text.data(), text.size(), "%Y-%m-%dT%H:%M:%SZ", &utc)};
-}
-
-// The trace that is asked for; null where none is.
-std::shared_ptr<Trace> openTrace(const Options& options) {
-  if (!options.trace) return nullptr;
-  auto opened = Trace::open(*options.trace);
-  if (opened.isOk()) return opened.take();
-  throw Ending{ExitStatus::wrongUse, opened.status().description()};
-}
-
 Onlookers onlookersFor(const Options& options) {
-  Onlookers onlookers{.trace = openTrace(options), .recorder = {}};
+  Onlookers onlookers;
+  if (options.trace) {
+    auto opened = Trace::open(*options.trace);
+    if (!opened.isOk()) throw Ending{ExitStatus::wrongUse, opened.status().description()};
+    onlookers.trace = opened.take();
+  }
   const bool isExplained = options.explain != Explain::notAsked;
   onlookers.recorder = std::make_shared<RunRecorder>(isExplained ? onlookers.trace : nullptr);
   return onlookers;
 }
 
 // A device image is none of the business of the programs that run on this machine.
-void silenceNotices(platform::Platform& platform) {
-  platform.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
-  platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();
-}
-
 platform::Platform platformFor(const Options& options, const Onlookers& onlookers) {
   auto platform = platform::makeLinuxPlatform(options.device);
   if (options.isRehearsal) rehearseOn(platform);
@@ -80,12 +60,6 @@ platform::Platform platformFor(const Options& options, const Onlookers& onlooker
   putConsoleAroundProgress(platform);
   platform.observer = onlookers.recorder;
   return platform;
-}
-
-std::unique_ptr<platform::DataClassMigrator> load(const Options& options) {
-  auto loaded = loadMigrator(platform::current(), options.plugin ? *options.plugin : installedPlugin());
-  if (const auto* const error = std::get_if<std::string>(&loaded)) throw Ending{ExitStatus::noPlugin, *error};
-  return std::get<std::unique_ptr<platform::DataClassMigrator>>(std::move(loaded));
 }
 
 // What is said of a run after it.
@@ -99,44 +73,31 @@ struct Account {
   [[nodiscard]] std::string asJson() const { return jsonDocumentOf(explanation, verdict, run); }
 };
 
-snapshots::RunEnd endOf(const Account& account) {
-  snapshots::RunEnd end{.isMigrated = account.run.success,
-                        .isSaved = account.verdict.kind != Verdict::Kind::notSaved,
-                        .onlyInSnapshot = {},
-                        .explanation = account.asText(),
-                        .explanationAsJson = account.asJson()};
-  for (const records::Lost& lost : account.verdict.lost) end.onlyInSnapshot.push_back(textOf(lost));
-  if (account.verdict.lost.empty()) end.onlyInSnapshot = account.foretold;
-  return end;
-}
-
 // Ends the session of the snapshots, where there is one; what is rolled back is lost no longer.
 void endSession(snapshots::SnapshotSession* session, std::size_t keep, Account& account) {
   if (session == nullptr) return;
-  if (session->end(endOf(account), keep) != snapshots::Ended::rolledBack) return;
+  Verdict& verdict = account.verdict;
+  snapshots::RunEnd end{.isMigrated = account.run.success,
+                        .isSaved = verdict.kind != Verdict::Kind::notSaved,
+                        .onlyInSnapshot = {},
+                        .explanation = account.asText(),
+                        .explanationAsJson = account.asJson()};
+  for (const records::Lost& lost : verdict.lost) end.onlyInSnapshot.push_back(textOf(lost));
+  if (verdict.lost.empty()) end.onlyInSnapshot = account.foretold;
+  if (session->end(end, keep) != snapshots::Ended::rolledBack) return;
   say("the accounts could not be saved; the device is as it was before the run");
-  account.verdict.lost.clear();
+  verdict.lost.clear();
 }
 
 // On the console, without a word where everything was kept. What a snapshot is kept for, its session says.
 void sayVerdict(const Verdict& verdict, bool hasSnapshot) {
-  constexpr std::size_t kMost = 40;
+  constexpr std::size_t kMaxWarnings = 40;
   if (hasSnapshot && verdict.kind == Verdict::Kind::lost) return;
   const std::vector<std::string> warnings = warningsOf(verdict);
-  for (std::size_t place = 0; place < std::min(warnings.size(), kMost); ++place) say(warnings[place]);
-  if (warnings.size() > kMost) {
-    say("and " + std::to_string(warnings.size() - kMost) + " more losses, which --explain and --trace name");
+  for (std::size_t place = 0; place < std::min(warnings.size(), kMaxWarnings); ++place) say(warnings[place]);
+  if (warnings.size() > kMaxWarnings) {
+    say("and " + std::to_string(warnings.size() - kMaxWarnings) + " more losses, which --explain and --trace name");
   }
-}
-
-// The accounts that stand in the settings file now; where it cannot be read, none.
-std::vector<records::Name> presentAccounts(const platform::MigrationFootprint& footprint) {
-  std::vector<records::Name> accounts;
-  for (const platform::MigrationFile& file : footprint.files) {
-    if (file.part != platform::MigrationFile::Part::settings) continue;
-    accounts = accountsIn(platform::current().propertyLists->readDictionary(file.path).valueOr({}));
-  }
-  return accounts;
 }
 
 std::string explanationOf(Explain how, const Account& account, const platform::MigrationFootprint& footprint) {
@@ -144,39 +105,35 @@ std::string explanationOf(Explain how, const Account& account, const platform::M
     case Explain::notAsked: return {};
     case Explain::text: return account.asText();
     case Explain::json: return account.asJson();
-    case Explain::html: return pageOf(account.asJson(), presentAccounts(footprint));
+    case Explain::html: break;
   }
-  return {};
-}
-
-bool explain(Explain how, const Account& account, const platform::MigrationFootprint& footprint) {
-  if (how == Explain::notAsked) return true;
-  const bool isPrinted = commandline::print(explanationOf(how, account, footprint));
-  if (!isPrinted) say("the explanation could not be written to standard output");
-  return isPrinted;
-}
-
-bool endTrace(Trace& trace, const Account& account) {
-  trace.result(account.run.dataClass, account.run.success, account.verdict);
-  const platform::Status& traced = trace.outcome();
-  if (!traced.isOk()) say("the trace is incomplete: not every event could be written: " + traced.reason());
-  return traced.isOk();
-}
-
-bool measure(const std::filesystem::path& file, const Account& account) {
-  const std::string text =
-      metricsOf(account.explanation, account.verdict, account.run, secondsOf(Clock::now().time_since_epoch()));
-  const platform::Status written = writeMetrics(file, text, *platform::current().directories);
-  if (!written.isOk()) say("the metrics could not be written: " + written.description());
-  return written.isOk();
+  const auto settings = platform::current().propertyLists->readDictionary(settingsIn(footprint));
+  return pageOf(account.asJson(), accountsIn(settings.valueOr({})));
 }
 
 // Tells of the run in every way that is asked for. Answers whether all of it was written.
 bool tell(const Options& options, const Onlookers& onlookers, const Account& account,
           const platform::MigrationFootprint& footprint) {
-  const bool isTraced = !onlookers.trace || endTrace(*onlookers.trace, account);
-  const bool isMeasured = !options.metrics || measure(*options.metrics, account);
-  return explain(options.explain, account, footprint) && isTraced && isMeasured;
+  bool isTold = true;
+  const auto miss = [&isTold](const std::string& what) {
+    say(what);
+    isTold = false;
+  };
+  if (onlookers.trace) {
+    onlookers.trace->result(account.run.dataClass, account.run.success, account.verdict);
+    const platform::Status& traced = onlookers.trace->outcome();
+    if (!traced.isOk()) miss("the trace is incomplete: not every event could be written: " + traced.reason());
+  }
+  if (options.metrics) {
+    const std::string text =
+        metricsOf(account.explanation, account.verdict, account.run, secondsOf(Clock::now().time_since_epoch()));
+    const platform::Status written = writeMetrics(*options.metrics, text, *platform::current().directories);
+    if (!written.isOk()) miss("the metrics could not be written: " + written.description());
+  }
+  if (options.explain != Explain::notAsked && !commandline::print(explanationOf(options.explain, account, footprint))) {
+    miss("the explanation could not be written to standard output");
+  }
+  return isTold;
 }
 
 ExitStatus statusOf(const Account& account, bool isStrict) {
@@ -189,14 +146,6 @@ ExitStatus statusOf(const Account& account, bool isStrict) {
   return ExitStatus::notMigrated;
 }
 
-// To the plug-in such a file counts as missing: what is in it would be gone.
-void refusePlanted(const platform::Path& file, const platform::Status& read) {
-  if (read.cause() != platform::Cause::unsafe) return;
-  throw Ending{ExitStatus::refused,
-               file.string() + " may have been planted (" + read.reason() +
-                   "); put the file itself there, with no second name, and run again; the device was not touched"};
-}
-
 // Reads the files that the run will work on. Answers how many version steps it has ahead, as its progress needs them.
 std::size_t stepsAhead(const platform::MigrationFootprint& footprint) {
   using Part = platform::MigrationFile::Part;
@@ -204,7 +153,12 @@ std::size_t stepsAhead(const platform::MigrationFootprint& footprint) {
   for (const platform::MigrationFile& file : footprint.files) {
     if (file.part == Part::other) continue;
     const auto read = platform::current().propertyLists->readDictionary(file.path);
-    refusePlanted(file.path, read.status());
+    if (read.status().cause() == platform::Cause::unsafe) {
+      // To the plug-in such a file counts as missing: what is in it would be gone.
+      throw Ending{ExitStatus::refused,
+                   file.path.string() + " may have been planted (" + read.status().reason() +
+                       "); put the file itself there, with no second name, and run again; the device was not touched"};
+    }
     if (file.part == Part::legacy && read.isOk()) stored = std::min<std::int64_t>(stored, 0);
     if (file.part != Part::settings || !read.isOk()) continue;
     const auto* const version = read.value().find(footprint.versionKey);
@@ -259,20 +213,16 @@ std::unique_ptr<snapshots::SnapshotSession> prepare(const platform::DataClassMig
   return session;
 }
 
-std::vector<std::string> foretoldOf(const platform::DataClassMigrator& migrator, const Options& options) {
-  const bool isAsked = (options.isCareful || options.refusesLoss) && !options.isRehearsal;
-  return isAsked ? foretell(options, migrator.footprint().lockName) : std::vector<std::string>{};
-}
-
 ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options, const Onlookers& onlookers) {
   const Clock::time_point start = Clock::now();
   ExplainedRun run{.dataClass = migrator.dataClassName(),
                    .isRehearsal = options.isRehearsal,
                    .version = HOST_VERSION,
                    .root = platform::current().directories->systemRoot(),
-                   .time = universal(start)};
+                   .time = snapshots::universalTime(start)};
   if (onlookers.trace) onlookers.trace->start(run.version, run.root, options.given, run.time);
-  const auto foretold = foretoldOf(migrator, options);
+  const bool isForetold = (options.isCareful || options.refusesLoss) && !options.isRehearsal;
+  const auto foretold = isForetold ? foretell(options, migrator.footprint().lockName) : std::vector<std::string>{};
   RunMark mark{storageFor(options)};
   const auto session = prepare(migrator, options, *onlookers.recorder, mark, start);
   run.success = migrator.performMigration();
@@ -290,30 +240,29 @@ ExitStatus perform(platform::DataClassMigrator& migrator, const Options& options
   return status == ExitStatus::migrated && !isTold ? ExitStatus::untold : status;
 }
 
-// A plug-in that cannot be loaded is the run's to tell.
-bool isNeeded(const Options& options) {
-  platform::setCurrent(platform::makeLinuxPlatform(options.device));
-  const auto loaded = loadMigrator(platform::current(), options.plugin ? *options.plugin : installedPlugin());
-  const auto* const migrator = std::get_if<std::unique_ptr<platform::DataClassMigrator>>(&loaded);
-  return migrator == nullptr || isRunNeeded(options.snapshots, **migrator);
-}
-
 }  // namespace
 
 ExitStatus run(const Options& options) {
-  if (options.snapshots.isIfNeeded && !isNeeded(options)) return ExitStatus::migrated;
+  if (options.snapshots.isIfNeeded) {
+    platform::setCurrent(platform::makeLinuxPlatform(options.device));
+    const auto plugin = loadMigrator(platform::current(), options.plugin);  // its failure is the run's to tell
+    if (plugin.isOk() && !isRunNeeded(options.snapshots, *plugin.value())) return ExitStatus::migrated;
+  }
   const Onlookers onlookers = onlookersFor(options);
   platform::setCurrent(platformFor(options, onlookers));
   if (isToBePrinted(options.snapshots)) {
     return printFromSnapshots(options.snapshots, options.explain) ? ExitStatus::migrated : ExitStatus::untold;
   }
-  const auto migrator = load(options);  // first, so that nothing is touched where there is none
+  // First, so that nothing is touched where there is none.
+  const auto plugin = loadMigrator(platform::current(), options.plugin);
+  if (!plugin.isOk()) throw Ending{ExitStatus::noPlugin, plugin.status().reason()};
+  platform::DataClassMigrator& migrator = *plugin.value();
   if (isToBeChanged(options.snapshots)) {
-    changeBySnapshots(options, *migrator);
+    changeBySnapshots(options, migrator);
     return ExitStatus::migrated;
   }
   if (options.isRehearsal) say("this is a rehearsal: nothing on the device is changed");
-  return perform(*migrator, options, onlookers);
+  return perform(migrator, options, onlookers);
 }
 
 }  // namespace host
