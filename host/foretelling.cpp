@@ -29,29 +29,22 @@ void waitForOthers(platform::LinuxPlatformOptions device, const std::string& loc
 
 std::string memberOf(const Json& object, const char* name) { return object.value(name, std::string{}); }
 
-std::string reasonOf(const Json& lost) {
-  const std::string type = memberOf(lost, "type");
-  const std::string identifier = memberOf(lost, "identifier");
-  std::string subject = type.empty() && identifier.empty() ? memberOf(lost, "file") : type;
-  if (!identifier.empty()) subject += (subject.empty() ? "account (" : " (") + identifier + ")";
-  return "a rehearsal foretold a loss: " + subject + " [" + memberOf(lost, "code") + "]";
-}
-
 Reasons reasonsIn(const std::string& explanation) try {
   const Json result = Json::parse(explanation).at("result");
   Reasons reasons;
   if (memberOf(result, "verdict") == "not saved") {
     reasons.push_back("a rehearsal foretold that the accounts are not saved: " + memberOf(result, "cause"));
   }
-  for (const Json& lost : result.value("lost", Json::array())) reasons.push_back(reasonOf(lost));
+  for (const Json& lost : result.value("lost", Json::array())) {
+    const std::string type = memberOf(lost, "type");
+    const std::string identifier = memberOf(lost, "identifier");
+    std::string subject = type.empty() && identifier.empty() ? memberOf(lost, "file") : type;
+    if (!identifier.empty()) subject += (subject.empty() ? "account (" : " (") + identifier + ")";
+    reasons.push_back("a rehearsal foretold a loss: " + subject + " [" + memberOf(lost, "code") + "]");
+  }
   return reasons;
 } catch (const Json::exception&) {
   return {"the rehearsal ended without an explanation"};
-}
-
-bool isRefused(int status) {
-  return status == static_cast<int>(ExitStatus::refused) || status == static_cast<int>(ExitStatus::noSnapshot) ||
-         status == static_cast<int>(ExitStatus::wrongUse);
 }
 
 Reasons reasonsOf(const ForkedRun& rehearsal) {
@@ -59,24 +52,24 @@ Reasons reasonsOf(const ForkedRun& rehearsal) {
   if (rehearsal.stopped == Stopped::timeout) return {"the rehearsal did not end in time"};
   if (rehearsal.stopped == Stopped::tooMuchOutput) return {"the rehearsal told more than can be heard"};
   if (rehearsal.status < 0) return {"the rehearsal was ended by signal " + std::to_string(-rehearsal.status)};
-  return isRefused(rehearsal.status) ? Reasons{} : reasonsIn(rehearsal.output);
-}
-
-Reasons rehearse(const Options& options) {
-  const auto work = [&] {
-    return commandline::runProgram(kProgram, {}, static_cast<int>(ExitStatus::notMigrated),
-                                   [&](auto) { return static_cast<int>(run(rehearsalOf(options))); });
-  };
-  const platform::Result<ForkedRun> rehearsal = runForked(work, kLimits);
-  return rehearsal.isOk() ? reasonsOf(rehearsal.value())
-                          : Reasons{"there was no rehearsal: " + rehearsal.status().description()};
+  switch (static_cast<ExitStatus>(rehearsal.status)) {
+    case ExitStatus::wrongUse:
+    case ExitStatus::noSnapshot:
+    case ExitStatus::refused: return {};  // the run says it
+    default: return reasonsIn(rehearsal.output);
+  }
 }
 
 }  // namespace
 
 std::vector<std::string> foretell(const Options& options, const std::string& lockName) {
   waitForOthers(options.device, lockName);
-  Reasons reasons = rehearse(options);
+  const auto rehearse = [&options](auto) { return static_cast<int>(run(rehearsalOf(options))); };
+  const platform::Result<ForkedRun> rehearsal = runForked(
+      [&] { return commandline::runProgram(kProgram, {}, static_cast<int>(ExitStatus::notMigrated), rehearse); },
+      kLimits);
+  Reasons reasons = rehearsal.isOk() ? reasonsOf(rehearsal.value())
+                                     : Reasons{"there was no rehearsal: " + rehearsal.status().description()};
   for (const std::string& reason : reasons) say(reason);
   if (reasons.empty() || !options.refusesLoss) return reasons;
   throw Ending{ExitStatus::accountsLost, "the run is refused, since something may be lost; the device was not touched"};

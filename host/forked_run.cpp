@@ -50,12 +50,6 @@ void limit(__rlimit_resource resource, rlim_t most) {
   static_cast<void>(::setrlimit(resource, &both));
 }
 
-void keepLimits(const RunLimits& limits) {
-  limit(RLIMIT_CORE, 0);
-  if (limits.seconds) limit(RLIMIT_CPU, static_cast<rlim_t>(*limits.seconds) + 1);
-  if (limits.memory) limit(RLIMIT_AS, *limits.memory);
-}
-
 [[noreturn]] void workAsChild(pid_t parent, const std::function<int()>& work, const RunLimits& limits, int output,
                               int errors) {
   ::prctl(PR_SET_PDEATHSIG, SIGKILL, 0, 0, 0);
@@ -66,7 +60,9 @@ void keepLimits(const RunLimits& limits) {
       ::dup2(errors, STDERR_FILENO) < 0 || ::close_range(STDERR_FILENO + 1, UINT_MAX, 0) != 0) {
     std::_Exit(EXIT_FAILURE);
   }
-  keepLimits(limits);
+  limit(RLIMIT_CORE, 0);
+  if (limits.seconds) limit(RLIMIT_CPU, static_cast<rlim_t>(*limits.seconds) + 1);
+  if (limits.memory) limit(RLIMIT_AS, *limits.memory);
   std::exit(work());
 }
 

@@ -8,14 +8,6 @@
 
 namespace {
 
-// Neither a core file nor another process of the same user gets at the passwords in memory. The search for leaks of a
-// sanitizer has to.
-void hideMemory() {
-#ifndef __SANITIZE_ADDRESS__
-  ::prctl(PR_SET_DUMPABLE, 0, 0, 0, 0);
-#endif
-}
-
 host::ExitStatus obey(std::span<const char* const> arguments) {
   const auto asked = host::parseArguments(arguments);
   if (const auto* const options = std::get_if<host::Options>(&asked)) {
@@ -28,7 +20,11 @@ host::ExitStatus obey(std::span<const char* const> arguments) {
 }  // namespace
 
 int main(int count, char** arguments) {
-  hideMemory();
+#ifndef __SANITIZE_ADDRESS__
+  // Neither a core file nor another process of the same user gets at the passwords in memory. The search for leaks of a
+  // sanitizer has to.
+  ::prctl(PR_SET_DUMPABLE, 0, 0, 0, 0);
+#endif
   return commandline::runProgram(host::kProgram, {arguments, static_cast<std::size_t>(count)},
                                  static_cast<int>(host::ExitStatus::notMigrated),
                                  [](auto given) { return static_cast<int>(obey(given)); });

@@ -17,15 +17,16 @@ namespace {
 
 using Event = nlohmann::ordered_json;
 
-// 0, or the number of the error; a part of a line is no line.
-int writeLine(int descriptor, const std::string& line) {
-  constexpr int attempts = 100;
-  for (int attempt = 0; attempt < attempts; ++attempt) {
+// A part of a line is no line.
+platform::Status writeLine(int descriptor, const std::string& line) {
+  constexpr int kMaxAttempts = 100;
+  int cause = EINTR;
+  for (int attempt = 0; attempt < kMaxAttempts && cause == EINTR; ++attempt) {
     const auto written = ::write(descriptor, line.data(), line.size());
-    if (written >= 0) return static_cast<std::size_t>(written) == line.size() ? 0 : ENOSPC;
-    if (errno != EINTR) return errno;
+    if (written == static_cast<ssize_t>(line.size())) return {};
+    cause = written < 0 ? errno : ENOSPC;
   }
-  return EINTR;
+  return platform::Status::failure(cause, "write an event");
 }
 
 // How many runs begin in a file; what is no file is no older than this run.
@@ -101,18 +102,15 @@ platform::Result<std::shared_ptr<Trace>> Trace::open(const std::filesystem::path
 
 Trace::Trace(platform::Descriptor file) : _file{std::move(file)}, _run{runsIn(_file.number()) + 1} {}
 
-void Trace::lose(int cause) noexcept {
-  if (_outcome.isOk()) _outcome = platform::Status::failure(cause, "write an event");
-}
-
 template <typename MakeEvent>
 void Trace::append(const MakeEvent& makeEvent) noexcept {
   try {
     const Event event = makeEvent();
-    const int failed = writeLine(_file.number(), event.dump(-1, ' ', false, Event::error_handler_t::replace) + '\n');
-    if (failed != 0) lose(failed);
+    const std::string line = event.dump(-1, ' ', false, Event::error_handler_t::replace) + '\n';
+    platform::Status written = writeLine(_file.number(), line);
+    if (_outcome.isOk()) _outcome = std::move(written);
   } catch (...) {
-    lose(ENOMEM);
+    if (_outcome.isOk()) _outcome = platform::Status::failure(ENOMEM, "write an event");
   }
 }
 

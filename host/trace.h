@@ -47,7 +47,6 @@ class Trace {
 
  private:
   explicit Trace(platform::Descriptor file);
-  void lose(int cause) noexcept;
   template <typename MakeEvent>
   void append(const MakeEvent& makeEvent) noexcept;
 
