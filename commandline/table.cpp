@@ -14,20 +14,9 @@ namespace {
 using Widths = std::vector<std::size_t>;
 
 constexpr std::size_t kGap = 2;
-constexpr std::size_t kNarrowestCell = 8;  // what a column keeps of its cells on the narrowest page
-constexpr std::size_t kNarrowestMeaning = 20;
+constexpr std::size_t kMinCell = 8;  // what a column keeps of its cells on the narrowest page
+constexpr std::size_t kMinMeaning = 20;
 constexpr std::size_t kUnlimited = std::numeric_limits<std::size_t>::max();
-
-Widths widestCells(const std::vector<Row>& rows) {
-  Widths widths;
-  for (const Row& row : rows) {
-    widths.resize(std::max(widths.size(), row.cells.size()));
-    for (std::size_t column = 0; column < row.cells.size(); ++column) {
-      widths[column] = std::max(widths[column], columnsOf(row.cells[column]));
-    }
-  }
-  return widths;
-}
 
 // The widest columns give way, one column of the page at a time.
 Widths fittedTo(Widths widths, const Page& page) {
@@ -35,7 +24,7 @@ Widths fittedTo(Widths widths, const Page& page) {
   const std::size_t gaps = kGap * (widths.size() - 1);
   while (std::accumulate(widths.begin(), widths.end(), gaps) > *page.columns) {
     const auto widest = std::ranges::max_element(widths);
-    if (*widest <= kNarrowestCell) break;
+    if (*widest <= kMinCell) break;
     --*widest;
   }
   return widths;
@@ -62,7 +51,14 @@ std::string emphasised(std::string_view text, Emphasis emphasis, const Page& pag
 std::string table(const std::vector<Row>& rows, const Page& page) {
   std::vector<Row> shown = rows;
   for (Row& row : shown) std::ranges::transform(row.cells, row.cells.begin(), printable);
-  const Widths widths = fittedTo(widestCells(shown), page);
+  Widths widths;
+  for (const Row& row : shown) {
+    widths.resize(std::max(widths.size(), row.cells.size()));
+    for (std::size_t column = 0; column < row.cells.size(); ++column) {
+      widths[column] = std::max(widths[column], columnsOf(row.cells[column]));
+    }
+  }
+  widths = fittedTo(std::move(widths), page);
   std::string lines;
   for (const Row& row : shown) lines += emphasised(lineOf(row, widths), row.emphasis, page) + "\n";
   return lines;
@@ -71,7 +67,7 @@ std::string table(const std::vector<Row>& rows, const Page& page) {
 std::string meanings(const std::vector<Meaning>& list, const Page& page) {
   std::size_t indent = 0;
   for (const Meaning& each : list) indent = std::max(indent, columnsOf(each.term) + 2 * kGap);
-  const std::size_t left = page.columns ? std::max(*page.columns, indent + kNarrowestMeaning) - indent : kUnlimited;
+  const std::size_t left = page.columns ? std::max(*page.columns, indent + kMinMeaning) - indent : kUnlimited;
   std::vector<Row> rows;
   for (const Meaning& each : list) {
     std::string term = each.term;

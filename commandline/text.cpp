@@ -48,15 +48,6 @@ class Measure {
   std::size_t _columns = 0;
 };
 
-// The character at the place, and how many bytes it has. Printable text has nothing else than characters.
-Code characterAt(std::string_view text, std::size_t place, std::size_t& length) {
-  Code code = 0;
-  const auto* const bytes = reinterpret_cast<const utf8proc_uint8_t*>(text.data()) + place;
-  const auto taken = ::utf8proc_iterate(bytes, static_cast<utf8proc_ssize_t>(text.size() - place), &code);
-  length = taken > 0 ? static_cast<std::size_t>(taken) : 1;
-  return code;
-}
-
 std::vector<Cluster> clustersOf(std::string_view text) {
   std::vector<Cluster> clusters;
   Measure measure;
@@ -65,7 +56,11 @@ std::vector<Cluster> clustersOf(std::string_view text) {
   std::size_t begin = 0;
   std::size_t length = 0;
   for (std::size_t place = 0; place < text.size(); place += length) {
-    const Code code = characterAt(text, place, length);
+    Code code = 0;
+    const std::string_view rest = text.substr(place);
+    const auto taken = ::utf8proc_iterate(reinterpret_cast<const utf8proc_uint8_t*>(rest.data()),
+                                          static_cast<utf8proc_ssize_t>(rest.size()), &code);
+    length = taken > 0 ? static_cast<std::size_t>(taken) : 1;  // printable text has nothing else than characters
     if (place > 0 && ::utf8proc_grapheme_break_stateful(before, code, &state)) {
       clusters.push_back({text.substr(begin, place - begin), measure.columns()});
       begin = place;
