@@ -17,11 +17,8 @@ constexpr StringConstant kGooglePrincipalPath{"/calendar/dav/%@/user"};
 constexpr StringConstant kYahooPrincipalPath{"/principals/users/%@"};
 
 // Reserved and unreserved characters of RFC 2396, without "@", "?" and "/", which a path's segment must not hold.
-bool isLegalInSegment(char character) {
-  constexpr std::string_view kLegalMarks = "-_.!~*'();:&=+$,";
-  return (character >= 'a' && character <= 'z') || (character >= 'A' && character <= 'Z') ||
-         (character >= '0' && character <= '9') || kLegalMarks.find(character) != std::string_view::npos;
-}
+constexpr std::string_view kLegalInSegment =
+    "abcdefghijklmnopqrstuvwxyzABCDEFGHIJKLMNOPQRSTUVWXYZ0123456789-_.!~*'();:&=+$,";
 
 bool contains(const std::vector<std::string>& texts, const Text* text) {
   return text != nullptr && std::ranges::find(texts, text->view()) != texts.end();
@@ -34,7 +31,7 @@ std::string AccountsDataMigrator::_urlSafeUsername(std::string_view username) {
   std::string escaped;
   for (const char character : username) {
     const auto byte = static_cast<unsigned char>(character);
-    if (isLegalInSegment(character)) {
+    if (kLegalInSegment.find(character) != std::string_view::npos) {
       escaped += character;
     } else {
       escaped.append({'%', kDigits[byte >> 4U], kDigits[byte & 0xFU]});

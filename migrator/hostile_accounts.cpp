@@ -26,21 +26,17 @@ constexpr std::size_t kLevelsAbove = 2;
 constexpr std::size_t kLevelsAdded = 2;
 constexpr std::size_t kValuesAdded = 64;
 
-// By which the steps will know the account.
-Text identifierOf(const BasicAccount& account) {
-  const Text* const uniqueId = account.properties().text(kUniqueIdKey);
-  if (uniqueId != nullptr && !uniqueId->empty()) return *uniqueId;
-  return account.identifier().value_or(Text{});
-}
-
-std::size_t mostOfOneIdentifier(const AccountsManager& store) {
+// Of accounts that the steps will know by one and the same identifier.
+std::size_t maxOfOneIdentifier(const AccountsManager& store) {
   std::map<std::string, std::size_t> counts;
-  std::size_t most = 0;
+  std::size_t max = 0;
   for (const auto& account : store.allBasicAccounts()) {
-    const Text identifier = identifierOf(*account);
-    if (!identifier.empty()) most = std::max(most, ++counts[identifier.string()]);
+    const Text* const uniqueId = account->properties().text(kUniqueIdKey);
+    const bool isUnique = uniqueId != nullptr && !uniqueId->empty();
+    const Text identifier = isUnique ? *uniqueId : account->identifier().value_or(Text{});
+    if (!identifier.empty()) max = std::max(max, ++counts[identifier.string()]);
   }
-  return most;
+  return max;
 }
 
 std::size_t sizeOf(const BasicAccount& account, std::string_view key) {
@@ -101,7 +97,7 @@ void refuseAbove(std::size_t limit, std::size_t count, std::string_view what) {
 }
 
 void refuseHostileAccounts(const AccountsManager& store) {
-  refuseAbove(kMaxOfOneIdentifier, mostOfOneIdentifier(store), "accounts of one identifier");
+  refuseAbove(kMaxOfOneIdentifier, maxOfOneIdentifier(store), "accounts of one identifier");
   refuseAbove(kMaxInherited, inheritedDataclasses(store), "data classes in lists that children inherit");
   const Extent extent = around(store.allBasicAccounts(), [](const AccountsManager::Account& account) {
     Extent own = extentOf(account->properties());

@@ -38,15 +38,6 @@ bool prepareReportDirectory(const Path& directory) {
   return false;
 }
 
-// A binary property list, whatever its ".txt" says. Nobody hears of a report that cannot be written.
-void writeReport(const Path& directory, const Dictionary& report) {
-  const platform::Platform& services = platform::current();
-  const std::string time = services.clock->currentLocalTime(kReportTimePattern).valueOr({});
-  const std::string name = records::message("AccountMigrationInformation-%@.txt", {time});
-  const auto serialized = services.propertyLists->serialize(report);
-  if (serialized.data != nullptr) std::ignore = services.files->replace(directory / name, *serialized.data);
-}
-
 }  // namespace
 
 Path AccountsDataMigrator::copyAsidePath() {
@@ -90,7 +81,13 @@ void AccountsDataMigrator::_saveCollatedMigrationInformation() {
   const Path directory =
       platform::current().directories->home() / accountsettings::kCrashReporterDirectory / "AccountMigration";
   // The directory is made also for a run that migrated nothing and so has nothing to report.
-  if (prepareReportDirectory(directory) && _collatedMigrationData) writeReport(directory, *_collatedMigrationData);
+  if (!prepareReportDirectory(directory) || !_collatedMigrationData) return;
+  // A binary property list, whatever its ".txt" says. Nobody hears of a report that cannot be written.
+  const platform::Platform& services = platform::current();
+  const std::string time = services.clock->currentLocalTime(kReportTimePattern).valueOr({});
+  const std::string name = records::message("AccountMigrationInformation-%@.txt", {time});
+  const auto serialized = services.propertyLists->serialize(*_collatedMigrationData);
+  if (serialized.data != nullptr) std::ignore = services.files->replace(directory / name, *serialized.data);
 }
 
 }  // namespace migrator

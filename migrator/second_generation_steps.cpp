@@ -60,18 +60,6 @@ Dictionary parentPropertiesFor(const BasicAccount& mail) {
   return parent;
 }
 
-void wrapInParent(AccountsManager& store, const Account& mail) {
-  const Account parent = BasicAccount::initWithProperties(parentPropertiesFor(*mail));
-  if (parent == nullptr) return;  // the device knows no cloud accounts, so there is nothing to move to
-  for (const StringConstant key : kMovedKeys) mail->removeAccountPropertyForKey(key);
-  // Here, unlike in the other steps, an account must say that it is active: a new parent offers mail only if told to.
-  const bool isActive = booleanForKey(*mail, kIsActiveKey).value_or(false);
-  if (isActive) parent->setEnabled_forDataclass(true, kAccountDataclassMail);
-  store.replaceAccount_withAccount(mail, parent);
-  mail->setParentAccount(parent);
-  store.addChild_toAccount(mail, parent);
-}
-
 // --- Children of cloud accounts, and mail ---
 
 // Takes the display name of a child that is hosted mail away: it is its parent's to say.
@@ -112,8 +100,17 @@ bool AccountsDataMigrator::_migrateAccountsFrom8A293(AccountsManager& store) {
 // No release ever stamped 7 or 8: this step and the next leave the version at 6.
 bool AccountsDataMigrator::_migrateAccountsFrom8B117(AccountsManager& store) {
   const Accounts snapshot = store.allBasicAccounts();
-  for (const Account& account : snapshot) {
-    if (isHostedMail(*account)) wrapInParent(store, account);
+  for (const Account& mail : snapshot) {
+    if (!isHostedMail(*mail)) continue;
+    const Account parent = BasicAccount::initWithProperties(parentPropertiesFor(*mail));
+    if (parent == nullptr) continue;  // the device knows no cloud accounts, so there is nothing to move to
+    for (const StringConstant key : kMovedKeys) mail->removeAccountPropertyForKey(key);
+    // Here, unlike in the other steps, an account must say that it is active: a new parent offers mail only if told to.
+    const bool isActive = booleanForKey(*mail, kIsActiveKey).value_or(false);
+    if (isActive) parent->setEnabled_forDataclass(true, kAccountDataclassMail);
+    store.replaceAccount_withAccount(mail, parent);
+    mail->setParentAccount(parent);
+    store.addChild_toAccount(mail, parent);
   }
   store.saveAllAccounts();
   return true;

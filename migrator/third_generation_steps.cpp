@@ -80,20 +80,6 @@ bool settleCloudAccount(BasicAccount& account) {
   return isToBePrimary;
 }
 
-// --- Provisioning ---
-
-void letProvisioningFollowChildren(BasicAccount& account) {
-  if (hostedServiceStatus(account) == kSeparateStatus &&
-      AccountsDataMigrator::_account_hasChildAccountOfType(account, kNimbraAccountType)) {
-    writeToConsole("AccountsDataMigrator: Found Nimbra mail as Cirrant child account, setting status to 1");
-    revertToStandardStatus(account);
-  }
-  AccountsDataMigrator::_enableProvisioningForDataClass_toAccount_ifChildAccountExistsOfType(
-      kAccountDataclassMail, account, kNimbraAccountType);
-  AccountsDataMigrator::_enableProvisioningForDataClass_toAccount_ifChildAccountExistsOfType(
-      kAccountDataclassCalendars, account, kCalDAVAccountType);
-}
-
 }  // namespace
 
 bool AccountsDataMigrator::_migrateAccountsFrom9A182(AccountsManager& store) {
@@ -124,7 +110,17 @@ bool AccountsDataMigrator::_migrateAccountsFrom9A334(AccountsManager& store) {
       account->setEnabled_forDataclass(false, kAccountDataclassQuorvel);
       account->setEnabled_forDataclass(false, kAccountDataclassKeyValue);
     }
-    if (isCloudAccount(*account)) letProvisioningFollowChildren(*account);
+    if (!isCloudAccount(*account)) continue;
+    // Provisioning follows the children.
+    if (hostedServiceStatus(*account) == kSeparateStatus &&
+        _account_hasChildAccountOfType(*account, kNimbraAccountType)) {
+      writeToConsole("AccountsDataMigrator: Found Nimbra mail as Cirrant child account, setting status to 1");
+      revertToStandardStatus(*account);
+    }
+    _enableProvisioningForDataClass_toAccount_ifChildAccountExistsOfType(kAccountDataclassMail, *account,
+                                                                         kNimbraAccountType);
+    _enableProvisioningForDataClass_toAccount_ifChildAccountExistsOfType(kAccountDataclassCalendars, *account,
+                                                                         kCalDAVAccountType);
   }
   store.setDataVersion(11);
   store.saveAllAccounts();
