@@ -24,11 +24,6 @@ constexpr const char* kSave = "-[AccountsManager saveAllAccounts]";
 
 using SaveStage = SaveOutcome::Stage;
 
-std::optional<std::int64_t> versionIn(const Dictionary& file) {
-  const PropertyValue* const version = file.find(kPlistVersionKey);
-  return version == nullptr ? std::nullopt : version->integerValue();
-}
-
 WhyLeftOut faultOf(const PropertyValue& element) {
   const Dictionary* const properties = element.asDictionary();
   if (properties == nullptr) return WhyLeftOut::noRecord;
@@ -59,17 +54,12 @@ SerializedPropertyList serialized(const Dictionary& root) {
   return list;
 }
 
-Status giveToOwner(FileSystem& files, const Path& path) {
-  Status status = files.setOwner(path, kSettingsOwner, kSettingsOwner);
-  if (!status.isOk()) {
-    _ASLogSystem().log(kSave, "Could not set attributes on the temporary account settings plist. %@",
-                       status.description());
-  }
-  return status;
-}
-
 SaveOutcome moveOntoSettingsFile(FileSystem& files, const Path& temporary) {
-  if (Status given = giveToOwner(files, temporary); !given.isOk()) return {SaveStage::givingAway, std::move(given)};
+  if (Status given = files.setOwner(temporary, kSettingsOwner, kSettingsOwner); !given.isOk()) {
+    _ASLogSystem().log(kSave, "Could not set attributes on the temporary account settings plist. %@",
+                       given.description());
+    return {SaveStage::givingAway, std::move(given)};
+  }
   Status moved = files.rename(temporary, AccountsManager::fullPathToAccountSettingsPlist());
   return {moved.isOk() ? SaveStage::saved : SaveStage::replacing, std::move(moved)};
 }
@@ -123,7 +113,9 @@ std::shared_ptr<AccountsManager> AccountsManager::loadedFromFile(std::unique_ptr
   std::shared_ptr<AccountsManager> store = loaded(file.array(kPlistAccountsKey), std::move(tracker));
   store->_loadOutcome.isFromFile = true;
   store->_loadOutcome.reading = read.status();
-  store->_loadOutcome.storedVersion = versionIn(file);
+  if (const PropertyValue* const version = file.find(kPlistVersionKey)) {
+    store->_loadOutcome.storedVersion = version->integerValue();
+  }
   store->setDataVersion(static_cast<std::uint64_t>(store->_loadOutcome.storedVersion.value_or(0)));
   if (store->_tracker) store->_tracker->loadedAll(store->_orderedTopLevelAccounts, store->_loadOutcome);
   return store;

@@ -33,15 +33,6 @@ template <typename... Arguments>
                 {records::MessageArgument{arguments}...});
 }
 
-const Array& creatorEntries(std::optional<std::string_view> type) {
-  const Dictionary* const table = BasicAccount::_accountCreationMap();
-  const Array* const entries = table == nullptr || !type ? nullptr : table->array(*type);
-  if (entries == nullptr) {
-    failLookup("Malformed AccountCreators information. Could not find the information for the type %@", type);
-  }
-  return *entries;
-}
-
 template <typename Found>
 const Found& required(const Found* found, std::string_view whatIsMissing, const Search& search) {
   if (found == nullptr) failLookup(whatIsMissing, search.creatorType, search.type);
@@ -88,10 +79,15 @@ RefreshQueueObject::~RefreshQueueObject() = default;
 
 std::optional<std::string> BasicAccount::_creatorClassNameForAccountType_creatorType_loader(
     std::optional<std::string_view> type, std::string_view creatorType, const AccountClassInfo* loader) const {
+  const Dictionary* const table = _accountCreationMap();
+  const Array* const entries = table == nullptr || !type ? nullptr : table->array(*type);
+  if (entries == nullptr) {
+    failLookup("Malformed AccountCreators information. Could not find the information for the type %@", type);
+  }
   const Search search{type, creatorType};
   std::optional<std::string> className;
   // Every matching entry's module is opened; the last one's class counts.
-  for (const PropertyValue& entry : creatorEntries(type)) {
+  for (const PropertyValue& entry : *entries) {
     const Dictionary* const creator = entry.asDictionary();
     const Text* const kind = creator == nullptr ? nullptr : creator->text("Type");
     if (kind == nullptr || *kind != creatorType) continue;
