@@ -6,6 +6,7 @@
 #include <cerrno>
 #include <memory>
 #include <string>
+#include <utility>
 #include <vector>
 
 namespace platform {
@@ -39,19 +40,23 @@ Descriptor openDirectory(const Descriptor& parent, const std::string& name, int 
   return Descriptor{::openat(parent.number(), name.c_str(), flags)};
 }
 
-// Removes all that is no directory up to the first directory, and answers that one's name: empty where none is left.
-std::optional<std::string> clearUpToDirectory(const Descriptor& directory) {
-  const Stream stream = streamOf(directory);
-  if (!stream) return std::nullopt;
+// Removes all that is no directory up to the first directory, and names that one: empty where none is left.
+bool clearUpToDirectory(const Descriptor& holder, std::string& directory) {
+  const Stream stream = streamOf(holder);
+  if (!stream) return false;
+  directory.clear();
   errno = 0;
   while (const dirent* const entry = ::readdir(stream.get())) {
-    const std::string name = static_cast<const char*>(entry->d_name);
+    std::string name = static_cast<const char*>(entry->d_name);
     if (!isEntryName(name)) continue;
-    if (isDirectoryAt(directory.number(), name.c_str())) return name;
-    if (::unlinkat(directory.number(), name.c_str(), 0) != 0 && errno != ENOENT) return std::nullopt;
+    if (isDirectoryAt(holder.number(), name.c_str())) {
+      directory = std::move(name);
+      return true;
+    }
+    if (::unlinkat(holder.number(), name.c_str(), 0) != 0 && errno != ENOENT) return false;
     errno = 0;
   }
-  return errno == 0 ? std::optional{std::string{}} : std::nullopt;
+  return errno == 0;
 }
 
 class Walk {
@@ -71,16 +76,13 @@ class Walk {
 
   // Empties the directories from the current one up to the first that was entered.
   bool run() {
-    while (true) {
-      const std::optional<std::string> directory = clearUpToDirectory(_current);
-      if (!directory) return false;
-      if (!directory->empty()) {
-        if (!enter(_current, *directory)) return false;
-        continue;
-      }
-      if (_levels.size() == 1) return true;
-      if (!leave()) return false;
+    std::string directory;
+    while (clearUpToDirectory(_current, directory)) {
+      if (directory.empty() && _levels.size() == 1) return true;
+      const bool isOnItsWay = directory.empty() ? leave() : enter(_current, directory);
+      if (!isOnItsWay) return false;
     }
+    return false;
   }
 
  private:
