@@ -3,7 +3,6 @@
 #include <cmath>
 #include <nlohmann/json.hpp>
 
-#include "accountsettings/device_local_account.h"
 #include "platform/characters.h"
 #include "records/description.h"
 
@@ -18,12 +17,7 @@ using Json = nlohmann::ordered_json;
 constexpr std::string_view kDataclassPrefix = "com.vorlix.Dataclass.";
 constexpr const char* kHidden = "<hidden>";
 
-Json jsonOf(const std::optional<Text>& text) { return text ? Json(text->string()) : Json(nullptr); }
-
-bool isDeviceLocal(const BasicAccount& account) {
-  const auto type = account.type();
-  return type && *type == accountsettings::kOnMyDeviceAccountType;
-}
+bool isDeviceLocal(const Account& account) { return account.type() == accountsettings::kOnMyDeviceAccountType; }
 
 Json numberOf(const PropertyValue& value) {
   const auto integer = value.asInteger();
@@ -42,30 +36,15 @@ std::string fullDataclass(std::string_view name) {
   return std::string{name.starts_with(kDataclassPrefix) ? std::string_view{} : kDataclassPrefix} + std::string{name};
 }
 
-BasicAccount::Dataclasses enabledOf(const BasicAccount& account) {
-  return account.enabledDataclasses().value_or(BasicAccount::Dataclasses{});
-}
-
-std::string joinedDataclasses(const BasicAccount::Dataclasses& dataclasses) {
+std::string joinedDataclasses(const Dataclasses& dataclasses) {
   std::string joined;
-  for (const Text& dataclass : dataclasses) joined += (joined.empty() ? "" : ", ") + shortDataclass(dataclass);
+  for (const std::string& dataclass : dataclasses) joined += (joined.empty() ? "" : ", ") + shortDataclass(dataclass);
   return joined;
-}
-
-std::string nameOf(const BasicAccount& account) {
-  if (isDeviceLocal(account)) return accountsettings::DeviceLocalAccount::class_typeString();
-  return account.displayName().value_or(Text{}).string();
 }
 
 std::string textUnder(const Dictionary& properties, std::string_view key) {
   const Text* const text = properties.text(key);
   return text == nullptr ? std::string{} : text->string();
-}
-
-std::string ownText(const BasicAccount& account, std::string_view key) { return textUnder(account.properties(), key); }
-
-std::string ownName(const BasicAccount& account) {
-  return isDeviceLocal(account) ? nameOf(account) : ownText(account, accountsettings::kAccountDisplayName);
 }
 
 Names namesOf(const Dictionary& properties) {
@@ -74,11 +53,11 @@ Names namesOf(const Dictionary& properties) {
           textUnder(properties, accountsettings::kAccountUsername), textUnder(properties, kAccountHost)};
 }
 
-Names namesOf(const BasicAccount& account) {
-  Names names = namesOf(account.properties());
-  names.identifier = account.identifier().value_or(Text{}).string();
-  names.name = ownName(account);
-  return names;
+Names namesOf(const Account& account) {
+  const auto own = [&account](std::string_view key) { return account.ownText(key).value_or(""); };
+  return {account.identifier(),
+          isDeviceLocal(account) ? account.displayName().value_or("") : own(accountsettings::kAccountDisplayName),
+          own(accountsettings::kAccountUsername), own(kAccountHost)};
 }
 
 std::string serviceOf(const Dictionary& properties) {
@@ -99,14 +78,6 @@ bool Names::areMeantBy(const std::string& word) const {
 std::string Names::described() const {
   if (identifier.empty()) return name.empty() ? "an account without a name" : name;
   return identifier + (name.empty() ? "" : " (" + name + ")");
-}
-
-ChildrenByParent childrenByParent(const AccountsManager& accounts) {
-  ChildrenByParent children;
-  for (const auto& account : accounts.allBasicSyncableAccounts()) {
-    if (const auto& parent = account->parentAccount()) children[parent.get()].push_back(account);
-  }
-  return children;
 }
 
 Json jsonOf(const PropertyValue& value) {
@@ -137,24 +108,18 @@ Json jsonOf(const Dictionary& properties) {
   return members;
 }
 
-Json jsonOf(const BasicAccount::Dataclasses& dataclasses) {
-  auto elements = Json::array();
-  for (const Text& dataclass : dataclasses) elements.push_back(dataclass.string());
-  return elements;
-}
-
-Json jsonOf(const BasicAccount& account) {
-  const auto enabled = account.enabledDataclasses();
+Json jsonOf(const Account& account) {
   const auto orNull = [](const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); };
-  return {{"identifier", jsonOf(account.identifier())},
-          {"type", jsonOf(account.type())},
-          {"class", jsonOf(account.accountClass())},
-          {"name", orNull(nameOf(account))},
-          {"user", orNull(ownText(account, accountsettings::kAccountUsername))},
-          {"host", orNull(ownText(account, kAccountHost))},
-          {"parent", jsonOf(account.parentAccountIdentifier())},
-          {"enabled", enabled ? jsonOf(*enabled) : Json(nullptr)},
-          {"supported", jsonOf(account.supportedDataclasses())}};
+  const Names names = namesOf(account);
+  return {{"identifier", orNull(names.identifier)},
+          {"type", orNull(account.type())},
+          {"class", orNull(account.accountClass())},
+          {"name", orNull(account.displayName().value_or(""))},
+          {"user", orNull(names.user)},
+          {"host", orNull(names.host)},
+          {"parent", orNull(account.parentIdentifier())},
+          {"enabled", account.listsDataclasses() ? Json(account.enabledDataclasses()) : Json(nullptr)},
+          {"supported", account.supportedDataclasses()}};
 }
 
 std::string lineOf(const PropertyValue& value, std::string_view key) {

@@ -2,7 +2,6 @@
 
 #include <nlohmann/json_fwd.hpp>
 #include <string>
-#include <unordered_map>
 #include <vector>
 
 #include "tools/session.h"
@@ -12,20 +11,13 @@ namespace tools {
 // A data class as people write it ("Mail"), and back. The long form stands for itself.
 [[nodiscard]] std::string shortDataclass(std::string_view dataclass);
 [[nodiscard]] std::string fullDataclass(std::string_view name);
-// The data classes that are switched on; none where the account has no list of them.
-[[nodiscard]] BasicAccount::Dataclasses enabledOf(const BasicAccount& account);
 // "Mail, Notes".
-[[nodiscard]] std::string joinedDataclasses(const BasicAccount::Dataclasses& dataclasses);
+[[nodiscard]] std::string joinedDataclasses(const Dataclasses& dataclasses);
 
 // The key under which accounts of most types have the name of their server.
 constexpr std::string_view kAccountHost = "Hostname";
 
-// What people call the account; empty where it has no name.
-[[nodiscard]] std::string nameOf(const BasicAccount& account);
-// A text of the account's own, not of its parent; empty where it has none. The second is its name, as nameOf has it.
-[[nodiscard]] std::string ownText(const BasicAccount& account, std::string_view key);
-[[nodiscard]] std::string ownName(const BasicAccount& account);
-// What a person may mean an account by; whatever it does not have is empty.
+// What a person may mean an account by; whatever it does not have itself is empty.
 struct Names {
   std::string identifier;
   std::string name;
@@ -37,7 +29,7 @@ struct Names {
   // "M1 (Home)", for messages.
   [[nodiscard]] std::string described() const;
 };
-[[nodiscard]] Names namesOf(const BasicAccount& account);
+[[nodiscard]] Names namesOf(const Account& account);
 [[nodiscard]] Names namesOf(const accountsettings::Dictionary& properties);
 // A text among the properties; empty where there is none.
 [[nodiscard]] std::string textUnder(const accountsettings::Dictionary& properties, std::string_view key);
@@ -46,16 +38,11 @@ struct Names {
 // its name. Empty where there is no user name.
 [[nodiscard]] std::string serviceOf(const accountsettings::Dictionary& properties);
 
-// The indexed children of all top-level accounts by their parent, each parent's in order.
-using ChildrenByParent = std::unordered_map<const BasicAccount*, std::vector<Account>>;
-[[nodiscard]] ChildrenByParent childrenByParent(const AccountsManager& accounts);
-
 // Values and accounts for machines. No credential is in them, only that it is there, and of data only its size.
 [[nodiscard]] nlohmann::ordered_json jsonOf(const accountsettings::PropertyValue& value);
 [[nodiscard]] nlohmann::ordered_json jsonOf(const accountsettings::Dictionary& properties);
 // The well-known values of one account, without its properties.
-[[nodiscard]] nlohmann::ordered_json jsonOf(const BasicAccount& account);
-[[nodiscard]] nlohmann::ordered_json jsonOf(const BasicAccount::Dataclasses& dataclasses);
+[[nodiscard]] nlohmann::ordered_json jsonOf(const Account& account);
 
 // The value under a key for people, on one line, held back in the same way.
 [[nodiscard]] std::string lineOf(const accountsettings::PropertyValue& value, std::string_view key);

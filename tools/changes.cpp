@@ -7,14 +7,15 @@
 #include "tools/commands.h"
 #include "tools/key_value.h"
 #include "tools/next_load.h"
+#include "tools/values.h"
 
 namespace tools {
 namespace {
 
+using accounts::Edit;
 using accountsettings::Dictionary;
 using accountsettings::Text;
 using Json = nlohmann::ordered_json;
-using Dataclasses = BasicAccount::Dataclasses;
 
 [[noreturn]] void refuseUse(const std::string& message) { throw Failure{ExitStatus::wrongUse, message}; }
 
@@ -27,48 +28,59 @@ std::string printedChange(const Options& options, Json report, const std::string
   return options.changesNothing ? "would " + rehearsed + "\n" : line;
 }
 
-std::string printedChange(const Options& options, const BasicAccount& account, const std::string& rehearsed) {
-  return printedChange(options, {{"account", jsonOf(account)}}, "", rehearsed);
+// The steps change the one account, which is answered as it is then.
+template <typename Steps>
+Account changed(Session& session, const Account& account, const Dataclasses& concerned, const Steps& steps) {
+  const std::string identifier = account.identifier();
+  if (identifier.empty())
+    throw Failure{ExitStatus::failed, "the account has no identifier by which it could be changed"};
+  std::optional<Account> after;
+  session.change({{account, concerned}}, [&](Edit& edit) {
+    steps(edit, identifier);
+    after = edit.account(identifier);
+  });
+  return after.value_or(account);
+}
+
+std::vector<std::string> textsOf(const BasicAccount::Dataclasses& dataclasses) {
+  std::vector<std::string> texts;
+  for (const Text& each : dataclasses) texts.push_back(each.string());
+  return texts;
 }
 
 // The data class of those that the name means, in short or in full, in whatever case; null where it is none of them.
-const Text* dataclassNamed(const std::string& name, const Dataclasses& dataclasses) {
+const std::string* dataclassNamed(const std::string& name, const Dataclasses& dataclasses) {
   const std::string meant = platform::caseFolded(fullDataclass(name));
-  const auto found = std::ranges::find_if(dataclasses, [&](const Text& each) {
+  const auto found = std::ranges::find_if(dataclasses, [&](const std::string& each) {
     return platform::caseFolded(each) == meant || platform::caseFolded(each) == platform::caseFolded(name);
   });
   return found == dataclasses.end() ? nullptr : &*found;
 }
 
-std::string hintForDataclass(const std::string& name, const Dataclasses& dataclasses) {
-  std::vector<std::string> names;
-  for (const Text& each : dataclasses) names.push_back(shortDataclass(each));
-  return commandline::hintFor(shortDataclass(name), names);
-}
-
 // The data class that the name means for the account.
-Text supportedDataclass(const BasicAccount& account, const std::string& name) {
-  const auto& supported = account.supportedDataclasses();
-  if (const Text* const found = dataclassNamed(name, supported)) return *found;
-  const Text* const known = dataclassNamed(name, BasicAccount::allSupportedDataclasses());
-  if (known == nullptr) {
-    throw Failure{ExitStatus::wrongUse, "unknown data class: " + name, hintForDataclass(name, supported)};
+std::string supportedDataclass(const Account& account, const std::string& name) {
+  const Dataclasses supported = account.supportedDataclasses();
+  if (const auto* const found = dataclassNamed(name, supported)) return *found;
+  const Dataclasses all = textsOf(BasicAccount::allSupportedDataclasses());
+  const auto* const known = dataclassNamed(name, all);
+  if (known != nullptr) {
+    refuseUse("accounts of the type " + account.type() + " do not support " + shortDataclass(*known));
   }
-  refuseUse("accounts of the type " + account.type().value_or(Text{}).string() + " do not support " +
-            shortDataclass(*known));
+  std::vector<std::string> names;
+  for (const std::string& each : supported) names.push_back(shortDataclass(each));
+  throw Failure{ExitStatus::wrongUse, "unknown data class: " + name, commandline::hintFor(shortDataclass(name), names)};
 }
 
-std::string switchDataclass(Session& session, const Words& arguments, const Options& options, bool enabled) {
+Outcome switchDataclass(Session& session, const Words& arguments, const Options& options, bool enabled) {
   session.beginChanges();
-  const auto account = session.accountMeantBy(arguments[0]);
-  const auto dataclass = supportedDataclass(*account, arguments[1]);
-  session.changeAndSave({{account, {dataclass}}}, [&] {
-    account->setEnabled_forDataclass(enabled, dataclass);
-    Session::keepChanges(account);
+  const Account account = session.accountMeantBy(arguments[0]);
+  const auto dataclass = supportedDataclass(account, arguments[1]);
+  const auto after = changed(session, account, {dataclass}, [&](Edit& edit, const std::string& identifier) {
+    required(edit.setEnabled(identifier, dataclass, enabled));
   });
   return printedChange(
-      options, *account,
-      (enabled ? "enable " : "disable ") + shortDataclass(dataclass) + " of " + namesOf(*account).described());
+      options, {{"account", jsonOf(after)}}, "",
+      (enabled ? "enable " : "disable ") + shortDataclass(dataclass) + " of " + namesOf(account).described());
 }
 
 // Refuses a record that would not last, or only as another one.
@@ -94,54 +106,38 @@ void setProperty(Dictionary& properties, const KeyValue& property, std::size_t p
   properties.set(property.key, *property.value);
 }
 
-Account newAccount(const Words& arguments) {
+Dictionary newRecord(const Words& arguments) {
   auto properties = typeAndClass(arguments[0], arguments[1]);
   for (std::size_t index = 2; index < arguments.size(); ++index) {
     setProperty(properties, parseKeyValue(arguments[index], index - 1), index - 1);
   }
   requireLasting(properties);
-  return BasicAccount::initWithProperties(properties);
+  return properties;
 }
 
 // The properties that an account may be given afterwards are all but those that say which account it is.
-void change(BasicAccount& account, const KeyValue& property, std::size_t position) {
-  if (property.key == accountsettings::kAccountIdentifier || property.key == accountsettings::kAccountChildAccounts) {
-    refuseUse("property " + std::to_string(position) + " sets " + property.key + ", which stays as it is");
+std::vector<KeyValue> givenProperties(const Words& arguments) {
+  std::vector<KeyValue> given;
+  for (std::size_t index = 1; index < arguments.size(); ++index) {
+    const KeyValue& property = given.emplace_back(parseKeyValue(arguments[index], index));
+    if (property.key == accountsettings::kAccountIdentifier || property.key == accountsettings::kAccountChildAccounts) {
+      refuseUse("property " + std::to_string(index) + " sets " + property.key + ", which stays as it is");
+    }
   }
-  account._forcedSetAccountProperty_forKey(property.value, property.key);
+  return given;
 }
 
-// A child's record lasts as a part of its parent's.
-Dictionary recordOf(const BasicAccount& account) {
-  const auto& parent = account.parentAccount();
-  if (parent == nullptr) return account.properties();
-  Dictionary record = parent->properties();
-  record.set(accountsettings::kAccountChildAccounts, accountsettings::Array{account.properties()});
-  return record;
+// The account with the properties; a child's record lasts as a part of its parent's.
+Dictionary recordWith(const std::vector<KeyValue>& given, const Account& account, Session& session) {
+  Dictionary record = recordOf(account);
+  for (const auto& [key, value] : given) value ? record.set(key, *value) : static_cast<void>(record.remove(key));
+  if (!account.isChild()) return record;
+  Dictionary parent = recordOf(session.accounts().withIdentifier(account.parentIdentifier()).value_or(account));
+  parent.set(accountsettings::kAccountChildAccounts, accountsettings::Array{std::move(record)});
+  return parent;
 }
 
-bool isDevicesOwn(const BasicAccount& account) {
-  const auto type = account.type();
-  return type && *type == accountsettings::kOnMyDeviceAccountType;
-}
-
-bool isRegistered(Session& session, const BasicAccount& account) {
-  const auto identifier = account.identifier();
-  return std::ranges::any_of(session.accounts().allBasicSyncableAccounts(),
-                             [&](const Account& each) { return each->identifier() == identifier; });
-}
-
-void removeEveryRecord(AccountsManager& accounts, const Account& account) {
-  if (const auto parent = account->parentAccount()) {
-    accounts.removeChildWithIdentifier_fromAccount(account->identifier().value_or(Text{}), parent);
-    return;
-  }
-  // The store takes out one record at a time, and several may have the identifier.
-  for (auto before = accounts.count() + 1; accounts.count() < before;) {
-    before = accounts.count();
-    accounts.deleteAccount(account);
-  }
-}
+bool isDevicesOwn(const Account& account) { return account.type() == accountsettings::kOnMyDeviceAccountType; }
 
 }  // namespace
 
@@ -156,56 +152,58 @@ Outcome disableDataclass(Session& session, const Words& arguments, const Options
 Outcome renameAccount(Session& session, const Words& arguments, const Options& options) {
   if (arguments[1].empty()) refuseUse("an account's name cannot be empty");
   session.beginChanges();
-  const auto account = session.accountMeantBy(arguments[0]);
-  if (isDevicesOwn(*account)) refuseUse("the device's own account has a fixed name");
-  const auto before = namesOf(*account).described();
-  session.changeAndSave({{account, enabledOf(*account)}}, [&] {
-    account->setDisplayName(arguments[1]);
-    Session::keepChanges(account);
+  const Account account = session.accountMeantBy(arguments[0]);
+  if (isDevicesOwn(account)) refuseUse("the device's own account has a fixed name");
+  const auto enabled = account.enabledDataclasses();
+  const auto after = changed(session, account, enabled, [&](Edit& edit, const std::string& identifier) {
+    required(edit.set(identifier, accountsettings::kAccountDisplayName, arguments[1]));
   });
-  return printedChange(options, *account, "rename " + before + " to " + arguments[1]);
+  return printedChange(options, {{"account", jsonOf(after)}}, "",
+                       "rename " + namesOf(account).described() + " to " + arguments[1]);
 }
 
 Outcome setProperties(Session& session, const Words& arguments, const Options& options) {
   session.beginChanges();
-  const auto account = session.accountMeantBy(arguments[0]);
-  const auto dataclasses = enabledOf(*account);
-  const Dictionary before = account->properties();
-  for (std::size_t index = 1; index < arguments.size(); ++index) {
-    change(*account, parseKeyValue(arguments[index], index), index);
-  }
-  requireLasting(recordOf(*account));
-  const Dictionary after = std::exchange(account->properties(), before);
-  session.changeAndSave({{account, dataclasses}}, [&] {
-    account->properties() = after;
-    Session::keepChanges(account);
+  const Account account = session.accountMeantBy(arguments[0]);
+  const auto given = givenProperties(arguments);
+  requireLasting(recordWith(given, account, session));
+  const auto enabled = account.enabledDataclasses();
+  const auto after = changed(session, account, enabled, [&](Edit& edit, const std::string& identifier) {
+    for (const auto& [key, value] : given) {
+      required(value ? edit.set(identifier, key, valueOf(*value)) : edit.erase(identifier, key));
+    }
   });
-  return printedChange(options, *account, "change " + namesOf(*account).described());
+  return printedChange(options, {{"account", jsonOf(after)}}, "", "change " + namesOf(account).described());
 }
 
 Outcome addAccount(Session& session, const Words& arguments, const Options& options) {
   session.beginChanges();
-  const auto account = newAccount(arguments);
-  const auto identifier = account->identifier().value_or(Text{}).string();
-  if (isRegistered(session, *account)) refuseUse("there is an account with the identifier " + identifier);
-  session.changeAndSave({{account, enabledOf(*account)}}, [&] { session.accounts().insertAccount(account); });
-  return printedChange(options, {{"account", jsonOf(*account)}}, identifier + "\n",
+  static_cast<void>(session.accounts());  // which may be none that this release may change
+  std::optional<Account> account;
+  session.tryOut([&](Edit& edit) { account = required(edit.add({"", "", entriesOf(newRecord(arguments)), ""})); });
+  session.change({{*account, account->enabledDataclasses()}}, [&](Edit& edit) {
+    account = required(edit.add({"", "", account->ownProperties(), ""}));
+  });
+  return printedChange(options, {{"account", jsonOf(*account)}}, account->identifier() + "\n",
                        "add " + namesOf(*account).described());
 }
 
 Outcome removeAccount(Session& session, const Words& arguments, const Options& options) {
   session.beginChanges();
-  const auto account = session.accountMeantBy(arguments[0]);
-  if (isDevicesOwn(*account)) refuseUse("the device's own account cannot be removed");
-  session.changeAndSave({{account, enabledOf(*account)}}, [&] { removeEveryRecord(session.accounts(), account); });
-  return printedChange(options, {{"removed", jsonOf(*account)["identifier"]}}, "",
-                       "remove " + namesOf(*account).described());
+  const Account account = session.accountMeantBy(arguments[0]);
+  if (isDevicesOwn(account)) refuseUse("the device's own account cannot be removed");
+  changed(session, account, account.enabledDataclasses(),
+          [](Edit& edit, const std::string& identifier) { required(edit.remove(identifier)); });
+  return printedChange(options, {{"removed", account.identifier()}}, "", "remove " + namesOf(account).described());
 }
 
 Outcome saveAccounts(Session& session, const Words&, const Options& options) {
   session.beginChanges();
-  session.save();
-  const auto count = session.accounts().count();
+  std::size_t count = 0;
+  session.change({}, [&count](Edit& edit) {
+    edit.rewrite();
+    count = edit.accounts().size();
+  });
   return printedChange(options, {{"saved", count}}, "", "save " + std::to_string(count) + " accounts");
 }
 

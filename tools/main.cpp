@@ -32,12 +32,10 @@ const tools::Command& commandOf(const tools::Options& options) {
 }
 
 tools::Outcome perform(std::span<const char* const> arguments) {
-  auto options = tools::parseArguments(arguments);
+  const auto options = tools::parseArguments(arguments);
   if (options.printsHelp) return tools::help(options);
   if (options.printsVersion) return std::string{"accountctl " ACCOUNTCTL_VERSION "\n"};
   const auto& command = commandOf(options);
-  const bool isWriter = command.changesAccounts && !options.changesNothing;
-  options.device.locks = isWriter ? tools::kLocksOfWriters : tools::kLocksOfReaders;
   tools::Session session{options};
   try {
     return (options.file ? command.runOnFile : command.run)(session, options.arguments, options);

@@ -5,6 +5,7 @@
 #include "commandline/progress_line.h"
 #include "commandline/text.h"
 #include "tools/recovery.h"
+#include "tools/values.h"
 
 namespace tools {
 namespace {
@@ -15,31 +16,26 @@ constexpr int kSchema = 1;
 
 // --- Doing it ---
 
-using Concerned = Session::Concerned;
-
-Account accountOf(AccountsManager& store, const RecoveryStep& step) {
-  auto account = BasicAccount::initWithProperties(step.record);
-  if (step.parent) account->setParentAccount(store.accountWithIdentifier(*step.parent));
-  return account;
-}
-
 void bringBack(Session& session, const RecoveryPlan& plan) {
-  AccountsManager& store = session.accounts();
-  Concerned concerned;
+  std::vector<accounts::NewAccount> absent;
   for (const RecoveryStep& step : plan.steps()) {
     if (step.kind != RecoveryStep::Kind::bringBack) continue;
-    const auto account = accountOf(store, step);
-    concerned.emplace_back(account, enabledOf(*account));
+    absent.push_back({.type = "",
+                      .accountClass = "",
+                      .properties = entriesOf(step.record),
+                      .parentIdentifier = step.parent.value_or("")});
   }
-  if (concerned.empty()) return;
-  session.changeAndSave(concerned, [&] {
-    for (const auto& [account, dataclasses] : concerned) {
-      if (const auto& parent = account->parentAccount()) {
-        store.addChild_toAccount(account, parent);
-      } else {
-        store.insertAccount(account);
-      }
+  if (absent.empty()) return;
+  Session::Concerned concerned;
+  session.tryOut([&](accounts::Edit& edit) {
+    for (accounts::NewAccount& each : absent) {
+      const Account account = required(edit.add(each));
+      each.properties = account.ownProperties();
+      concerned.emplace_back(account, account.enabledDataclasses());
     }
+  });
+  session.change(concerned, [&absent](accounts::Edit& edit) {
+    for (const accounts::NewAccount& each : absent) required(edit.add(each));
   });
 }
 

@@ -55,10 +55,10 @@ void requireFreePlace(const Path& place, const AccountFile& original) {
 enum class Settings : std::uint8_t { absent, older, empty, current };
 
 Settings settingsOf(Session& session) {
-  const AccountsManager& store = session.accounts();
+  const accounts::Accounts& accounts = session.accounts();
   if (!stands(AccountsManager::fullPathToAccountSettingsPlist())) return Settings::absent;
   if (AccountsManager::accountSettingsNeedsToBeMigrated()) return Settings::older;
-  return store.count() == 0 && store.loadOutcome().leftOut.empty() ? Settings::empty : Settings::current;
+  return accounts.empty() && accounts.unreadable() == 0 ? Settings::empty : Settings::current;
 }
 
 void write(const AccountFile& file, const Path& place) {

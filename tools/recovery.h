@@ -23,7 +23,7 @@ struct RecoveryStep {
 // The accounts that are there, top-level ones and children.
 class PresentAccounts {
  public:
-  explicit PresentAccounts(const AccountsManager& store);
+  explicit PresentAccounts(const accounts::Accounts& accounts);
   void add(const accountsettings::Dictionary& record);
 
   // The one of that identifier, and the one that syncs by it; null where there is none.
@@ -46,7 +46,7 @@ class PresentAccounts {
 // back already. None comes back that is there, and none that the next load would drop or repair.
 class RecoveryPlan {
  public:
-  explicit RecoveryPlan(const AccountsManager& store) : _present{store} {}
+  explicit RecoveryPlan(const accounts::Accounts& accounts) : _present{accounts} {}
 
   // An account of the file, with the record that it is to come back as.
   void add(const AccountFile& file, const FoundAccount& account, accountsettings::Dictionary record);

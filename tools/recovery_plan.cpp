@@ -5,6 +5,7 @@
 #include "tools/key_value.h"
 #include "tools/next_load.h"
 #include "tools/recovery.h"
+#include "tools/values.h"
 
 namespace tools {
 namespace {
@@ -38,9 +39,11 @@ void settleBesides(RecoveryStep& step, const Dictionary& present, const std::str
 
 }  // namespace
 
-PresentAccounts::PresentAccounts(const AccountsManager& store) {
-  for (const auto& account : store.allBasicAccounts()) add(account->properties());
-  for (const auto& account : store.allBasicSyncableAccounts()) add(account->properties());
+PresentAccounts::PresentAccounts(const accounts::Accounts& accounts) {
+  for (const Account& account : accounts) add(recordOf(account));
+  for (const Account& account : accounts) {
+    for (const Account& child : account.children()) add(recordOf(child));
+  }
 }
 
 void PresentAccounts::add(const Dictionary& record) {

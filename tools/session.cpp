@@ -1,37 +1,19 @@
 #include "tools/session.h"
 
-#include <algorithm>
-#include <cerrno>
-#include <exception>
-#include <new>
-#include <optional>
-#include <utility>
-
-#include "platform/base_directories.h"
+#include "commandline/program.h"
 #include "platform/linux/linux_platform.h"
 #include "platform/logs_and_notices.h"
 
 namespace tools {
 namespace {
 
-using accountsettings::Array;
+using accounts::AccountSettings;
+using accounts::Code;
+using accounts::Edit;
 
-constexpr const char* kSavedButNotAnnounced = "the accounts were saved, but not announced";
-
-// In the place of the device's loader while none of its modules may be opened.
-class ClosedModuleLoader final : public platform::ModuleLoader {
- public:
-  platform::Status open(const std::string&) override {
-    return platform::Status::failure(platform::Cause::unsafe, "open a module",
-                                     "modules under another root are opened only with --modules");
-  }
-};
-
-// In the place of this machine's notices: those who follow its mail accounts have nothing to do with another root's.
-class NoNotice final : public platform::PreferencesChangedNotice {
- public:
-  void post(std::string_view, std::string_view) override {}
-};
+constexpr const char* kSavedButNotAnnounced = "the accounts were saved, but not announced: ";
+constexpr std::chrono::seconds kPatienceOfReaders{5};
+constexpr std::chrono::hours kPatienceOfWriters{24 * 365};  // as long as it takes
 
 // Answers another file in the place of the device's settings.
 class SettingsFromElsewhere final : public platform::PropertyListStore {
@@ -50,67 +32,58 @@ class SettingsFromElsewhere final : public platform::PropertyListStore {
   platform::Path _file;
 };
 
-bool hasIdentifier(const BasicAccount& account, std::string_view identifier) {
-  const auto own = account.identifier();
-  return own && *own == identifier;
+ExitStatus statusFor(Code code) {
+  switch (code) {
+    case Code::unknownAccount: return ExitStatus::noSuchAccount;
+    case Code::alreadyThere:
+    case Code::unsuitable:
+    case Code::wouldBeDropped: return ExitStatus::wrongUse;
+    case Code::notAnnounced:
+    case Code::brokenInstallation: return ExitStatus::faultyInstallation;
+    default: return ExitStatus::failed;
+  }
 }
 
-// The children's dictionaries with the changed child's in place of its old one. Of several with one identifier the last
-// is the one that the store knows.
-Array withChild(const Array& children, const BasicAccount& child) {
-  Array changed = children;
-  const auto place = std::find_if(changed.rbegin(), changed.rend(), [&](const auto& element) {
-    const auto* const properties = element.asDictionary();
-    const auto* const identifier =
-        properties == nullptr ? nullptr : properties->text(accountsettings::kAccountIdentifier);
-    return identifier != nullptr && hasIdentifier(child, *identifier);
-  });
-  if (place != changed.rend()) *place = child.properties();
-  return changed;
+accounts::OpenOptions optionsOf(const Options& options) {
+  const auto textOf = [](const auto& path) { return path ? path->string() : std::string{}; };
+  accounts::OpenOptions opening;
+  opening.root = textOf(options.device.systemRoot);
+  opening.home = textOf(options.device.home);
+  opening.resources = textOf(options.device.resources);
+  opening.whileWaiting = [](const std::string& sentence) { commandline::say("accountctl", sentence); };
+  opening.mayBeMissing = true;
+  opening.mayDropUnreadable = true;
+  opening.opensModules = options.opensModules();
+  return opening;
 }
 
 }  // namespace
 
-Session::Session(const Options& options)
-    : _opensModules{options.opensModules()}, _changesNothing{options.changesNothing} {
-  auto platform = platform::makeLinuxPlatform(options.device);
-  if (!_opensModules) {
-    platform.modules = std::make_shared<ClosedModuleLoader>();
-    platform.preferencesChanged = std::make_shared<NoNotice>();
-  }
-  platform::setCurrent(std::move(platform));
-  AccountsManager::_setShouldSkipNotifications(!_opensModules);
+void fail(const accounts::Error& error) { throw Failure{statusFor(error.code), error.sentence}; }
+
+Session::Session(const Options& options) : _options{optionsOf(options)}, _changesNothing{options.changesNothing} {
+  platform::setCurrent(platform::makeLinuxPlatform(options.device));
 }
 
-AccountsManager& Session::accounts() {
-  if (_accounts == nullptr) loadAccounts();
+void Session::waitForMigration() const {
+  const auto waited = AccountSettings::waitForMigration(_options);
+  if (waited || waited.error().code != Code::busy) return;
+  commandline::say("accountctl", waited.error().sentence + "; what follows is read while a migration may run");
+}
+
+const AccountSettings& Session::settings() {
+  if (_settings) return *_settings;
+  const bool isWriter = _changes && !_changesNothing;
+  _options.timeLimit = isWriter ? std::chrono::milliseconds{kPatienceOfWriters} : kPatienceOfReaders;
+  _options.mayBeOfOtherRelease = !_changes;
+  _options.mayBeMigrating = !isWriter;
+  if (!isWriter) waitForMigration();
+  return _settings.emplace(required(AccountSettings::open(_options)));
+}
+
+const accounts::Accounts& Session::accounts() {
+  if (!_accounts) _accounts = required(settings().accounts());
   return *_accounts;
-}
-
-// As AccountsManager::waitForMigrationToFinish does, which cannot tell whether it has.
-void Session::waitForMigration() {
-  const auto& services = platform::current();
-  const platform::Path file = accountsettings::kAccountMigrationLockFilename;
-  const auto lock = services.locks->lockNamed(file.filename().native());
-  if (!lock.isOk()) return;
-  const platform::Status held = lock.value()->lock();
-  if (held.isOk()) {
-    lock.value()->unlock();
-  } else if (held.errorNumber() == ETIMEDOUT) {
-    services.console->write("accountctl: " + held.description() + "; what follows is read while a migration may run");
-  }
-}
-
-void Session::loadAccounts() {
-  waitForMigration();
-  auto accounts = AccountsManager::init();
-  // The store takes a file that it cannot read for an empty one; saving would then lose what is in it.
-  if (const auto& outcome = accounts->loadOutcome(); outcome.hasUnreadFile()) {
-    throw Failure{ExitStatus::failed,
-                  "the account settings cannot be read: " + AccountsManager::fullPathToAccountSettingsPlist().string() +
-                      ": " + outcome.reading.reason()};
-  }
-  _accounts = std::move(accounts);
 }
 
 void Session::beginLooking() {
@@ -124,60 +97,34 @@ void Session::beginExamination(const std::optional<platform::Path>& file) {
   auto platform = platform::current();
   if (file) platform.propertyLists = std::make_shared<SettingsFromElsewhere>(platform.propertyLists, *file);
   platform::setCurrent(std::move(platform));
+  _options.timeLimit = kPatienceOfReaders;
   if (!file) waitForMigration();
 }
 
-void Session::beginChanges() {
-  if (!_changesNothing) platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
-  const auto& store = accounts();
-  if (AccountsManager::accountSettingsNeedsToBeMigrated()) {
-    throw Failure{ExitStatus::failed, "the account settings have data version " + std::to_string(store.dataVersion()) +
-                                          " and must be migrated before they are changed"};
-  }
-}
-
-void Session::keepChanges(const Account& account) {
-  const auto& parent = account->parentAccount();
-  if (parent == nullptr) return;
-  const auto children = parent->accountPropertyForKey(accountsettings::kAccountChildAccounts);
-  const auto* const array = children ? children->asArray() : nullptr;
-  if (array == nullptr) return;
-  parent->setAccountProperty_forKey(withChild(*array, *account), accountsettings::kAccountChildAccounts);
-}
-
-// A module may fail in its own way, too; whatever it throws, the message says what became of the change.
-void Session::announce(const Concerned& concerned, Announcement announcement, const char* whatBecameOfTheChange) const {
-  if (!_opensModules || _changesNothing) return;
-  try {
-    for (const auto& [account, dataclasses] : concerned) {
-      for (const accountsettings::Text& each : dataclasses) announcement(*account, each);
+// A module may fail in its own way, too; whatever it says, the message says what became of the change.
+void Session::announce(const Concerned& concerned, Announcement announcement, const char* whatBecameOfTheChange) {
+  for (const auto& [account, dataclasses] : concerned) {
+    for (const std::string& each : dataclasses) {
+      const auto told = (settings().*announcement)(account, each);
+      if (!told) throw Failure{ExitStatus::faultyInstallation, whatBecameOfTheChange + told.error().sentence};
     }
-  } catch (const std::exception& failure) {
-    throw Failure{ExitStatus::faultyInstallation, std::string{whatBecameOfTheChange} + ": " + failure.what()};
   }
 }
 
-void Session::changeAndSave(const Concerned& concerned, const std::function<void()>& change) {
-  announce(concerned, AccountsManager::accountWillChange_forDataclass, "nothing was changed");
-  change();
-  save();
-  announce(concerned, AccountsManager::accountDidChange_forDataclass, kSavedButNotAnnounced);
+void Session::tryOut(const Steps& steps) {
+  Edit edit = required(settings().trial());
+  steps(edit);
+  required(edit.save());
 }
 
-void Session::save() {
-  if (_changesNothing) return;
-  try {
-    accounts().saveAllAccounts();
-  } catch (const std::bad_alloc&) {
-    throw;  // before the file was written or after it
-  } catch (const std::exception& failure) {
-    if (!accounts().lastSaveOutcome().isSaved()) throw;
-    throw Failure{ExitStatus::faultyInstallation, std::string{kSavedButNotAnnounced} + ": " + failure.what()};
-  }
-  const auto& outcome = accounts().lastSaveOutcome();
-  if (outcome.isSaved()) return;
-  const auto path = AccountsManager::fullPathToAccountSettingsPlist().string();
-  throw Failure{ExitStatus::failed, "the accounts could not be saved to " + path + ": " + outcome.status.description()};
+void Session::change(const Concerned& concerned, const Steps& steps) {
+  if (_changesNothing) return tryOut(steps);
+  announce(concerned, &AccountSettings::willChange, "nothing was changed: ");
+  Edit edit = required(settings().edit());
+  steps(edit);
+  const auto saved = required(edit.save());
+  if (saved.notAnnounced) fail(*saved.notAnnounced);
+  announce(concerned, &AccountSettings::didChange, kSavedButNotAnnounced);
 }
 
 }  // namespace tools

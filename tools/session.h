@@ -1,39 +1,39 @@
 #pragma once
 
-#include <cstddef>
 #include <functional>
-#include <memory>
 #include <optional>
 #include <string>
-#include <string_view>
 #include <utility>
 #include <vector>
 
+#include "accounts/account_settings.h"
 #include "accountsettings/accounts_manager.h"
 #include "tools/options.h"
 
 namespace tools {
 
+using accounts::Account;
 using accountsettings::AccountsManager;
 using accountsettings::BasicAccount;
-using Account = AccountsManager::Account;
+using Dataclasses = std::vector<std::string>;
 
-// A client waits for a migration and holds nobody up, so it makes no lock file. One that only reads never hangs: after
-// a while it goes on, and says what it does.
-inline constexpr platform::LockManner kLocksOfWriters{.isShared = true};
-inline constexpr platform::LockManner kLocksOfReaders{.isShared = true, .timeLimit = std::chrono::seconds{5}};
+// The value; throws Failure, with the status that fits, where there is none.
+[[noreturn]] void fail(const accounts::Error& error);
+template <typename Value>
+Value required(accounts::Result<Value> result) {
+  if (!result) fail(result.error());
+  return std::move(result).value();
+}
 
-// The accounts of one device, for one command. Making a session sets the process's platform.
+// The accounts of one device, for one command, through the interface for programs. Making a session sets the process's
+// platform, for whatever looks at files beside that.
 class Session {
  public:
   explicit Session(const Options& options);
 
-  [[nodiscard]] bool opensModules() const { return _opensModules; }
-
-  // The store, loaded at its first use and once no migration is running, or the platform's locks are waited for no
-  // longer. Throws Failure where the file is there but
-  // cannot be read as account settings.
-  [[nodiscard]] AccountsManager& accounts();
+  // As they were when they were first asked for. A migration is waited for; after a while, a command that changes
+  // nothing goes on all the same, and says so. Throws Failure where they cannot be looked at.
+  [[nodiscard]] const accounts::Accounts& accounts();
 
   // The account or child account that the word means: the one of that identifier, else the only one whose identifier
   // begins so or that is called so (lookup.cpp says how). Throws Failure where there is none, or more than one.
@@ -42,34 +42,33 @@ class Session {
   // Makes the session one that only looks and of which nobody is told, not even the log. To be called before anything
   // else.
   void beginLooking();
-  // The same, and the settings are read from
-  // the file that is named, wherever it lies, else from the device's own once no migration is running. To be called
-  // before anything else.
+  // The same, and the settings are read from the file that is named, wherever it lies, else from the device's own once
+  // no migration is running. To be called before anything else.
   void beginExamination(const std::optional<platform::Path>& file);
 
-  // To be called before the accounts are changed: throws Failure where they are of an earlier release, since saving
-  // them would mark them as migrated.
-  void beginChanges();
-  // Keeps what was changed of the account: a child's record is a copy of what its parent holds.
-  static void keepChanges(const Account& account);
+  // To be called before the accounts are looked at in order to change them: those of another release are refused then.
+  void beginChanges() { _changes = true; }
+  // What the steps make of the accounts, which are not changed. Throws Failure where they could not be saved so.
+  using Steps = std::function<void(accounts::Edit&)>;
+  void tryOut(const Steps& steps);
   // The accounts that a change concerns, each with the data classes that it concerns of it.
-  using Concerned = std::vector<std::pair<Account, BasicAccount::Dataclasses>>;
-  // Changes the accounts in memory and saves them, telling those who follow these data classes before and after. Throws
-  // Failure, which says what became of the change, where it cannot be saved or a module is at fault.
-  void changeAndSave(const Concerned& concerned, const std::function<void()>& change);
-  // Writes the file, unless the session changes nothing. Throws Failure, with the cause, where it cannot be written,
-  // and where it was but nobody could be told.
-  void save();
+  using Concerned = std::vector<std::pair<Account, Dataclasses>>;
+  // Changes the accounts as they are by now and saves them, telling those who follow these data classes before and
+  // after; or only tries it, where that is asked for. Throws Failure, which says what became of the change, where it
+  // cannot be saved or a module is at fault.
+  void change(const Concerned& concerned, const Steps& steps);
 
  private:
-  using Announcement = void (*)(const BasicAccount& account, std::string_view dataclass);
-  void announce(const Concerned& concerned, Announcement announcement, const char* whatBecameOfTheChange) const;
-  static void waitForMigration();
-  void loadAccounts();
+  using Announcement = accounts::Outcome (accounts::AccountSettings::*)(const Account&, std::string_view) const;
+  void announce(const Concerned& concerned, Announcement announcement, const char* whatBecameOfTheChange);
+  void waitForMigration() const;
+  const accounts::AccountSettings& settings();
 
-  bool _opensModules;
+  accounts::OpenOptions _options;
   bool _changesNothing;  // what is asked for is only tried
-  std::shared_ptr<AccountsManager> _accounts;
+  bool _changes = false;
+  std::optional<accounts::AccountSettings> _settings;
+  std::optional<accounts::Accounts> _accounts;
 };
 
 }  // namespace tools

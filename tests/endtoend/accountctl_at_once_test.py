@@ -77,13 +77,49 @@ class TwoAndAnEditor(AtOnce):
         self.assert_done(first)
         self.assertEqual("First", self.accounts()[0]["DisplayName"])
 
-    def test_are_left_with_the_accounts_that_the_one_who_saves_last_knows(self):
+    def test_keep_what_the_other_added_and_bring_nothing_back(self):
         first, gate = self.start_and_hold("rename", "M1", "Work")
         self.done("remove", "L1")
         self.done("add", "LDAP", "LDAPAccount", "Identifier=L2")
         os.close(gate)
         self.assert_done(first)
-        self.assertEqual([changed(HOME_MAIL, DisplayName="Work"), CLOUD, DIRECTORY], self.accounts())
+        added = {"Type": "LDAP", "Class": "LDAPAccount", "Identifier": "L2"}
+        self.assertEqual([changed(HOME_MAIL, DisplayName="Work"), CLOUD, added], self.accounts())
+
+    def test_say_that_the_account_is_gone_by_now(self):
+        first, gate = self.start_and_hold("rename", "M1", "Work")
+        self.done("remove", "M1")
+        os.close(gate)
+        _, errors = first.communicate(timeout=PATIENCE)
+        self.assertEqual((3, "accountctl: no account has the identifier M1\n"), (first.returncode, errors))
+        self.assertEqual([CLOUD, DIRECTORY], self.accounts())
+
+
+class Twelve(AtOnce):
+    def setUp(self):
+        super().setUp()
+        self.put(HOME_MAIL, CLOUD, DIRECTORY)
+
+    def assert_done_after_a_while(self, process):
+        """It may have said for whom it waited."""
+        output, errors = process.communicate(timeout=PATIENCE)
+        self.assertRegex(f"{process.returncode} {errors}", r"^0 (accountctl: waiting for process \d+.*\n)*$")
+        return output
+
+    def test_that_add_leave_twelve_accounts_more(self):
+        started = [self.start("add", "LDAP", "LDAPAccount", f"Username={number}") for number in range(12)]
+        told = {self.assert_done_after_a_while(process).strip() for process in started}
+        self.assertEqual(12, len(told))
+        self.assertEqual({"M1", "V1", "L1", *told}, {each["Identifier"] for each in self.accounts()})
+        self.assertEqual(15, len(self.accounts()))
+
+    def test_that_change_the_children_of_one_account_keep_what_each_changed(self):
+        started = [self.start("set", ("C1", "K1")[number % 2], f"Key{number}=set") for number in range(12)]
+        for process in started:
+            self.assert_done_after_a_while(process)
+        calendar, mail = self.accounts()[1]["ChildAccounts"]
+        self.assertEqual({f"Key{number}" for number in range(0, 12, 2)}, {key for key in calendar if "Key" in key})
+        self.assertEqual({f"Key{number}" for number in range(1, 12, 2)}, {key for key in mail if "Key" in key})
 
 
 class ARunningMigration(AtOnce):

@@ -111,7 +111,7 @@ class FreshSystem(unittest.TestCase):
         shutil.copytree(EXAMPLES.parent / "list-accounts", self.root / "srv/list-accounts")
         self.inside(
             "cd /srv && cmake -G Ninja -S list-accounts -B with-cmake && cmake --build with-cmake"
-            " && g++ list-accounts/main.cpp $(pkg-config --cflags --libs account-settings) -o with-pkg-config"
+            " && g++ list-accounts/main.cpp $(pkg-config --cflags --libs account-settings-client) -o with-pkg-config"
         )
         for program in ("/srv/with-cmake/list-accounts", "/srv/with-pkg-config"):
             self.assertIn("Hollis & Daughters", self.inside(f"{program} /srv/device"))
