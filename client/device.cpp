@@ -4,7 +4,6 @@
 
 #include <algorithm>
 #include <cerrno>
-#include <thread>
 #include <utility>
 
 #include "platform/linux/files/file_services.h"
@@ -25,7 +24,7 @@ const Path kMigrationLock = Path{accountsettings::kAccountMigrationLockFilename}
 constexpr unsigned kOwnerOnly = 0700;
 constexpr const char* kOwner = "mobile";
 constexpr std::string_view kClientsLock = "AccountSettingsChange";
-constexpr milliseconds kBetweenGlances{10};
+constexpr std::string_view kNextsLock = "AccountSettingsNext";
 constexpr std::int64_t kNanoseconds = 1'000'000'000;
 
 // New files come to lie on the volume of the device's settings, whatever the program's environment says.
@@ -135,26 +134,28 @@ Device::Device(OpenOptions options) : _options{std::move(options)} {
 bool Device::opensModules() const { return mayOpenModules(_options, _services); }
 
 Outcome Device::waitForMigration() const {
-  const auto end = steady_clock::now() + _options.timeLimit;
   const platform::LockManner glance{.isShared = true, .timeLimit = milliseconds{0}};
   const auto isBusy = [](const Result<HeldLock>& lock) { return !lock.isOk() && lock.error().code == Code::busy; };
-  while (true) {
-    const Result<HeldLock> ofMigration = takeLock(kMigrationLock, glance);
-    const bool isMigrating = isBusy(ofMigration) && !isBusy(takeLock(kClientsLock, glance));
-    if (!isMigrating) return std::monostate{};
-    if (steady_clock::now() >= end) return ofMigration.error();
-    std::this_thread::sleep_for(kBetweenGlances);
-  }
+  const bool isMigrating = isBusy(takeLock(kMigrationLock, glance)) && !isBusy(takeLock(kClientsLock, glance));
+  if (!isMigrating) return std::monostate{};
+  const auto waited = takeLock(kMigrationLock, {.isShared = true, .timeLimit = _options.timeLimit});
+  return isBusy(waited) ? Outcome{waited.error()} : std::monostate{};
 }
 
 Result<HeldLocks> Device::takeLocks() const {
   const auto began = steady_clock::now();
-  Result<HeldLock> ofClients = takeLock(kClientsLock, {.timeLimit = _options.timeLimit});
-  if (!ofClients.isOk()) return ofClients.error();
-  const auto waited = std::chrono::duration_cast<milliseconds>(steady_clock::now() - began);
-  Result<HeldLock> ofMigration =
-      takeLock(kMigrationLock, {.timeLimit = std::max(milliseconds{0}, _options.timeLimit - waited)});
-  if (!ofMigration.isOk()) return ofMigration.error();
+  const auto inTime = [&]() -> platform::LockManner {
+    const auto waited = std::chrono::duration_cast<milliseconds>(steady_clock::now() - began);
+    return {.timeLimit = std::max(milliseconds{0}, _options.timeLimit - waited)};
+  };
+  const auto ofClientsInTurn = [&]() -> Result<HeldLock> {
+    const Result<HeldLock> next = takeLock(kNextsLock, inTime());
+    return next ? takeLock(kClientsLock, inTime()) : next.error();
+  };
+  Result<HeldLock> ofClients = ofClientsInTurn();
+  if (!ofClients) return ofClients.error();
+  Result<HeldLock> ofMigration = takeLock(kMigrationLock, inTime());
+  if (!ofMigration) return ofMigration.error();
   return HeldLocks{std::move(ofClients).value(), std::move(ofMigration).value()};
 }
 

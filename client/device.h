@@ -54,7 +54,9 @@ class Device {
   [[nodiscard]] Result<Store> load(Use use = Use::look) const;
   // Returns once no migration is running, or nobody can tell whether one is. A client's change is not waited for.
   [[nodiscard]] Outcome waitForMigration() const;
-  // Both locks, held until they go. A lock file that another user of the machine may have put there is refused.
+  // Both locks, held until they go, in turn: whoever is next waits for them alone, and the others for that place, so
+  // that a program that changes in a loop comes behind those who wait. A lock file that another user of the machine may
+  // have put there is refused.
   [[nodiscard]] Result<HeldLocks> takeLocks() const;
   // Makes sure of the directory in which a save makes the new file.
   void prepareSaving() const;

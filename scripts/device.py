@@ -24,7 +24,7 @@ SETTINGS_COPY = HOME + "/Library/Logs/CrashReporter/com.vorlix.accountsettings.p
 LEGACY_MAIL = HOME + "/Library/Mail/Accounts.plist"
 LEGACY_EXCHANGE = PREFERENCES + "/com.vorlix.DataAccess.plist"
 TEMPORARY = HOME + "/tmp"
-LOCK = ("tmp", "tmp/AccountMigrationInProgress", "tmp/AccountSettingsChange")
+LOCK = ("tmp", "tmp/AccountMigrationInProgress", "tmp/AccountSettingsChange", "tmp/AccountSettingsNext")
 
 # A device has them from its first start on, and version control cannot hold them while they are empty.
 STANDING_DIRECTORIES = [PREFERENCES, HOME + "/Library/Mail", HOME + "/Library/Logs/CrashReporter"]

@@ -2,6 +2,7 @@
 
 import os
 import random
+import statistics
 import subprocess
 import threading
 import time
@@ -69,10 +70,8 @@ class ManyChanges(DeviceTest):
         accounts = [SHARED, *({**SHARED, "Identifier": f"P{number}"} for number in range(PROGRAMS))]
         self.tree = self.device(Version=CURRENT_VERSION, Accounts=accounts)
 
-    def run_programs(self, manner, changes):
-        programs = [
-            Program(self.tree.root, manner, f"P{number}", -(-changes // PROGRAMS)) for number in range(PROGRAMS)
-        ]
+    def run_programs(self, manner, changes, count=PROGRAMS):
+        programs = [Program(self.tree.root, manner, f"P{number}", -(-changes // count)) for number in range(count)]
         threads = [threading.Thread(target=program.run) for program in programs]
         for thread in threads:
             thread.start()
@@ -102,6 +101,15 @@ class ManyChanges(DeviceTest):
             accounts = {each["Identifier"]: each for each in self.tree.read_plist(SETTINGS)["Accounts"]}
             stands = accounts[program.name]["Count"]
             self.assertEqual(program.answered[-1], stands)
+
+    def test_let_each_other_in_though_they_change_without_a_pause(self):
+        programs = self.run_programs("count", 40, 2)
+        for program, other in (programs, programs[::-1]):
+            meanwhile = [
+                sum(began <= first and last <= ended for first, last in other.intervals.values())
+                for began, ended in program.intervals.values()
+            ]
+            self.assertLessEqual(statistics.median(meanwhile), 1)
 
     def test_lose_to_an_editor_without_the_lock_what_was_saved_while_it_edited(self):
         editor = Editor(self.tree)

@@ -131,7 +131,7 @@ class FreshSystem(unittest.TestCase):
         self.inside("dpkg --purge migration-host")
         self.inside(f"dpkg --purge {' '.join(NAMES)}")
         left = {path for path in self.standing() - before if not path.startswith(STAYS)}
-        left -= {"tmp/AccountMigrationInProgress", "tmp/AccountSettingsChange"}
+        left -= {"tmp/AccountMigrationInProgress", "tmp/AccountSettingsChange", "tmp/AccountSettingsNext"}
         self.assertEqual((set(), set()), (left, before - self.standing()))
 
 
