@@ -56,6 +56,12 @@ class Programs(DeviceTest):
             command, env=self.environment, stdin=subprocess.DEVNULL, capture_output=True, text=True, check=True
         ).stdout
 
+    def test_take_twenty_lines_each(self):
+        for title in ("List", "Change", "Watch"):
+            for language in ("cpp", "c", "python"):
+                lines = [line for line in program_of(title, language).splitlines() if line.strip()]
+                self.assertLessEqual(len(lines), 20, f"{title}, {language}")
+
     def test_list_the_accounts(self):
         for language in ("cpp", "c", "python"):
             with self.subTest(language=language):
