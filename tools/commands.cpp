@@ -33,6 +33,15 @@ constexpr std::string_view kRecover =
     "first "
     "releases comes back as a file, for the next migration to convert.";
 
+constexpr std::string_view kCheckModules =
+    "FILE is an AccountCreators.plist; without it, the configuration's own is meant. Each module is opened, which runs "
+    "its code, in a process of its own. Under another root, that takes --modules. The status is 0 where nothing was "
+    "found, 5 where something was, and 1 where FILE could not be read.";
+constexpr std::string_view kNewDevice =
+    "DIR is made where it is missing; one that is not empty, or not yours alone, is refused. The device has no "
+    "accounts, "
+    "whoever makes it as the mobile user, and copies of the configuration and of the modules that it names.";
+
 }  // namespace
 
 const std::vector<Command>& commands() {
@@ -60,6 +69,9 @@ const std::vector<Command>& commands() {
        addAccount, true},
       {"remove", "ID", "remove an account, with its children", kId, 1, 1, removeAccount, true},
       {"save", "", "repair what needs it and save the accounts", "", 0, 0, saveAccounts, true},
+      {"check-modules", "[FILE]", "what each account module is called for, and why one never is", kCheckModules, 0, 1,
+       checkModules},
+      {"new-device", "DIR", "make a scratch device to try account modules on", kNewDevice, 1, 1, makeDevice},
       {"help", "[COMMAND]", "what a command does and takes", "", 0, 1, helpOnCommand},
   };
   return all;

@@ -63,6 +63,12 @@ Outcome listTypes(Session& session, const Words& arguments, const Options& optio
 // verify.cpp; ends with ExitStatus::findings where it has something to tell of the file.
 Outcome verifySettings(Session& session, const Words& arguments, const Options& options);
 
+// check_modules.cpp; ends with ExitStatus::findings where it has something to tell.
+Outcome checkModules(Session& session, const Words& arguments, const Options& options);
+
+// new_device.cpp
+Outcome makeDevice(Session& session, const Words& arguments, const Options& options);
+
 // changes.cpp; each saves the accounts.
 Outcome enableDataclass(Session& session, const Words& arguments, const Options& options);
 Outcome disableDataclass(Session& session, const Words& arguments, const Options& options);

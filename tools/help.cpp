@@ -18,7 +18,8 @@ constexpr std::string_view kStatuses =
     "Credentials are never printed. accountctl help COMMAND tells more.\n"
     "\n"
     "Exit status: 0 done, 1 failed, 2 wrong use, 3 no such account,\n"
-    "4 the configuration or a module is at fault, 5 verify has findings.\n";
+    "4 the configuration or a module is at fault,\n"
+    "5 verify or check-modules has findings.\n";
 
 commandline::Page pageOf(const Options& options) {
   auto page = options.page();

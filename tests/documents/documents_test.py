@@ -35,7 +35,7 @@ PROGRAMS = re.compile(
 # Whatever device a command names, it is the test's own that it gets.
 WRAPPER = """#!/bin/sh
 case " $* " in
-  *" --root "* | *" --help "* | *" --version "* | *" --serve-rehearsals "*) exec "{program}" "$@" ;;
+  *" --root "* | *" --help "* | *" --version "* | *" --serve-rehearsals "* | *" new-device "*) exec "{program}" "$@" ;;
   *) exec "{program}" --root "{root}" "$@" ;;
 esac
 """

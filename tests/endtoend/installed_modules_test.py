@@ -7,7 +7,7 @@ import unittest
 from pathlib import Path
 
 from accountctl_case import ACCOUNTCTL, DIRECTORY, HOME_MAIL
-from device import CURRENT_VERSION, EXAMPLES, SETTINGS, plain_environment, run_host
+from device import CURRENT_VERSION, EXAMPLES, SETTINGS, Device, plain_environment, run_host
 from device_case import DeviceTest
 
 BUILD_TREE = Path(os.environ["BUILD_TREE"])
@@ -98,6 +98,25 @@ class InstalledModules(DeviceTest):
         shown = self.accountctl("show", "C1")
         self.assertEqual((0, []), (shown.status, shown.errors))
         self.assertEqual("C1", self.tree.read_plist(SETTINGS)["Accounts"][2]["Identifier"])
+
+    def test_can_be_tried_on_a_new_device(self):
+        def accountctl(*words):
+            return run_host(self.prefix / "bin" / ACCOUNTCTL.name, *words)
+
+        root = self.scratch / "new"
+        self.assertEqual((0, []), accountctl("new-device", root)[::2])
+        device, self.resources = Device(root), root / "usr/share/account-settings"
+        device.write("usr/lib/example/example-accounts.so", self.build_example().read_bytes())
+        self.name_example("usr/lib/example/example-accounts.so")
+        options = ("--root", root, "--resources", self.resources)
+        self.assertEqual((0, []), run_host(self.prefix / "bin/migration-host", *options)[::2])
+        checked = accountctl(*options, "--modules", "check-modules")
+        self.assertEqual((0, []), (checked.status, checked.errors))
+        (line,) = [each for each in checked.output if " ExampleNotifier " in each]
+        self.assertRegex(line, r" after a switch, after a save  Calendars  usr/lib/example/example-accounts\.so$")
+        added = accountctl(*options, "--modules", "add", "CalDAV", "MobileCalDAVAccount", "Identifier=C1",
+                           f'Enabled Dataclasses:=["{CALENDARS}"]')
+        self.assertEqual((0, ["C1"], 2), (added.status, added.output, len(added.errors)))
 
 
 if __name__ == "__main__":

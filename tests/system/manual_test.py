@@ -49,8 +49,8 @@ class Manual(unittest.TestCase):
     def test_tells_of_every_command(self):
         text = words_of((SOURCES / "docs/man/accountctl.1").read_text())
         commands = text[text.index(".SH COMMANDS") : text.index(".SH OPTIONS")]
-        told = re.findall(r"^\.TP\n\.BI? ([a-z]+)", commands, re.MULTILINE)
-        self.assertEqual(re.findall(r"^  ([a-z]+) ", help_of(ACCOUNTCTL), re.MULTILINE), told)
+        told = re.findall(r"^\.TP\n\.BI? ([a-z-]+)", commands, re.MULTILINE)
+        self.assertEqual(re.findall(r"^  ([a-z][a-z-]+) ", help_of(ACCOUNTCTL), re.MULTILINE), told)
 
     def test_tells_of_every_exit_status(self):
         for program, page in PAGES.items():
@@ -98,10 +98,12 @@ class Completion(AccountctlTest):
         self.assertEqual(["var"], self.offered(HOST, "--root", "=", "v"))
         self.assertEqual(["etc/group", "etc/passwd"], sorted(self.offered(HOST, "--trace", "etc/")))
         self.assertEqual(["etc/passwd"], self.offered(ACCOUNTCTL, "verify", "etc/p"))
+        self.assertEqual(["etc/passwd"], self.offered(ACCOUNTCTL, "check-modules", "etc/p"))
+        self.assertEqual(["var"], self.offered(ACCOUNTCTL, "new-device", "v"))
         self.assertEqual([], self.offered(HOST, "x"))
 
     def test_of_commands(self):
-        self.assertEqual(re.findall(r"^  ([a-z]+) ", help_of(ACCOUNTCTL), re.MULTILINE), self.offered(ACCOUNTCTL, ""))
+        self.assertEqual(re.findall(r"^  ([a-z][a-z-]+) ", help_of(ACCOUNTCTL), re.MULTILINE), self.offered(ACCOUNTCTL, ""))
         self.assertEqual(["recover", "remove", "rename"], sorted(self.offered(ACCOUNTCTL, "re")))
 
     def test_of_identifiers_of_the_device_that_is_meant(self):

@@ -44,7 +44,7 @@ function __accountctl_needs_command
 end
 
 function __accountctl_commands
-    __accountctl --help | string match -rg '^  ([a-z]+) '
+    __accountctl --help | string match -rg '^  ([a-z][a-z-]*) '
 end
 
 function __accountctl_identifiers
@@ -65,7 +65,8 @@ complete -c accountctl -n '__accountctl_wants 1 help' -a '(__accountctl_commands
 complete -c accountctl -n '__accountctl_wants 1 show enable disable rename set remove' -a '(__accountctl_identifiers)'
 complete -c accountctl -n '__accountctl_wants 2 enable disable' -a '(__accountctl_dataclasses)'
 complete -c accountctl -n '__accountctl_wants 1 add' -a '(__accountctl_types)'
-complete -c accountctl -n '__accountctl_wants 1 verify diff recover' -F
+complete -c accountctl -n '__accountctl_wants 1 verify diff recover check-modules' -F
+complete -c accountctl -n '__accountctl_wants 1 new-device' -a '(__fish_complete_directories)'
 complete -c accountctl -n '__accountctl_wants 2 diff' -F
 complete -c accountctl -l root -r -a '(__fish_complete_directories)'
 complete -c accountctl -l home -r -a '(__fish_complete_directories)'
