@@ -29,7 +29,8 @@ void put(int descriptor, std::string_view text) {
 ProgressLine::ProgressLine(int descriptor) : _descriptor{descriptor} {}
 
 void ProgressLine::show(Progress progress) noexcept {
-  if (!_drawing.joinable() && ::isatty(_descriptor) != 1) return;
+  if (!_drawing.joinable() && _mayBeTerminal) _mayBeTerminal = ::isatty(_descriptor) == 1;
+  if (!_mayBeTerminal) return;
   try {
     const std::unique_lock lock{_mutex};
     const auto now = Clock::now();

@@ -1,5 +1,6 @@
 #pragma once
 
+#include <atomic>
 #include <mutex>
 #include <optional>
 #include <thread>
@@ -30,7 +31,8 @@ class ProgressLine {
   void wipe() noexcept;
 
   int _descriptor;
-  std::mutex _mutex;  // of all below, and of the terminal's last line
+  std::atomic<bool> _mayBeTerminal = true;  // no line is drawn once it is known to be none
+  std::mutex _mutex;                        // of all below, and of the terminal's last line
   bool _isShown = false;
   std::optional<ProgressEstimate> _estimate;  // none before the first call
   std::jthread _drawing;

@@ -8,6 +8,17 @@ namespace {
 
 constexpr const char* kMigratorClass = "AccountsDataMigrator";
 
+// What the installed plug-in stands on. The loader would look for it by its name in many directories first.
+void openLibraryOf(const platform::Platform& platform, const std::filesystem::path& plugin) {
+  const auto library = plugin.parent_path() / HOST_LIBRARY_FROM_PLUGIN;
+  static_cast<void>(platform.modules->open(library.lexically_normal().string()));
+}
+
+std::filesystem::path installedPlugin() {
+  static const auto program = std::filesystem::read_symlink("/proc/self/exe");
+  return (program.parent_path() / HOST_PLUGIN_FROM_PROGRAM).lexically_normal();
+}
+
 platform::Status noPlugin(std::string reason) {
   return platform::Status::failure(platform::Cause::unsuitable, "load the plug-in", std::move(reason));
 }
@@ -16,14 +27,11 @@ platform::Status noPlugin(std::string reason) {
 
 platform::Result<std::unique_ptr<platform::DataClassMigrator>> loadMigrator(
     const platform::Platform& platform, const std::optional<std::filesystem::path>& given) {
-  const auto installed = [] {
-    return (std::filesystem::read_symlink("/proc/self/exe").parent_path() / HOST_PLUGIN_FROM_PROGRAM)
-        .lexically_normal();
-  };
-  const std::string plugin = given ? given->string() : installed().string();
-  const platform::Status opened = platform.modules->open(plugin);
+  const auto plugin = given.value_or(installedPlugin());
+  if (plugin == installedPlugin()) openLibraryOf(platform, plugin);
+  const platform::Status opened = platform.modules->open(plugin.string());
   if (!opened.isOk()) return noPlugin("cannot load the plug-in: " + opened.reason());
-  const std::string isNone = plugin + " is no migrator plug-in: ";
+  const std::string isNone = plugin.string() + " is no migrator plug-in: ";
   const auto* const found = platform.classes->classNamed(kMigratorClass);
   if (found == nullptr) return noPlugin(isNone + "it defines no class " + kMigratorClass);
   const auto* const migratorClass = dynamic_cast<const platform::DataClassMigratorClass*>(found);

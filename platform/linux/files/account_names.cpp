@@ -42,8 +42,7 @@ Status notFound(int error, const std::string& name, const std::string& purpose =
 
 using File = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
 
-File openTable(const Place& place) {
-  Descriptor table = place.parent.isOpen() ? openOwnFile(place) : Descriptor{};
+File openTable(Descriptor table) {
   std::FILE* const file = table.isOpen() ? ::fdopen(table.number(), "re") : nullptr;
   if (file != nullptr) static_cast<void>(table.release());
   return {file, &std::fclose};
@@ -51,9 +50,9 @@ File openTable(const Place& place) {
 
 // The number behind a name in a table of the tree, which `next` reads an entry at a time.
 template <typename Entry, typename Number>
-Result<Number> numberInTable(const Place& place, const std::string& name, char* Entry::*nameOf, Number Entry::*numberOf,
+Result<Number> numberInTable(Descriptor file, const std::string& name, char* Entry::*nameOf, Number Entry::*numberOf,
                              int (*next)(std::FILE*, Entry*, char*, std::size_t, Entry**)) {
-  const File table = openTable(place);
+  const File table = openTable(std::move(file));
   if (!table) return notFound(errno, name);
   Room room;
   Entry entry{};
@@ -81,14 +80,12 @@ Result<Number> numberInSystem(const std::string& name, Number Entry::*numberOf,
 
 Result<uid_t> AccountNames::user(const std::string& name) const {
   if (_root == "/") return numberInSystem(name, &passwd::pw_uid, &::getpwnam_r);
-  const Place table = _paths.openParentOfTarget(_root / "etc/passwd");
-  return numberInTable(table, name, &passwd::pw_name, &passwd::pw_uid, &::fgetpwent_r);
+  return numberInTable(_paths.openFile(_root / "etc/passwd"), name, &passwd::pw_name, &passwd::pw_uid, &::fgetpwent_r);
 }
 
 Result<gid_t> AccountNames::group(const std::string& name) const {
   if (_root == "/") return numberInSystem(name, &::group::gr_gid, &::getgrnam_r);
-  const Place table = _paths.openParentOfTarget(_root / "etc/group");
-  return numberInTable(table, name, &::group::gr_name, &::group::gr_gid, &::fgetgrent_r);
+  return numberInTable(_paths.openFile(_root / "etc/group"), name, &::group::gr_name, &::group::gr_gid, &::fgetgrent_r);
 }
 
 Result<AccountNames::Owner> AccountNames::ownerOf(const std::filesystem::path& path, const std::string& user,

@@ -127,16 +127,16 @@ bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
   struct stat status {};
   if (::fstat(file, &status) != 0) return false;
   if (static_cast<std::uintmax_t>(status.st_size) > limit) return failWith(EFBIG);
-  // One byte more than expected shows whether the file ends where it said.
-  bytes.resize(static_cast<std::size_t>(status.st_size) + 1);
+  const auto expected = static_cast<std::size_t>(status.st_size);
+  bytes.resize(expected + 1);  // one byte more than expected shows whether the file ends where it said
   std::size_t filled = 0;
   while (true) {
-    const ssize_t count = readSome(file, bytes.data() + filled, bytes.size() - filled);
+    const ssize_t count = retried([&] { return ::read(file, bytes.data() + filled, bytes.size() - filled); });
     if (count < 0) return false;
     filled += static_cast<std::size_t>(count);
     if (filled > limit) return failWith(EFBIG);
-    if (filled < bytes.size()) break;
-    bytes.resize(bytes.size() * 2);
+    if (count == 0 || filled == expected) break;
+    if (filled == bytes.size()) bytes.resize(bytes.size() * 2);
   }
   bytes.resize(filled);
   return true;

@@ -54,8 +54,8 @@ bool copyBytes(int from, int to) {
   std::array<char, std::size_t{1} << 16> buffer;  // no allocation: one that failed would leave half of a copy
   while (true) {
     const ssize_t count = readSome(from, buffer.data(), buffer.size());
-    if (count <= 0) return count == 0;
-    if (!writeAll(to, buffer.data(), static_cast<std::size_t>(count))) return false;
+    if (count < 0 || !writeAll(to, buffer.data(), static_cast<std::size_t>(count))) return false;
+    if (static_cast<std::size_t>(count) < buffer.size()) return true;
   }
 }
 
@@ -160,16 +160,19 @@ class LinuxFileSystem final : public FileSystem {
   explicit LinuxFileSystem(const FileTrees& trees) : _accounts{trees.systemRoot}, _paths{trees} {}
 
   Result<FileKind> kindOf(const Path& path) override {
+    struct stat status {};
+    const Descriptor thing = _paths.openPlain(path);
+    if (!thing.isOpen() && errno == ENOENT) return failureOf("look at", path);
+    if (thing.isOpen() && ::fstat(thing.number(), &status) == 0) return platform::kindOf(status.st_mode);
     Place place = _paths.openParentOfTarget(path);
     if (!place.parent.isOpen() && errno == ELOOP) place = _paths.openParent(path);
-    struct stat status {};
     if (!place.parent.isOpen() || !isThere(place, status)) return failureOf("look at", path);
     return platform::kindOf(status.st_mode);
   }
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
     Bytes bytes;
-    const Descriptor file = openToRead(path);
+    const Descriptor file = _paths.openFile(path);
     if (!file.isOpen() || !readUpTo(file.number(), sizeLimit, bytes)) return failureOf("read", path);
     return bytes;
   }
@@ -196,7 +199,7 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status copy(const Path& from, const Path& to) override {
-    const Descriptor source = openToRead(from);
+    const Descriptor source = _paths.openFile(from);
     if (!source.isOpen()) return failureOf("copy", from);
     return at(to, "copy to", [&](const Place& place) {
       return makeSyncedFile(place, [&](int file) { return copyBytes(source.number(), file); }).isOpen();
@@ -205,6 +208,8 @@ class LinuxFileSystem final : public FileSystem {
 
   Status remove(const Path& path) override {
     _made.forget(path);
+    const bool isThere = _paths.openPlain(path).isOpen() || errno != ENOENT;
+    if (!isThere) return failureOf("remove", path);
     return at(path, "remove",
               [](const Place& place) { return changeEntries(place.parent, [&place] { return removeTree(place); }); });
   }
@@ -239,9 +244,7 @@ class LinuxFileSystem final : public FileSystem {
       const std::string name = randomTemporaryName();
       if (name.empty()) return failureOf("find a temporary name in", directory.value());
       Path path = directory.value() / name;
-      const Place place = _paths.openParent(path);
-      struct stat status {};
-      if (place.parent.isOpen() && isThere(place, status)) continue;
+      if (_paths.openPlain(path).isOpen() || (errno != ENOENT && isTaken(path))) continue;
       return errno == ENOENT ? Result<Path>{std::move(path)} : failureOf("find a temporary name in", directory.value());
     }
     return Status::failure(EEXIST, "find a temporary name in " + directory.value().string());
@@ -257,9 +260,11 @@ class LinuxFileSystem final : public FileSystem {
   }
 
  private:
-  [[nodiscard]] Descriptor openToRead(const Path& path) const {
-    const Place place = _paths.openParentOfTarget(path);
-    return place.parent.isOpen() ? openOwnFile(place) : Descriptor{};
+  // Whether something, be it a link, stands at the path; else errno tells why that is not so.
+  [[nodiscard]] bool isTaken(const Path& path) const {
+    const Place place = _paths.openParent(path);
+    struct stat status {};
+    return place.parent.isOpen() && isThere(place, status);
   }
 
   // Runs the action at the path's place; the action answers false, with errno set, where it fails.

@@ -208,15 +208,30 @@ path wholePath(const path& given) {
   return whole.has_filename() ? whole : whole.parent_path();
 }
 
-// A link or "..", or a kernel that does not know the call below or does not let it through.
-constexpr int kCausesToWalk[] = {ELOOP, EXDEV, EAGAIN, ENOSYS, EPERM, EINVAL};
+// Whether the last call failed for a link or "..", or since the kernel does not know it or does not let it through.
+bool isToBeWalked() {
+  constexpr int kCauses[] = {ELOOP, EXDEV, EAGAIN, ENOSYS, EPERM, EINVAL};
+  return std::ranges::find(kCauses, errno) != std::end(kCauses);
+}
 
 // In one call of the kernel where no link stands in the way; errno tells whether that could be known.
-Descriptor openWithoutLinks(const Descriptor& base, const path& below) {
+Descriptor openWithoutLinks(int base, const char* path, unsigned flags, unsigned resolve = 0) {
   open_how how{};
-  how.flags = O_PATH | O_DIRECTORY | O_CLOEXEC;
-  how.resolve = RESOLVE_NO_SYMLINKS | RESOLVE_BENEATH;
-  return Descriptor{static_cast<int>(::syscall(SYS_openat2, base.number(), below.c_str(), &how, sizeof how))};
+  how.flags = flags | O_CLOEXEC;
+  how.resolve = RESOLVE_NO_SYMLINKS | resolve;
+  return Descriptor{retried([&] { return static_cast<int>(::syscall(SYS_openat2, base, path, &how, sizeof how)); })};
+}
+
+// Whether a path is absolute and made of names alone, so that it leads where it says if no link stands in its way.
+bool isPlain(std::string_view text) {
+  if (!text.starts_with('/')) return false;
+  while (!text.empty()) {
+    const std::size_t end = std::min(text.find('/', 1), text.size());
+    const std::string_view name = text.substr(1, end - 1);
+    if (name.empty() || name == "." || name == "..") return false;
+    text.remove_prefix(end);
+  }
+  return true;
 }
 
 }  // namespace
@@ -239,7 +254,27 @@ const Base& PathResolver::baseOf(const path& path) const {
   return *std::ranges::find_if(_bases, [&](const Base& base) { return isBelow(path, base.path); });
 }
 
+bool PathResolver::isBase(const path& path) const {
+  return std::ranges::any_of(_bases, [&](const Base& base) { return base.path.native() == path.native(); });
+}
+
+Descriptor PathResolver::openPlain(const path& path) const {
+  if (!isPlain(path.native()) && failWith(ELOOP)) return {};
+  return openWithoutLinks(AT_FDCWD, path.c_str(), O_PATH);
+}
+
+Descriptor PathResolver::openFile(const path& path) const {
+  const Place place = openParentOfTarget(path);
+  return place.parent.isOpen() ? openOwnFile(place) : Descriptor{};
+}
+
 Place PathResolver::openParent(const path& path) const {
+  if (isPlain(path.native()) && !isBase(path)) {
+    const std::size_t end = path.native().rfind('/');
+    const std::string above = path.native().substr(0, std::max<std::size_t>(end, 1));
+    Descriptor directory = openWithoutLinks(AT_FDCWD, above.c_str(), O_PATH | O_DIRECTORY);
+    if (directory.isOpen() || !isToBeWalked()) return {std::move(directory), path.native().substr(end + 1)};
+  }
   const std::filesystem::path whole = wholePath(path);
   if (whole.empty()) {
     errno = ENOENT;
@@ -251,10 +286,9 @@ Place PathResolver::openParent(const path& path) const {
   const std::string leaf = below.empty() ? "." : below.filename().string();
   const Descriptor start = openAsGiven(base.path);
   if (!start.isOpen()) return {{}, leaf};
-  Descriptor directory = openWithoutLinks(start, above.empty() ? "." : above);
-  if (directory.isOpen() || std::ranges::find(kCausesToWalk, errno) == std::end(kCausesToWalk)) {
-    return {std::move(directory), leaf};
-  }
+  Descriptor directory =
+      openWithoutLinks(start.number(), above.empty() ? "." : above.c_str(), O_PATH | O_DIRECTORY, RESOLVE_BENEATH);
+  if (directory.isOpen() || !isToBeWalked()) return {std::move(directory), leaf};
   PathWalk walk{base, nullptr};
   return {walk.toDirectory(above) ? walk.takeDirectory() : Descriptor{}, leaf};
 }

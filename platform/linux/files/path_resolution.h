@@ -63,6 +63,13 @@ class PathResolver {
   [[nodiscard]] std::optional<Spot> find(const std::filesystem::path& path) const;
   [[nodiscard]] std::optional<Spot> findTarget(const std::filesystem::path& path) const;
 
+  // What the path leads to as an O_PATH descriptor, in one call of the kernel. Not open, with errno ELOOP, where a link
+  // or an oddity of the path's writing stands in the way; the calls above then know more.
+  [[nodiscard]] Descriptor openPlain(const std::filesystem::path& path) const;
+
+  // The regular file that the path leads to, for reading, as openOwnFile has it.
+  [[nodiscard]] Descriptor openFile(const std::filesystem::path& path) const;
+
   struct Base {
     std::filesystem::path path;
     std::filesystem::path root;  // where absolute links begin
@@ -70,6 +77,7 @@ class PathResolver {
 
  private:
   [[nodiscard]] const Base& baseOf(const std::filesystem::path& path) const;
+  [[nodiscard]] bool isBase(const std::filesystem::path& path) const;
 
   std::vector<Base> _bases;
   const Overlay* _overlay;
