@@ -1,6 +1,7 @@
 """Images rehearsed by the program as it is installed: what stands in the results, and how it ends."""
 
 import os
+import plistlib
 import pty
 import re
 import shutil
@@ -125,8 +126,8 @@ class Again(RehearseTest):
         self.rehearse(root)
         resources = self.scratch / "resources"
         shutil.copytree(REHEARSE.parent.parent / os.environ["DATA_DIRECTORY"] / "account-settings", resources)
-        with open(resources / "AccountTypesProperties.plist", "a", encoding="utf-8") as file:
-            file.write("<!-- another -->\n")
+        types = resources / "AccountTypesProperties.plist"
+        types.write_bytes(plistlib.dumps(plistlib.loads(types.read_bytes())))  # the same as text
         self.rehearse(root, "--resources", resources)
         self.assertEqual([(2,)], self.rows("SELECT count(*) FROM rehearsals"))
         self.assertEqual([(2,)], self.rows("SELECT count(*) FROM releases"))
