@@ -53,6 +53,8 @@ constexpr std::array<Kind, 13> kKinds{{
     {3, "Nimbra", "NimbraAccount", "Mail/Nimbra-", {"Mail", "Contacts", "Notes"}},
     {2, "BookmarkDAV", "BookmarkDAVAccount", nullptr, {"Bookmarks"}},
 }};
+constexpr const Kind& kGmail = kKinds[2];
+constexpr const Kind& kCalendars = kKinds[7];
 constexpr Kind kCloud{0, "VorlixAccount", "KQAccount", nullptr, {"Mail", "Contacts", "Calendars", "DeviceLocator"}};
 constexpr Kind kCloudMail{0, "KeldorIMAP", "KeldorIMAPAccount", nullptr, {"Mail", "Notes"}};
 constexpr Kind kCloudCalendars{0, "CalDAV", "MobileCalDAVAccount", nullptr, {"Calendars"}};
@@ -64,6 +66,8 @@ constexpr std::array<std::string_view, 20> kOtherKeys{
     "Auth Scheme", "Max Attachment", "Use TLS",      "Keep On Server",   "Last Refresh",
     "Sync Window", "Server Quirks",  "Capabilities", "Download Images",  "Archive Folder"};
 
+constexpr std::size_t kFirstParent = 9;  // of ten accounts
+
 class Generator {
  public:
   explicit Generator(const Population& population)
@@ -73,15 +77,38 @@ class Generator {
     const std::size_t place = number % kPopulationPeriod;
     if (place == 0) _lastGmailUser.clear();
     _random = Random{_seed + place};
-    const bool isCloud = number % 10 == 9;
+    const bool isCloud = number % 10 == kFirstParent;
     const Kind& kind = isCloud ? kCloud : anyKind();
     Dictionary account = common(kind, number);
     if (kind.pathPrefix != nullptr) addMail(account, kind);
     if (kind.className == std::string_view{"GmailAccount"}) _lastGmailUser = account.text("Username")->string();
-    if (kind.type == std::string_view{"CalDAV"}) addCalendarServer(account);
+    if (kind.type == std::string_view{"CalDAV"}) {
+      addCalendarServer(account, !_lastGmailUser.empty() && _random.oneIn(4));
+    }
     if (_random.oneIn(4)) account.set("Server State", blob(20 + _random.below(200)));
     fill(account, 15 + _random.below(isCloud ? 10 : 11));
     if (isCloud && _children > 0) account.set("ChildAccounts", children(number));
+    return account;
+  }
+
+  // Of a mail account and its calendar account, which come in turn.
+  Dictionary halfOfPair(std::size_t number) {
+    _random = Random{_seed + number % kPopulationPeriod};
+    const bool isMail = number % 2 == 0;
+    Dictionary account = common(isMail ? kGmail : kCalendars, number);
+    if (isMail) {
+      addMail(account, kGmail);
+      _lastGmailUser = account.text("Username")->string();
+    } else {
+      addCalendarServer(account, true);
+    }
+    return account;
+  }
+
+  Dictionary ofOneType(std::size_t number) {
+    _random = Random{_seed + number % kPopulationPeriod};
+    Dictionary account = common(kKinds.front(), number);
+    addMail(account, kKinds.front());
     return account;
   }
 
@@ -122,8 +149,7 @@ class Generator {
     account.set("IsActive", !_random.oneIn(5));
   }
 
-  void addCalendarServer(Dictionary& account) {
-    const bool isPartner = !_lastGmailUser.empty() && _random.oneIn(4);
+  void addCalendarServer(Dictionary& account, bool isPartner) {
     const std::string user = isPartner ? _lastGmailUser : account.text("Username")->string();
     const std::string local = user.substr(0, user.find('@'));
     const char* const server = isPartner ? "www.google.com" : "calendars.example.com";
@@ -192,10 +218,21 @@ class Generator {
 }  // namespace
 
 Array accountsOf(const Population& population) {
+  if (population.mixture == Mixture::family) {
+    Population alone = population;
+    alone.children = population.accounts - 1;
+    return {Generator{alone}.account(kFirstParent)};
+  }
   Generator generator{population};
   Array accounts;
   accounts.reserve(population.accounts);
-  for (std::size_t number = 0; number < population.accounts; ++number) accounts.emplace_back(generator.account(number));
+  for (std::size_t number = 0; number < population.accounts; ++number) {
+    switch (population.mixture) {
+      case Mixture::pairs: accounts.emplace_back(generator.halfOfPair(number)); break;
+      case Mixture::type: accounts.emplace_back(generator.ofOneType(number)); break;
+      default: accounts.emplace_back(generator.account(number));
+    }
+  }
   return accounts;
 }
 

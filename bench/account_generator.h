@@ -17,11 +17,20 @@ namespace bench {
 // compared between populations of whole hundreds.
 constexpr std::size_t kPopulationPeriod = 100;
 
+// Beside the devices that there are, such as somebody makes up to keep a run busy.
+enum class Mixture {
+  device,
+  pairs,  // each other account is the calendar account of the mail account before it, and is folded into that
+  type,   // all are of one type
+  family  // there is one account, and the others are its children
+};
+
 struct Population {
   std::size_t accounts = 1000;
   std::uint64_t version = accountsettings::kCurrentVersion;
   std::size_t children = 2;
   std::uint64_t seed = 20071109;
+  Mixture mixture = Mixture::device;
 };
 
 // The file's root: the accounts and the version.

@@ -1,5 +1,6 @@
 // Runs pieces of bench/pieces.h on each of the given populations, for whoever counts what `measuredPiece` takes, and
-// prints the names of the pieces. Usage: bench-count [--piece NAME]... [ACCOUNTS[/CHILDREN]]...
+// prints the names of the pieces. Usage: bench-count [--piece NAME]... [ACCOUNTS[/CHILDREN][/MIXTURE]]...
+#include <cctype>
 #include <cstdio>
 #include <cstdlib>
 #include <set>
@@ -11,11 +12,22 @@ extern "C" __attribute__((noinline)) void measuredPiece(const std::function<void
 
 namespace {
 
+bench::Mixture mixtureNamed(std::string_view name) {
+  if (name == "pairs") return bench::Mixture::pairs;
+  if (name == "type") return bench::Mixture::type;
+  if (name == "family") return bench::Mixture::family;
+  std::fprintf(stderr, "bench-count: no such mixture: %s\n", name.data());
+  std::exit(2);
+}
+
 bench::Population populationOf(const char* argument) {
   bench::Population population;
   char* end = nullptr;
   population.accounts = std::strtoull(argument, &end, 10);
-  if (*end == '/') population.children = std::strtoull(end + 1, nullptr, 10);
+  if (*end == '/' && std::isdigit(static_cast<unsigned char>(end[1])) != 0) {
+    population.children = std::strtoull(end + 1, &end, 10);
+  }
+  if (*end == '/') population.mixture = mixtureNamed(end + 1);
   return population;
 }
 

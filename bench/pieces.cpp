@@ -1,5 +1,6 @@
 #include "bench/pieces.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <memory>
 
@@ -143,7 +144,7 @@ void insert(AccountsManager& store) {
 constexpr std::size_t kFew = 9;
 
 void update(AccountsManager& store) {
-  for (std::size_t number = 0; number < kFew; ++number) {
+  for (std::size_t number = 0; number < std::min(kFew, store.count()); ++number) {
     const AccountsManager::Account account = store.allBasicAccounts()[number];
     account->_forcedSetEnabled_forDataclass(true, accountsettings::kAccountDataclassNotes);
     store.updateAccount(account);
@@ -151,10 +152,12 @@ void update(AccountsManager& store) {
 }
 
 void remove(AccountsManager& store) {
-  for (std::size_t number = 0; number < kFew; ++number) {
+  for (std::size_t number = 0; number < kFew && store.count() > 0; ++number) {
     store.deleteAccount(AccountsManager::Account{store.allBasicAccounts()[store.count() / 2]});
   }
 }
+
+void removeAll(AccountsManager& store) { store.deleteAccounts(store.allBasicAccounts()); }
 
 void addChildren(AccountsManager& store) {
   for (const auto& account : store.allBasicAccounts()) store.addChild_toAccount(stranger(), account);
@@ -202,6 +205,7 @@ const std::vector<Piece>& pieces() {
       ofStore("insert", &insert),
       ofStore("update", &update),
       ofStore("remove", &remove),
+      ofStore("remove all", &removeAll),
       ofStore("add children", &addChildren),
       ofStore("replace all", &replaceAll),
       ofStore("log unread", &logUnread),

@@ -1,0 +1,54 @@
+"""That whole processes take no more than they did: counted, so that no busy machine fails them or lets them pass."""
+
+import os
+import subprocess
+import tempfile
+import unittest
+from pathlib import Path
+
+from device import CURRENT_VERSION
+from process_counts import Processes
+
+BUILD = Path(os.environ["BUILD"])
+DEVICE = os.environ["BENCH_DEVICE"]
+# Other processors have other ways to copy and compare, and other kernels other pages at hand.
+SLACK = 1.05
+SLACK_OF_FAULTS = 1.15
+# Instructions, calls of the kernel and page faults, as docs/PERFORMANCE.md has them.
+MOST = {
+    f"version {CURRENT_VERSION}": (7_150_000, 345, 248),
+    "version 0": (15_080_000, 748, 287),
+    "rehearsal with JSON": (15_730_000, 1_591, 292),
+    "accountctl list": (7_300_000, 161, 224),
+    "accountctl set": (8_250_000, 228, 247),
+}
+
+
+def make_device(root, accounts, version):
+    subprocess.run([DEVICE, root, str(accounts), str(version)], check=True)
+
+
+class ProcessCounts(unittest.TestCase):
+    def test_stay_what_the_page_says(self):
+        with tempfile.TemporaryDirectory(dir="/dev/shm") as directory:
+            processes = Processes(BUILD, BUILD / "bench", directory, make_device)
+            for name, (version, command, _, _) in processes.rows().items():
+                counted = processes.count(version, command)
+                print(f"\n{name}: {counted}", end="", flush=True)
+                instructions, calls, faults = MOST[name]
+                with self.subTest(name):
+                    self.assertLessEqual(counted.instructions, instructions * SLACK)
+                    self.assertLessEqual(counted.calls, calls * SLACK)
+                    self.assertLessEqual(counted.faults, faults * SLACK_OF_FAULTS)
+
+    def test_load_no_bus_library_before_there_is_a_bus(self):
+        libraries = BUILD / "lib"
+        announcer = libraries / "account-settings/modules/account-announcer.so"
+        for binary in (BUILD / "bin/migration-host", libraries / "libaccountplatform.so", announcer):
+            needed = subprocess.run(["ldd", binary], check=True, capture_output=True, text=True).stdout
+            self.assertIn("libplist", needed)
+            self.assertNotIn("libsystemd", needed)
+
+
+if __name__ == "__main__":
+    unittest.main()
