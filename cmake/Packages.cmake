@@ -1,6 +1,7 @@
 # The Debian packages: `cmake --preset package`, build, then `cpack --preset package`. One package a component.
 
 set(CPACK_PACKAGE_NAME account-settings)
+set(CPACK_PACKAGE_VERSION "${PROJECT_VERSION}")
 set(CPACK_PACKAGE_DESCRIPTION_SUMMARY "")  # it would stand above every package's own
 set(CPACK_PACKAGE_VENDOR "Vorlix")
 set(CPACK_PACKAGE_CONTACT "Account Settings Maintainers <account-settings@vorlix.com>")
@@ -10,12 +11,13 @@ set(CPACK_DEBIAN_DEBUGINFO_PACKAGE ON)  # strips, too, and puts the symbols into
 set(CPACK_VERBATIM_VARIABLES ON)
 set(CPACK_COMPONENTS_ALL library development host tools rehearse python documents reference)
 set(CPACK_PRE_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/FinishPackages.cmake")
-set(CPACK_POST_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/TrimPackages.cmake")
+set(CPACK_POST_BUILD_SCRIPTS "${CMAKE_SOURCE_DIR}/cmake/RepackPackages.cmake")
 set(CPACK_PACKAGING_SOURCES "${CMAKE_SOURCE_DIR}/packaging")
+set(CPACK_PACKAGING_BUILD_TREE "${CMAKE_BINARY_DIR}")
 
 set(CPACK_DEB_COMPONENT_INSTALL ON)
 set(CPACK_DEBIAN_FILE_NAME DEB-DEFAULT)
-set(CPACK_DEBIAN_COMPRESSION_TYPE xz)
+set(CPACK_DEBIAN_COMPRESSION_TYPE gzip)  # until each is packed once more
 set(CPACK_DEBIAN_PACKAGE_CONTROL_STRICT_PERMISSION ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS ON)
 set(CPACK_DEBIAN_PACKAGE_SHLIBDEPS_PRIVATE_DIRS "${CMAKE_LIBRARY_OUTPUT_DIRECTORY}")

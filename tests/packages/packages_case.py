@@ -6,6 +6,8 @@ from pathlib import Path
 
 SOURCES = Path(os.environ["SOURCE_TREE"])
 PACKAGES = SOURCES / "build" / "package" / "packages"
+# The same sources under an earlier version.
+EARLIER_PACKAGES = SOURCES / "build" / "earlier" / "packages"
 NAMES = [
     "account-settings-doc", "accountctl", "libaccountsettings-dev", "libaccountsettings-doc", "libaccountsettings1",
     "migration-host", "migration-rehearse",
