@@ -59,9 +59,21 @@ std::optional<std::string> ownMarkIn(const Storage& storage, const Path& directo
   return textIn(read.value());
 }
 
+bool isBeingReplaced(const std::string& name) {
+  return name.starts_with(kBeingReplaced) && name.size() == kBeingReplaced.size() + kNoiseDigits &&
+         name.find_first_not_of("0123456789abcdef", kBeingReplaced.size()) == std::string::npos;
+}
+
 bool isOwnName(const std::string& name) {
   static const std::set<std::string> kNames{kOwnMark, kLock, RunJournal::kName, kFormerJournal, kStampName};
   return kNames.contains(name) || isIdentifier(name) || isPassing(name);
+}
+
+// What who died while it marked the directory left: the mark, or what was to become it, or a part of either.
+bool isOfADeadMaker(const Storage& storage, const Path& directory, const std::string& name) {
+  if (name != kOwnMark && !isBeingReplaced(name)) return false;
+  const platform::Result<platform::Bytes> read = storage.files->read(directory / name, kOwnMarkText.size());
+  return read.isOk() && kOwnMarkText.starts_with(textIn(read.value()));
 }
 
 void requireSnapshotsOrNothing(const Storage& storage, const Path& directory) {
@@ -73,7 +85,9 @@ void requireSnapshotsOrNothing(const Storage& storage, const Path& directory) {
   if (mark ? !kOwnMarkText.starts_with(*mark) : std::ranges::find(names, kOwnMark) != names.end()) {
     cannotHold(directory, std::string{"it holds something else: "} + kOwnMark);
   }
-  if (std::ranges::all_of(names, [](const std::string& name) { return name == kOwnMark; })) return;  // its maker died
+  const bool areAllOfADeadMaker =
+      std::ranges::all_of(names, [&](const std::string& name) { return isOfADeadMaker(storage, directory, name); });
+  if (areAllOfADeadMaker) return;
   // A name alone is no proof of an earlier host: every host made the lock first, and it is empty.
   const platform::Result<FileAttributes> lock = storage.keeper->attributesOf(directory / kLock);
   if (!lock.isOk() || lock.value().kind != FileKind::file || lock.value().size != 0) {
@@ -91,11 +105,7 @@ bool isIdentifier(const std::string& name) {
          });
 }
 
-bool isPassing(const std::string& name) {
-  if (name == kBeingMade || name == kBeingRemoved) return true;
-  return name.starts_with(kBeingReplaced) && name.size() == kBeingReplaced.size() + kNoiseDigits &&
-         name.find_first_not_of("0123456789abcdef", kBeingReplaced.size()) == std::string::npos;
-}
+bool isPassing(const std::string& name) { return name == kBeingMade || name == kBeingRemoved || isBeingReplaced(name); }
 
 void markAsOwn(const Storage& storage, const Path& directory) {
   if (ownMarkIn(storage, directory) == kOwnMarkText) return;

@@ -3,6 +3,7 @@
 import hashlib
 import json
 import os
+import shutil
 import unittest
 
 from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS
@@ -53,6 +54,16 @@ class DirectoriesOfOthers(SnapshotsTest):
             (self.snapshots / name).write_text("somebody's")
             self.assert_left_alone(name)
             (self.snapshots / name).unlink()
+
+    def test_whose_mark_a_dead_host_began_are_taken(self):
+        for part in ("", "migra"):
+            (self.snapshots / ".new-0123456789abcdef").write_text(part)
+            self.assertEqual(0, self.migrate(self.old_device()).status)
+            self.assertEqual(1, len(self.list()))
+            shutil.rmtree(self.snapshots)
+            self.snapshots.mkdir(mode=0o700)
+        (self.snapshots / ".new-0123456789abcdef").write_text("somebody's")
+        self.assert_left_alone(".new-0123456789abcdef")
 
     def test_of_an_earlier_release_are_known_by_their_names(self):
         device = self.old_device()
