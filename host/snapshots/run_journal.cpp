@@ -20,11 +20,15 @@ std::string lineOf(const Json& json) {
   }
 }
 
+// A line that was being added when the power went may be there in part. What it was to note had not begun, so it is
+// left out; a head is never in part.
 RunMark markFrom(const std::string& text) {
   RunMark mark;
   std::size_t start = 0;
   for (std::size_t end = 0; (end = text.find('\n', start)) != std::string::npos; start = end + 1) {
-    const Json line = Json::parse(text.substr(start, end - start));
+    const bool mayBeInPart = start > 0 && end + 1 == text.size();
+    const Json line = Json::parse(text.substr(start, end - start), nullptr, !mayBeInPart);
+    if (line.is_discarded()) break;
     if (start == 0) {
       mark.snapshot = line.at("snapshot");
       if (line.contains("restores")) mark.restores = line.at("restores").get<std::string>();

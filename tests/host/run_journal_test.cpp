@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <string>
 
 #include "host/snapshots/problem.h"
 #include "tests/support/fake_file_keeper.h"
@@ -48,6 +49,13 @@ TEST_F(AMark, ForgetsALastLineThatWasCutOff) {
   journal.begin("1", std::nullopt);
   journal.noteChange("/a", "aa", false);
   addToFile(R"({"path":"/b","sta)");
+  EXPECT_EQ(journal.read()->left.size(), 1U);
+}
+
+TEST_F(AMark, ForgetsALastLineOfWhichOnlyTheEndIsOnTheDisk) {
+  journal.begin("1", std::nullopt);
+  journal.noteChange("/a", "aa", false);
+  addToFile(std::string(15, '\0') + "\",\"state\":\"bb\"}\n");
   EXPECT_EQ(journal.read()->left.size(), 1U);
 }
 
