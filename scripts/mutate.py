@@ -1,0 +1,239 @@
+#!/usr/bin/env python3
+"""Says what part of the mutants of accountsettings/ and migrator/ the unit tests notice.
+
+    scripts/mutate.py --build DIRECTORY [--jobs N] [SOURCE...]
+
+Builds the target `mutants` of a build tree (tests/mutation): one program of tests in which each mutant stands behind a
+switch of its own. Every test runs once alone and tells which mutants it reaches; then each mutant runs the tests that
+reach it until one fails, dies or does not end. A mutant that none of them notices is named, with its reason from
+tests/mutation/survivors.txt. Fails where one has none there, where one that is listed is noticed or no more there, and
+where less than 95 % are noticed. With SOURCEs only the mutants of these are tried.
+"""
+
+import argparse
+import json
+import math
+import os
+import re
+import signal
+import subprocess
+import sys
+import tempfile
+import threading
+from collections import defaultdict
+from concurrent.futures import ThreadPoolExecutor
+from dataclasses import dataclass, field
+from pathlib import Path
+
+TREE = Path(__file__).resolve().parent.parent
+SURVIVORS = TREE / "tests" / "mutation" / "survivors.txt"
+PROGRAMS = ("accountsettings_tests", "migrator_mutant_tests", "run_sequence_mutant_tests")
+LEAST = 0.95
+MEMORY = 4 << 30
+PATIENCE = 600  # seconds, for a test that sleeps; one that computes is stopped earlier
+LONGEST = 2  # seconds of processor time; a test that takes longer is not among those that are tried
+
+
+@dataclass
+class Test:
+    program: Path
+    name: str
+    seconds: float = 0.0  # of processor time
+    reached: list = field(default_factory=list)
+
+
+@dataclass
+class Mutant:
+    name: str  # what the switch knows it by
+    source: str
+    line: int
+    function: str
+    change: str
+    tests: list = field(default_factory=list)
+
+    @property
+    def key(self):
+        return f"{self.source} {self.function}: {self.change}"
+
+
+def mutants_of(directory):
+    for listing in sorted(directory.glob("*/*.json")):
+        source = f"{listing.parent.name}/{listing.stem}"
+        for each in json.loads(listing.read_text()):
+            again = f" #{each['place']}" if each["place"] > 1 else ""
+            yield Mutant(f"{source}:{each['number']}", source, each["line"], each["function"],
+                         f"{each['old']} -> {each['new']}{again}")
+
+
+class Runner:
+    """Runs tests with the mutated library in the place of the other one."""
+
+    def __init__(self, directory):
+        self.environment = os.environ | {"LD_LIBRARY_PATH": str(directory / "lib")}
+
+    def passes(self, test, seconds=60, **variables):
+        return self.run(test, seconds, variables)[0]
+
+    def run(self, test, seconds, variables):
+        """Whether the test passes, and the processor time that it took."""
+        command = ["prlimit", f"--cpu={seconds}", f"--as={MEMORY}", "--core=0", test.program, f"--gtest_filter={test.name}"]
+        process = subprocess.Popen(command, env=self.environment | variables, start_new_session=True,
+                                   stdin=subprocess.DEVNULL, stdout=subprocess.DEVNULL, stderr=subprocess.DEVNULL)
+        alarm = threading.Timer(PATIENCE, os.killpg, (process.pid, signal.SIGKILL))
+        alarm.start()
+        _, status, used = os.wait4(process.pid, 0)
+        alarm.cancel()
+        process.returncode = status
+        return status == 0, used.ru_utime + used.ru_stime
+
+    def tests_of(self, program):
+        listing = subprocess.run([program, "--gtest_list_tests"], env=self.environment, check=True, capture_output=True,
+                                 text=True).stdout
+        suite = ""
+        for line in listing.splitlines():
+            name = line.split("#")[0].strip()
+            if line.startswith(" "):
+                yield Test(program, suite + name)
+            else:
+                suite = name
+
+    def learn(self, test):
+        """Fills in what the test reaches, and how long it takes without any mutant."""
+        with tempfile.TemporaryDirectory() as place:
+            reached = Path(place) / "reached"
+            passed, test.seconds = self.run(test, LONGEST + 1, {"MUTANTS_REACHED": str(reached)})
+            if not passed and test.seconds < LONGEST:
+                raise SystemExit(f"{test.name} fails without any mutant")
+            if test.seconds < LONGEST and reached.exists():
+                test.reached = reached.read_text().split()
+
+
+class Trial:
+    """Finds for each mutant the first test that notices it. Remembers them from run to run, and tries those first."""
+
+    def __init__(self, runner, memory, limit):
+        self.runner, self.memory, self.limit = runner, memory, limit
+        self.killers = json.loads(memory.read_text()) if memory.exists() else {}
+        self.by_function = defaultdict(list)
+        self.tried = 0
+
+    def killer_of(self, mutant):
+        self.tried += 1
+        if self.tried % 100 == 0:
+            print(f"{self.tried} tried", file=sys.stderr, flush=True)
+            self.remember()
+        return self.first_that_notices(mutant)
+
+    def first_that_notices(self, mutant):
+        near = self.by_function[mutant.source, mutant.function]
+        first = [self.killers.get(mutant.key)] + near[::-1]
+        tests = sorted(mutant.tests, key=lambda test: first.index(test.name) if test.name in first else len(first))
+        for test in tests[:self.limit]:
+            if not self.runner.passes(test, math.ceil(2 + 10 * test.seconds), MUTANT=mutant.name):
+                self.killers[mutant.key] = test.name
+                if test.name not in near:
+                    near.append(test.name)
+                return test.name
+        self.killers.pop(mutant.key, None)
+        return None
+
+    def remember(self):
+        self.memory.write_text(json.dumps(dict(self.killers), indent=1) + "\n")
+
+
+def kept_reasons():
+    """By key; each entry is a line with the key and indented lines with the reason."""
+    reasons, key = {}, None
+    for line in SURVIVORS.read_text().splitlines():
+        if line.startswith("#") or not line.strip():
+            continue
+        if line.startswith(" "):
+            reasons[key] += [line.strip()]
+        else:
+            key = line
+            reasons[key] = []
+    return {key: " ".join(reason) for key, reason in reasons.items()}
+
+
+def in_parallel(jobs, work, items):
+    with ThreadPoolExecutor(jobs) as pool:
+        return list(pool.map(work, items))
+
+
+def prepare(options):
+    subprocess.run(["cmake", "--build", options.build, "--target", "mutants"], check=True, stdin=subprocess.DEVNULL)
+    directory = options.build / "tests" / "mutation"
+    runner = Runner(directory)
+    places = {path.name: path for path in (options.build / "tests").glob("**/*_tests")}
+    tests = [test for program in PROGRAMS for test in runner.tests_of(places[program])]
+    learn_all(runner, tests, options.jobs, directory / "reached.json")
+    mutants = {mutant.name: mutant for mutant in mutants_of(directory / "copies")}
+    # A test that reaches little is the likeliest to notice what becomes different there.
+    for test in sorted(tests, key=lambda test: (len(test.reached), test.seconds)):
+        for name in test.reached:
+            mutants[name].tests.append(test)
+    return runner, list(mutants.values())
+
+
+def learn_all(runner, tests, jobs, memory):
+    """What each test reaches; asked again only once the programs are others."""
+    library = runner.environment["LD_LIBRARY_PATH"] + "/libaccountsettings.so.1"
+    stamp = {str(path): os.stat(path).st_mtime_ns for path in sorted({library, *(str(test.program) for test in tests)})}
+    known = json.loads(memory.read_text()) if memory.exists() else {}
+    if known.get("stamp") != stamp:
+        in_parallel(jobs, runner.learn, tests)
+        known = {"stamp": stamp, "tests": {f"{test.program.name} {test.name}": [test.seconds, test.reached] for test in tests}}
+        memory.write_text(json.dumps(known))
+    left_out = [name for name, (seconds, _) in known["tests"].items() if seconds >= LONGEST]
+    print(f"{len(tests)} tests, {len(left_out)} of them left out, since they take long: {', '.join(left_out)}")
+    for test in tests:
+        test.seconds, test.reached = known["tests"][f"{test.program.name} {test.name}"]
+
+
+def tell_score(mutants, survivors):
+    for folder in [*sorted({re.sub("/.*", "/", mutant.source) for mutant in mutants}), ""]:
+        tried = [mutant for mutant in mutants if mutant.source.startswith(folder)]
+        left = [mutant for mutant in survivors if mutant.source.startswith(folder)]
+        unreached = sum(not mutant.tests for mutant in left)
+        print(f"{folder or 'both'}: {len(tried)} mutants, {len(tried) - len(left)} noticed "
+              f"({1 - len(left) / len(tried):.2%}), {len(left)} not, {unreached} of them reached by no test")
+
+
+def complaints(mutants, survivors, everything):
+    reasons = kept_reasons()
+    keys = {mutant.key for mutant in survivors}
+    sources = {mutant.source for mutant in mutants}
+    for mutant in survivors:
+        if not reasons.get(mutant.key):
+            yield f"no reason for {mutant.key} (line {mutant.line}, reached by {len(mutant.tests)} tests)"
+    for key in reasons:
+        if key not in keys and (everything or key.split()[0] in sources):
+            yield f"noticed, or no more there: {key}"
+    if 1 - len(survivors) / len(mutants) < LEAST:
+        yield f"less than {LEAST:.0%} are noticed"
+
+
+def main():
+    parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
+    parser.add_argument("--build", type=Path, required=True, help="the build tree")
+    parser.add_argument("--jobs", type=int, default=os.cpu_count())
+    parser.add_argument("--tests", type=int, help="tries no more than so many tests for each mutant: quicker, and notices less")
+    parser.add_argument("sources", nargs="*", metavar="SOURCE", help="as in accountsettings/basic_account.cpp")
+    options = parser.parse_args()
+    options.build = options.build.absolute()
+    os.nice(max(0, 10 - os.nice(0)))
+    runner, mutants = prepare(options)
+    mutants = [mutant for mutant in mutants if not options.sources or mutant.source in options.sources]
+    print(f"{len(mutants)} mutants", flush=True)
+    trial = Trial(runner, options.build / "tests" / "mutation" / "killers.json", options.tests)
+    killers = in_parallel(options.jobs, trial.killer_of, mutants)
+    trial.remember()
+    survivors = [mutant for mutant, killer in zip(mutants, killers) if killer is None]
+    tell_score(mutants, survivors)
+    found = list(complaints(mutants, survivors, not options.sources))
+    print(*found, sep="\n", end="\n" if found else "")
+    return 1 if found else 0
+
+
+if __name__ == "__main__":
+    sys.exit(main())
