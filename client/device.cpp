@@ -101,6 +101,7 @@ std::recursive_mutex& turns() {
   return mutex;
 }
 
+bool isOfFullDisk(const Status& status) { return status.errorNumber() == ENOSPC || status.errorNumber() == EDQUOT; }
 bool isForbidden(const Status& status) { return status.errorNumber() == EACCES || status.errorNumber() == EPERM; }
 
 Error unreadFile(const Path& path, const Status& reading) {
@@ -168,6 +169,7 @@ Result<HeldLock> Device::takeLock(const Path& name, platform::LockManner manner)
       {.directory = directory, .trees = platform::treesOf(*_services.directories), .manner = manner, .say = say});
   auto made = locks->lockNamed(name.native());
   if (!made.isOk()) {
+    if (isOfFullDisk(made.status())) return Error{Code::noSpace, made.status().description()};
     return Error{isForbidden(made.status()) ? Code::noPermission : Code::refused, made.status().description()};
   }
   if (!manner.isShared && !isTrusted(directory / name)) {

@@ -204,13 +204,18 @@ class Changing(PythonModule):
         self.assert_fails(Code.WOULD_DROP_OTHERS, self.settings().edit)
 
     def test_says_that_the_disk_is_full(self):
+        def fail_to_begin():
+            refuse_to_sync()  # and so the directory of the lock files cannot be made
+            self.assert_fails(Code.NO_SPACE, self.settings().edit)
+
         def fail_to_save():
-            refuse_to_sync()
             edit = self.settings().edit()
             edit["M1"]["Port"] = 1
+            refuse_to_sync()
             self.assert_fails(Code.NO_SPACE, edit.save)
 
         before = self.accounts()
+        self.assert_passes_in_child(fail_to_begin)
         self.assert_passes_in_child(fail_to_save)
         self.assertEqual(before, self.accounts())
 
