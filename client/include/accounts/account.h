@@ -14,9 +14,9 @@ namespace accounts {
 
 // Where the service behind an account is reached.
 struct Service {
-  std::string host;
-  std::uint16_t port = 0;
-  bool isSecure = true;
+  std::string host;        // a name or an address
+  std::uint16_t port = 0;  // 0 where the module tells none
+  bool isSecure = true;    // whether it is reached through TLS
 };
 
 // An account as it was when it was looked at. It never changes, copies share what they hold, it outlives whatever it

@@ -19,7 +19,7 @@ struct Date {
 
 // A number by which one part of an archived object names another.
 struct Reference {
-  std::uint64_t number = 0;
+  std::uint64_t number = 0;  // in that archive
 };
 
 // The value of a property. It never changes, copies share what they hold, and any thread may read it.
