@@ -239,9 +239,20 @@ def look_at_what_the_cut_left(device, recording):
     expect(set(found) == set(recording.markers), f"lost: {set(recording.markers) - set(found)}")
 
 
-def look_at_the_next_run(scenario, device, recording):
+def is_told_and_kept(device, recording, ended):
+    """Without a journal, the name of a new file may come to stand for an old one, even that which has legacy files deleted.
+    What a run takes away then, it says, and keeps."""
+    found = set(markers_of(device.path(SETTINGS)))
+    for copy in (device.root / ".snapshots").glob("0*/[1-9]"):
+        found |= set(markers_of(copy))
+    return "[not-saved]" in " ".join(ended.errors) and found == set(recording.markers)
+
+
+def look_at_the_next_run(file_system, scenario, device, recording):
     ended = run(scenario, device)
     expect(ended.status == 0, f"the next run ends with {ended.status}: {ended.errors}")
+    if file_system.repair and is_told_and_kept(device, recording, ended):
+        return
     settings = device.path(SETTINGS)
     expect(markers_of(settings) == {marker: 1 for marker in recording.markers} or scenario.restores,
            f"after the next run: {markers_of(settings)}")
@@ -258,7 +269,7 @@ def look_at(file_system, scenario, recording, disk, place):
     with mounted(file_system, disk, place) as device:
         look_at_what_the_cut_left(device, recording)
     with mounted(file_system, disk, place) as device:
-        look_at_the_next_run(scenario, device, recording)
+        look_at_the_next_run(file_system, scenario, device, recording)
 
 
 def try_cuts(file_system, scenario, parts):
