@@ -1,6 +1,7 @@
 #include "fuzz/fuzzed_device.h"
 
 #include <algorithm>
+#include <iterator>
 
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 
@@ -103,6 +104,26 @@ FuzzedDevice::FuzzedDevice() : _store{platform::makeLibplistPropertyListStore(fi
 }
 
 void FuzzedDevice::fill(Input& input) {
+  begin(input);
+  putFiles();
+}
+
+void FuzzedDevice::fillWithCopies(Input& input) {
+  begin(input);
+  areIdentifiersUnique = _input->yes();
+  const std::int64_t version = static_cast<std::int64_t>(_input->below(13));
+  const std::size_t copies = 1 + _input->below(250);
+  const Input choices = *_input;
+  Array all;
+  for (std::size_t copy = 0; copy < copies; ++copy) {
+    Input again = choices;
+    _input = &again;
+    std::ranges::move(accounts(1), std::back_inserter(all));
+  }
+  putReal(tests::kSettingsFile, {{"Version", version}, {"Accounts", all}});
+}
+
+void FuzzedDevice::begin(Input& input) {
   _input = &input;
   _identifiers = 0;
   _markers = 0;
@@ -111,7 +132,6 @@ void FuzzedDevice::fill(Input& input) {
   files->hasTemporaryNames = true;
   identifiers->made = 0;
   forget();
-  putFiles();
 }
 
 void FuzzedDevice::forget() {

@@ -19,6 +19,8 @@ class FuzzedDevice : public tests::MigrationDevice {
 
   // Makes it what the input says, with nothing left of what it was.
   void fill(Input& input);
+  // The same with a settings file of some accounts, all of them up to 250 times.
+  void fillWithCopies(Input& input);
 
   static constexpr std::string_view kSecret = "S3CR3T";  // in every credential and every blob, and nowhere else
   static constexpr std::string_view kMarker = "Marker";  // an integer of its own in each account
@@ -43,7 +45,8 @@ class FuzzedDevice : public tests::MigrationDevice {
   void putFile(const tests::Path& path, const tests::Dictionary& contents);
   void putFiles();
   void addFaults();
-  void forget();  // what the fakes recorded
+  void begin(Input& input);  // with nothing left of what it was
+  void forget();             // what the fakes recorded
 
   Input* _input = nullptr;  // while it is filled
   std::shared_ptr<platform::PropertyListStore> _store;
