@@ -2,6 +2,7 @@
 
 #include <gmock/gmock.h>
 
+#include "migrator/legacy_conversion.h"
 #include "migrator/version_chain.h"
 #include "tests/support/fact_recorder.h"
 #include "tests/support/step_test.h"
@@ -9,8 +10,10 @@
 namespace migrator {
 namespace {
 
+using testing::AllOf;
 using testing::Contains;
 using testing::ElementsAre;
+using testing::EndsWith;
 using testing::Not;
 using testing::StartsWith;
 using tests::account;
@@ -89,6 +92,59 @@ TEST_F(ExplainedConversions, TellOfAFileThatCannotBeRead) {
   device.files->put(accountsettings::mailAccountsPath(), "no property list");
   static_cast<void>(migrator._migrateMailAccounts(*store));
   EXPECT_THAT(recorder->lines(), ElementsAre(StartsWith("lost (unreadable-legacy-file: ")));
+}
+
+TEST_F(ExplainedConversions, TellFromWhatEachAccountWasMade) {
+  const Dictionary one{{"AccountType", "IMAPAccount"}, {"uniqueId", "1"}};
+  const Dictionary two{{"AccountType", "IMAPAccount"}, {"uniqueId", "2"}};
+  toldOf({{"MailAccounts", Array{one, two}}});
+  store->tellChanges();
+  const std::string of = " of " + accountsettings::mailAccountsPath() + ")";
+  EXPECT_THAT(recorder->lines(), ElementsAre(AllOf(StartsWith("converted 1: "), EndsWith("(MailAccounts[0]" + of)),
+                                             AllOf(StartsWith("converted 2: "), EndsWith("(MailAccounts[1]" + of))));
+}
+
+// What is told of legacy files whose removal was interrupted: they go without being converted again.
+class ExplainedRemovals : public ExplainedSteps {
+ protected:
+  static Dictionary synced(std::string_view identifier) {
+    return account("Mail", "IMAPAccount", "of " + std::string{identifier}, {{"Sync Identifier", identifier}});
+  }
+  static Array described(std::string_view key, std::initializer_list<std::string_view> identifiers) {
+    Array descriptions;
+    for (const std::string_view identifier : identifiers) descriptions.emplace_back(Dictionary{{key, identifier}});
+    return descriptions;
+  }
+  std::vector<std::string> told() {
+    tellUnsavedExchange();
+    tellUnsavedMail();
+    return recorder->lines();
+  }
+};
+
+TEST_F(ExplainedRemovals, TellOfEachLegacyAccountThatTheSettingsDoNotHold) {
+  const Dictionary parent = account("VorlixAccount", "KQAccount", "P", {{"ChildAccounts", Array{synced("CHILD")}}});
+  putSettings({{"Accounts", Array{"no record", synced("SAVED"), parent}}});
+  device.put(accountsettings::daAccountPath(),
+             {{"DAAccountsKey", described("DAAccountConfigurationAccountID", {"CHILD", "E"})}});
+  device.put(accountsettings::mailAccountsPath(), {{"DeliveryAccounts", described("uniqueId", {"D"})},
+                                                   {"MailAccounts", described("uniqueId", {"SAVED", "M", "SAVED"})}});
+  const std::string of = " of " + accountsettings::mailAccountsPath() + ")";
+  EXPECT_THAT(told(),
+              ElementsAre("lost E (not-saved: DAAccountsKey[1] of " + accountsettings::daAccountPath() + ")",
+                          "lost D (not-saved: DeliveryAccounts[0]" + of, "lost M (not-saved: MailAccounts[1]" + of,
+                          "lost SAVED (not-saved: MailAccounts[2]" + of));
+}
+
+TEST_F(ExplainedRemovals, TellNothingOfFilesThatAreNotThere) { EXPECT_THAT(told(), ElementsAre()); }
+
+TEST_F(ExplainedRemovals, ReadNothingWhereNobodyWantsToKnow) {
+  device.put(accountsettings::daAccountPath(), {});
+  device.put(accountsettings::mailAccountsPath(), {});
+  device.setObserver(nullptr);
+  device.propertyLists->reads.clear();
+  EXPECT_THAT(told(), ElementsAre());
+  EXPECT_THAT(device.propertyLists->reads, ElementsAre());
 }
 
 }  // namespace
