@@ -51,6 +51,10 @@ def _calls(command, environment):
     return len(calls) - look_ups, look_ups
 
 
+def can_trace_calls():
+    return shutil.which("strace") and subprocess.run(["strace", "-o", os.devnull, "true"], check=False).returncode == 0
+
+
 def _faults(command, environment):
     before = resource.getrusage(resource.RUSAGE_CHILDREN)
     _run(command, environment)

@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <iterator>
 
+#include "accountsettings/accounts_manager.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace fuzz {
@@ -111,7 +112,8 @@ void FuzzedDevice::fill(Input& input) {
 void FuzzedDevice::fillWithCopies(Input& input) {
   begin(input);
   areIdentifiersUnique = _input->yes();
-  const std::int64_t version = static_cast<std::int64_t>(_input->below(13));
+  const std::int64_t version =
+      static_cast<std::int64_t>(_input->below(accountsettings::AccountsManager::currentVersion() + 1));
   const std::size_t copies = 1 + _input->below(250);
   const Input choices = *_input;
   Array all;

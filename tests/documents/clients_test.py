@@ -75,7 +75,7 @@ class Programs(DeviceTest):
                     self.command("List", language), env=self.environment, capture_output=True, text=True, check=False
                 )
                 self.assertEqual(1, ended.returncode)
-                self.assertIn("has data version 3 and has yet to be migrated", ended.stderr)
+                self.assertIn("have data version 3 and must be migrated before", ended.stderr)
 
     def test_change_the_accounts(self):
         for language, name in (("cpp", "Club"), ("c", "Directory"), ("python", "Club")):

@@ -113,7 +113,7 @@ class InstalledModules(DeviceTest):
         checked = accountctl(*options, "--modules", "check-modules")
         self.assertEqual((0, []), (checked.status, checked.errors))
         (line,) = [each for each in checked.output if " ExampleNotifier " in each]
-        self.assertRegex(line, r" after a switch, after a save  Calendars  usr/lib/example/example-accounts\.so$")
+        self.assertRegex(line, r" after a switch, after a save +Calendars +usr/lib/example/example-accounts\.so$")
         added = accountctl(*options, "--modules", "add", "CalDAV", "MobileCalDAVAccount", "Identifier=C1",
                            f'Enabled Dataclasses:=["{CALENDARS}"]')
         self.assertEqual((0, ["C1"], 2), (added.status, added.output, len(added.errors)))

@@ -133,7 +133,8 @@ class TheProcessThatUnpacks(ArchiveTest):
         self.assertIsNone(self.process())
 
     def test_is_ended_where_it_takes_too_long(self):
-        self.assertEqual("timeout", self.rehearsed(self.whole, seconds=0).cause)
+        os.kill(self.process(), signal.SIGSTOP)
+        self.assertEqual("timeout", self.rehearsed(self.whole, seconds=0.5).cause)
         self.assertIsNone(self.process())
 
     def test_is_replaced_where_somebody_kills_it(self):
