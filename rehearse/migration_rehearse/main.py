@@ -1,11 +1,14 @@
-"""The program migration-rehearse: what is asked is done, and told by the exit status."""
+"""The program migration-rehearse: what is asked is done, and told by the exit status.
+
+What rehearsals do not need is brought in by the command that does: there is one process for each call, and none of it is
+compiled beforehand."""
 
 import json
 import signal
 import sys
 import time
 
-from migration_rehearse import anonymise, campaign, compare, engines, host, options, rehearsal, report, telling
+from migration_rehearse import campaign, engines, host, options, rehearsal, telling
 from migration_rehearse.listing import Listing
 from migration_rehearse.results import ResultFault, Results
 
@@ -90,6 +93,8 @@ def merge(arguments, version):
 
 
 def make_report(arguments, version):
+    from migration_rehearse import report
+
     made = options.parser("report", version, "Makes one HTML page of the results, which needs nothing else to be shown.")
     made.add_argument("results", metavar="FILE", help="a result file")
     made.add_argument("--output", metavar="FILE", default="report.html", help="the page (default: report.html)")
@@ -109,6 +114,8 @@ def make_report(arguments, version):
 
 
 def make_comparison(arguments, version):
+    from migration_rehearse import compare
+
     made = options.parser("compare", version, "Tells which devices end differently under another release.",
                           epilog="Rules: " + "; ".join(f"{name} ({words})" for name, words in compare.RULES.items())
                           + "\n\nExit status: 0 nothing differs, or no rule of the gate is broken; 1 otherwise; 2 wrong use;\n"
@@ -134,6 +141,8 @@ def make_comparison(arguments, version):
 
 
 def make_anonymous(arguments, version):
+    from migration_rehearse import anonymise
+
     made = options.parser("anonymise", version, "Makes an archive of what a run reads, with all that is personal replaced.",
                           epilog="Exit status: 0 the archive is made, and the migration does the same with it as with the image;\n"
                           "2 wrong use; 3 there can be no such archive; 5 the host cannot be used.")
