@@ -17,14 +17,6 @@ using Json = nlohmann::ordered_json;
 constexpr std::string_view kDataclassPrefix = "com.vorlix.Dataclass.";
 constexpr const char* kHidden = "<hidden>";
 
-bool isDeviceLocal(const Account& account) { return account.type() == accountsettings::kOnMyDeviceAccountType; }
-
-Json numberOf(const PropertyValue& value) {
-  const auto integer = value.asInteger();
-  if (!integer) return *value.asReal();
-  return integer->isAboveInt64 ? Json(integer->bits) : Json(static_cast<std::int64_t>(integer->bits));
-}
-
 }  // namespace
 
 std::string shortDataclass(std::string_view dataclass) {
@@ -55,8 +47,9 @@ Names namesOf(const Dictionary& properties) {
 
 Names namesOf(const Account& account) {
   const auto own = [&account](std::string_view key) { return account.ownText(key).value_or(""); };
+  const bool isDevicesOwn = account.type() == accountsettings::kOnMyDeviceAccountType;
   return {account.identifier(),
-          isDeviceLocal(account) ? account.displayName().value_or("") : own(accountsettings::kAccountDisplayName),
+          isDevicesOwn ? account.displayName().value_or("") : own(accountsettings::kAccountDisplayName),
           own(accountsettings::kAccountUsername), own(kAccountHost)};
 }
 
@@ -85,8 +78,11 @@ Json jsonOf(const PropertyValue& value) {
   switch (value.kind()) {
     case Kind::string: return records::withoutUserParts(*value.asText());
     case Kind::boolean: return *value.asBoolean();
-    case Kind::integer:
-    case Kind::real: return numberOf(value);
+    case Kind::real: return *value.asReal();
+    case Kind::integer: {
+      const auto [bits, isAboveInt64] = *value.asInteger();
+      return isAboveInt64 ? Json(bits) : Json(static_cast<std::int64_t>(bits));
+    }
     case Kind::dictionary: return jsonOf(*value.asDictionary());
     case Kind::array: {
       auto elements = Json::array();

@@ -17,6 +17,13 @@ namespace tools {
 // The key under which accounts of most types have the name of their server.
 constexpr std::string_view kAccountHost = "Hostname";
 
+// Values of the interface for programs as those of a file, and back; exactly.
+[[nodiscard]] accountsettings::PropertyValue fileValueOf(const accounts::Value& value);
+[[nodiscard]] accounts::Value valueOf(const accountsettings::PropertyValue& value);
+[[nodiscard]] accounts::Value::Dictionary entriesOf(const accountsettings::Dictionary& properties);
+// What the account has by itself, as the record of a file.
+[[nodiscard]] accountsettings::Dictionary recordOf(const Account& account);
+
 // What a person may mean an account by; whatever it does not have itself is empty.
 struct Names {
   std::string identifier;

@@ -7,7 +7,6 @@
 #include "tools/commands.h"
 #include "tools/key_value.h"
 #include "tools/next_load.h"
-#include "tools/values.h"
 
 namespace tools {
 namespace {
@@ -42,12 +41,6 @@ Account changed(Session& session, const Account& account, const Dataclasses& con
   return after.value_or(account);
 }
 
-std::vector<std::string> textsOf(const BasicAccount::Dataclasses& dataclasses) {
-  std::vector<std::string> texts;
-  for (const Text& each : dataclasses) texts.push_back(each.string());
-  return texts;
-}
-
 // The data class of those that the name means, in short or in full, in whatever case; null where it is none of them.
 const std::string* dataclassNamed(const std::string& name, const Dataclasses& dataclasses) {
   const std::string meant = platform::caseFolded(fullDataclass(name));
@@ -61,7 +54,8 @@ const std::string* dataclassNamed(const std::string& name, const Dataclasses& da
 std::string supportedDataclass(const Account& account, const std::string& name) {
   const Dataclasses supported = account.supportedDataclasses();
   if (const auto* const found = dataclassNamed(name, supported)) return *found;
-  const Dataclasses all = textsOf(BasicAccount::allSupportedDataclasses());
+  Dataclasses all;
+  for (const Text& each : BasicAccount::allSupportedDataclasses()) all.push_back(each.string());
   const auto* const known = dataclassNamed(name, all);
   if (known != nullptr) {
     refuseUse("accounts of the type " + account.type() + " do not support " + shortDataclass(*known));
@@ -88,28 +82,20 @@ void requireLasting(const Dictionary& record) {
   if (const auto fault = faultAtNextLoad(record); !fault.empty()) refuseUse("the next load would " + fault);
 }
 
-Dictionary typeAndClass(const std::string& type, const std::string& className) {
-  if (!BasicAccount::_isValidAccountType(type)) refuseUse("unknown account type: " + type);
-  if (className.empty()) refuseUse("an account needs a class");
-  return {{accountsettings::kAccountType, type}, {accountsettings::kAccountClass, className}};
-}
-
-void setProperty(Dictionary& properties, const KeyValue& property, std::size_t position) {
-  const auto place = "property " + std::to_string(position);
-  if (property.key == accountsettings::kAccountType || property.key == accountsettings::kAccountClass) {
-    refuseUse(place + " sets " + property.key + ", which stands before the properties");
-  }
-  if (!property.value) refuseUse(place + " holds null, which is no value");
-  const auto* const text = property.value->asText();
-  const bool hasText = text != nullptr && !text->empty();
-  if (property.key == accountsettings::kAccountIdentifier && !hasText) refuseUse(place + " is no identifier");
-  properties.set(property.key, *property.value);
-}
-
 Dictionary newRecord(const Words& arguments) {
-  auto properties = typeAndClass(arguments[0], arguments[1]);
+  if (!BasicAccount::_isValidAccountType(arguments[0])) refuseUse("unknown account type: " + arguments[0]);
+  if (arguments[1].empty()) refuseUse("an account needs a class");
+  Dictionary properties{{accountsettings::kAccountType, arguments[0]}, {accountsettings::kAccountClass, arguments[1]}};
   for (std::size_t index = 2; index < arguments.size(); ++index) {
-    setProperty(properties, parseKeyValue(arguments[index], index - 1), index - 1);
+    const auto [key, value] = parseKeyValue(arguments[index], index - 1);
+    const auto place = "property " + std::to_string(index - 1);
+    if (key == accountsettings::kAccountType || key == accountsettings::kAccountClass) {
+      refuseUse(place + " sets " + key + ", which stands before the properties");
+    }
+    if (!value) refuseUse(place + " holds null, which is no value");
+    const bool isEmpty = value->asText() == nullptr || value->asText()->empty();
+    if (key == accountsettings::kAccountIdentifier && isEmpty) refuseUse(place + " is no identifier");
+    properties.set(key, *value);
   }
   requireLasting(properties);
   return properties;
@@ -125,16 +111,6 @@ std::vector<KeyValue> givenProperties(const Words& arguments) {
     }
   }
   return given;
-}
-
-// The account with the properties; a child's record lasts as a part of its parent's.
-Dictionary recordWith(const std::vector<KeyValue>& given, const Account& account, Session& session) {
-  Dictionary record = recordOf(account);
-  for (const auto& [key, value] : given) value ? record.set(key, *value) : static_cast<void>(record.remove(key));
-  if (!account.isChild()) return record;
-  Dictionary parent = recordOf(session.accounts().withIdentifier(account.parentIdentifier()).value_or(account));
-  parent.set(accountsettings::kAccountChildAccounts, accountsettings::Array{std::move(record)});
-  return parent;
 }
 
 bool isDevicesOwn(const Account& account) { return account.type() == accountsettings::kOnMyDeviceAccountType; }
@@ -166,7 +142,14 @@ Outcome setProperties(Session& session, const Words& arguments, const Options& o
   session.beginChanges();
   const Account account = session.accountMeantBy(arguments[0]);
   const auto given = givenProperties(arguments);
-  requireLasting(recordWith(given, account, session));
+  Dictionary record = recordOf(account);
+  for (const auto& [key, value] : given) value ? record.set(key, *value) : static_cast<void>(record.remove(key));
+  if (account.isChild()) {  // whose record lasts as a part of its parent's
+    Dictionary parent = recordOf(session.accounts().withIdentifier(account.parentIdentifier()).value_or(account));
+    parent.set(accountsettings::kAccountChildAccounts, accountsettings::Array{std::move(record)});
+    record = std::move(parent);
+  }
+  requireLasting(record);
   const auto enabled = account.enabledDataclasses();
   const auto after = changed(session, account, enabled, [&](Edit& edit, const std::string& identifier) {
     for (const auto& [key, value] : given) {

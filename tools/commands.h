@@ -26,8 +26,8 @@ struct Command {
   std::string_view arguments;  // as the help shows them
   std::string_view summary;
   std::string_view details;  // for the help on this command alone
-  std::size_t fewestArguments;
-  std::size_t mostArguments;
+  std::size_t minArguments;
+  std::size_t maxArguments;
   Outcome (*run)(Session& session, const Words& arguments, const Options& options);
   bool changesAccounts = false;
   // What is run in place of it where --file is given; null where that makes no sense.

@@ -32,12 +32,6 @@ PropertyValue valueOf(const Json& json, std::size_t position) {
   return members;
 }
 
-std::optional<PropertyValue> parsedValue(std::string_view text, std::size_t position) {
-  const auto json = Json::parse(text, nullptr, false);
-  if (json.is_discarded()) refuseProperty("is no valid JSON after :=", position);
-  return json.is_null() ? std::nullopt : std::optional{valueOf(json, position)};
-}
-
 }  // namespace
 
 KeyValue parseKeyValue(std::string_view argument, std::size_t position) {
@@ -47,7 +41,10 @@ KeyValue parseKeyValue(std::string_view argument, std::size_t position) {
   const auto key = argument.substr(0, isJson ? equals - 1 : equals);
   const auto value = argument.substr(equals + 1);
   if (key.empty()) refuseProperty("has no key", position);
-  return {std::string{key}, isJson ? parsedValue(value, position) : std::optional{PropertyValue{value}}};
+  if (!isJson) return {std::string{key}, PropertyValue{value}};
+  const auto json = Json::parse(value, nullptr, false);
+  if (json.is_discarded()) refuseProperty("is no valid JSON after :=", position);
+  return {std::string{key}, json.is_null() ? std::nullopt : std::optional{valueOf(json, position)}};
 }
 
 }  // namespace tools

@@ -11,7 +11,9 @@ using tools::Failure;
 constexpr std::string_view kProgram = "accountctl";
 
 // An option that means nothing for the command is a misunderstanding that had better be told.
-void checkOptions(const tools::Command& command, const tools::Options& options) {
+const tools::Command& commandOf(const tools::Options& options) {
+  if (options.command.empty()) throw commandline::WrongUse{"no command is given"};
+  const auto& command = tools::commandNamed(options.command);
   const auto require = [](bool isSound, const char* message) {
     if (!isSound) throw commandline::WrongUse{message};
   };
@@ -20,14 +22,8 @@ void checkOptions(const tools::Command& command, const tools::Options& options) 
   require(!options.changesNothing || command.changesAccounts, "--dry-run is for commands that change accounts");
   require(!options.file || command.runOnFile != nullptr, "--file is for list, show and verify");
   require(options.settings.empty() || command.run == tools::recoverAccounts, "--set is for recover");
-}
-
-const tools::Command& commandOf(const tools::Options& options) {
-  if (options.command.empty()) throw commandline::WrongUse{"no command is given"};
-  const auto& command = tools::commandNamed(options.command);
-  checkOptions(command, options);
   const auto count = options.arguments.size();
-  if (count >= command.fewestArguments && count <= command.mostArguments) return command;
+  if (count >= command.minArguments && count <= command.maxArguments) return command;
   throw Failure{ExitStatus::wrongUse, "usage: accountctl " + tools::usageOf(command)};
 }
 
@@ -44,15 +40,14 @@ tools::Outcome perform(std::span<const char* const> arguments) {
   }
 }
 
-int obey(std::span<const char* const> arguments) {
-  const auto outcome = perform(arguments);
-  if (!commandline::print(outcome.output)) throw Failure{ExitStatus::failed, "the output could not be written"};
-  return static_cast<int>(outcome.status);
-}
-
 }  // namespace
 
 int main(int count, char** arguments) {
+  const auto obey = [](std::span<const char* const> words) {
+    const auto outcome = perform(words);
+    if (!commandline::print(outcome.output)) throw Failure{ExitStatus::failed, "the output could not be written"};
+    return static_cast<int>(outcome.status);
+  };
   return commandline::runProgram(kProgram, {arguments, static_cast<std::size_t>(count)},
                                  static_cast<int>(ExitStatus::failed), obey);
 }

@@ -33,7 +33,7 @@ using Clock = std::chrono::steady_clock;
 
 constexpr std::chrono::seconds kTimeLimit{10};
 constexpr rlim_t kMoreMemory = rlim_t{1} << 30;
-constexpr std::size_t kMostReport = std::size_t{1} << 16;
+constexpr std::size_t kMaxReportSize = std::size_t{1} << 16;
 
 // The lines of a report: how it ended, what was found, the operations, and the last one, without which it is none.
 constexpr std::string_view kAnswered = "answered";
@@ -99,7 +99,7 @@ class TrialProcess {
   [[nodiscard]] std::string report() {
     std::string text;
     std::array<char, 4096> block{};
-    while (isReady(_reader) && text.size() < kMostReport) {
+    while (isReady(_reader) && text.size() < kMaxReportSize) {
       const ssize_t count = ::read(_reader.number(), block.data(), block.size());
       if (count == 0 || (count < 0 && errno != EINTR)) break;
       if (count > 0) text.append(block.data(), static_cast<std::size_t>(count));

@@ -12,17 +12,6 @@ using accountsettings::PropertyValue;
 using accountsettings::WhyLeftOut;
 using records::LossCode;
 
-LossCode codeOf(WhyLeftOut why) {
-  switch (why) {
-    case WhyLeftOut::noRecord: return LossCode::droppedNoRecord;
-    case WhyLeftOut::noType: return LossCode::droppedNoType;
-    case WhyLeftOut::unknownType: return LossCode::droppedUnknownType;
-    case WhyLeftOut::noClass: return LossCode::droppedNoClass;
-    case WhyLeftOut::givenUp: break;
-  }
-  return LossCode::droppedUnknownClass;
-}
-
 std::string repairOf(const BasicAccount& loaded) {
   for (const auto& [key, value] : loaded.properties()) {
     const PropertyValue* const given = loaded.originalProperties().find(key);
@@ -32,21 +21,19 @@ std::string repairOf(const BasicAccount& loaded) {
   return {};
 }
 
-std::string faultOfChildren(const Dictionary& record) {
-  const PropertyValue* const children = record.find(accountsettings::kAccountChildAccounts);
-  if (children == nullptr) return {};
-  const Array* const array = children->asArray();
-  if (array == nullptr) return "find none of its children: they are no array";
-  for (std::size_t index = 0; index < array->size(); ++index) {
-    const std::string fault = faultOfChild((*array)[index]);
-    if (!fault.empty()) return "not find its child " + std::to_string(index) + ": " + fault;
-  }
-  return {};
-}
-
 }  // namespace
 
-std::string_view reasonFor(WhyLeftOut why) { return records::meaningOf(codeOf(why)).text; }
+std::string_view reasonFor(WhyLeftOut why) {
+  auto code = LossCode::droppedUnknownClass;
+  switch (why) {
+    case WhyLeftOut::noRecord: code = LossCode::droppedNoRecord; break;
+    case WhyLeftOut::noType: code = LossCode::droppedNoType; break;
+    case WhyLeftOut::unknownType: code = LossCode::droppedUnknownType; break;
+    case WhyLeftOut::noClass: code = LossCode::droppedNoClass; break;
+    case WhyLeftOut::givenUp: break;
+  }
+  return records::meaningOf(code).text;
+}
 
 std::string faultOfChild(const PropertyValue& element) {
   const auto* const child = element.asDictionary();
@@ -63,7 +50,15 @@ std::string faultAtNextLoad(const Dictionary& record) {
   const auto& leftOut = store->loadOutcome().leftOut;
   if (!leftOut.empty()) return "drop it: " + std::string{reasonFor(leftOut.front().why)};
   const std::string repair = repairOf(*store->allBasicAccounts().front());
-  return repair.empty() ? faultOfChildren(record) : repair;
+  const PropertyValue* const children = record.find(accountsettings::kAccountChildAccounts);
+  if (!repair.empty() || children == nullptr) return repair;
+  const Array* const array = children->asArray();
+  if (array == nullptr) return "find none of its children: they are no array";
+  for (std::size_t index = 0; index < array->size(); ++index) {
+    const std::string fault = faultOfChild((*array)[index]);
+    if (!fault.empty()) return "not find its child " + std::to_string(index) + ": " + fault;
+  }
+  return {};
 }
 
 }  // namespace tools

@@ -4,7 +4,9 @@
 
 #include <algorithm>
 #include <filesystem>
+#include <iterator>
 #include <optional>
+#include <sstream>
 #include <string_view>
 #include <system_error>
 
@@ -47,29 +49,6 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
   };
 }
 
-// Property lists hold nothing but text; what is none would be kept as something else than was asked for.
-void checkWords(const Options& options) {
-  const auto& words = options.arguments;
-  const auto found = std::ranges::find_if_not(words, platform::isWellFormedText);
-  if (found == words.end()) return;
-  throw WrongUse{"argument " + std::to_string(found - words.begin() + 1) + " of " + options.command + " is not UTF-8"};
-}
-
-std::vector<std::string> partsOf(std::string_view list) {
-  std::vector<std::string> parts;
-  while (true) {
-    const auto part = list.substr(0, list.find(','));
-    parts.emplace_back(part);
-    if (part.size() == list.size()) return parts;
-    list.remove_prefix(part.size() + 1);
-  }
-}
-
-commandline::Colour colourFor(const std::string& form) {
-  if (form == "auto") return commandline::Colour::automatic;
-  return form == "never" ? commandline::Colour::never : commandline::Colour::always;
-}
-
 }  // namespace
 
 commandline::Page Options::page() const {
@@ -88,14 +67,22 @@ Options parseArguments(std::span<const char* const> arguments) {
   Options options;
   Written written;
   auto words = commandline::readOptions(optionsInto(options, written), arguments);
-  if (written.columns) options.columns = partsOf(*written.columns);
-  if (written.colour) options.colour = colourFor(*written.colour);
+  std::istringstream columns{written.columns ? *written.columns + "," : ""};
+  for (std::string name; std::getline(columns, name, ',');) options.columns.push_back(name);
+  if (written.colour && written.colour != "auto") {
+    options.colour = written.colour == "never" ? commandline::Colour::never : commandline::Colour::always;
+  }
   if (!words.empty()) {
     options.command = std::move(words.front());
     if (options.command.empty()) throw WrongUse{"unknown command: "};
     options.arguments.assign(std::move_iterator{words.begin() + 1}, std::move_iterator{words.end()});
   }
-  checkWords(options);
+  // Property lists hold nothing but text; what is none would be kept as something else than was asked for.
+  const auto& given = options.arguments;
+  const auto place = std::ranges::find_if_not(given, platform::isWellFormedText) - given.begin();
+  if (place != std::ssize(given)) {
+    throw WrongUse{"argument " + std::to_string(place + 1) + " of " + options.command + " is not UTF-8"};
+  }
   std::error_code ignored;
   if (const auto& root = options.device.systemRoot; root && !std::filesystem::is_directory(*root, ignored)) {
     throw WrongUse{"--root is no directory: " + root->string()};

@@ -4,8 +4,8 @@
 
 #include "commandline/progress_line.h"
 #include "commandline/text.h"
+#include "tools/account_view.h"
 #include "tools/recovery.h"
-#include "tools/values.h"
 
 namespace tools {
 namespace {
@@ -56,33 +56,23 @@ std::string lineOf(const RecoveryStep& step, const AccountFile& file, bool isTri
   return (isTried ? "would bring back: " : "brought back: ") + what + why + version;
 }
 
-Json jsonOf(const RecoveryStep& step) {
-  static constexpr std::array kOutcomes{"recovered", "present", "faulty"};
-  return {{"outcome", kOutcomes.at(static_cast<std::size_t>(step.kind))},
-          {"place", step.from->place()},
-          {"identifier", namesOf(step.record).identifier},
-          {"name", namesOf(step.record).name},
-          {"why", step.why.empty() ? Json(nullptr) : Json(step.why)}};
-}
-
 Outcome told(const RecoveryPlan& plan, const AccountFile& file, const Options& options) {
+  static constexpr std::array kOutcomes{"recovered", "present", "faulty"};
   Json report{{"schema", kSchema}, {"dryRun", options.changesNothing}, {"accounts", Json::array()}};
   std::string text;
   bool isFaulty = false;
   for (const RecoveryStep& step : plan.steps()) {
-    report["accounts"].push_back(jsonOf(step));
+    const Names names = namesOf(step.record);
+    report["accounts"].push_back({{"outcome", kOutcomes.at(static_cast<std::size_t>(step.kind))},
+                                  {"place", step.from->place()},
+                                  {"identifier", names.identifier},
+                                  {"name", names.name},
+                                  {"why", step.why.empty() ? Json(nullptr) : Json(step.why)}});
     text += commandline::printable(lineOf(step, file, options.changesNothing)) + "\n";
     isFaulty |= step.kind == RecoveryStep::Kind::leaveFaulty;
   }
   if (plan.steps().empty()) text = "there are no accounts\n";
   return {options.printsJson ? report.dump(2) + "\n" : text, isFaulty ? ExitStatus::incomplete : ExitStatus::done};
-}
-
-void refuseFaulty(const RecoveryPlan& plan) {
-  for (const RecoveryStep& step : plan.steps()) {
-    if (step.kind != RecoveryStep::Kind::leaveFaulty) continue;
-    throw Failure{ExitStatus::failed, step.from->described() + " cannot be brought back: " + step.why};
-  }
 }
 
 // Of an earlier release's file, an account that is not there may have been folded into another one by the migration.
@@ -113,28 +103,21 @@ Outcome recoverRecords(Session& session, const AccountFile& file, const std::vec
   session.beginChanges();
   RecoveryPlan plan{session.accounts()};
   commandline::progressLine().show({"what is missing is looked for", 0.4, 0.5});
-  for (const FoundAccount* each : named) plan.add(file, *each, withProperties(each->properties, options.settings));
+  for (const FoundAccount* each : named) {
+    plan.add(file, *each, withProperties(each->properties, options.settings));
+    const RecoveryStep& step = plan.steps().back();
+    if (step.kind != RecoveryStep::Kind::leaveFaulty) continue;
+    throw Failure{ExitStatus::failed, step.from->described() + " cannot be brought back: " + step.why};
+  }
   if (named.empty()) {
     for (const FoundAccount& each : file.accounts) {
       if (!comesWithParent(each, plan)) plan.add(file, each, each.properties);
     }
     if (file.isOlder()) refuseUnnamed(plan, file);
-  } else {
-    refuseFaulty(plan);
   }
   commandline::progressLine().show({"the accounts are saved", 0.5, 1});
   bringBack(session, plan);
   return told(plan, file, options);
-}
-
-// The one file that the accounts are taken from: that of those that are named, else the only one, or the settings.
-const AccountFile& fileMeant(const Source& source, const std::vector<Chosen>& named) {
-  if (named.empty()) return source.files.front();
-  for (const Chosen& each : named) {
-    if (each.file == named.front().file) continue;
-    throw Failure{ExitStatus::wrongUse, "the accounts stand in several files: bring back those of one at a time"};
-  }
-  return *named.front().file;
 }
 
 }  // namespace
@@ -150,9 +133,15 @@ Outcome recoverAccounts(Session& session, const Words& arguments, const Options&
   for (std::size_t index = 1; index < arguments.size(); ++index) {
     chosen.push_back(accountMeantBy(source, arguments[index]));
   }
-  const AccountFile& file = fileMeant(source, chosen);
+  // The one file that the accounts are taken from: that of those that are named, else the only one, or the settings.
+  const AccountFile& file = chosen.empty() ? source.files.front() : *chosen.front().file;
   std::vector<const FoundAccount*> named;
-  for (const Chosen& each : chosen) named.push_back(each.account);
+  for (const Chosen& each : chosen) {
+    if (each.file != &file) {
+      throw Failure{ExitStatus::wrongUse, "the accounts stand in several files: bring back those of one at a time"};
+    }
+    named.push_back(each.account);
+  }
   if (file.form == FileForm::settings) return recoverRecords(session, file, named, options);
   return recoverLegacyFile(session, file, named, options);
 }

@@ -4,6 +4,7 @@
 #include "accountsettings/product_values.h"
 #include "commandline/text.h"
 #include "platform/platform.h"
+#include "tools/findings.h"
 #include "tools/recovery.h"
 
 namespace tools {
@@ -16,10 +17,6 @@ using Json = nlohmann::ordered_json;
 constexpr int kSchema = 1;
 
 [[noreturn]] void fail(const std::string& message) { throw Failure{ExitStatus::failed, message}; }
-
-Path placeOf(FileForm form) {
-  return form == FileForm::legacyMail ? accountsettings::mailAccountsPath() : accountsettings::daAccountPath();
-}
 
 // The file with the named descriptions repaired.
 AccountFile repaired(const AccountFile& file, const std::vector<const FoundAccount*>& named,
@@ -34,13 +31,6 @@ AccountFile repaired(const AccountFile& file, const std::vector<const FoundAccou
   return result;
 }
 
-void requireConvertible(const AccountFile& file) {
-  for (const FoundAccount& each : file.accounts) {
-    if (each.fault.empty()) continue;
-    fail(each.described() + ": " + each.fault + "; name it, and repair it with --set Class=CLASS");
-  }
-}
-
 bool stands(const Path& path) { return platform::current().files->kindOf(path).isOk(); }
 
 void requireFreePlace(const Path& place, const AccountFile& original) {
@@ -50,15 +40,6 @@ void requireFreePlace(const Path& place, const AccountFile& original) {
   if (!stands(place)) return;
   const auto present = platform::current().propertyLists->readDictionary(place);
   if (!present.isOk() || present.value() != original.root) fail("another file stands there: " + place.string());
-}
-
-enum class Settings : std::uint8_t { absent, older, empty, current };
-
-Settings settingsOf(Session& session) {
-  const accounts::Accounts& accounts = session.accounts();
-  if (!stands(AccountsManager::fullPathToAccountSettingsPlist())) return Settings::absent;
-  if (AccountsManager::accountSettingsNeedsToBeMigrated()) return Settings::older;
-  return accounts.empty() && accounts.unreadable() == 0 ? Settings::empty : Settings::current;
 }
 
 void write(const AccountFile& file, const Path& place) {
@@ -88,12 +69,17 @@ Outcome told(const AccountFile& file, const Path& place, const Options& options)
 
 Outcome recoverLegacyFile(Session& session, const AccountFile& file, const std::vector<const FoundAccount*>& named,
                           const Options& options) {
-  const Path place = placeOf(file.form);
+  const Path place = pathOf(file.form == FileForm::legacyMail ? LegacyForm::mail : LegacyForm::exchange);
   const AccountFile whole = repaired(file, named, options.settings);
-  requireConvertible(whole);
-  const Settings settings = settingsOf(session);
+  for (const FoundAccount& each : whole.accounts) {
+    if (each.fault.empty()) continue;
+    fail(each.described() + ": " + each.fault + "; name it, and repair it with --set Class=CLASS");
+  }
+  const accounts::Accounts& accounts = session.accounts();
+  const bool isMigrated =
+      stands(AccountsManager::fullPathToAccountSettingsPlist()) && !AccountsManager::accountSettingsNeedsToBeMigrated();
   requireFreePlace(place, file);
-  if (settings == Settings::current) {
+  if (isMigrated && (!accounts.empty() || accounts.unreadable() > 0)) {
     fail(
         "the device has migrated accounts, beside which a migration converts such a file without its version steps; go "
         "back first (migration-host --undo), or migrate the file on an empty device and recover from that");
@@ -101,7 +87,7 @@ Outcome recoverLegacyFile(Session& session, const AccountFile& file, const std::
   if (options.changesNothing) return told(whole, place, options);
   platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
   // An empty settings file would pass for migrated accounts; one that is older is migrated together with the file.
-  if (settings == Settings::empty) AccountsManager::removeNewAccountSettingsToMigrateOldAccountInformation();
+  if (isMigrated) AccountsManager::removeNewAccountSettingsToMigrateOldAccountInformation();
   write(whole, place);
   return told(whole, place, options);
 }

@@ -2,10 +2,10 @@
 #include <array>
 #include <utility>
 
+#include "tools/account_view.h"
 #include "tools/key_value.h"
 #include "tools/next_load.h"
 #include "tools/recovery.h"
-#include "tools/values.h"
 
 namespace tools {
 namespace {
@@ -15,11 +15,6 @@ using accountsettings::Dictionary;
 using accountsettings::PropertyValue;
 using accountsettings::Text;
 
-bool areEvidentlyOthers(const Dictionary& one, const Dictionary& other) {
-  const std::string service = serviceOf(one);
-  return !service.empty() && !serviceOf(other).empty() && service != serviceOf(other);
-}
-
 void leave(RecoveryStep& step, RecoveryStep::Kind kind, std::string why) {
   step.kind = kind;
   step.why = std::move(why);
@@ -28,7 +23,9 @@ void leave(RecoveryStep& step, RecoveryStep::Kind kind, std::string why) {
 // An account that is there has an identifier of the record.
 void settleBesides(RecoveryStep& step, const Dictionary& present, const std::string& what, std::string_view key) {
   const std::string whose = namesOf(present).described();
-  if (areEvidentlyOthers(present, step.record)) {
+  const std::string service = serviceOf(present);
+  const std::string other = serviceOf(step.record);
+  if (!service.empty() && !other.empty() && service != other) {
     leave(step, RecoveryStep::Kind::leaveFaulty,
           "another account that is there, " + whose + ", has its " + what + "; --set '" + std::string{key} +
               ":=null' brings it back without");

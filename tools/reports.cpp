@@ -12,7 +12,6 @@
 #include "platform/platform.h"
 #include "tools/account_view.h"
 #include "tools/commands.h"
-#include "tools/values.h"
 
 namespace tools {
 namespace {
@@ -72,12 +71,6 @@ std::string counted(std::size_t count, std::string_view what) {
   return std::to_string(count) + " " + std::string{what} + (count == 1 ? "" : "s");
 }
 
-// "12 accounts, 2 of them in others"
-std::string tally(std::size_t accounts, std::size_t children) {
-  const std::string all = counted(accounts + children, "account");
-  return children == 0 ? all : all + ", " + std::to_string(children) + " of them in others";
-}
-
 bool isThere(const platform::Path& path) { return platform::current().files->kindOf(path).isOk(); }
 
 // What a reader of the list cannot see in it; empty where it has everything.
@@ -123,15 +116,6 @@ Rows summaryOf(const Account& account) {
   return rows;
 }
 
-// Children are accounts of their own and not shown twice.
-Rows propertiesOf(const Account& account) {
-  Rows rows;
-  for (const auto& [key, value] : recordOf(account)) {
-    if (key != accountsettings::kAccountChildAccounts) rows.push_back({"  " + key.string(), lineOf(value, key)});
-  }
-  return rows;
-}
-
 }  // namespace
 
 Outcome listAccounts(Session& session, const Words&, const Options& options) {
@@ -150,18 +134,25 @@ Outcome listAccounts(Session& session, const Words&, const Options& options) {
     for (const Account& child : account.children()) rows.push_back(rowOf(columns, child, "  "));
   }
   if (const auto told = whatIsNotListed(accounts); !told.empty()) commandline::say("accountctl", told);
-  const bool isForPeople = ::isatty(STDOUT_FILENO) == 1;
-  return commandline::table(rows, options.page()) +
-         (isForPeople ? tally(accounts.size(), rows.size() - 1 - accounts.size()) + "\n" : "");
+  const std::string table = commandline::table(rows, options.page());
+  if (::isatty(STDOUT_FILENO) == 0) return table;
+  const std::size_t children = rows.size() - 1 - accounts.size();
+  const std::string others = children == 0 ? "" : ", " + std::to_string(children) + " of them in others";
+  return table + counted(accounts.size() + children, "account") + others + "\n";
 }
 
 Outcome showAccount(Session& session, const Words& arguments, const Options& options) {
   const Account account = session.accountMeantBy(arguments[0]);
   if (!options.printsJson) {
     const auto page = options.page();
+    Rows properties;  // without the children, which are accounts of their own
+    for (const auto& [key, value] : recordOf(account)) {
+      if (key == accountsettings::kAccountChildAccounts) continue;
+      properties.push_back({"  " + key.string(), lineOf(value, key)});
+    }
     return commandline::table(summaryOf(account), page) +
            commandline::emphasised("Properties", commandline::Emphasis::strong, page) + "\n" +
-           commandline::table(propertiesOf(account), page);
+           commandline::table(properties, page);
   }
   auto report = treeOf(account);
   report["service"] = jsonOf(account.service());

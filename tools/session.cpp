@@ -32,37 +32,30 @@ class SettingsFromElsewhere final : public platform::PropertyListStore {
   platform::Path _file;
 };
 
-ExitStatus statusFor(Code code) {
-  switch (code) {
-    case Code::unknownAccount: return ExitStatus::noSuchAccount;
+}  // namespace
+
+void fail(const accounts::Error& error) {
+  switch (error.code) {
+    case Code::unknownAccount: throw Failure{ExitStatus::noSuchAccount, error.sentence};
     case Code::alreadyThere:
     case Code::unsuitable:
-    case Code::wouldBeDropped: return ExitStatus::wrongUse;
+    case Code::wouldBeDropped: throw Failure{ExitStatus::wrongUse, error.sentence};
     case Code::notAnnounced:
-    case Code::brokenInstallation: return ExitStatus::faultyInstallation;
-    default: return ExitStatus::failed;
+    case Code::brokenInstallation: throw Failure{ExitStatus::faultyInstallation, error.sentence};
+    default: throw Failure{ExitStatus::failed, error.sentence};
   }
 }
 
-accounts::OpenOptions optionsOf(const Options& options) {
-  const auto textOf = [](const auto& path) { return path ? path->string() : std::string{}; };
-  accounts::OpenOptions opening;
-  opening.root = textOf(options.device.systemRoot);
-  opening.home = textOf(options.device.home);
-  opening.resources = textOf(options.device.resources);
-  opening.whileWaiting = [](const std::string& sentence) { commandline::say("accountctl", sentence); };
-  opening.mayBeMissing = true;
-  opening.mayDropUnreadable = true;
-  opening.opensModules = options.opensModules();
-  return opening;
-}
-
-}  // namespace
-
-void fail(const accounts::Error& error) { throw Failure{statusFor(error.code), error.sentence}; }
-
-Session::Session(const Options& options) : _options{optionsOf(options)}, _changesNothing{options.changesNothing} {
+Session::Session(const Options& options) : _changesNothing{options.changesNothing} {
   platform::setCurrent(platform::makeLinuxPlatform(options.device));
+  const auto textOf = [](const auto& path) { return path ? path->string() : std::string{}; };
+  _options.root = textOf(options.device.systemRoot);
+  _options.home = textOf(options.device.home);
+  _options.resources = textOf(options.device.resources);
+  _options.whileWaiting = [](const std::string& sentence) { commandline::say("accountctl", sentence); };
+  _options.mayBeMissing = true;
+  _options.mayDropUnreadable = true;
+  _options.opensModules = options.opensModules();
 }
 
 void Session::waitForMigration() const {

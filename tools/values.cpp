@@ -1,4 +1,6 @@
-#include "tools/values.h"
+// Values as a file has them and as the interface for programs has them.
+
+#include "tools/account_view.h"
 
 namespace tools {
 
