@@ -12,22 +12,16 @@
 namespace tools {
 namespace {
 
-using accountsettings::Dictionary;
 using platform::Path;
 using Json = nlohmann::ordered_json;
 
-constexpr std::size_t kLargestManifest = std::size_t{1} << 20U;
-constexpr std::size_t kLargestCopy = std::size_t{256} << 20U;  // no larger property list can be read
+constexpr std::size_t kMaxManifestSize = std::size_t{1} << 20U;
+constexpr std::size_t kMaxCopySize = std::size_t{256} << 20U;  // no larger property list can be read
 constexpr const char* kManifest = "manifest";
 constexpr const char* kLatest = "latest";
 constexpr std::string_view kUsualSnapshots = "var/lib/account-settings/snapshots";
 
 [[noreturn]] void fail(const std::string& message) { throw Failure{ExitStatus::failed, message}; }
-
-bool isDirectory(const Path& path) {
-  std::error_code ignored;
-  return std::filesystem::is_directory(path, ignored);
-}
 
 bool stands(const Path& path) {
   std::error_code ignored;
@@ -36,31 +30,23 @@ bool stands(const Path& path) {
 
 // --- Files ---
 
-FileForm formOf(const Dictionary& root, const Path& path) {
-  if (root.contains("MailAccounts") || root.contains("DeliveryAccounts")) return FileForm::legacyMail;
-  if (root.contains("DAAccountsKey")) return FileForm::legacyExchange;
-  if (root.contains(accountsettings::kPlistAccountsKey)) return FileForm::settings;
-  if (root.contains(accountsettings::kPlistVersionKey)) return FileForm::settings;
-  fail("this is no file of accounts: " + path.string());
-}
-
 AccountFile fileAt(const Path& path) {
   const auto read = platform::current().propertyLists->readDictionary(path);
   if (!read.isOk()) fail("the file cannot be read: " + path.string() + ": " + read.status().reason());
-  AccountFile file{.path = path, .form = formOf(read.value(), path), .root = read.value(), .accounts = {}};
+  AccountFile file{.path = path, .form = FileForm::settings, .root = read.value(), .accounts = {}};
+  const auto has = [&file](std::string_view key) { return file.root.contains(key); };
+  if (has("MailAccounts") || has("DeliveryAccounts")) {
+    file.form = FileForm::legacyMail;
+  } else if (has("DAAccountsKey")) {
+    file.form = FileForm::legacyExchange;
+  } else if (!has(accountsettings::kPlistAccountsKey) && !has(accountsettings::kPlistVersionKey)) {
+    fail("this is no file of accounts: " + path.string());
+  }
   file.accounts = accountsIn(file);
   return file;
 }
 
 // --- Devices ---
-
-// Where the device's file stands on one with another root.
-Path underRoot(const Path& root, const Path& home, const Path& file) {
-  const auto& directories = *platform::current().directories;
-  const Path inHome = file.lexically_relative(directories.home());
-  if (!inHome.empty() && *inHome.begin() != "..") return home / inHome;
-  return root / file.lexically_relative(directories.systemRoot());
-}
 
 std::vector<Path> filesOfDevice() {
   return {AccountsManager::fullPathToAccountSettingsPlist(), accountsettings::daAccountPath(),
@@ -75,9 +61,15 @@ std::optional<Source> filesThatAreThere(const std::vector<Path>& paths) {
   return source.files.empty() ? std::nullopt : std::optional{std::move(source)};
 }
 
+// The files stand below its root, or its home, as the device's own do.
 std::optional<Source> deviceAt(const Path& root) {
+  const auto& directories = *platform::current().directories;
   std::vector<Path> paths;
-  for (const Path& file : filesOfDevice()) paths.push_back(underRoot(root, root / "var/mobile", file));
+  for (const Path& file : filesOfDevice()) {
+    const Path inHome = file.lexically_relative(directories.home());
+    const bool isInHome = !inHome.empty() && *inHome.begin() != "..";
+    paths.push_back(isInHome ? root / "var/mobile" / inHome : root / file.lexically_relative(directories.systemRoot()));
+  }
   return filesThatAreThere(paths);
 }
 
@@ -96,16 +88,6 @@ platform::Bytes bytesOf(const Path& path, std::size_t limit) {
   return read.take();
 }
 
-Json manifestOf(const Path& snapshot) {
-  const Path path = snapshot / kManifest;
-  const auto bytes = bytesOf(path, kLargestManifest);
-  const auto json = Json::parse(bytes, nullptr, false);
-  if (!json.is_object() || !json.contains("manifest") || !json.contains("sha256")) failDamaged(path);
-  const std::string text = json["manifest"].dump(-1, ' ', false, Json::error_handler_t::replace);
-  if (json["sha256"] != checksumOf(reinterpret_cast<const std::uint8_t*>(text.data()), text.size())) failDamaged(path);
-  return json["manifest"];
-}
-
 // The path of a copy that is as the manifest says; nothing for a file of which there is no copy with accounts.
 std::optional<Path> copyOf(const Path& snapshot, const Json& file) {
   const bool holdsAccounts = file.at("part") == "settings" || file.at("part") == "legacy";
@@ -113,43 +95,41 @@ std::optional<Path> copyOf(const Path& snapshot, const Json& file) {
   const auto name = file.at("copy").get<std::string>();
   if (name.find_first_not_of("0123456789") != std::string::npos) failDamaged(snapshot / kManifest);
   const Path path = snapshot / name;
-  const auto bytes = bytesOf(path, kLargestCopy);
+  const auto bytes = bytesOf(path, kMaxCopySize);
   if (file.at("sha256") != checksumOf(bytes.data(), bytes.size())) failDamaged(path);
   return path;
 }
 
 Source snapshotAt(const Path& snapshot) {
   Source source;
+  const Path path = snapshot / kManifest;
   try {
-    const Json manifest = manifestOf(snapshot);
+    const Json parsed = Json::parse(bytesOf(path, kMaxManifestSize));
+    const Json& manifest = parsed.at("manifest");
+    const std::string text = manifest.dump(-1, ' ', false, Json::error_handler_t::replace);
+    const std::string sum = checksumOf(reinterpret_cast<const std::uint8_t*>(text.data()), text.size());
+    if (parsed.at("sha256") != sum) failDamaged(path);
     for (const Json& file : manifest.at("files")) {
-      if (const auto path = copyOf(snapshot, file)) source.files.push_back(fileAt(*path));
+      if (const auto copy = copyOf(snapshot, file)) source.files.push_back(fileAt(*copy));
     }
   } catch (const Json::exception&) {
-    failDamaged(snapshot / kManifest);
+    failDamaged(path);
   }
   if (source.files.empty()) fail("the snapshot has no file of accounts: " + snapshot.string());
   return source;
 }
 
-// The snapshots of a directory, the oldest first: the number at the front of their names counts.
-std::vector<Path> snapshotsIn(const Path& directory) {
+Path snapshotNamed(const std::string& word, const Path& directory) {
   std::vector<Path> snapshots;
   std::error_code failure;
   for (const auto& entry : std::filesystem::directory_iterator{directory, failure}) {
-    if (!entry.path().filename().native().starts_with('.') && stands(entry.path() / kManifest)) {
-      snapshots.push_back(entry.path());
-    }
+    const std::string name = entry.path().filename().native();
+    const bool isMeant = word == kLatest || name.starts_with(word);
+    if (isMeant && !name.starts_with('.') && stands(entry.path() / kManifest)) snapshots.push_back(entry.path());
   }
+  // The last one is the latest: the number at the front of their names counts.
   std::ranges::sort(snapshots);
-  return snapshots;
-}
-
-Path snapshotNamed(const std::string& word, const Path& directory) {
-  auto snapshots = snapshotsIn(directory);
-  if (word == kLatest && !snapshots.empty()) return snapshots.back();
-  std::erase_if(snapshots, [&](const Path& each) { return !each.filename().native().starts_with(word); });
-  if (snapshots.size() == 1) return snapshots.front();
+  if (!snapshots.empty() && (word == kLatest || snapshots.size() == 1)) return snapshots.back();
   const std::string where = "among the snapshots in " + directory.string();
   if (snapshots.empty()) {
     throw Failure{ExitStatus::wrongUse, "there is no file " + word + ", and none " + where + " is called so"};
@@ -159,18 +139,15 @@ Path snapshotNamed(const std::string& word, const Path& directory) {
 
 // --- What a word means ---
 
-std::vector<Chosen> allIn(const Source& source) {
-  std::vector<Chosen> all;
-  for (const AccountFile& file : source.files) {
-    for (const FoundAccount& account : file.accounts) all.push_back({&file, &account});
-  }
-  return all;
-}
-
 template <typename Condition>
-std::vector<Chosen> selected(std::vector<Chosen> all, const Condition& isMeant) {
-  std::erase_if(all, [&](const Chosen& each) { return !isMeant(*each.account); });
-  return all;
+std::vector<Chosen> selected(const Source& source, const Condition& isMeant) {
+  std::vector<Chosen> meant;
+  for (const AccountFile& file : source.files) {
+    for (const FoundAccount& account : file.accounts) {
+      if (isMeant(account)) meant.push_back({&file, &account});
+    }
+  }
+  return meant;
 }
 
 }  // namespace
@@ -185,18 +162,19 @@ Source sourceNamed(const std::string& word, const Options& options) {
   const Path path = std::filesystem::absolute(word);
   const Path usual = platform::current().directories->systemRoot() / kUsualSnapshots;
   if (!stands(path)) return snapshotAt(snapshotNamed(word, options.snapshots.value_or(usual)));
-  if (!isDirectory(path)) return {{fileAt(path)}};
+  std::error_code ignored;
+  if (!std::filesystem::is_directory(path, ignored)) return {{fileAt(path)}};
   if (stands(path / kManifest)) return snapshotAt(path);
   if (auto source = deviceAt(path)) return *std::move(source);
   fail("there are no accounts in " + path.string() + ": it is no snapshot, and no device's root with such files");
 }
 
 Chosen accountMeantBy(const Source& source, const std::string& word) {
-  const auto all = allIn(source);
   const auto namesOfAccount = [](const FoundAccount& account) { return namesOf(account.record); };
-  auto meant = selected(all, [&](const auto& each) { return each.place() == word; });
-  if (meant.empty()) meant = selected(all, [&](const auto& each) { return namesOfAccount(each).identifier == word; });
-  if (meant.empty()) meant = selected(all, [&](const auto& each) { return namesOfAccount(each).areMeantBy(word); });
+  auto meant = selected(source, [&](const auto& each) { return each.place() == word; });
+  if (meant.empty())
+    meant = selected(source, [&](const auto& each) { return namesOfAccount(each).identifier == word; });
+  if (meant.empty()) meant = selected(source, [&](const auto& each) { return namesOfAccount(each).areMeantBy(word); });
   if (meant.empty()) throw Failure{ExitStatus::noSuchAccount, "no account is called " + word + " there"};
   if (meant.size() == 1) return meant.front();
   std::string message = "several accounts are meant by " + word + ": ";

@@ -150,12 +150,11 @@ CreatorTable creatorTableIn(const Dictionary& file) {
     const Array* const list = value.asArray();
     const std::size_t first = table.entries.size();
     for (std::size_t index = 0; list != nullptr && index < list->size(); ++index) {
-      CreatorEntry entry;
+      CreatorEntry& entry = table.entries.emplace_back();
       entry.place = type + "[" + std::to_string(index) + "]";
       entry.accountType = type;
       Examination{entry, table.findings}.examine((*list)[index]);
       if (!isKnown) entry.isCalled = false;
-      table.entries.push_back(std::move(entry));
     }
     markShadowed(table, first);
   }

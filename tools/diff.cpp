@@ -48,10 +48,6 @@ void pairBy(KeyOf keyBefore, KeyOf keyAfter, std::vector<Pair>& pairs, std::vect
 
 std::string identifierOf(const Dictionary& record) { return namesOf(record).identifier; }
 
-std::string syncIdentifierOf(const Dictionary& record) {
-  return textUnder(record, accountsettings::kAccountSyncIdentifier);
-}
-
 // What the record is an account of, together with its value under the key.
 std::string serviceWith(const Dictionary& record, std::string_view key) {
   const std::string service = serviceOf(record);
@@ -67,6 +63,9 @@ std::vector<Pair> paired(const Source& before, const Source& after) {
   for (const FoundAccount* each : accountsOf(before)) pairs.push_back({each, nullptr});
   auto added = accountsOf(after);
   pairBy(identifierOf, identifierOf, pairs, added);
+  const KeyOf syncIdentifierOf = [](const Dictionary& record) {
+    return textUnder(record, accountsettings::kAccountSyncIdentifier);
+  };
   pairBy(identifierOf, syncIdentifierOf, pairs, added);
   pairBy(serviceAndType, serviceAndType, pairs, added);
   pairBy(serviceAndClass, serviceAndClass, pairs, added);

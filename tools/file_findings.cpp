@@ -53,12 +53,6 @@ platform::Result<FileAttributes> attributesOf(const Path& path) {
   return platform::makeFileKeeper(*platform::current().directories)->attributesOf(path);
 }
 
-// Where a link leads to; empty where it is none.
-Path targetOf(const Path& path) {
-  std::error_code failure;
-  return std::filesystem::read_symlink(path, failure);
-}
-
 // What is followed is told of; what is not, the reading of the file tells.
 Findings findingsOfLink(const Path& path, const Path& target, const Fates& fates) {
   const auto kind = platform::current().files->kindOf(path);
@@ -80,14 +74,6 @@ Findings findingsOfOwner(const FileAttributes& attributes) {
   if (user.value() == attributes.owner) return {};
   return {{"foreign-owner", "", "", "it belongs to the user " + std::to_string(attributes.owner) + ", not to " + owner,
            "a migration leaves a file that belongs to " + owner}};
-}
-
-Findings findingsOfPermissions(const FileAttributes& attributes, const Fates& fates) {
-  if ((attributes.permissions & kOthersBits) == 0) return {};
-  std::array<char, 12> mode{};
-  std::snprintf(mode.data(), mode.size(), "%03o", attributes.permissions);
-  return {{"open-to-others", "", "", "others may read or change it: its mode is " + std::string{mode.data()},
-           fates.openToOthers}};
 }
 
 std::vector<Path> filesIn(const Path& directory, const std::function<bool(const std::string&)>& isMeant) {
@@ -118,12 +104,6 @@ Path besideIt(const Path& path, std::string_view before, std::string_view behind
   return path.parent_path() / (std::string{before} + path.filename().string() + std::string{behind});
 }
 
-Finding companionOf(const Path& legacy) {
-  const bool isConverted = platform::current().files->kindOf(legacy).isOk() && !isDeletionUnderWay();
-  return {"companion", "", "", "an earlier release left this copy of " + legacy.filename().string(),
-          isConverted ? "a migration deletes it with the file itself" : "a migration leaves it"};
-}
-
 void addIfThere(const Path& path, const Finding& finding, std::vector<Leftover>& found) {
   if (attributesOf(path).isOk()) found.push_back({path, finding});
 }
@@ -132,7 +112,13 @@ void addIfThere(const Path& path, const Finding& finding, std::vector<Leftover>&
 void lookBesideTheFiles(std::vector<Leftover>& found) {
   const Path exchange = pathOf(LegacyForm::exchange);
   const Path mail = pathOf(LegacyForm::mail);
-  for (const Path& legacy : {exchange, mail}) addIfThere(besideIt(legacy, "", ".original"), companionOf(legacy), found);
+  for (const Path& legacy : {exchange, mail}) {
+    const bool isConverted = platform::current().files->kindOf(legacy).isOk() && !isDeletionUnderWay();
+    addIfThere(besideIt(legacy, "", ".original"),
+               {"companion", "", "", "an earlier release left this copy of " + legacy.filename().string(),
+                isConverted ? "a migration deletes it with the file itself" : "a migration leaves it"},
+               found);
+  }
   const Path copyAside = platform::current().directories->sharedResources() / accountsettings::kCrashReporterDirectory /
                          AccountsManager::fullPathToAccountSettingsPlist().filename();
   const Finding kept{"kept-copy", "", "", "a run kept it: what stands in it may stand nowhere else",
@@ -179,13 +165,22 @@ Findings findingsOfStanding(const Path& path, Part part) {
   const Fates& fates = part == Part::settings ? kFatesOfSettings : kFatesOfLegacyFiles;
   const auto attributes = attributesOf(path);
   if (!attributes.isOk()) return {};
-  if (const Path target = targetOf(path); !target.empty()) return findingsOfLink(path, target, fates);
-  if (attributes.value().kind == FileKind::directory)
+  std::error_code isNoLink;
+  const Path target = std::filesystem::read_symlink(path, isNoLink);
+  if (!isNoLink) return findingsOfLink(path, target, fates);
+  if (attributes.value().kind == FileKind::directory) {
     return {{"no-file", "", "", "it is a directory", fates.directory}};
+  }
   if (attributes.value().kind != FileKind::file) {
     return {{"no-file", "", "", "it is a pipe, a socket or a device, and no file", fates.otherKind}};
   }
-  Findings findings = findingsOfPermissions(attributes.value(), fates);
+  Findings findings;
+  if (const auto permissions = attributes.value().permissions; (permissions & kOthersBits) != 0) {
+    std::array<char, 12> mode{};
+    std::snprintf(mode.data(), mode.size(), "%03o", permissions);
+    findings.push_back({"open-to-others", "", "",
+                        "others may read or change it: its mode is " + std::string{mode.data()}, fates.openToOthers});
+  }
   if (part == Part::settings) std::ranges::move(findingsOfOwner(attributes.value()), std::back_inserter(findings));
   return findings;
 }

@@ -24,26 +24,6 @@ Source examinedSource(Session& session, const Options& options) {
 std::string typeOf(const FoundAccount& account) { return textUnder(account.record, accountsettings::kAccountType); }
 std::string classOf(const FoundAccount& account) { return textUnder(account.record, accountsettings::kAccountClass); }
 
-// "/a/file: settings file, data version 7"
-std::string headOf(const AccountFile& file) {
-  const auto version = file.version();
-  const std::string told = version ? "data version " + std::to_string(*version) : "no data version";
-  return commandline::printable(file.path.string()) + ": " + std::string{nameOf(file.form)} +
-         (file.form == FileForm::settings ? ", " + told : "");
-}
-
-std::string listOf(const AccountFile& file, const commandline::Page& page) {
-  if (file.accounts.empty()) return headOf(file) + ", no accounts\n";
-  Rows rows{commandline::Row{{"PLACE", "IDENTIFIER", "TYPE", "CLASS", "NAME", "USER", "FAULT"},
-                             commandline::Emphasis::strong}};
-  for (const FoundAccount& account : file.accounts) {
-    const auto names = namesOf(account.record);
-    rows.push_back(
-        {account.place(), names.identifier, typeOf(account), classOf(account), names.name, names.user, account.fault});
-  }
-  return headOf(file) + "\n" + commandline::table(rows, page);
-}
-
 Json jsonOf(const FoundAccount& account) {
   const auto names = namesOf(account.record);
   return {{"place", account.place()},        {"identifier", orNull(names.identifier)},
@@ -67,12 +47,26 @@ std::string printed(const Json& report) { return report.dump(2) + "\n"; }
 }  // namespace
 
 Outcome listFile(Session& session, const Words&, const Options& options) {
+  static const commandline::Row heading{{"PLACE", "IDENTIFIER", "TYPE", "CLASS", "NAME", "USER", "FAULT"},
+                                        commandline::Emphasis::strong};
   const auto source = examinedSource(session, options);
   Json report{{"schema", kSchema}, {"files", Json::array()}};
   std::string text;
   for (const AccountFile& file : source.files) {
     report["files"].push_back(jsonOf(file));
-    text += listOf(file, options.page());
+    text += commandline::printable(file.path.string()) + ": " + std::string{nameOf(file.form)};
+    const auto version = file.version();
+    if (file.form == FileForm::settings) {
+      text += version ? ", data version " + std::to_string(*version) : ", no data version";
+    }
+    text += file.accounts.empty() ? ", no accounts\n" : "\n";
+    Rows rows{heading};
+    for (const FoundAccount& account : file.accounts) {
+      const auto names = namesOf(account.record);
+      rows.push_back({account.place(), names.identifier, typeOf(account), classOf(account), names.name, names.user,
+                      account.fault});
+    }
+    if (!file.accounts.empty()) text += commandline::table(rows, options.page());
   }
   return options.printsJson ? printed(report) : text;
 }

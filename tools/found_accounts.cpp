@@ -55,22 +55,17 @@ constexpr LegacyList kLegacyLists[] = {
     {FileForm::legacyMail, "MailAccounts", accountsettings::kMailAccountType, kMailRenames, {}},
     {FileForm::legacyExchange, "DAAccountsKey", accountsettings::kExchangeAccountType, kExchangeRenames, {}}};
 
-Dictionary recordOf(const LegacyList& list, const Dictionary& description) {
-  Dictionary record = description;
-  for (const Rename& rename : list.renames) {
-    if (auto value = record.remove(rename.legacyKey)) record.set(rename.key, *std::move(value));
-  }
-  record.set(accountsettings::kAccountType, list.type);
-  const bool lacksClass = record.text(accountsettings::kAccountClass) == nullptr;
-  if (lacksClass && !list.assumedClass.empty()) record.set(accountsettings::kAccountClass, list.assumedClass);
-  return record;
-}
-
 void addLegacyAccounts(const LegacyList& list, const AccountFile& file, std::vector<FoundAccount>& accounts) {
   const Array* const descriptions = file.root.array(list.key);
   for (std::size_t index = 0; descriptions != nullptr && index < descriptions->size(); ++index) {
     FoundAccount account = accountAt(list.key, index, (*descriptions)[index]);
-    account.record = recordOf(list, account.properties);
+    Dictionary& record = account.record;
+    for (const Rename& rename : list.renames) {
+      if (auto value = record.remove(rename.legacyKey)) record.set(rename.key, *std::move(value));
+    }
+    record.set(accountsettings::kAccountType, list.type);
+    const bool lacksClass = record.text(accountsettings::kAccountClass) == nullptr;
+    if (lacksClass && !list.assumedClass.empty()) record.set(accountsettings::kAccountClass, list.assumedClass);
     if (BasicAccount::initWithProperties(account.record) == nullptr) {
       account.fault = "its description has no class, so a migration converts none of the file";
     }
@@ -80,17 +75,6 @@ void addLegacyAccounts(const LegacyList& list, const AccountFile& file, std::vec
 
 // --- The records of a settings file ---
 
-void addChildren(const FoundAccount& parent, std::vector<FoundAccount>& accounts) {
-  const Array* const children = parent.properties.array(accountsettings::kAccountChildAccounts);
-  for (std::size_t index = 0; children != nullptr && index < children->size(); ++index) {
-    const PropertyValue& element = (*children)[index];
-    FoundAccount child = accountAt(parent.list, parent.index, element);
-    child.child = index;
-    if (const auto fault = faultOfChild(element); !fault.empty()) child.fault = std::string{kMeansNoChild} + fault;
-    accounts.push_back(std::move(child));
-  }
-}
-
 void addRecords(const Array& records, std::vector<FoundAccount>& accounts) {
   const auto store = AccountsManager::initWithAccounsInfoArray(records);
   const auto& leftOut = store->loadOutcome().leftOut;
@@ -99,20 +83,13 @@ void addRecords(const Array& records, std::vector<FoundAccount>& accounts) {
     FoundAccount account = accountAt(accountsettings::kPlistAccountsKey, index, records[index]);
     if (next != leftOut.end() && next->position == index) account.fault = reasonFor((next++)->why);
     accounts.push_back(account);
-    addChildren(account, accounts);
-  }
-}
-
-// Of several with one identifier no more than one is found.
-void noteSharedIdentifiers(std::vector<FoundAccount>& accounts) {
-  platform::InsertionOrderedMap<const FoundAccount*> known;
-  for (FoundAccount& account : accounts) {
-    const auto* const identifier = account.record.text(accountsettings::kAccountIdentifier);
-    if (identifier == nullptr || !account.fault.empty()) continue;
-    if (const auto* const earlier = known.find(*identifier)) {
-      account.fault = "it shares its identifier with " + (*earlier)->place();
-    } else {
-      known.set(*identifier, &account);
+    const Array* const children = account.properties.array(accountsettings::kAccountChildAccounts);
+    for (std::size_t place = 0; children != nullptr && place < children->size(); ++place) {
+      const PropertyValue& element = (*children)[place];
+      FoundAccount child = accountAt(account.list, index, element);
+      child.child = place;
+      if (const auto fault = faultOfChild(element); !fault.empty()) child.fault = std::string{kMeansNoChild} + fault;
+      accounts.push_back(std::move(child));
     }
   }
 }
@@ -157,7 +134,17 @@ std::vector<FoundAccount> accountsIn(const AccountFile& file) {
   }
   const Array* const records = file.root.array(accountsettings::kPlistAccountsKey);
   if (file.form == FileForm::settings && records != nullptr) addRecords(*records, accounts);
-  noteSharedIdentifiers(accounts);
+  // Of several with one identifier no more than one is found.
+  platform::InsertionOrderedMap<const FoundAccount*> known;
+  for (FoundAccount& account : accounts) {
+    const auto* const identifier = account.record.text(accountsettings::kAccountIdentifier);
+    if (identifier == nullptr || !account.fault.empty()) continue;
+    if (const auto* const earlier = known.find(*identifier)) {
+      account.fault = "it shares its identifier with " + (*earlier)->place();
+    } else {
+      known.set(*identifier, &account);
+    }
+  }
   return accounts;
 }
 

@@ -1,5 +1,6 @@
 #include <algorithm>
 #include <array>
+#include <set>
 #include <span>
 
 #include "accountsettings/file_paths.h"
@@ -74,21 +75,6 @@ std::string placeIn(std::string_view array, std::size_t index) {
   return std::string{array} + "[" + std::to_string(index) + "]";
 }
 
-std::string clauseOnClass(const Dictionary& description, const List& list) {
-  const auto* const value = valueUnder(description, list.classKey, accountsettings::kAccountClass);
-  const std::string key{list.classKey};
-  return value == nullptr ? "there is no " + key : key + " is no class: " + lineOf(*value, key);
-}
-
-bool hasAccountOf(const Dictionary& settings, const std::string& identifier) {
-  const Array* const accounts = settings.array(accountsettings::kPlistAccountsKey);
-  return accounts != nullptr && std::ranges::any_of(*accounts, [&](const PropertyValue& element) {
-           const Dictionary& record = dictionaryIn(element);
-           return textUnder(record, accountsettings::kAccountIdentifier) == identifier ||
-                  textUnder(record, accountsettings::kAccountSyncIdentifier) == identifier;
-         });
-}
-
 std::vector<std::string> identifiersIn(const Dictionary& file, const List& list) {
   std::vector<std::string> identifiers;
   for (const PropertyValue& element : descriptionsIn(file, list)) {
@@ -97,22 +83,21 @@ std::vector<std::string> identifiersIn(const Dictionary& file, const List& list)
   return identifiers;
 }
 
-std::size_t countOfConverted(LegacyForm form, const Dictionary& file, const Dictionary& settings) {
+// How many of the file's accounts the settings have already, under their identifier or to sync by.
+std::ptrdiff_t countOfConverted(LegacyForm form, const Dictionary& file, const Dictionary& settings) {
+  std::set<std::string> known;
+  const Array* const accounts = settings.array(accountsettings::kPlistAccountsKey);
+  for (std::size_t index = 0; accounts != nullptr && index < accounts->size(); ++index) {
+    const Dictionary& record = dictionaryIn((*accounts)[index]);
+    known.insert(textUnder(record, accountsettings::kAccountIdentifier));
+    known.insert(textUnder(record, accountsettings::kAccountSyncIdentifier));
+  }
+  known.erase("");
   std::ptrdiff_t count = 0;
   for (const List& list : listsOf(form)) {
-    count += std::ranges::count_if(identifiersIn(file, list), [&](const std::string& identifier) {
-      return !identifier.empty() && hasAccountOf(settings, identifier);
-    });
+    count += std::ranges::count_if(identifiersIn(file, list), [&](const auto& each) { return known.contains(each); });
   }
-  return static_cast<std::size_t>(count);
-}
-
-std::string fateOf(LegacyForm form, const Dictionary& file) {
-  if (isDeletionUnderWay()) return "a migration deletes it without converting it, since it only finishes the deletion";
-  if (!findingsOfDescriptions(form, file).empty()) {
-    return "a migration converts none of them, since one is refused, and deletes the file";
-  }
-  return "a migration converts them and deletes the file";
+  return count;
 }
 
 }  // namespace
@@ -142,8 +127,10 @@ Findings findingsOfDescriptions(LegacyForm form, const Dictionary& file) {
     for (std::size_t index = 0; index < descriptions.size(); ++index) {
       const Dictionary& description = dictionaryIn(descriptions[index]);
       if (!isRefused(description, list)) continue;
+      const auto* const value = valueUnder(description, list.classKey, accountsettings::kAccountClass);
+      const std::string key{list.classKey};
       findings.push_back({"refused-description", placeIn(list.key, index), identifierOf(description, list),
-                          clauseOnClass(description, list),
+                          value == nullptr ? "there is no " + key : key + " is no class: " + lineOf(*value, key),
                           "a migration refuses it, and with it every account of the file, which it deletes"});
     }
   }
@@ -153,10 +140,15 @@ Findings findingsOfDescriptions(LegacyForm form, const Dictionary& file) {
 Findings findingsOfConversion(LegacyForm form, const Dictionary& file) {
   const auto settings =
       platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist()).valueOr({});
-  const std::size_t count = countOfDescriptions(form, file);
-  Findings findings{
-      {"legacy", "", "", "accounts of the first releases stand in it: " + std::to_string(count), fateOf(form, file)}};
-  const std::size_t converted = countOfConverted(form, file, settings);
+  std::string fate = "a migration converts them and deletes the file";
+  if (isDeletionUnderWay()) {
+    fate = "a migration deletes it without converting it, since it only finishes the deletion";
+  } else if (!findingsOfDescriptions(form, file).empty()) {
+    fate = "a migration converts none of them, since one is refused, and deletes the file";
+  }
+  const std::string count = std::to_string(countOfDescriptions(form, file));
+  Findings findings{{"legacy", "", "", "accounts of the first releases stand in it: " + count, fate}};
+  const auto converted = countOfConverted(form, file, settings);
   if (converted > 0 && !isDeletionUnderWay()) {
     findings.push_back(
         {"interrupted-run", "", "",

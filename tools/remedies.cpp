@@ -85,14 +85,10 @@ std::string onDevice(const char* program, const Options& options) {
   return command;
 }
 
-std::string sysusers(const Options& options) {
-  const auto& root = options.device.systemRoot;
-  return root ? "systemd-sysusers --root=" + quoted(root->string()) : "systemd-sysusers";
-}
-
 std::string commandFor(Act act, const std::string& file, const Options& options) {
   const std::string path = quoted(file);
   const std::string kept = quoted(file + ".kept");
+  const auto& root = options.device.systemRoot;
   switch (act) {
     case Act::nothing: return {};
     case Act::keepCopy: return "cp -p " + path + " " + kept;
@@ -103,7 +99,7 @@ std::string commandFor(Act act, const std::string& file, const Options& options)
     case Act::remove: return "rm " + path;
     case Act::closeToOthers: return "chmod go= " + path;
     case Act::giveToMobile: return "chown mobile:mobile " + path;
-    case Act::makeMobile: return sysusers(options);
+    case Act::makeMobile: return "systemd-sysusers" + (root ? " --root=" + quoted(root->string()) : "");
     case Act::list: return onDevice("accountctl", options) + " list";
     case Act::save: return onDevice("accountctl", options) + " save";
     case Act::rehearse: return onDevice("migration-host", options) + " --dry-run --explain";

@@ -21,21 +21,8 @@ std::string currentVersion() { return std::to_string(AccountsManager::currentVer
 
 std::string versionText(std::int64_t version) { return "the data version is " + std::to_string(version); }
 
-std::vector<Finding> oneFinding(std::string_view kind, std::string_view place, std::string what,
-                                const std::string& migration) {
-  return {{kind, std::string{place}, "", std::move(what), "a migration " + migration}};
-}
-
-// Whether the library, which answers for the file that is examined, would upgrade it.
-Findings findingsOfNumber(std::int64_t version) {
-  if (AccountsManager::accountSettingsNeedsToBeMigrated()) {
-    return oneFinding("version-older", kVersionPlace, versionText(version),
-                      "upgrades the accounts from there to " + currentVersion());
-  }
-  if (static_cast<std::uint64_t>(version) == AccountsManager::currentVersion()) return {};
-  return oneFinding("version-newer", kVersionPlace,
-                    versionText(version) + (version < 0 ? ", which counts as newer than every other" : ""),
-                    "upgrades nothing and saves the file as version " + currentVersion());
+Finding finding(std::string_view kind, std::string_view place, std::string what, const std::string& migration) {
+  return {kind, std::string{place}, "", std::move(what), "a migration " + migration};
 }
 
 }  // namespace
@@ -43,19 +30,28 @@ Findings findingsOfNumber(std::int64_t version) {
 Findings findingsOfVersion(const Dictionary& file) {
   const PropertyValue* const version = file.find(accountsettings::kPlistVersionKey);
   if (version == nullptr) {
-    return oneFinding("version-absent", kVersionPlace, "there is no data version", kTakesForCurrent);
+    return {finding("version-absent", kVersionPlace, "there is no data version", kTakesForCurrent)};
   }
   const auto number = version->integerValue();
   const auto shown = records::description(*version);
   if (!number) {
-    return oneFinding("version-odd", kVersionPlace, "the data version is no number: " + shown, kTakesForCurrent);
+    return {finding("version-odd", kVersionPlace, "the data version is no number: " + shown, kTakesForCurrent)};
   }
   Findings findings;
   if (!version->asInteger()) {
-    findings = oneFinding("version-odd", kVersionPlace, "the data version is no integer: " + shown,
-                          "reads it as " + std::to_string(*number));
+    findings.push_back(finding("version-odd", kVersionPlace, "the data version is no integer: " + shown,
+                               "reads it as " + std::to_string(*number)));
   }
-  for (Finding& each : findingsOfNumber(*number)) findings.push_back(std::move(each));
+  const bool isCurrent = static_cast<std::uint64_t>(*number) == AccountsManager::currentVersion();
+  // The library, which answers for the file that is examined, says whether it would upgrade it.
+  if (AccountsManager::accountSettingsNeedsToBeMigrated()) {
+    findings.push_back(finding("version-older", kVersionPlace, versionText(*number),
+                               "upgrades the accounts from there to " + currentVersion()));
+  } else if (!isCurrent) {
+    findings.push_back(finding("version-newer", kVersionPlace,
+                               versionText(*number) + (*number < 0 ? ", which counts as newer than every other" : ""),
+                               "upgrades nothing and saves the file as version " + currentVersion()));
+  }
   return findings;
 }
 
@@ -63,10 +59,10 @@ Findings findingsOfRoot(const Dictionary& file) {
   Findings findings;
   const PropertyValue* const accounts = file.find(accountsettings::kPlistAccountsKey);
   if (accounts == nullptr) {
-    findings = oneFinding("no-accounts", kAccountsPlace, "there is no list of accounts", "saves an empty one");
+    findings.push_back(finding("no-accounts", kAccountsPlace, "there is no list of accounts", "saves an empty one"));
   } else if (accounts->asArray() == nullptr) {
-    findings = oneFinding("no-accounts", kAccountsPlace, "what should be the list of accounts is no array",
-                          "reads no account from it and loses what it holds");
+    findings.push_back(finding("no-accounts", kAccountsPlace, "what should be the list of accounts is no array",
+                               "reads no account from it and loses what it holds"));
   }
   for (const auto& [key, value] : file) {
     if (key == accountsettings::kPlistAccountsKey || key == accountsettings::kPlistVersionKey) continue;

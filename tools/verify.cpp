@@ -94,23 +94,11 @@ void examineLegacy(LegacyForm form, Examination& examination) {
   examination.files.push_back(std::move(file));
 }
 
-Examination examineDevice() {
-  Examination examination;
-  examineSettings(AccountsManager::fullPathToAccountSettingsPlist(), examination);
-  examineLegacy(LegacyForm::exchange, examination);
-  examineLegacy(LegacyForm::mail, examination);
-  for (Leftover& each : leftoversOnDevice()) {
-    examination.files.push_back({std::move(each.path), "other", {}, {std::move(each.finding)}});
-  }
-  return examination;
-}
-
 // A file of the first releases by its keys, wherever it lies; any other as a settings file.
-Examination examineNamed(const Path& path) {
+void examineNamed(const Path& path, Examination& examination) {
   const auto read =
       platform::current().propertyLists->readDictionary(AccountsManager::fullPathToAccountSettingsPlist());
   if (read.cause() == platform::Cause::missing) throw Failure{ExitStatus::failed, "there is no file " + path.string()};
-  Examination examination;
   const auto form = read.isOk() ? legacyFormOf(read.value()) : std::nullopt;
   if (form) {
     examination.files.push_back(
@@ -118,7 +106,6 @@ Examination examineNamed(const Path& path) {
   } else {
     examineSettings(path, examination);
   }
-  return examination;
 }
 
 // --- The report ---
@@ -173,33 +160,25 @@ std::string reportFor(const Examination& examination, const Options& options) {
 
 Json orNull(const std::string& text) { return text.empty() ? Json(nullptr) : Json(text); }
 
-Json jsonOf(const Finding& finding, const Path& file, const Options& options) {
-  const auto [advice, command] = remedyFor(finding, file, options);
-  return {{"kind", finding.kind},
-          {"file", Text{file.string()}.string()},
-          {"place", orNull(finding.place)},
-          {"identifier", orNull(finding.identifier)},
-          {"what", finding.what},
-          {"migration", finding.migration},
-          {"advice", advice},
-          {"command", orNull(command)}};
-}
-
 std::string jsonFor(const Examination& examination, const Options& options) {
   Json report{{"files", Json::array()}, {"findings", Json::array()}};
   for (const ExaminedFile& file : examination.files) {
-    report["files"].push_back({{"file", Text{file.path.string()}.string()},
-                               {"form", file.form},
-                               {"accounts", file.accounts ? Json(*file.accounts) : Json(nullptr)}});
-    for (const Finding& each : file.findings) report["findings"].push_back(jsonOf(each, file.path, options));
+    const std::string path = Text{file.path.string()}.string();
+    report["files"].push_back(
+        {{"file", path}, {"form", file.form}, {"accounts", file.accounts ? Json(*file.accounts) : Json(nullptr)}});
+    for (const Finding& each : file.findings) {
+      const auto [advice, command] = remedyFor(each, file.path, options);
+      report["findings"].push_back({{"kind", each.kind},
+                                    {"file", path},
+                                    {"place", orNull(each.place)},
+                                    {"identifier", orNull(each.identifier)},
+                                    {"what", each.what},
+                                    {"migration", each.migration},
+                                    {"advice", advice},
+                                    {"command", orNull(command)}});
+    }
   }
   return report.dump(2) + "\n";
-}
-
-ExitStatus statusOf(const Examination& examination) {
-  if (!examination.unopened.empty()) return ExitStatus::failed;
-  const bool isClean = std::ranges::all_of(examination.files, [](const auto& file) { return file.findings.empty(); });
-  return isClean ? ExitStatus::done : ExitStatus::findings;
 }
 
 }  // namespace
@@ -209,9 +188,21 @@ Outcome verifySettings(Session& session, const Words& arguments, const Options& 
   if (isNamed && arguments[0].empty()) throw Failure{ExitStatus::wrongUse, "the file to verify has no name"};
   const auto named = isNamed ? std::optional{std::filesystem::absolute(arguments[0])} : std::nullopt;
   session.beginExamination(named);
-  const auto examination = named ? examineNamed(*named) : examineDevice();
+  Examination examination;
+  if (named) {
+    examineNamed(*named, examination);
+  } else {
+    examineSettings(AccountsManager::fullPathToAccountSettingsPlist(), examination);
+    for (const LegacyForm form : {LegacyForm::exchange, LegacyForm::mail}) examineLegacy(form, examination);
+    for (Leftover& each : leftoversOnDevice()) {
+      examination.files.push_back({std::move(each.path), "other", {}, {std::move(each.finding)}});
+    }
+  }
   for (const std::string& each : examination.unopened) commandline::say("accountctl", each);
-  return {options.printsJson ? jsonFor(examination, options) : reportFor(examination, options), statusOf(examination)};
+  const bool isClean = std::ranges::all_of(examination.files, [](const auto& file) { return file.findings.empty(); });
+  const auto status = isClean ? ExitStatus::done : ExitStatus::findings;
+  return {options.printsJson ? jsonFor(examination, options) : reportFor(examination, options),
+          examination.unopened.empty() ? status : ExitStatus::failed};
 }
 
 }  // namespace tools
