@@ -9,7 +9,7 @@ DOCUMENT = (TREE / "docs/MESSAGES.md").read_text(encoding="utf-8")
 # Of each section of the page: where the messages come from, and the calls that make them.
 SAID = {
     "On the console": (("migrator", "modules", "accountsettings"), r"writeToConsole\(|convertedAccounts\("),
-    "By the host": (("host", "platform/linux/files"), r"\b(?:say|warn|tell|fail|failWrongUse|refuse)\(|\bEnding\{|\bProblem\{|console->write\(|\bnoPlugin\("),
+    "By the host": (("host", "platform/linux/files"), r"\b(?:say|warn|tell|miss|fail|failWrongUse|refuse)\(|\bEnding\{|\bProblem\{|console->write\(|\bnoPlugin\("),
     "In the journal": (("accountsettings", "migrator"), r"\b_ASLogSystem\(\)\.log\("),
 }
 NOT_OF_A_RUN = ("host/options.cpp", "host/rehearsal_server.cpp")  # wrong use of the command line, or of the server
