@@ -191,11 +191,12 @@ bool Device::isTrusted(const Path& lockFile) const {
   return ::stat(_settingsFile.c_str(), &settings) == 0 && file.st_uid == settings.st_uid;
 }
 
-void Device::prepareSaving() const {
+Status Device::prepareSaving() const {
   const Path directory = temporaryDirectory(_services);
-  if (_services.files->kindOf(directory).isOk()) return;
-  if (!_services.files->createDirectories(directory, kOwnerOnly).isOk()) return;
-  static_cast<void>(_services.files->setOwner(directory, kOwner, kOwner));
+  if (_services.files->kindOf(directory).isOk()) return {};
+  const Status made = _services.files->createDirectories(directory, kOwnerOnly);
+  if (made.isOk()) static_cast<void>(_services.files->setOwner(directory, kOwner, kOwner));
+  return made;
 }
 
 Result<Store> Device::load(Use use) const {

@@ -58,8 +58,8 @@ class Device {
   // that a program that changes in a loop comes behind those who wait. A lock file that another user of the machine may
   // have put there is refused.
   [[nodiscard]] Result<HeldLocks> takeLocks() const;
-  // Makes sure of the directory in which a save makes the new file.
-  void prepareSaving() const;
+  // Makes sure of the directory in which a save makes the new file, or says why it cannot be made.
+  [[nodiscard]] platform::Status prepareSaving() const;
 
  private:
   friend class Within;

@@ -152,10 +152,9 @@ Outcome examine(const AccountsManager& store, const Pair& pair) {
   return done();
 }
 
-Error failureOf(const platform::Path& file, const accountsettings::SaveOutcome& outcome) {
-  const int cause = outcome.status.errorNumber();
-  const std::string sentence =
-      "the accounts could not be saved to " + file.string() + ": " + outcome.status.description();
+Error failureOf(const platform::Path& file, const platform::Status& status) {
+  const int cause = status.errorNumber();
+  const std::string sentence = "the accounts could not be saved to " + file.string() + ": " + status.description();
   if (cause == ENOSPC || cause == EDQUOT) return {Code::noSpace, sentence};
   const bool isForbidden = cause == EACCES || cause == EPERM || cause == EROFS;
   return {isForbidden ? Code::noPermission : Code::notSaved, sentence};
@@ -232,10 +231,12 @@ struct Edit::Content {
     if (pairs.empty() && !rewrites) return Saved{};
     Saved saved{changesBetween(before, after, device), std::nullopt};
     if (manner == Manner::trial) return saved;
-    device->prepareSaving();
+    if (const auto prepared = device->prepareSaving(); !prepared.isOk()) {
+      return failureOf(device->settingsFile(), prepared);
+    }
     saveSilently(*store);
     const auto& outcome = store->lastSaveOutcome();
-    return outcome.isSaved() ? Result<Saved>{std::move(saved)} : failureOf(device->settingsFile(), outcome);
+    return outcome.isSaved() ? Result<Saved>{std::move(saved)} : failureOf(device->settingsFile(), outcome.status);
   }
 
   [[nodiscard]] std::optional<Error> announce() const {
