@@ -50,7 +50,7 @@ std::shared_ptr<const AccountClassInfo> classInfo() {
   return info;
 }
 
-const platform::ClassRegistration registration{classInfo()};
+const platform::ClassRegistration kRegistration{classInfo()};
 
 }  // namespace
 

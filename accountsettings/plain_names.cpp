@@ -28,7 +28,7 @@ void mailClassFoundByName(const Dictionary& properties, std::string_view reason)
   reportMailAccountClassFound(properties, reason);
 }
 
-ACCOUNT_EXPORT extern const char* const lockFilenameByName asm("kAccountMigrationLockFilename");
-const char* const lockFilenameByName = kAccountMigrationLockFilename;
+ACCOUNT_EXPORT extern const char* const kLockFilenameByName asm("kAccountMigrationLockFilename");
+const char* const kLockFilenameByName = kAccountMigrationLockFilename;
 
 }  // namespace accountsettings

@@ -235,8 +235,8 @@ bool account_settings_value_date(const account_settings_value* value, double* se
 const uint8_t* account_settings_value_data(const account_settings_value* value, size_t* size) {
   if (!value->data) return nullptr;
   if (size != nullptr) *size = value->data->size();
-  static constexpr uint8_t none = 0;  // of no bytes, but not NULL either
-  return value->data->empty() ? &none : value->data->data();
+  static constexpr uint8_t kNone = 0;  // of no bytes, but not NULL either
+  return value->data->empty() ? &kNone : value->data->data();
 }
 
 size_t account_settings_value_count(const account_settings_value* value) { return value->elements.size(); }

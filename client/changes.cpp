@@ -107,9 +107,9 @@ std::vector<Pair> differingPairs(const Records& before, const Records& after) {
 }
 
 std::vector<std::string> differingKeys(const Pair& pair) {
-  static const Dictionary none;
-  const Dictionary& before = pair.before == nullptr ? none : *pair.before;
-  const Dictionary& after = pair.after == nullptr ? none : *pair.after;
+  static const Dictionary kNone;
+  const Dictionary& before = pair.before == nullptr ? kNone : *pair.before;
+  const Dictionary& after = pair.after == nullptr ? kNone : *pair.after;
   std::vector<std::string> keys;
   for (const auto& [key, value] : before) {
     if (!after.contains(key)) keys.push_back(key.string());

@@ -15,8 +15,8 @@ void openLibraryOf(const platform::Platform& platform, const std::filesystem::pa
 }
 
 std::filesystem::path installedPlugin() {
-  static const auto program = std::filesystem::read_symlink("/proc/self/exe");
-  return (program.parent_path() / HOST_PLUGIN_FROM_PROGRAM).lexically_normal();
+  static const auto kProgram = std::filesystem::read_symlink("/proc/self/exe");
+  return (kProgram.parent_path() / HOST_PLUGIN_FROM_PROGRAM).lexically_normal();
 }
 
 platform::Status noPlugin(std::string reason) {

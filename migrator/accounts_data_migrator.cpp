@@ -16,7 +16,7 @@
 namespace migrator {
 namespace {
 
-const platform::ClassRegistration registration{std::make_shared<platform::DataClassMigratorClass>(
+const platform::ClassRegistration kRegistration{std::make_shared<platform::DataClassMigratorClass>(
     "AccountsDataMigrator", [] { return std::make_unique<AccountsDataMigrator>(); })};
 
 // Says what was thrown. Out of memory even for that, it says less, and at last nothing.

@@ -144,7 +144,7 @@ std::shared_ptr<const AccountClassInfo> announcer() {
   return info;
 }
 
-const platform::ClassRegistration notifier{announcer()};
+const platform::ClassRegistration kNotifier{announcer()};
 
 }  // namespace
 }  // namespace modules

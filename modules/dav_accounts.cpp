@@ -34,8 +34,8 @@ const accountsettings::AccountClassInfo* classForType(std::string_view type) {
   return nullptr;
 }
 
-const platform::ClassRegistration fullAccounts{fullAccountCreator("DAVAccountCreator", classForType)};
-const platform::ClassRegistration syncAccounts{syncAccountCreator("DAVSyncAccountCreator")};
+const platform::ClassRegistration kFullAccounts{fullAccountCreator("DAVAccountCreator", classForType)};
+const platform::ClassRegistration kSyncAccounts{syncAccountCreator("DAVSyncAccountCreator")};
 
 }  // namespace
 }  // namespace modules

@@ -7,7 +7,7 @@ namespace modules {
 namespace {
 
 // Keeps the library among what this module needs, however the linker is asked to drop what seems unused.
-[[gnu::used]] const auto fullAccount = &accountsettings::DeviceLocalAccount::accountWithBasicAccount<>;
+[[gnu::used]] const auto kFullAccount = &accountsettings::DeviceLocalAccount::accountWithBasicAccount<>;
 
 }  // namespace
 }  // namespace modules

@@ -7,7 +7,7 @@ namespace {
 
 constexpr ServiceKind kDirectory{.name = "LDAP", .securePort = 636, .plainPort = 389};
 
-const platform::ClassRegistration fullAccounts{fullAccountCreator(
+const platform::ClassRegistration kFullAccounts{fullAccountCreator(
     "DirectoryAccountCreator", [](const BasicAccount&) -> const ServiceKind& { return kDirectory; })};
 
 }  // namespace

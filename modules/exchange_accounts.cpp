@@ -7,9 +7,9 @@ namespace {
 
 constexpr ServiceKind kExchange{.name = "Exchange", .securePort = 443, .plainPort = 80};
 
-const platform::ClassRegistration fullAccounts{
+const platform::ClassRegistration kFullAccounts{
     fullAccountCreator("ExchangeAccountCreator", [](const BasicAccount&) -> const ServiceKind& { return kExchange; })};
-const platform::ClassRegistration syncAccounts{syncAccountCreator("ExchangeSyncAccountCreator")};
+const platform::ClassRegistration kSyncAccounts{syncAccountCreator("ExchangeSyncAccountCreator")};
 
 }  // namespace
 }  // namespace modules

@@ -19,8 +19,8 @@ const ServiceKind& kindOf(const BasicAccount& account) {
   return kCloud;
 }
 
-const platform::ClassRegistration fullAccounts{fullAccountCreator("HostedAccountCreator", kindOf)};
-const platform::ClassRegistration syncAccounts{syncAccountCreator("HostedSyncAccountCreator")};
+const platform::ClassRegistration kFullAccounts{fullAccountCreator("HostedAccountCreator", kindOf)};
+const platform::ClassRegistration kSyncAccounts{syncAccountCreator("HostedSyncAccountCreator")};
 
 }  // namespace
 }  // namespace modules

@@ -30,8 +30,8 @@ const ServiceKind& kindOf(const BasicAccount& account) {
   return kImap;
 }
 
-const platform::ClassRegistration fullAccounts{fullAccountCreator("MailAccountCreator", kindOf)};
-const platform::ClassRegistration syncAccounts{syncAccountCreator("MailSyncAccountCreator")};
+const platform::ClassRegistration kFullAccounts{fullAccountCreator("MailAccountCreator", kindOf)};
+const platform::ClassRegistration kSyncAccounts{syncAccountCreator("MailSyncAccountCreator")};
 
 }  // namespace
 }  // namespace modules

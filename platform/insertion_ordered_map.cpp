@@ -20,8 +20,8 @@ XXH64_hash_t makeSeed() {
 }  // namespace
 
 std::size_t SeededHash::operator()(std::string_view text) const {
-  static const XXH64_hash_t seed = makeSeed();
-  return XXH3_64bits_withSeed(text.data(), text.size(), seed);
+  static const XXH64_hash_t kSeed = makeSeed();
+  return XXH3_64bits_withSeed(text.data(), text.size(), kSeed);
 }
 
 }  // namespace platform

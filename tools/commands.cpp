@@ -47,7 +47,7 @@ constexpr std::string_view kNewDevice =
 }  // namespace
 
 const std::vector<Command>& commands() {
-  static const std::vector<Command> all{
+  static const std::vector<Command> kAll{
       {"list", "", "all accounts, children below their parents", kList, 0, 0, listAccounts, false, listFile},
       {"show", "ID", "one account with its properties", kId, 1, 1, showAccount, false, showInFile},
       {"verify", "[FILE]", "what is wrong, what a migration does about it, and what to do", kVerify, 0, 1,
@@ -70,7 +70,7 @@ const std::vector<Command>& commands() {
       {"new-device", "DIR", "make a scratch device to try account modules on", kNewDevice, 1, 1, makeDevice},
       {"help", "[COMMAND]", "what a command does and takes", "", 0, 1, helpOnCommand},
   };
-  return all;
+  return kAll;
 }
 
 }  // namespace tools

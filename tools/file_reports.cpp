@@ -47,8 +47,8 @@ std::string printed(const Json& report) { return report.dump(2) + "\n"; }
 }  // namespace
 
 Outcome listFile(Session& session, const Words&, const Options& options) {
-  static const commandline::Row heading{{"PLACE", "IDENTIFIER", "TYPE", "CLASS", "NAME", "USER", "FAULT"},
-                                        commandline::Emphasis::strong};
+  static const commandline::Row kHeading{{"PLACE", "IDENTIFIER", "TYPE", "CLASS", "NAME", "USER", "FAULT"},
+                                         commandline::Emphasis::strong};
   const auto source = examinedSource(session, options);
   Json report{{"schema", kSchema}, {"files", Json::array()}};
   std::string text;
@@ -60,7 +60,7 @@ Outcome listFile(Session& session, const Words&, const Options& options) {
       text += version ? ", data version " + std::to_string(*version) : ", no data version";
     }
     text += file.accounts.empty() ? ", no accounts\n" : "\n";
-    Rows rows{heading};
+    Rows rows{kHeading};
     for (const FoundAccount& account : file.accounts) {
       const auto names = namesOf(account.record);
       rows.push_back({account.place(), names.identifier, typeOf(account), classOf(account), names.name, names.user,

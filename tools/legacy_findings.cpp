@@ -38,15 +38,15 @@ std::span<const List> listsOf(LegacyForm form) {
 }
 
 const Array& descriptionsIn(const Dictionary& file, const List& list) {
-  static const Array none;
+  static const Array kNone;
   const Array* const descriptions = file.array(list.key);
-  return descriptions == nullptr ? none : *descriptions;
+  return descriptions == nullptr ? kNone : *descriptions;
 }
 
 const Dictionary& dictionaryIn(const PropertyValue& element) {
-  static const Dictionary none;
+  static const Dictionary kNone;
   const Dictionary* const dictionary = element.asDictionary();
-  return dictionary == nullptr ? none : *dictionary;
+  return dictionary == nullptr ? kNone : *dictionary;
 }
 
 // The value of the legacy key takes the place of one that stands under the later name.

@@ -18,9 +18,9 @@ using accountsettings::Text;
 constexpr const char* kDropsRecord = "a migration drops the record";
 
 const Dictionary& propertiesIn(const PropertyValue& element) {
-  static const Dictionary none;
+  static const Dictionary kNone;
   const Dictionary* const properties = element.asDictionary();
-  return properties == nullptr ? none : *properties;
+  return properties == nullptr ? kNone : *properties;
 }
 
 // A value as a clause: `Class is "MailAccount"`.

@@ -38,9 +38,9 @@ struct Examination {
 };
 
 const Array& recordsIn(const Dictionary& file) {
-  static const Array none;
+  static const Array kNone;
   const Array* const accounts = file.array(accountsettings::kPlistAccountsKey);
-  return accounts == nullptr ? none : *accounts;
+  return accounts == nullptr ? kNone : *accounts;
 }
 
 void append(Findings& findings, Findings more) {

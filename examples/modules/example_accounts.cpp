@@ -80,7 +80,7 @@ std::shared_ptr<const AccountClassInfo> notifier() {
 }
 
 // Opening the module makes these, and with them its classes known.
-const platform::ClassRegistration accountClass{accountCreator()};
-const platform::ClassRegistration notifierClass{notifier()};
+const platform::ClassRegistration kAccountClass{accountCreator()};
+const platform::ClassRegistration kNotifierClass{notifier()};
 
 }  // namespace

@@ -16,14 +16,14 @@ namespace {
 // ICU's functions, opened by the first who asks. Null where the library that has them does not stand where it was
 // installed or cannot be opened: dates are then not written and texts are in English, but no account waits for that.
 const IcuFunctions* icuFunctions() {
-  static const IcuFunctions* const functions = []() -> const IcuFunctions* {
+  static const IcuFunctions* const kFunctions = []() -> const IcuFunctions* {
     const std::string file = ownDirectory() / "account-settings/platform-icu.so";
     void* const library = ::dlopen(file.c_str(), RTLD_NOW | RTLD_LOCAL | RTLD_NODELETE);
     if (library == nullptr) return nullptr;
     const auto getter = reinterpret_cast<IcuFunctionsGetter>(::dlsym(library, kIcuFunctionsSymbol));
     return getter == nullptr ? nullptr : getter();
   }();
-  return functions;
+  return kFunctions;
 }
 
 // --- Texts in the user's language ---

@@ -51,13 +51,13 @@ class Presence {
 };
 
 bool hasJournal() {
-  static const Presence socket{kJournalSocket};
-  return socket();
+  static const Presence kSocket{kJournalSocket};
+  return kSocket();
 }
 
 bool hasSyslog() {
-  static const Presence socket{"/dev/log"};
-  return socket();
+  static const Presence kSocket{"/dev/log"};
+  return kSocket();
 }
 
 class LinuxSystemLog final : public SystemLog {

@@ -51,8 +51,8 @@ std::optional<BusLibrary> openLibrary() {
 }  // namespace
 
 const BusLibrary* busLibrary() {
-  static const std::optional<BusLibrary> library = openLibrary();
-  return library ? &*library : nullptr;
+  static const std::optional<BusLibrary> kLibrary = openLibrary();
+  return kLibrary ? &*kLibrary : nullptr;
 }
 
 }  // namespace platform
