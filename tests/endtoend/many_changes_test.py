@@ -15,6 +15,8 @@ CLIENT = PLUGINS / "changing_client"
 PROGRAMS = 16
 CHANGES = int(os.environ.get("CHANGES", "1000"))
 FEWER = 160
+# A program of a short run is killed about once; one of a long run again and again, until its end.
+SHARE_THAT_LIVES, LONGEST_LIFE = (0.5, 1) if CHANGES <= 1000 else (0, 20)
 SEED = int(os.environ.get("SEED", "20261"))
 PATIENCE = 600
 SHARED = {"Type": "LDAP", "Class": "LDAPAccount", "Identifier": "Shared"}
@@ -34,8 +36,8 @@ class Program:
     def run(self):
         following = 0
         while following < self._changes and not self.failure:
-            lives = self._random.random() < 0.5
-            following = self._run_from(following, None if lives else self._random.uniform(0.05, 1))
+            lives = self._random.random() < SHARE_THAT_LIVES
+            following = self._run_from(following, None if lives else self._random.uniform(0.05, LONGEST_LIFE))
 
     def _run_from(self, first, killed_after):
         process = subprocess.Popen(
@@ -96,11 +98,17 @@ class ManyChanges(DeviceTest):
         self.assertEqual(len(added), len(set(added)))
         self.assertEqual((added, keys), watcher.told_at_last(len(added) + len(keys)))
 
-    def test_follow_each_other_without_a_gap(self):
-        for program in self.run_programs("count", CHANGES if CHANGES > 1000 else FEWER):
-            accounts = {each["Identifier"]: each for each in self.tree.read_plist(SETTINGS)["Accounts"]}
-            stands = accounts[program.name]["Count"]
-            self.assertEqual(program.answered[-1], stands)
+    def test_follow_each_other_without_a_gap_and_are_told_in_order(self):
+        watcher = Watcher(self, self.tree.root)
+        programs = self.run_programs("count", CHANGES if CHANGES > 1000 else FEWER)
+        accounts = self.tree.read_plist(SETTINGS)["Accounts"]
+        stands = {each["Identifier"]: each["Count"] for each in accounts if "Count" in each}
+        told = watcher.counts_at_last(stands)
+        for program in programs:
+            counts = told[program.name]
+            self.assertEqual([program.answered[-1]] * 2, [stands[program.name], counts[-1]])
+            self.assertEqual(sorted(set(counts)), counts)
+            self.assertEqual(set(), set(counts) - {*program.answered, *program.unknown})
 
     def test_let_each_other_in_though_they_change_without_a_pause(self):
         programs = self.run_programs("count", 40, 2)
@@ -112,15 +120,17 @@ class ManyChanges(DeviceTest):
             self.assertLessEqual(statistics.median(meanwhile), 1)
 
     def test_lose_to_an_editor_without_the_lock_what_was_saved_while_it_edited(self):
-        editor = Editor(self.tree)
+        watcher, editor = Watcher(self, self.tree.root), Editor(self.tree)
         with editor:
-            programs = self.run_programs("add", FEWER)
+            programs = self.run_programs("add", 1000 if CHANGES > 1000 else FEWER)
         added, keys = self.named()
+        self.assertEqual((len(added), len(keys)), (len(set(added)), len(set(keys))))
         for program in programs:
             for number in program.answered:
                 if f"{program.name}-{number}" not in {*added, *keys}:
                     self.assertTrue(editor.was_at_it(*program.intervals[number]), f"{program.name}-{number}")
         self.assertGreater(len(editor.spans), 1)
+        self.assertEqual((set(added), set(keys)), watcher.sum_at_last((set(added), set(keys))))
 
 
 class Watcher:
@@ -147,14 +157,44 @@ class Watcher:
 
     def told_at_last(self, count):
         """The accounts that were told as added and the keys that were told as changed, in the order of telling."""
+        self._wait_until(lambda: self._number_told() >= count)
+        added = [words[1] for words in self._lines if words[0] == "added"]
+        return added, [key for key, _ in self._changes("Shared")]
+
+    def sum_at_last(self, expected):
+        """What the added accounts and the keys that were set come to, less those that went again."""
+        self._wait_until(lambda: self._sum() == expected)
+        return self._sum()
+
+    def counts_at_last(self, expected):
+        """The numbers that were told of each account, in the order of telling, once the last ones are as expected."""
+        def counts():
+            return {name: [number for key, number in self._changes(name) if key == "Count"] for name in expected}
+
+        self._wait_until(lambda: expected == {name: told[-1] for name, told in counts().items() if told})
+        return counts()
+
+    def _wait_until(self, is_over):
         deadline = time.monotonic() + 60
-        while time.monotonic() < deadline and self._count() < count:
+        while time.monotonic() < deadline and not is_over():
             time.sleep(0.05)
         self._end()
-        added = [words[1] for words in self._lines if words[0] == "added"]
-        return added, [key for words in self._lines if words[:2] == ["changed", "Shared"] for key in words[2:]]
 
-    def _count(self):
+    def _changes(self, name):
+        """The keys of one account that were told as changed, each with its number, or with none where it went."""
+        for words in list(self._lines):
+            if words[:2] == ["changed", name]:
+                for key, _, number in (word.partition("=") for word in words[2:]):
+                    yield key, int(number) if number else None
+
+    def _sum(self):
+        added, keys = set(), dict(self._changes("Shared"))
+        for kind, name, *_ in list(self._lines):
+            if kind != "changed":
+                (added.add if kind == "added" else added.discard)(name)
+        return added, {key for key, number in keys.items() if number is not None}
+
+    def _number_told(self):
         return sum(len(words) - 2 if words[0] == "changed" else 1 for words in list(self._lines))
 
 

@@ -1,8 +1,8 @@
 // A program on the interface for programs, for tests that kill it:
 //
-//   changing_client add ROOT NAME FIRST END    adds the accounts NAME-FIRST, NAME-FIRST+2, ... and sets the keys
-//   between changing_client count ROOT NAME FIRST END  sets the number of the account NAME to FIRST, FIRST+1, ...
-//   changing_client watch ROOT                 tells of changes until its input ends
+//   changing_client add ROOT NAME FIRST END    adds accounts NAME-FIRST, NAME-FIRST+2, ..., sets keys between them
+//   changing_client count ROOT NAME FIRST END  sets the number of the account NAME to FIRST, FIRST+1, ...
+//   changing_client watch ROOT                 tells of changes, with the numbers that were set, until its input ends
 //
 // After each change that was saved it says when it began, when it ended (nanoseconds) and which it was.
 
@@ -75,7 +75,10 @@ int watch(const char* root) {
   const auto settings = opened(root);
   const auto watch = settings.watch(settings.accounts().value(), [](const accounts::Change& change) {
     std::cout << kinds[static_cast<int>(change.kind)] << ' ' << change.account.identifier();
-    for (const std::string& key : change.keys) std::cout << ' ' << key;
+    for (const std::string& key : change.keys) {
+      const auto number = change.account.integer(key);
+      std::cout << ' ' << key << (number ? "=" + std::to_string(*number) : "");
+    }
     std::cout << std::endl;
   });
   if (!watch.isOk()) return 1;
