@@ -11,10 +11,11 @@ from process_counts import Processes, can_trace_calls
 
 BUILD = Path(os.environ["BUILD"])
 DEVICE = os.environ["BENCH_DEVICE"]
-# Other processors have other ways to copy and compare, and other kernels other pages at hand.
-SLACK = 1.1
-SLACK_OF_CALLS = 1.05
-SLACK_OF_FAULTS = 1.3
+# Other processors have other ways to copy and compare, other kernels other pages at hand, and other machines other things
+# beside a device that are looked for.
+SLACK = 1.15
+SLACK_OF_CALLS = 1.25
+SLACK_OF_FAULTS = 1.4
 # Instructions, calls of the kernel and page faults, as docs/PERFORMANCE.md has them.
 MOST = {
     f"version {CURRENT_VERSION}": (7_200_000, 402, 248),
