@@ -26,7 +26,7 @@ class OfARun(SnapshotsTest):
         self.assertEqual(1, lines.count("done\n"))
         self.assertIn(lines[-1], ("done\n", ""))  # the end of the process may take its time, too
         for line in lines:
-            self.assertRegex(line, r"^(\d+ %, \d+ s left: slow|done\n)?$")
+            self.assertRegex(line, r"^(\d+ %, \d+ s left: slow(, 256 of 1000 accounts)?|done\n)?$")
 
     def test_goes_on_while_nothing_is_told(self):
         shares = [int(share) for share in re.findall(r"(\d+) %", self.shown("work slowly"))]
