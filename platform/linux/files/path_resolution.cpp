@@ -259,8 +259,9 @@ bool PathResolver::isBase(const path& path) const {
 }
 
 Descriptor PathResolver::openPlain(const path& path) const {
-  if (!isPlain(path.native()) && failWith(ELOOP)) return {};
-  return openWithoutLinks(AT_FDCWD, path.c_str(), O_PATH);
+  if (isPlain(path.native())) return openWithoutLinks(AT_FDCWD, path.c_str(), O_PATH);
+  errno = ELOOP;
+  return {};
 }
 
 Descriptor PathResolver::openFile(const path& path) const {
