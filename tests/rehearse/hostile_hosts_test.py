@@ -70,27 +70,30 @@ class HostileImages(RehearseTest):
         self.assertEqual("unrehearsed worker-died", found.pop("murder"))
         self.assertEqual(dict.fromkeys(others, "kept"), found)
 
-    def test_lose_nothing_to_a_host_that_dies_once(self):
+    def assert_nothing_is_lost(self, kill):
+        """Though `kill` ends the host that serves, of which it is given the process, between two images."""
         root = self.image("one")
         program = host.Host(str(REAL_HOST))
         limits = host.Limits()
         self.addCleanup(serving.close)
         before = serving.rehearse(program, str(root), limits)
-        serving._kept.server._process.kill()
-        serving._kept.server._process.wait()
+        kill(serving._kept.server._process)
         after = serving.rehearse(program, str(root), limits)
         self.assertEqual((0, before.errors), (after.status, after.errors))
 
+    def test_lose_nothing_to_a_host_that_dies_once(self):
+        def kill(process):
+            process.kill()
+            process.wait()
+
+        self.assert_nothing_is_lost(kill)
+
     def test_lose_nothing_to_a_host_that_dies_while_it_is_asked(self):
-        root = self.image("one")
-        program = host.Host(str(REAL_HOST))
-        limits = host.Limits()
-        self.addCleanup(serving.close)
-        before = serving.rehearse(program, str(root), limits)
-        os.kill(serving._kept.server._process.pid, signal.SIGSTOP)
-        threading.Timer(0.2, serving._kept.server._process.kill).start()
-        after = serving.rehearse(program, str(root), limits)
-        self.assertEqual((0, before.errors), (after.status, after.errors))
+        def kill(process):
+            os.kill(process.pid, signal.SIGSTOP)
+            threading.Timer(0.2, process.kill).start()
+
+        self.assert_nothing_is_lost(kill)
 
 
 class HostileHosts(RehearseTest):
