@@ -5,6 +5,7 @@
 #include <sys/time.h>
 #include <unistd.h>
 
+#include <algorithm>
 #include <cerrno>
 #include <csignal>
 #include <thread>
@@ -309,6 +310,19 @@ TEST_F(LinuxLocks, SayOnceAfterASecondForWhomTheyWait) {
   EXPECT_TRUE(said[0].ends_with("process, which holds the lock " + file.string()) ||
               said[0].ends_with("), which holds the lock " + file.string()))
       << said[0];
+}
+
+TEST_F(LinuxLocks, ListenAgainAndAgainOnOneDescriptor) {
+  const auto held = locks->lockNamed(name);
+  ASSERT_TRUE(held.value()->lock().isOk());
+  const auto listening = [&] {
+    EXPECT_FALSE(isTaken(*locksTaken({.timeLimit = 20ms})));
+    const auto isNotices = [](const auto& entry) { return fs::read_symlink(entry.path()) == "anon_inode:inotify"; };
+    return std::ranges::count_if(fs::directory_iterator{"/proc/self/fd"}, isNotices);
+  };
+  const auto first = listening();
+  EXPECT_GT(first, 0);
+  EXPECT_EQ(listening(), first);
 }
 
 TEST_F(LinuxLocks, ThatAreSharedWaitOnlyForWhoeverHoldsThemAlone) {

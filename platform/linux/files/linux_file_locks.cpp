@@ -5,13 +5,16 @@
 #include <sys/file.h>
 #include <sys/inotify.h>
 #include <sys/sysmacros.h>
+#include <unistd.h>
 
 #include <algorithm>
 #include <array>
 #include <cerrno>
 #include <cstdio>
 #include <fstream>
+#include <mutex>
 #include <sstream>
+#include <vector>
 
 #include "platform/linux/files/account_names.h"
 #include "platform/linux/files/directory_trees.h"
@@ -166,29 +169,74 @@ class LockFile {
   bool _hasSaidReplacement = false;
 };
 
+// Descriptors on which the kernel tells what becomes of files. Those that nobody uses are kept: the kernel takes
+// milliseconds to close one, in which whoever got a lock would only hold it.
+class Notices {
+ public:
+  // Not open where there is none to be had.
+  static Descriptor take() {
+    Notices& kept = ofThisProcess();
+    const std::scoped_lock lock{kept._guard};
+    const bool isForked = std::exchange(kept._process, ::getpid()) != ::getpid();
+    if (isForked) kept._idle.clear();  // they are the parent's
+    if (kept._idle.empty()) return Descriptor{::inotify_init1(IN_NONBLOCK | IN_CLOEXEC)};
+    Descriptor notices = std::move(kept._idle.back());
+    kept._idle.pop_back();
+    return notices;
+  }
+
+  static void giveBack(Descriptor notices) {
+    Notices& kept = ofThisProcess();
+    const std::scoped_lock lock{kept._guard};
+    kept._idle.push_back(std::move(notices));
+  }
+
+ private:
+  static Notices& ofThisProcess() {
+    static Notices& kept = *new Notices;  // destructors of globals may wait for locks
+    return kept;
+  }
+
+  std::mutex _guard;
+  pid_t _process = ::getpid();
+  std::vector<Descriptor> _idle;
+};
+
 // Lets who waits sleep until there may be a lock to be had. Whoever gives one back closes the file, which the kernel
 // tells; of who gives it back otherwise it tells nothing, and of who dies a moment early, so there is a next try
 // anyway.
 class Closings {
  public:
-  explicit Closings(const Descriptor& file) : _notices{::inotify_init1(IN_NONBLOCK | IN_CLOEXEC)} {
+  explicit Closings(const Descriptor& file) : _notices{Notices::take()} {
     const std::string path = "/proc/self/fd/" + std::to_string(file.number());
     constexpr std::uint32_t kWatched = IN_CLOSE | IN_ATTRIB | IN_DELETE_SELF | IN_MOVE_SELF;
-    _isTold = _notices.isOpen() && ::inotify_add_watch(_notices.number(), path.c_str(), kWatched) >= 0;
+    if (_notices.isOpen()) _watch = ::inotify_add_watch(_notices.number(), path.c_str(), kWatched);
+  }
+  Closings(const Closings&) = delete;
+  Closings& operator=(const Closings&) = delete;
+  ~Closings() {
+    if (_watch >= 0) ::inotify_rm_watch(_notices.number(), _watch);
+    readAll();
+    if (_notices.isOpen()) Notices::giveBack(std::move(_notices));
   }
 
   void await(milliseconds atMost) {
     pollfd notice{_notices.number(), POLLIN, 0};
-    const milliseconds pause = std::min(_isTold ? _pause : kBetweenTries, atMost);
-    const bool isClosed = ::poll(&notice, _isTold ? 1 : 0, static_cast<int>(pause.count())) > 0;
+    const bool isTold = _watch >= 0;
+    const milliseconds pause = std::min(isTold ? _pause : kBetweenTries, atMost);
+    const bool isClosed = ::poll(&notice, isTold ? 1 : 0, static_cast<int>(pause.count())) > 0;
     _pause = isClosed ? kShortestPause : std::min(2 * _pause, kLongestPause);
-    std::array<char, 4096> ignored{};
-    while (isClosed && ::read(_notices.number(), ignored.data(), ignored.size()) > 0) continue;
+    if (isClosed) readAll();
   }
 
  private:
+  void readAll() {
+    std::array<char, 4096> ignored{};
+    while (::read(_notices.number(), ignored.data(), ignored.size()) > 0) continue;
+  }
+
   Descriptor _notices;
-  bool _isTold = false;
+  int _watch = -1;
   milliseconds _pause = kShortestPause;
 };
 
