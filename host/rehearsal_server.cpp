@@ -78,6 +78,7 @@ void loadForAll(const Options& options) {
   const auto loaded = loadMigrator(platform::current(), options.plugin);
   if (!loaded.isOk()) throw Ending{ExitStatus::noPlugin, loaded.status().reason()};
   keepResources(platform::current());
+  static_cast<void>(platform::current().clock->currentLocalTime("y"));  // opens the library of dates
 }
 
 }  // namespace

@@ -10,6 +10,7 @@ from migration_rehearse.unpacking import Bounds
 
 COMMANDS = ("merge", "report", "compare", "anonymise")
 RESULTS = "rehearsals.sqlite"
+WORKERS_A_CORE = 2  # while one waits for a disk, for its archive or for its host, another has the core
 STATUSES = """\
 Exit status: 0 nothing is lost, 1 accounts are lost, not saved or not migrated, 2 wrong use, 3 some images could not be
 rehearsed (whatever came of the others), 4 the result file could not be written: what is in it is whole, and the same
@@ -108,8 +109,8 @@ def run_parser(version):
     made.add_argument("--again", action="store_true", help="try those again that could not be rehearsed before")
     add_host_options(made)
     where = made.add_argument_group("where it is done")
-    where.add_argument("--workers", metavar="N", type=positive, default=len(os.sched_getaffinity(0)),
-                       help="processes of this machine (default: one for each core)")
+    where.add_argument("--workers", metavar="N", type=positive, default=WORKERS_A_CORE * len(os.sched_getaffinity(0)),
+                       help="processes of this machine (default: two for each core)")
     where.add_argument("--scheduler", metavar="ADDRESS", help="the workers of this Dask scheduler instead")
     where.add_argument("--shard", metavar="N/M", type=shard, default=(1, 1),
                        help="only the Nth of M parts of the images, the same in every call")
