@@ -78,7 +78,6 @@ void loadForAll(const Options& options) {
   const auto loaded = loadMigrator(platform::current(), options.plugin);
   if (!loaded.isOk()) throw Ending{ExitStatus::noPlugin, loaded.status().reason()};
   keepResources(platform::current());
-  static_cast<void>(platform::current().clock->currentLocalTime("y"));  // opens the library of dates
 }
 
 }  // namespace

@@ -3,6 +3,7 @@
 #include <gtest/gtest.h>
 
 #include <cstdlib>
+#include <random>
 
 #include "tests/support/fake_platform.h"
 
@@ -52,6 +53,20 @@ TEST(Clock, ShowsTheLocalTime) {
   EXPECT_EQ(shown({"America/Los_Angeles", day, 3h, ""}), "2011-6-29-20-6-0");
   EXPECT_EQ(shown({"Asia/Tokyo", day, 22h, ""}), "2011-7-1-7-7-0");
   EXPECT_EQ(shown({"Europe/Berlin", day, 3h, ""}), "2011-6-30-5-6-0");
+}
+
+// A quote more, and it is no pattern of plain numbers: what is shown then comes from ICU.
+TEST(Clock, ShowsPlainNumbersAsItShowsThemAmongOthers) {
+  std::mt19937_64 random{20'261};
+  std::uniform_int_distribution<std::int64_t> milliseconds{0, std::int64_t{51} * 365 * 24 * 3'600 * 1'000};
+  for (const char* const zone :
+       {"UTC", "America/Los_Angeles", "Europe/Berlin", "Asia/Kathmandu", "Australia/Lord_Howe"}) {
+    for (int time = 0; time < 300; ++time) {
+      const Moment moment{zone, sys_days{}, std::chrono::milliseconds{milliseconds(random)}, ""};
+      EXPECT_EQ(shown(moment).valueOr("none") + "'", shown(moment, "Y-M-d-H-M-S''").valueOr(""))
+          << zone << " " << moment.timeOfDay.count();
+    }
+  }
 }
 
 TEST(Clock, CountsByTheGregorianCalendarAtAllTimes) {

@@ -32,6 +32,11 @@ TEST_F(IcuLibrary, IsLoadedForADate) {
   EXPECT_TRUE(isIcuLoaded());
 }
 
+TEST_F(IcuLibrary, IsNotLoadedForTheNameOfAReport) {
+  EXPECT_TRUE(device.clock->currentLocalTime("Y-M-d-H-M-S").isOk());
+  EXPECT_FALSE(isIcuLoaded());
+}
+
 TEST_F(IcuLibrary, IsLoadedForALanguage) {
   EXPECT_FALSE(isIcuLoaded());
   lookForATextIn("de_DE.UTF-8");

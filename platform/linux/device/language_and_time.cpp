@@ -1,7 +1,9 @@
 #include <dlfcn.h>
 
 #include <algorithm>
+#include <chrono>
 #include <cstdlib>
+#include <ctime>
 #include <map>
 #include <mutex>
 #include <vector>
@@ -86,14 +88,55 @@ class LinuxLocalizedStrings final : public LocalizedStrings {
 
 // --- The time of day ---
 
+constexpr int kFirstYearOfTm = 1900;
+constexpr int kDecember = 11;
+constexpr int kDaysOfDecember = 31;
+constexpr int kSaturday = 6;
+constexpr std::chrono::milliseconds kTenth{100};
+
+// Weeks end on Saturdays, and are of the year in which they end.
+int yearOfWeek(const std::tm& day) {
+  const bool endsInNextYear = day.tm_mon == kDecember && day.tm_mday + kSaturday - day.tm_wday > kDaysOfDecember;
+  return day.tm_year + kFirstYearOfTm + (endsInNextYear ? 1 : 0);
+}
+
+// The time by a pattern whose letters stand alone, each for a plain number, with hyphens between them, as in the name
+// of the migration's report. None for any other pattern, and before the first year: those need ICU.
+std::optional<std::string> inPlainNumbers(Instant instant, std::string_view pattern) {
+  const std::time_t seconds = std::chrono::floor<std::chrono::seconds>(instant).time_since_epoch().count();
+  std::tm local{};
+  ::tzset();
+  if (::localtime_r(&seconds, &local) == nullptr || local.tm_year + kFirstYearOfTm < 1) return std::nullopt;
+  const auto numberOf = [&](char letter) -> std::optional<int> {
+    switch (letter) {
+      case 'Y': return yearOfWeek(local);
+      case 'M': return local.tm_mon + 1;
+      case 'd': return local.tm_mday;
+      case 'H': return local.tm_hour;
+      case 'S': return static_cast<int>((instant - std::chrono::floor<std::chrono::seconds>(instant)) / kTenth);
+      default: return std::nullopt;
+    }
+  };
+  std::string text;
+  for (std::size_t place = 0; place < pattern.size(); ++place) {
+    const bool isHyphen = place % 2 == 1;
+    const std::optional<int> number = numberOf(pattern[place]);
+    if (isHyphen ? pattern[place] != '-' : !number) return std::nullopt;
+    text += isHyphen ? "-" : std::to_string(*number);
+  }
+  return text;
+}
+
 class LinuxClock final : public Clock {
  public:
   explicit LinuxClock(std::function<Instant()> now) : _now{std::move(now)} {}
 
   Result<std::string> currentLocalTime(std::string_view pattern) const override {
+    const Instant now = _now();
+    if (std::optional<std::string> numbers = inPlainNumbers(now, pattern)) return *std::move(numbers);
     const IcuFunctions* const icu = icuFunctions();
     if (icu == nullptr) return Status::failure(Cause::missing, "tell the time", "there is no date library");
-    std::optional<std::string> time = icu->localTime(_now().time_since_epoch().count(), pattern);
+    std::optional<std::string> time = icu->localTime(now.time_since_epoch().count(), pattern);
     if (time) return *std::move(time);
     return Status::failure(Cause::unsuitable, "tell the time",
                            "there is no such date pattern: " + std::string{pattern});
