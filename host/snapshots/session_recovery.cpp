@@ -21,14 +21,21 @@ KnownContents contentsOfBoth(const Manifest& one, const Manifest& other) {
   return known;
 }
 
+bool isSentinel(const Manifest& manifest, const Path& path) {
+  return std::ranges::any_of(
+      manifest.files, [&path](const KeptFile& file) { return file.path == path && file.part == Part::sentinel; });
+}
+
 KnownContents leftByRun(const Storage& storage, const Manifest& taken, const RunMark& mark) {
   KnownContents known = mark.left;
   addContents(taken, known);
   for (const Path& path : mark.made) {
     const FileState present = stateAt(storage, path, Part::settings);
-    // It may be there in part; it is still its maker's own then.
     const bool isKept = present.contents != kAbsent && present.contents != kUnkept;
-    if (isKept && present.attributes.owner == ::geteuid()) known[path].insert(present.contents);
+    // It may be there in part; it is still its maker's own then. A sentinel tells by its name alone, which a power cut
+    // may have left to another file: where it stayed, the next run would delete legacy files that have just come back.
+    const bool isOfRun = present.attributes.owner == ::geteuid() || isSentinel(taken, path);
+    if (isKept && isOfRun) known[path].insert(present.contents);
   }
   for (const Path& path : mark.edited) known.erase(path);
   return known;

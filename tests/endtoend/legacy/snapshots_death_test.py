@@ -105,6 +105,16 @@ class Deaths(MortalCase):
         self.assertIn("Migrating accounts", run.console())
         self.assertIn("E1", [each["Identifier"] for each in device.read_plist(SETTINGS)["Accounts"]])
 
+    @unittest.skipUnless(os.getuid() == 0, "only root can give a file away")
+    def test_a_sentinel_whose_name_a_power_cut_left_to_a_file_of_the_users_does_not_cost_the_legacy_files(self):
+        device = self.killed_before(self.change_of("remove", LEGACY_EXCHANGE))
+        device.write(SENTINEL, device.read(SETTINGS))
+        os.chown(device.path(SENTINEL), 501, 501)
+        run = device.migrate(HOST, *self.with_snapshots)
+        self.assertEqual("kept", run.result()["verdict"], run.errors)
+        self.assertIn("E1", [each["Identifier"] for each in device.read_plist(SETTINGS)["Accounts"]])
+        self.assertFalse(device.path(SENTINEL).exists())
+
     def test_a_second_host_waits_for_the_first_with_the_same_directory(self):
         _, changes = self.undisturbed()
         device = self.old_device()
