@@ -1,6 +1,5 @@
 #include "accountsettings/mail_functions.h"
 
-#include <mutex>
 #include <optional>
 
 #include "platform/platform.h"
@@ -8,13 +7,11 @@
 namespace accountsettings {
 
 bool _UseGoogleMail() {
-  static std::once_flag asked;
-  static bool answer = false;
-  std::call_once(asked, [] {
+  static const bool answer = [] {
     const std::optional<platform::PropertyValue> regional =
         platform::current().deviceInfo->answer("RegionalBehaviorGoogleMail");
-    answer = regional && regional->booleanValue().value_or(false);
-  });
+    return regional && regional->booleanValue().value_or(false);
+  }();
   return answer;
 }
 
