@@ -104,9 +104,9 @@ void ChangeTracker::loadedAll(const Accounts& accounts, const LoadOutcome& outco
       _observer->told(Lost{.code = LossCode::unreadableSettingsFile, .detail = outcome.reading.reason()});
     }
     _known = stateOf(accounts);
-    const auto version = static_cast<std::uint64_t>(outcome.storedVersion.value_or(0));
-    _observer->told(records::Loaded{accounts.size(), version});
-    if (static_cast<std::int64_t>(version) < 0 || version <= AccountsManager::currentVersion()) return;
+    const std::int64_t version = outcome.storedVersion.value_or(0);
+    _observer->told(records::Loaded{accounts.size(), static_cast<std::uint64_t>(version)});
+    if (version <= static_cast<std::int64_t>(AccountsManager::currentVersion())) return;
     _observer->told(Lost{.code = LossCode::newerSettingsFile, .detail = "version " + std::to_string(version)});
   });
 }

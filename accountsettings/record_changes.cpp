@@ -106,7 +106,6 @@ class Matching {
     if (candidates.empty()) return;
     _former[place] = candidates.front();
     _isFound[candidates.front()] = true;
-    candidates.pop_front();
   }
   // Matches what the key, empty for a record that has none, says is the same.
   template <typename Key, typename MakeBeforeKey, typename MakeAfterKey>
