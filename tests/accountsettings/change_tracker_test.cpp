@@ -30,6 +30,17 @@ TEST_F(WatchedStore, TellsHowManyAccountsOfWhichVersionWereLoaded) {
   EXPECT_EQ(recorder->facts[0], (records::Fact{records::Loaded{2, 3}}));
 }
 
+TEST_F(WatchedStore, TellsOfVersionZeroWhereTheFileSaysNone) {
+  device.put(kSettingsFile, Dictionary{{"Accounts", Array{}}});
+  AccountsManager::initInsideOfMigration();
+  EXPECT_EQ(recorder->facts, std::vector<records::Fact>{(records::Loaded{0, 0})});
+}
+
+TEST_F(WatchedStore, TellsNothingElseOfAFileOfTheCurrentVersion) {
+  load({properties("a")});
+  EXPECT_EQ(recorder->facts, std::vector<records::Fact>{(records::Loaded{1, accountsettings::kCurrentVersion})});
+}
+
 TEST_F(WatchedStore, TellsOfAFileThatStandsThereAndCannotBeRead) {
   device.files->put(kSettingsFile, "no property list");
   AccountsManager::initInsideOfMigration();
@@ -82,6 +93,25 @@ TEST_F(WatchedStore, TellsWhyAccountsOfAReplacedTypeWent) {
   EXPECT_EQ(recorder->lines(), (Lines{"changed b: +Port 2", "lost a (replaced-with-type)"}));
 }
 
+TEST_F(WatchedStore, TellsOfAnAccountThatAnotherOneWasPutInThePlaceOf) {
+  const Store store = loadOutdated({properties("a"), properties("b")});
+  store->replaceAccount_withAccount(store->accountWithIdentifier("a"), account("c"));
+  store->tellChanges();
+  EXPECT_EQ(recorder->lines(), (Lines{"added c", "lost a (replaced)"}));
+}
+
+TEST_F(WatchedStore, TellsAnewWhyAnAccountWentThatWentBeforeAndCameAgain) {
+  const Store store = loadOutdated({properties("a", {}, "SMTP")});
+  const Account comesAgain = store->accountWithIdentifier("a");
+  store->replaceAccountsWithTypes_withAccounts({"SMTP"}, {});
+  store->tellChanges();
+  store->insertAccount(comesAgain);
+  store->tellChanges();
+  store->deleteAccountWithIdentifier("a");
+  store->tellChanges();
+  EXPECT_EQ(recorder->lines(), (Lines{"lost a (replaced-with-type)", "added a", "lost a (deleted)"}));
+}
+
 TEST_F(WatchedStore, TellsIntoWhichAccountsOneWasFolded) {
   const Store store = loadOutdated({properties("a"), properties("b"), properties("c")});
   const Account folded = store->accountWithIdentifier("a");
@@ -100,6 +130,39 @@ TEST_F(WatchedStore, TellsFromWhatAnAccountWasConverted) {
   store->insertAccount(made);
   store->tellChanges();
   EXPECT_EQ(recorder->lines(), Lines{"converted a: uniqueId now Identifier \"a\", +Type \"CalDAV\" (MailAccounts[0])"});
+}
+
+TEST_F(WatchedStore, TellsWhichAccountAConvertedOneReplaces) {
+  const Store store = loadOutdated({properties("a", {{"Port", 1}})});
+  const Account made = account("a", {{"Port", 2}});
+  store->changeTracker()->comesFrom(*made, {{"uniqueId", "a"}}, "MailAccounts[0]", "/mail");
+  store->replaceAccountsWithTypes_withAccounts({"CalDAV"}, {made});
+  store->tellChanges();
+  EXPECT_EQ(recorder->lines(), Lines{"converted a: Port 1 -> 2 (MailAccounts[0], replacing)"});
+}
+
+TEST_F(WatchedStore, TellsThatAConvertedAccountWasAChildBefore) {
+  const Store store = loadOutdated({properties("p", {{"ChildAccounts", Array{properties("c")}}})});
+  const Account made = account("c");
+  store->changeTracker()->comesFrom(*made, {{"uniqueId", "c"}}, "MailAccounts[0]", "/mail");
+  store->accountWithIdentifier("p")->removeAccountPropertyForKey("ChildAccounts");
+  store->insertAccount(made);
+  store->tellChanges();
+  EXPECT_EQ(recorder->lines(), (Lines{"moved c", "converted c (MailAccounts[0], replacing)"}));
+}
+
+TEST_F(WatchedStore, TellsOfAnAccountThatWasConvertedAndWentBeforeAnybodyLooked) {
+  const Store store = loadOutdated({});
+  const Account replaced = account("a");
+  const Account neverStored = account("b");
+  store->changeTracker()->comesFrom(*replaced, {}, "MailAccounts[0]", "/mail");
+  store->changeTracker()->comesFrom(*neverStored, {}, "MailAccounts[1]", "/mail");
+  store->insertAccount(replaced);
+  store->replaceAccountsWithTypes_withAccounts({"CalDAV"}, {});
+  store->tellChanges();
+  store->tellChanges();
+  EXPECT_EQ(recorder->lines(),
+            (Lines{"lost a (replaced-with-type: MailAccounts[0])", "lost b (removed: MailAccounts[1])"}));
 }
 
 TEST_F(WatchedStore, TellsOfASaveAndWhatStageItsChangesBelongTo) {
@@ -134,6 +197,15 @@ TEST_F(WatchedStore, TellsWhatTheFileKeptOfAnAccountThatSomebodyElseChanged) {
   putFile({properties("a", {{"Port", 2}})});
   store->saveAllAccounts();
   EXPECT_EQ(recorder->lines(), Lines{"changed a: Port 1 -> 2"});
+}
+
+TEST_F(WatchedStore, TellsAtEachSaveWhatThatOneDoesOtherwiseThanTheLast) {
+  const Store store = loadOutdated({properties("a", {{"Port", 1}})});
+  for (const int port : {2, 3, 3}) {
+    putFile({properties("a", {{"Port", port}})});
+    store->saveAllAccounts();
+  }
+  EXPECT_EQ(recorder->lines(), (Lines{"changed a: Port 1 -> 2", "changed a: Port 1 -> 3"}));
 }
 
 TEST_F(WatchedStore, TellsOfARecordThatAnotherOneWithItsIdentifierReplaces) {
@@ -179,6 +251,9 @@ TEST_F(WatchedStore, IsWatchedByNobodyWhereNobodyWantsFacts) {
     EXPECT_EQ(store->changeTracker(), nullptr);
   }
   EXPECT_EQ(ChangeTracker::statesTaken(), before);
+  device.setObserver(recorder);
+  loadOutdated({});
+  EXPECT_EQ(ChangeTracker::statesTaken(), before + 1);
 }
 
 class FailingObserver final : public records::FactObserver {

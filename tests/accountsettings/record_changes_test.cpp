@@ -91,6 +91,23 @@ TEST_F(RecordChanges, TellOfChildrenLikeOfAccounts) {
             (Lines{"changed c in p: Port 1 -> 2", "added e in p", "lost d in p (removed-from-parent)"}));
 }
 
+TEST_F(RecordChanges, KeepChildrenOfOneIdentifierApartByTheirParents) {
+  const Account one = parent("p", {properties("c", {{"Port", 1}})});
+  const Account other = parent("q", {properties("c", {{"Port", 2}})});
+  EXPECT_EQ(between(stateOf({one, other}), stateOf({other, one})), Lines{});
+}
+
+TEST_F(RecordChanges, TellOfAnAccountThatAnotherObjectStandsFor) {
+  EXPECT_EQ(between(stateOf({account("a")}), stateOf({account("a")})), Lines{"changed a"});
+}
+
+TEST_F(RecordChanges, NameARecordByWhatPeopleKnowItBy) {
+  const Dictionary displayed{{"Type", "Mail"}, {"DisplayName", "Home"}, {"Username", "jane"}, {"Identifier", "a"}};
+  EXPECT_EQ(accountsettings::nameOf(displayed, "p"), (records::Name{"Mail", "Home", "a", "p"}));
+  EXPECT_EQ(accountsettings::nameOf({{"DisplayName", ""}, {"Username", "jane"}}), (records::Name{"", "jane", "", ""}));
+  EXPECT_EQ(accountsettings::nameOf({{"Username", 5}}), (records::Name{}));
+}
+
 TEST_F(RecordChanges, TellOfAnAccountThatWentUnderAnotherAndTookItsChildrenAlong) {
   const Account mail = parent("m", {properties("c")});
   const StoreState before = stateOf({mail});
