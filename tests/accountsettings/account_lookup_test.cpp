@@ -250,6 +250,7 @@ TEST_F(LookingUpFullAccounts, RequiresOneForEveryMatchingTopLevelAccount) {
     FAIL();
   } catch (const AssertionFailure& failure) {
     EXPECT_EQ(failure.file(), "AccountsManager");
+    EXPECT_EQ(failure.method(), "-[AccountsManager accountsWithTypes:withLoader:]");
     EXPECT_EQ(failure.message(), "There is no full account for the account with identifier b");
   }
 }

@@ -1,12 +1,11 @@
 #include <gtest/gtest.h>
 
-#include "accountsettings/assertion_failure.h"
 #include "tests/support/account_store.h"
+#include "tests/support/assertion_failures.h"
 
 namespace tests {
 namespace {
 
-using accountsettings::AssertionFailure;
 using Lines = std::vector<std::string>;
 
 class EditingAccounts : public AccountStore {
@@ -126,8 +125,12 @@ TEST_F(EditingAccounts, DeletesATopLevelAccountByItsIdentifier) {
 
 TEST_F(EditingAccounts, RequiresTheIdentifierOfATopLevelAccountToDelete) {
   const Store store = storeOf({withChildren("p", {properties("c")})});
-  EXPECT_THROW(store->deleteAccountWithIdentifier("c"), AssertionFailure);
-  EXPECT_THROW(store->deleteAccountWithIdentifier("nobody"), AssertionFailure);
+  for (const std::string identifier : {"c", "nobody"}) {
+    EXPECT_EQ(failureOf([&] { store->deleteAccountWithIdentifier(identifier); }).what(),
+              "Assertion failure in -[AccountsManager deleteAccountWithIdentifier:], AccountsManager: There is no "
+              "top-level account with identifier " +
+                  identifier);
+  }
   EXPECT_EQ(allOf(store), (Lines{"p", "c"}));
 }
 
@@ -152,7 +155,9 @@ TEST_F(EditingAccounts, SavesAReplacementAndFindsItInAStoreLoadedAfresh) {
 
 TEST_F(EditingAccounts, RequiresTheReplacedAccountToBeInTheOrder) {
   const Store store = storeOf({account("a")});
-  EXPECT_THROW(store->replaceAccount_withAccount(account("a"), account("b")), AssertionFailure);
+  EXPECT_STREQ(failureOf([&] { store->replaceAccount_withAccount(account("a"), account("b")); }).what(),
+               "Assertion failure in -[AccountsManager replaceAccount:withAccount:], AccountsManager: The account with "
+               "identifier a is not in the store");
   EXPECT_EQ(orderOf(store), (Lines{"a"}));
   EXPECT_NE(store->accountWithIdentifier("a"), nullptr);
 }

@@ -59,8 +59,9 @@ TEST_F(Configuration, WithoutTheTypesFileEndsTheFirstUse) {
 TEST_F(Configuration, WithAnUnreadableTypesFileEndsTheFirstUse) {
   device.files->put(kTypesFile, "no property list");
   const AssertionFailure failure = tests::failureOf([] { BasicAccount::initialize(); });
-  EXPECT_EQ(failure.message(), "Could not load the dataclasses configuration file");
-  EXPECT_EQ(failure.method(), "+[BasicAccount initialize]");
+  EXPECT_STREQ(failure.what(),
+               "Assertion failure in +[BasicAccount initialize], BasicAccount: Could not load the dataclasses "
+               "configuration file");
 }
 
 TEST_F(Configuration, IsNeededByEveryQuestionAboutATypeAndByEveryRecord) {
@@ -254,6 +255,11 @@ TEST_F(Configuration, AnswersEachQuestionAboutADataclassFromItsOwnKey) {
     EXPECT_EQ(BasicAccount::displayToggleForDataclass(dataclass), dataclass == "Switch");
     EXPECT_EQ(BasicAccount::userConfirmationIsRequiredByDataclass(dataclass), dataclass == "Confirm");
   }
+}
+
+TEST_F(Configuration, TakesAnAnswerThatIsNoTruthValueForNo) {
+  device.put(kDataclassesFile, Dictionary{{"Stores", Dictionary{{"Supports Multiple Stores", Array{true}}}}});
+  EXPECT_FALSE(BasicAccount::multipleStoresSupportedByDataclass("Stores"));
 }
 
 TEST_F(Configuration, WithoutTheDataclassesFileEveryAnswerIsFalseForTheWholeLifeOfTheProcess) {

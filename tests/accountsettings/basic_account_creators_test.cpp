@@ -286,8 +286,9 @@ TEST_F(Creators, DoNotFallBackToTheRecordWhereTheClassForTheTypeIsNone) {
 TEST_F(Creators, FailWhereTheFullAccountsClassIsNotDefined) {
   put({creator("FullAccount", "full.so", "Nowhere")});
   const AssertionFailure failure = fullAccountFailure();
-  EXPECT_EQ(failure.message(), "The framework/bundle where Nowhere is defined has not been loaded");
-  EXPECT_EQ(failure.method(), "-[BasicAccount fullAccountUsingLoader:]");
+  EXPECT_STREQ(failure.what(),
+               "Assertion failure in -[BasicAccount fullAccountUsingLoader:], BasicAccount: The framework/bundle where "
+               "Nowhere is defined has not been loaded");
 }
 
 TEST_F(Creators, FailWhereThereIsNoFullAccountEntry) {
@@ -298,7 +299,10 @@ TEST_F(Creators, FailWhereThereIsNoFullAccountEntry) {
 TEST_F(Creators, FailWhereTheClassAnswersNeitherOperation) {
   put({creator("FullAccount", "full.so", "TestFullCreator")});
   fullCreator->classForAccountType = nullptr;
-  EXPECT_EQ(fullAccountFailure().message(), "Could not create the account with class TestFullCreator and id A");
+  EXPECT_STREQ(
+      fullAccountFailure().what(),
+      "Assertion failure in -[BasicAccount fullAccountUsingLoader:], BasicAccount: Could not create the account "
+      "with class TestFullCreator and id A");
 }
 
 TEST_F(Creators, FailWhereTheClassIsOfAnotherKindAltogether) {

@@ -281,7 +281,9 @@ TEST_F(Record, LeavesAnEqualDisplayNameUntouched) {
 
 TEST_F(Record, RefusesAnEmptyDisplayName) {
   const auto account = make();
-  EXPECT_EQ(tests::failureOf([&] { account->setDisplayName(""); }).method(), "-[BasicAccount setDisplayName:]");
+  const AssertionFailure failure = tests::failureOf([&] { account->setDisplayName(""); });
+  EXPECT_EQ(failure.method(), "-[BasicAccount setDisplayName:]");
+  EXPECT_EQ(failure.message(), "The display name must not be empty");
   EXPECT_EQ(account->properties(), minimal());
 }
 

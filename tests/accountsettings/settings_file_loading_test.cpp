@@ -3,6 +3,7 @@
 #include <algorithm>
 #include <cerrno>
 
+#include "platform/run_observer.h"
 #include "tests/support/account_store.h"
 
 namespace tests {
@@ -62,6 +63,24 @@ TEST_F(LoadingTheSettingsFile, IsToldApartFromFindingNoFileAndFromFindingOneThat
   device.files->failing = {"read"};
   EXPECT_EQ(AccountsManager::init()->loadOutcome().reading.errorNumber(), EIO);
   EXPECT_TRUE(AccountsManager::init()->loadOutcome().hasUnreadFile());
+}
+
+class ProgressObserver final : public platform::RunObserver {
+ public:
+  std::vector<std::pair<std::size_t, std::size_t>> told;
+  void stageBegan(std::string_view, std::string_view) override {}
+  void stageEnded(std::string_view) override {}
+  void progressed(std::size_t done, std::size_t total) override { told.emplace_back(done, total); }
+};
+
+TEST_F(LoadingTheSettingsFile, AndSavingItTellHowFarTheyAre) {
+  const auto observer = std::make_shared<ProgressObserver>();
+  device.setObserver(observer);
+  const Store store = load(Array(300, PropertyValue{properties("a")}));
+  EXPECT_EQ(observer->told, (std::vector<std::pair<std::size_t, std::size_t>>{{256, 300}}));
+  AccountsManager::_setShouldSkipNotifications(true);
+  store->saveAllAccounts();
+  EXPECT_EQ(observer->told.size(), 3U) << "by the load, by the save, and by the load of the file as it stands then";
 }
 
 TEST_F(LoadingTheSettingsFile, SaysNothingOfAccountsThatWereInMemory) {

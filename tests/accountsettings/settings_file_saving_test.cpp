@@ -325,6 +325,13 @@ TEST_F(SavingAccounts, ThatEndsInAnExceptionHasFailedUnlessTheFileWasWritten) {
   EXPECT_TRUE(store->lastSaveOutcome().isSaved());
 }
 
+TEST_F(SavingAccounts, RemembersThatNoDataCameWhereNobodySaidWhy) {
+  const Store store = load({});
+  device.propertyLists->serializes = false;
+  store->saveAllAccounts();
+  EXPECT_EQ(store->lastSaveOutcome().status.description(), "Could not serialize the accounts: No data came back");
+}
+
 TEST_F(SavingAccounts, SavesDataThatCameWithAnErrorAndSaysTheError) {
   const Store store = load({properties("a")});
   store->allBasicAccounts()[0]->setAccountProperty_forKey(2, "Port");
