@@ -24,6 +24,16 @@ class ThrowingConsole final : public platform::ConsoleLog {
   void write(std::string_view) override { throw std::bad_alloc{}; }
 };
 
+// Has no room for a line that says why.
+class ForgetfulConsole final : public platform::ConsoleLog {
+ public:
+  std::vector<std::string> lines;
+  void write(std::string_view line) override {
+    if (line.ends_with("odd")) throw std::bad_alloc{};
+    lines.emplace_back(line);
+  }
+};
+
 class ThrowingNotice final : public platform::PreferencesChangedNotice {
  public:
   void post(std::string_view, std::string_view) override { throw std::bad_alloc{}; }
@@ -117,6 +127,14 @@ TEST_F(RunFailures, ConsoleThatThrowsIsSurvived) {
   device.changePlatform([](platform::Platform& services) { services.console = std::make_shared<ThrowingConsole>(); });
   EXPECT_FALSE(migrator.performMigration());
   expectCleanedUp();
+}
+
+TEST_F(RunFailures, OutOfMemoryForTheLineThatSaysWhyIsSaidInFewerWords) {
+  const auto console = std::make_shared<ForgetfulConsole>();
+  device.changePlatform([&](platform::Platform& services) { services.console = console; });
+  versionSteps().work = [](AccountsManager&) { throw std::runtime_error{"odd"}; };
+  EXPECT_FALSE(migrator.performMigration());
+  EXPECT_EQ(console->lines.back(), "AccountsDataMigrator: The migration was given up.");
 }
 
 TEST_F(RunFailures, LockThatCannotBeMadeForWantOfMemoryFailsTheRun) {

@@ -4,6 +4,7 @@
 #include "migrator/accounts_data_migrator.h"
 #include "platform/run_observer.h"
 #include "tests/run_sequence/scripted_version_steps.h"
+#include "tests/support/fact_recorder.h"
 #include "tests/support/migration_device.h"
 
 using namespace tests;
@@ -13,7 +14,9 @@ using migrator::AccountsDataMigrator;
 using testing::Contains;
 using testing::ElementsAre;
 using testing::IsEmpty;
+using testing::IsSupersetOf;
 using testing::Not;
+using testing::Pair;
 
 namespace {
 
@@ -64,6 +67,25 @@ class RunSequence : public testing::Test {
 };
 
 TEST_F(RunSequence, IsOfTheDataClassAccounts) { EXPECT_EQ(migrator.dataClassName(), "accounts"); }
+
+TEST_F(RunSequence, SaysWhichFilesItMayTouch) {
+  using Part = platform::MigrationFile::Part;
+  std::vector<std::pair<Part, Path>> files;
+  for (const platform::MigrationFile& file : migrator.footprint().files) files.emplace_back(file.part, file.path);
+  EXPECT_THAT(files, ElementsAre(Pair(Part::settings, kSettingsFile), Pair(Part::legacy, kLegacyExchangeFile),
+                                 Pair(Part::legacy, kLegacyMailFile),
+                                 Pair(Part::other, Path{kLegacyExchangeFile} += ".original"),
+                                 Pair(Part::other, Path{kLegacyMailFile} += ".original"),
+                                 Pair(Part::sentinel, kRemovalSentinel), Pair(Part::marker, kAutoFetchMarker)));
+}
+
+TEST_F(RunSequence, SaysWhatItLocksAndLeavesBehind) {
+  const platform::MigrationFootprint footprint = migrator.footprint();
+  EXPECT_EQ(footprint.lockName, "AccountMigrationInProgress");
+  EXPECT_EQ(footprint.versionKey, "Version");
+  EXPECT_EQ(footprint.currentVersion, kCurrentVersion);
+  EXPECT_EQ(footprint.copyAside, kSettingsCopy);
+}
 
 TEST_F(RunSequence, NothingToMigrateStillSavesStampsAndTellsTheMailApplication) {
   device.putSettings(kCurrentVersion, {account("A")});
@@ -227,6 +249,19 @@ TEST_F(RunSequence, InterruptedRemovalIsFinishedAndNothingElseDone) {
   for (const Path& gone : {kLegacyExchangeFile, kLegacyMailFile, kRemovalSentinel}) {
     EXPECT_FALSE(device.files->exists(gone)) << gone;
   }
+}
+
+TEST_F(RunSequence, FinishingAnInterruptedRemovalTellsWhichLegacyAccountsWereNeverSaved) {
+  device.putSettings(kCurrentVersion, {});
+  device.put(kLegacyExchangeFile, legacyExchange("E1"));
+  device.put(kLegacyMailFile, legacyMail("M1"));
+  device.files->put(kRemovalSentinel, "");
+  const auto recorder = std::make_shared<FactRecorder>();
+  device.setObserver(recorder);
+  EXPECT_TRUE(migrator.performMigration());
+  EXPECT_THAT(recorder->lines(),
+              IsSupersetOf({"lost E1 (not-saved: DAAccountsKey[0] of " + kLegacyExchangeFile.string() + ")",
+                            "lost M1 (not-saved: MailAccounts[0] of " + kLegacyMailFile.string() + ")"}));
 }
 
 TEST_F(RunSequence, FinishingAnInterruptedRemovalLeavesNotificationsOff) {
