@@ -1,6 +1,7 @@
 #pragma once
 
 #include <memory>
+#include <mutex>
 #include <vector>
 
 #include "accounts/account_settings.h"
@@ -33,16 +34,27 @@ struct Account::Content {
 struct Accounts::Content {
   std::shared_ptr<const Device> device;
   std::shared_ptr<accountsettings::AccountsManager> store;
-  std::vector<Account> topLevel;
+
+  Content(std::shared_ptr<const Device> ofDevice, std::shared_ptr<accountsettings::AccountsManager> loaded)
+      : device{std::move(ofDevice)}, store{std::move(loaded)} {}
+
+  // Made for whoever asks first: who looks for one account of many needs no other.
+  [[nodiscard]] const std::vector<Account>& topLevel() const {
+    std::call_once(_made, [this] {
+      _topLevel.reserve(store->count());
+      for (const auto& record : store->allBasicAccounts()) _topLevel.push_back(accountOf(device, record));
+    });
+    return _topLevel;
+  }
+
+ private:
+  mutable std::once_flag _made;
+  mutable std::vector<Account> _topLevel;
 };
 
-[[nodiscard]] inline Accounts accountsOf(const std::shared_ptr<const Device>& device,
+[[nodiscard]] inline Accounts accountsOf(std::shared_ptr<const Device> device,
                                          std::shared_ptr<accountsettings::AccountsManager> store) {
-  std::vector<Account> topLevel;
-  topLevel.reserve(store->count());
-  for (const auto& record : store->allBasicAccounts()) topLevel.push_back(accountOf(device, record));
-  return Accounts{
-      std::make_shared<const Accounts::Content>(Accounts::Content{device, std::move(store), std::move(topLevel)})};
+  return Accounts{std::make_shared<const Accounts::Content>(std::move(device), std::move(store))};
 }
 
 enum class Manner : std::uint8_t { change, trial };
