@@ -200,9 +200,10 @@ struct Edit::Content {
     if (!loaded.isOk()) return loaded.error();
     store = std::move(loaded).value();
     if (!store->loadOutcome().leftOut.empty() && !device->options().mayDropUnreadable) {
-      return failed(Code::wouldDropOthers,
-                    std::to_string(store->loadOutcome().leftOut.size()) +
-                        " records of the accounts file cannot be loaded, and a save would remove them");
+      const std::size_t count = store->loadOutcome().leftOut.size();
+      const std::string what = std::to_string(count) + (count == 1 ? " record" : " records");
+      return failed(Code::wouldDropOthers, what + " of the accounts file cannot be loaded, and a save would remove " +
+                                               (count == 1 ? "it" : "them"));
     }
     before = recordsOf(*store);
     return done();

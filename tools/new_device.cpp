@@ -98,18 +98,16 @@ class ScratchDevice {
     }
   }
 
-  // By the store's own save, so that it is what a migration leaves. From then on, the process works on this device.
+  // A settings file as a migration leaves it.
   void saveNoAccounts() const {
-    auto platform = platform::makeLinuxPlatform({.systemRoot = _root, .resources = _resources});
-    platform.systemLog = std::make_shared<platform::SilentSystemLog>();
-    platform::setCurrent(std::move(platform));
-    AccountsManager::_setShouldSkipNotifications(true);
-    platform::keepTemporaryDirectoryOnDeviceVolume(platform::current());
-    const auto accounts = AccountsManager::init();
-    accounts->saveAllAccounts();
-    if (const auto& outcome = accounts->lastSaveOutcome(); !outcome.isSaved()) {
-      throw Failure{ExitStatus::failed, "the accounts could not be saved: " + outcome.status.description()};
-    }
+    accounts::OpenOptions options;
+    options.root = _root;
+    options.resources = _resources;
+    options.mayBeMissing = true;
+    const auto settings = required(accounts::AccountSettings::open(options));
+    accounts::Edit edit = required(settings.edit());
+    edit.rewrite();
+    required(edit.save());
   }
 
  private:

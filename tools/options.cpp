@@ -39,6 +39,7 @@ std::vector<commandline::Option> optionsInto(Options& options, Written& written)
        &options.snapshots},
       {"--set", "KEY=VALUE", "give what recover brings back this property; may be repeated", &options.settings},
       {"--dry-run", "", "change nothing, and print what would be changed", &options.changesNothing},
+      {"--drop-unreadable", "", "save although records of the file that cannot be loaded go", &options.dropsUnreadable},
       {"--json", "", "print JSON", &options.printsJson},
       {"--columns", "LIST", "of a list: identifier, type, class, name, user, host, enabled", &written.columns},
       {"--wide", "", "shorten nothing, however narrow the terminal is", &options.printsEverything},

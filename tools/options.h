@@ -34,6 +34,7 @@ struct Options {
   bool opensModulesOfOtherRoots = false;
   bool printsJson = false;
   bool changesNothing = false;      // a command that changes accounts is only tried
+  bool dropsUnreadable = false;     // accounts are saved although records that cannot be loaded go
   bool printsEverything = false;    // however narrow the terminal is
   std::optional<std::string> file;  // what is listed, shown or verified in place of the device's accounts
   std::optional<std::filesystem::path> snapshots;  // the directory of snapshots, where it is not the usual one

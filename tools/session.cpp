@@ -32,6 +32,12 @@ class SettingsFromElsewhere final : public platform::PropertyListStore {
   platform::Path _file;
 };
 
+void sayThatRecordsWent(std::size_t count) {
+  if (count == 0) return;
+  commandline::say("accountctl", std::to_string(count) + (count == 1 ? " record" : " records") +
+                                     " that could not be loaded went with the save");
+}
+
 }  // namespace
 
 void fail(const accounts::Error& error) {
@@ -42,6 +48,9 @@ void fail(const accounts::Error& error) {
     case Code::wouldBeDropped: throw Failure{ExitStatus::wrongUse, error.sentence};
     case Code::notAnnounced:
     case Code::brokenInstallation: throw Failure{ExitStatus::faultyInstallation, error.sentence};
+    case Code::wouldDropOthers:
+      throw Failure{ExitStatus::failed,
+                    error.sentence + "; accountctl verify tells why, and --drop-unreadable removes such records"};
     default: throw Failure{ExitStatus::failed, error.sentence};
   }
 }
@@ -54,7 +63,7 @@ Session::Session(const Options& options) : _changesNothing{options.changesNothin
   _options.resources = textOf(options.device.resources);
   _options.whileWaiting = [](const std::string& sentence) { commandline::say("accountctl", sentence); };
   _options.mayBeMissing = true;
-  _options.mayDropUnreadable = true;
+  _options.mayDropUnreadable = options.dropsUnreadable;
   _options.opensModules = options.opensModules();
 }
 
@@ -113,9 +122,11 @@ void Session::tryOut(const Steps& steps) {
 void Session::change(const Concerned& concerned, const Steps& steps) {
   if (_changesNothing) return tryOut(steps);
   announce(concerned, &AccountSettings::willChange, "nothing was changed: ");
+  const std::size_t unreadable = accounts().unreadable();
   Edit edit = required(settings().edit());
   steps(edit);
   const auto saved = required(edit.save());
+  sayThatRecordsWent(unreadable);
   if (saved.notAnnounced) fail(*saved.notAnnounced);
   announce(concerned, &AccountSettings::didChange, kSavedButNotAnnounced);
 }

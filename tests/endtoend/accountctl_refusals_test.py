@@ -154,6 +154,24 @@ class AccountsOfALaterRelease(AccountctlTest):
                 self.assert_refused(FAILED, message, *words)
 
 
+class AccountsBesideRecordsThatCannotBeLoaded(AccountctlTest):
+    def setUp(self):
+        super().setUp()
+        self.put(HOME_MAIL, {"Type": "Unheard", "Identifier": "U1"})
+
+    def test_are_not_changed_since_a_save_would_remove_those(self):
+        message = ("1 record of the accounts file cannot be loaded, and a save would remove it; accountctl verify tells why,"
+                   " and --drop-unreadable removes such records")
+        for words in CHANGES:
+            with self.subTest(words=words):
+                self.assert_refused(FAILED, message, *words)
+
+    def test_are_changed_where_those_may_go_and_that_is_said(self):
+        run = self.accountctl("--drop-unreadable", "rename", "M1", "Work")
+        self.assertEqual((0, ["accountctl: 1 record that could not be loaded went with the save"]), (run.status, run.errors))
+        self.assertEqual(["M1"], [each["Identifier"] for each in self.tree.read_plist(SETTINGS)["Accounts"]])
+
+
 class AccountsInFilesOfTheFirstReleases(AccountctlTest):
     def test_are_not_joined_by_a_new_one_before_they_are_migrated(self):
         self.tree.write_plist(LEGACY_MAIL, {"Accounts": []})

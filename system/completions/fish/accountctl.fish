@@ -76,6 +76,7 @@ complete -c accountctl -l file -r -F
 complete -c accountctl -l snapshots -r -a '(__fish_complete_directories)'
 complete -c accountctl -l set -x
 complete -c accountctl -l dry-run
+complete -c accountctl -l drop-unreadable
 complete -c accountctl -l json
 complete -c accountctl -l columns -x -a 'identifier type class name user host enabled'
 complete -c accountctl -l wide
