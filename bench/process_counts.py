@@ -79,7 +79,7 @@ class Processes:
         """What is measured, the version of its device, its command and its peer's; both of the device's root."""
         run = lambda *options: lambda root: [self.host, "--root", root, *options]
         control = lambda *words: lambda root: [self.accountctl, "--root", root, *words]
-        plistutil = lambda root: ["plistutil", "-i", root / SETTINGS, "-o", root / "converted"]
+        plistutil = lambda root: [shutil.which("plistutil"), "-i", root / SETTINGS, "-o", root / "converted"]
         only_loading = lambda root: [self.programs / "bench-only-load", self.plugin]
         one_letter = lambda root: [self.programs / "bench-one-letter"]
         change = lambda root: control("set", self._first_account(root), "Word=other")(root)

@@ -41,15 +41,15 @@ void sweepTemporaryFiles(const snapshots::Storage& storage, std::chrono::system_
   const Path directory = platform::temporaryDirectoryOf(platform::current().directories->systemRoot());
   const char* const used = std::getenv("TMPDIR");
   if (used == nullptr || directory != used) return;
-  const Result<FileAttributes> attributes = storage.keeper->attributesOf(directory);
   const Result<std::vector<std::string>> entries = storage.keeper->entriesOf(directory);
-  if (!attributes.isOk() || !entries.isOk()) return;
+  if (!entries.isOk()) return;
   const platform::RunStage stage{"before the run"};
   for (const std::string& name : entries.value()) {
     if (!platform::isNameOfSave(name)) continue;
     const Path path = directory / name;
     const Result<FileCopy> file = storage.keeper->read(path, platform::kMaxPropertyListSize);
-    if (!file.isOk() || !isLeftBySave(file.value(), attributes.value().owner, start)) continue;
+    const Result<FileAttributes> holder = storage.keeper->attributesOf(directory);
+    if (!file.isOk() || !holder.isOk() || !isLeftBySave(file.value(), holder.value().owner, start)) continue;
     const platform::Status removed = storage.keeper->removeFile(path);
     if (removed.isOk()) {
       say("a program was killed while it saved accounts; what it left was removed: " + path.string());

@@ -53,6 +53,13 @@ TEST_F(Rehearsal, ReplacesAFileInMemoryOnly) {
   EXPECT_EQ(scratch.contents("directory/file"), "as it is");
 }
 
+TEST_F(Rehearsal, FindsNothingBelowADirectoryThatItRemoved) {
+  ASSERT_TRUE(files->remove(scratch / "directory/below").isOk());
+  EXPECT_EQ(files->kindOf(scratch / "directory/below/other").cause(), Cause::missing);
+  EXPECT_EQ(textAt("directory/file"), "as it is");
+  EXPECT_EQ(scratch.contents("directory/below/other"), "as it is");
+}
+
 TEST_F(Rehearsal, RemovesAFileInMemoryOnly) {
   ASSERT_TRUE(files->remove(scratch / "directory/file").isOk());
   EXPECT_EQ(files->kindOf(scratch / "directory/file").cause(), Cause::missing);

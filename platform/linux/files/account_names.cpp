@@ -13,6 +13,7 @@ namespace {
 
 // A name that stands behind a longer entry (a group with very many members) is not found.
 constexpr std::size_t kMaxEntrySize = std::size_t{1} << 20;
+constexpr std::size_t kMaxTableSize = std::size_t{1} << 26;
 
 // Room for the texts of an entry: little, and where that does not do, as much as an entry may take.
 class Room {
@@ -40,19 +41,17 @@ Status notFound(int error, const std::string& name, const std::string& purpose =
   return Status::failure(error == 0 ? ENOENT : error, "find the account " + name + purpose);
 }
 
-using File = std::unique_ptr<std::FILE, int (*)(std::FILE*)>;
-
-File openTable(Descriptor table) {
-  std::FILE* const file = table.isOpen() ? ::fdopen(table.number(), "re") : nullptr;
-  if (file != nullptr) static_cast<void>(table.release());
-  return {file, &std::fclose};
-}
-
 // The number behind a name in a table of the tree, which `next` reads an entry at a time.
 template <typename Entry, typename Number>
-Result<Number> numberInTable(Descriptor file, const std::string& name, char* Entry::*nameOf, Number Entry::*numberOf,
+Result<Number> numberInTable(const PathResolver& paths, const std::filesystem::path& path, const std::string& name,
+                             char* Entry::*nameOf, Number Entry::*numberOf,
                              int (*next)(std::FILE*, Entry*, char*, std::size_t, Entry**)) {
-  const File table = openTable(std::move(file));
+  struct stat opened {};
+  const Descriptor file = paths.openFile(path, opened);
+  Bytes bytes;
+  if (!file.isOpen() || !readUpTo(file.number(), opened, kMaxTableSize, bytes)) return notFound(errno, name);
+  const std::unique_ptr<std::FILE, int (*)(std::FILE*)> table{::fmemopen(bytes.data(), bytes.size(), "r"),
+                                                              &std::fclose};
   if (!table) return notFound(errno, name);
   Room room;
   Entry entry{};
@@ -80,12 +79,12 @@ Result<Number> numberInSystem(const std::string& name, Number Entry::*numberOf,
 
 Result<uid_t> AccountNames::user(const std::string& name) const {
   if (_root == "/") return numberInSystem(name, &passwd::pw_uid, &::getpwnam_r);
-  return numberInTable(_paths.openFile(_root / "etc/passwd"), name, &passwd::pw_name, &passwd::pw_uid, &::fgetpwent_r);
+  return numberInTable(_paths, _root / "etc/passwd", name, &passwd::pw_name, &passwd::pw_uid, &::fgetpwent_r);
 }
 
 Result<gid_t> AccountNames::group(const std::string& name) const {
   if (_root == "/") return numberInSystem(name, &::group::gr_gid, &::getgrnam_r);
-  return numberInTable(_paths.openFile(_root / "etc/group"), name, &::group::gr_name, &::group::gr_gid, &::fgetgrent_r);
+  return numberInTable(_paths, _root / "etc/group", name, &::group::gr_name, &::group::gr_gid, &::fgetgrent_r);
 }
 
 Result<AccountNames::Owner> AccountNames::ownerOf(const std::filesystem::path& path, const std::string& user,

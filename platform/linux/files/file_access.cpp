@@ -26,7 +26,7 @@ bool isRegular(mode_t mode) {
 // it is taking away no longer, and finds it for a moment more. It does so under the directory's lock, which a move of
 // the name onto itself waits for; after that the name is gone, or the file's time of change is another, unless that is
 // so young that the clock has not moved since.
-bool hasStoodAlone(const Place& place, const Descriptor& file, const struct stat& status) {
+bool hasStoodAlone(const Place& place, const struct stat& status) {
   constexpr std::chrono::milliseconds kOldEnough{50};
   const std::chrono::nanoseconds changed = sinceEpoch(status.st_ctim);
   timespec now{};
@@ -39,7 +39,7 @@ bool hasStoodAlone(const Place& place, const Descriptor& file, const struct stat
   const char* const name = place.leaf.c_str();
   if (::renameat(parent, name, parent, name) != 0 && errno != EROFS) return false;
   struct stat later {};
-  return statAtName(place, file, later) && sinceEpoch(later.st_ctim) == changed;
+  return statAtName(place, status, later) && sinceEpoch(later.st_ctim) == changed;
 }
 
 }  // namespace
@@ -56,35 +56,33 @@ FileKind kindOf(mode_t mode) {
 
 bool isEntryName(const std::string& leaf) { return !leaf.empty() && leaf != "." && leaf != ".."; }
 
-Descriptor openRegularFile(const Place& place) {
-  struct stat status {};
-  if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return {};
-  if (!isRegular(status.st_mode)) return {};
+Descriptor openRegularFile(const Place& place, struct stat& opened) {
+  if (::fstatat(place.parent.number(), place.leaf.c_str(), &opened, AT_SYMLINK_NOFOLLOW) != 0) return {};
+  if (!isRegular(opened.st_mode)) return {};
   constexpr int kFlags = O_RDONLY | O_CLOEXEC | O_NOCTTY | O_NONBLOCK | O_NOFOLLOW;
   Descriptor file{retried([&] { return ::openat(place.parent.number(), place.leaf.c_str(), kFlags); })};
-  if (!file.isOpen() || ::fstat(file.number(), &status) != 0 || !isRegular(status.st_mode)) return {};
+  if (!file.isOpen() || ::fstat(file.number(), &opened) != 0 || !isRegular(opened.st_mode)) return {};
   return file;
 }
 
-bool statAtName(const Place& place, const Descriptor& thing, struct stat& status) {
-  struct stat opened {};
-  if (::fstat(thing.number(), &opened) != 0) return false;
+bool statAtName(const Place& place, const struct stat& opened, struct stat& status) {
   if (::fstatat(place.parent.number(), place.leaf.c_str(), &status, AT_SYMLINK_NOFOLLOW) != 0) return false;
   return (opened.st_dev == status.st_dev && opened.st_ino == status.st_ino) || failWith(ESTALE);
 }
 
-Descriptor openOwnFile(const Place& place) {
+Descriptor openOwnFile(const Place& place, struct stat& opened) {
   constexpr int kAttempts = 100;  // a file that is replaced by a save is another one, and as good
   for (int attempt = 0; attempt < kAttempts; ++attempt) {
-    Descriptor file = openRegularFile(place);
-    struct stat status {};
+    Descriptor file = openRegularFile(place, opened);
     struct stat holder {};
     if (!file.isOpen() || ::fstat(place.parent.number(), &holder) != 0) return {};
-    if (!statAtName(place, file, status)) continue;
+    if (isOurs(holder.st_uid) && isClosed(holder)) return file;  // nobody can have planted it, with however many names
+    struct stat status {};
+    if (!statAtName(place, opened, status)) continue;
     if (!mayBeRead(status, holder)) break;
     struct stat withSecondName = status;
     withSecondName.st_nlink = 2;
-    if (mayBeRead(withSecondName, holder) || hasStoodAlone(place, file, status)) return file;
+    if (mayBeRead(withSecondName, holder) || hasStoodAlone(place, status)) return file;
   }
   errno = EMLINK;
   return {};
@@ -123,11 +121,9 @@ ssize_t readSome(int descriptor, void* buffer, std::size_t size) {
   return static_cast<ssize_t>(filled);
 }
 
-bool readUpTo(int file, std::size_t limit, Bytes& bytes) {
-  struct stat status {};
-  if (::fstat(file, &status) != 0) return false;
-  if (static_cast<std::uintmax_t>(status.st_size) > limit) return failWith(EFBIG);
-  const auto expected = static_cast<std::size_t>(status.st_size);
+bool readUpTo(int file, const struct stat& opened, std::size_t limit, Bytes& bytes) {
+  if (static_cast<std::uintmax_t>(opened.st_size) > limit) return failWith(EFBIG);
+  const auto expected = static_cast<std::size_t>(opened.st_size);
   bytes.resize(expected + 1);  // one byte more than expected shows whether the file ends where it said
   std::size_t filled = 0;
   while (true) {

@@ -25,8 +25,9 @@ inline bool failWith(int errorNumber) {
 
 // A path taken apart: its opened parent directory and the name below it.
 struct Place {
-  Descriptor parent;  // good for the *at calls only
-  std::string leaf;   // "." for a root directory
+  Descriptor parent;     // good for the *at calls only
+  std::string leaf;      // "." for a root directory
+  bool canSync = false;  // whether the parent is opened for reading, and so for syncing, too
 };
 
 [[nodiscard]] FileKind kindOf(mode_t mode);
@@ -36,15 +37,16 @@ struct Place {
 
 // Opens a regular file for reading, whoever's it is. Whatever else stands there, a link included, is refused (EISDIR,
 // ELOOP or EINVAL), unopened where that can be told before, and nothing waits for the other side of a pipe or a device.
-[[nodiscard]] Descriptor openRegularFile(const Place& place);
+// `opened` is what the opened file tells of itself.
+[[nodiscard]] Descriptor openRegularFile(const Place& place, struct stat& opened);
 
-// What stands at the name, where that is the opened thing (ESTALE where it is not). How many names the thing itself
-// tells of is no answer: whoever planted one may have removed it again once it was open.
-[[nodiscard]] bool statAtName(const Place& place, const Descriptor& thing, struct stat& status);
+// What stands at the name, where that is the thing that told `opened` of itself (ESTALE where it is not). How many
+// names the thing itself tells of is no answer: whoever planted one may have removed it again once it was open.
+[[nodiscard]] bool statAtName(const Place& place, const struct stat& opened, struct stat& status);
 
-// The same for a file whose contents are to be used. One with a second name elsewhere is refused (EMLINK) as planting.h
-// has it, and so is one that is exchanged time and again.
-[[nodiscard]] Descriptor openOwnFile(const Place& place);
+// The same as openRegularFile for a file whose contents are to be used. One with a second name elsewhere is refused
+// (EMLINK) as planting.h has it, and so is one that is exchanged time and again.
+[[nodiscard]] Descriptor openOwnFile(const Place& place, struct stat& opened);
 
 // Makes a new file, mode 0600 whatever the umask, open for writing.
 [[nodiscard]] Descriptor makeFile(const Place& place);
@@ -62,21 +64,23 @@ auto retried(const Call& call) {
 // Fills the buffer as far as the file goes. Answers the number of bytes, -1 on failure.
 [[nodiscard]] ssize_t readSome(int descriptor, void* buffer, std::size_t size);
 
-// Reads a whole file of at most `limit` bytes; errno EFBIG where there are more.
-[[nodiscard]] bool readUpTo(int file, std::size_t limit, Bytes& bytes);
+// Reads a whole file, which told `opened` of itself, of at most `limit` bytes; errno EFBIG where there are more.
+[[nodiscard]] bool readUpTo(int file, const struct stat& opened, std::size_t limit, Bytes& bytes);
 
 // Brings a file, or the entries of a directory, to stable storage. File systems that have nothing to sync are no
 // failure.
 [[nodiscard]] bool sync(const Descriptor& file);
 
-// The directory opened so that it can be synced; a place's parent cannot.
+// The directory opened so that it can be synced.
 [[nodiscard]] Descriptor openForSync(const Descriptor& directory);
 
-// Runs a change of the directory's entries, which answers false where it fails, and brings them to stable storage. What
-// could not be synced is not changed in the first place; a sync that fails all the same is a failed change.
+// Runs a change of the entries of the place's parent, which answers false where it fails, and brings them to stable
+// storage. What could not be synced is not changed in the first place; a sync that fails all the same is a failed
+// change.
 template <typename Change>
-bool changeEntries(const Descriptor& directory, const Change& change) {
-  const Descriptor entries = openForSync(directory);
+bool changeEntries(const Place& place, const Change& change) {
+  const Descriptor opened = place.canSync ? Descriptor{} : openForSync(place.parent);
+  const Descriptor& entries = place.canSync ? place.parent : opened;
   return entries.isOpen() && change() && sync(entries);
 }
 

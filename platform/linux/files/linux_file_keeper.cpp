@@ -48,9 +48,8 @@ bool putInPlace(const Place& place, const std::string& beside, std::span<const s
   const int parent = place.parent.number();
   const Descriptor file = makeFile({Descriptor{::openat(parent, ".", O_PATH | O_DIRECTORY | O_CLOEXEC)}, beside});
   return file.isOpen() && writeAll(file.number(), bytes.data(), bytes.size()) &&
-         makeAsBefore(file.number(), attributes) && sync(file) && changeEntries(place.parent, [&] {
-           return ::renameat(parent, beside.c_str(), parent, place.leaf.c_str()) == 0;
-         });
+         makeAsBefore(file.number(), attributes) && sync(file) &&
+         changeEntries(place, [&] { return ::renameat(parent, beside.c_str(), parent, place.leaf.c_str()) == 0; });
 }
 
 class LinuxFileKeeper final : public FileKeeper {
@@ -72,10 +71,10 @@ class LinuxFileKeeper final : public FileKeeper {
       if (!lookAt(place, status)) return false;
       copy.attributes = attributesFrom(status);
       if (copy.attributes.kind != FileKind::file) return true;
-      const Descriptor file = openOwnFile(place);
-      if (!file.isOpen() || ::fstat(file.number(), &status) != 0) return false;
+      const Descriptor file = openOwnFile(place, status);
+      if (!file.isOpen()) return false;
       copy.attributes = attributesFrom(status);
-      return readUpTo(file.number(), sizeLimit, copy.bytes);
+      return readUpTo(file.number(), status, sizeLimit, copy.bytes);
     });
     if (!outcome.isOk()) return outcome;
     return copy;
@@ -115,7 +114,7 @@ class LinuxFileKeeper final : public FileKeeper {
   }
 
   Status restore(const Path& path, std::span<const std::uint8_t> bytes, const FileAttributes& attributes) override {
-    return at(path, "restore", [&](const Place& place) {
+    return at(_paths.openParentToChange(path), path, "restore", [&](const Place& place) {
       struct stat status {};
       if (lookAt(place, status) && S_ISDIR(status.st_mode)) return failWith(EISDIR);
       const std::string beside = ".restoring-" + place.leaf;
@@ -129,10 +128,9 @@ class LinuxFileKeeper final : public FileKeeper {
 
   // Nothing stands in a directory that is missing.
   Status removeFile(const Path& path) override {
-    Status removed = at(path, "remove", [](const Place& place) {
-      return changeEntries(place.parent, [&place] {
-        return ::unlinkat(place.parent.number(), place.leaf.c_str(), 0) == 0 || errno == ENOENT;
-      });
+    Status removed = at(_paths.openParentToChange(path), path, "remove", [](const Place& place) {
+      return changeEntries(
+          place, [&place] { return ::unlinkat(place.parent.number(), place.leaf.c_str(), 0) == 0 || errno == ENOENT; });
     });
     return removed.errorNumber() == ENOENT ? Status{} : removed;
   }
@@ -140,7 +138,11 @@ class LinuxFileKeeper final : public FileKeeper {
  private:
   template <typename Action>
   Status at(const Path& path, const char* verb, const Action& action) {
-    const Place place = _paths.openParent(path);
+    return at(_paths.openParent(path), path, verb, action);
+  }
+
+  template <typename Action>
+  static Status at(const Place& place, const Path& path, const char* verb, const Action& action) {
     return place.parent.isOpen() && action(place) ? Status{} : failureOf(verb, path);
   }
 

@@ -133,9 +133,8 @@ class LockFile {
     const bool isRoot = ::geteuid() == 0;
     const std::string flaw = isRoot ? flawOf(status) : std::string{};
     if (!flaw.empty()) return isShared() || (replace(flaw) && isToBeTriedAgain(true));
-    _file = openRegularFile(_place);
+    _file = openRegularFile(_place, status);
     if (!_file.isOpen()) return isToBeTriedAgain(isRoot ? meansExchanged(errno) : errno == ENOENT);
-    if (::fstat(_file.number(), &status) != 0) return false;
     return !isRoot || flawOf(status).empty() || isToBeTriedAgain(true);
   }
 

@@ -41,7 +41,7 @@ Descriptor makeSyncedFile(const Place& place, const Writer& write) {
     file = makeFile(place);
     return file.isOpen() && write(file.number()) && sync(file);
   };
-  if (changeEntries(place.parent, makeAndWrite)) return file;
+  if (changeEntries(place, makeAndWrite)) return file;
   if (file.isOpen()) unlinkKeepingCause(place);
   return {};
 }
@@ -72,24 +72,23 @@ std::string randomName() {
 
 // Only a failed sync can leave the file moved and yet a failure.
 bool moveFile(const Place& from, const Place& to) {
-  return changeEntries(to.parent, [&] {
+  return changeEntries(to, [&] {
     return ::renameat(from.parent.number(), from.leaf.c_str(), to.parent.number(), to.leaf.c_str()) == 0;
   });
 }
 
-bool isSame(const Descriptor& one, const Descriptor& other) {
-  struct stat first {};
-  struct stat second {};
-  return ::fstat(one.number(), &first) == 0 && ::fstat(other.number(), &second) == 0 && first.st_dev == second.st_dev &&
-         first.st_ino == second.st_ino;
+bool statOpened(const Descriptor& thing, struct stat& status) {
+  return thing.isOpen() && ::fstat(thing.number(), &status) == 0;
 }
 
 // Gives away the very thing that is open, and only a file that has no second name elsewhere, and brings its new owner
 // to stable storage. `made` is the thing where this process made it, not open where it did not.
-bool giveAway(const Place& place, const Descriptor& thing, const Descriptor& made, const AccountNames::Owner& owner) {
+bool giveAway(const Place& place, const Descriptor& made, const AccountNames::Owner& owner) {
+  const Descriptor found = made.isOpen() ? Descriptor{} : openAt(place, O_PATH);
+  const Descriptor& thing = made.isOpen() ? made : found;
+  struct stat there {};
   struct stat status {};
-  if (!thing.isOpen() || !statAtName(place, thing, status)) return false;
-  if (made.isOpen() && !isSame(thing, made)) return failWith(ESTALE);
+  if (!statOpened(thing, there) || !statAtName(place, there, status)) return false;
   if (S_ISLNK(status.st_mode)) return failWith(ELOOP);
   if (!S_ISDIR(status.st_mode) && status.st_nlink > 1) return failWith(EMLINK);
   const bool isTheirs = status.st_uid == owner.user && status.st_gid == owner.group;
@@ -99,7 +98,8 @@ bool giveAway(const Place& place, const Descriptor& thing, const Descriptor& mad
   Descriptor opened;
   if (!made.isOpen()) {
     opened = openAt(place, O_RDONLY | O_NONBLOCK | O_NOCTTY);
-    if (opened.isOpen() && !isSame(opened, thing)) return failWith(ESTALE);
+    const bool isSame = statOpened(opened, status) && status.st_dev == there.st_dev && status.st_ino == there.st_ino;
+    if (opened.isOpen() && !isSame) return failWith(ESTALE);
   }
   const Descriptor& theirs = made.isOpen() ? made : opened;
   return theirs.isOpen() && ::fchown(theirs.number(), owner.user, owner.group) == 0 && sync(theirs);
@@ -172,14 +172,15 @@ class LinuxFileSystem final : public FileSystem {
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
     Bytes bytes;
-    const Descriptor file = _paths.openFile(path);
-    if (!file.isOpen() || !readUpTo(file.number(), sizeLimit, bytes)) return failureOf("read", path);
+    struct stat opened {};
+    const Descriptor file = _paths.openFile(path, opened);
+    if (!file.isOpen() || !readUpTo(file.number(), opened, sizeLimit, bytes)) return failureOf("read", path);
     return bytes;
   }
 
   Status create(const Path& path, std::span<const std::uint8_t> bytes) override {
     _made.makeRoomFor(path);
-    return at(path, "create", [&](const Place& place) {
+    return atToChange(path, "create", [&](const Place& place) {
       Descriptor file = makeFileOf(place, bytes);
       const bool isMade = file.isOpen();
       isMade ? _made.remember(path, std::move(file)) : _made.forget(path);
@@ -188,9 +189,8 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status replace(const Path& path, std::span<const std::uint8_t> bytes) override {
-    return at(path, "replace", [bytes](const Place& place) {
-      Descriptor parent{::openat(place.parent.number(), ".", O_PATH | O_DIRECTORY | O_CLOEXEC)};
-      const Place beside{std::move(parent), randomName()};
+    return atToChange(path, "replace", [bytes](const Place& place) {
+      const Place beside{openForSync(place.parent), randomName(), true};
       if (!beside.parent.isOpen() || !makeFileOf(beside, bytes).isOpen()) return false;
       if (moveFile(beside, place)) return true;
       unlinkKeepingCause(beside);
@@ -199,9 +199,10 @@ class LinuxFileSystem final : public FileSystem {
   }
 
   Status copy(const Path& from, const Path& to) override {
-    const Descriptor source = _paths.openFile(from);
+    struct stat opened {};
+    const Descriptor source = _paths.openFile(from, opened);
     if (!source.isOpen()) return failureOf("copy", from);
-    return at(to, "copy to", [&](const Place& place) {
+    return atToChange(to, "copy to", [&](const Place& place) {
       return makeSyncedFile(place, [&](int file) { return copyBytes(source.number(), file); }).isOpen();
     });
   }
@@ -210,8 +211,8 @@ class LinuxFileSystem final : public FileSystem {
     _made.forget(path);
     const bool isThere = _paths.openPlain(path).isOpen() || errno != ENOENT;
     if (!isThere) return failureOf("remove", path);
-    return at(path, "remove",
-              [](const Place& place) { return changeEntries(place.parent, [&place] { return removeTree(place); }); });
+    return atToChange(path, "remove",
+                      [](const Place& place) { return changeEntries(place, [&place] { return removeTree(place); }); });
   }
 
   Status createDirectories(const Path& path, unsigned permissions) override {
@@ -227,9 +228,9 @@ class LinuxFileSystem final : public FileSystem {
     const Result<AccountNames::Owner> numbers = _accounts.ownerOf(path, std::string{owner}, std::string{group});
     if (!numbers.isOk()) return numbers.status();
     const Descriptor made = _made.take(path);
-    Status given = at(path, "set the owner of", [&](const Place& place) {
-      return giveAway(place, openAt(place, O_PATH), made, numbers.value());
-    });
+    const Place place = _paths.openParent(path);
+    const bool isGiven = place.parent.isOpen() && giveAway(place, made, numbers.value());
+    Status given = isGiven ? Status{} : failureOf("set the owner of", path);
     // Whoever took it from its place gets it: a file of ours that stayed with him would hold his bytes.
     const auto [user, theirGroup] = numbers.value();
     if (!given.isOk() && made.isOpen()) std::ignore = ::fchown(made.number(), user, theirGroup);
@@ -253,7 +254,7 @@ class LinuxFileSystem final : public FileSystem {
   Status rename(const Path& from, const Path& to) override {
     _made.forget(from);
     const Place source = _paths.openParent(from);
-    const Place target = source.parent.isOpen() ? _paths.openParent(to) : Place{};
+    const Place target = source.parent.isOpen() ? _paths.openParentToChange(to) : Place{};
     if (target.parent.isOpen() && moveFile(source, target)) return {};
     const int cause = errno;
     return Status::failure(cause, "rename " + from.string() + " to " + to.string());
@@ -269,8 +270,8 @@ class LinuxFileSystem final : public FileSystem {
 
   // Runs the action at the path's place; the action answers false, with errno set, where it fails.
   template <typename Action>
-  Status at(const Path& path, const char* verb, const Action& action) {
-    const Place place = _paths.openParent(path);
+  Status atToChange(const Path& path, const char* verb, const Action& action) {
+    const Place place = _paths.openParentToChange(path);
     return place.parent.isOpen() && action(place) ? Status{} : failureOf(verb, path);
   }
 

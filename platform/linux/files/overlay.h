@@ -2,8 +2,11 @@
 
 #include <sys/stat.h>
 
+#include <functional>
 #include <map>
+#include <set>
 #include <string>
+#include <string_view>
 #include <tuple>
 
 #include "platform/property_value.h"
@@ -26,7 +29,11 @@ class Overlay {
     return found == _nodes.end() ? nullptr : &found->second;
   }
 
+  // Whether some directory has a name of that text that is not as on the device.
+  [[nodiscard]] bool isKnown(std::string_view name) const { return _names.contains(name); }
+
   void put(const struct stat& directory, const std::string& name, Node node) {
+    _names.insert(name);
     node.status.st_dev = kNoDevice;
     node.status.st_ino = ++_made;
     node.status.st_nlink = 1;
@@ -46,6 +53,7 @@ class Overlay {
   }
 
   std::map<Key, Node> _nodes;
+  std::set<std::string, std::less<>> _names;
   ino_t _made = 0;  // numbers that tell what was made here apart
 };
 

@@ -31,6 +31,19 @@ bool readStatus(Entry& entry) {
   return entry.descriptor.isOpen() && ::fstat(entry.descriptor.number(), &entry.status) == 0;
 }
 
+// What stands at the name in the directory. Answers false, with errno set, where that cannot be told.
+bool look(const Entry& directory, const std::string& name, const Overlay* overlay, Entry& entry) {
+  const Overlay::Node* const node = overlay == nullptr ? nullptr : overlay->find(directory.status, name);
+  if (node != nullptr) {
+    entry = {copyOf(directory.descriptor), node->status, node};
+    return entry.descriptor.isOpen();
+  }
+  entry = {};
+  if (Overlay::isMade(directory.status)) return true;
+  entry.descriptor = Descriptor{::openat(directory.descriptor.number(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC)};
+  return readStatus(entry) || errno == ENOENT;
+}
+
 // What the bits of a file promise holds everywhere but in the kernel's own views of its processes.
 bool isOfProcesses(const Descriptor& file) {
   struct statfs volume {};
@@ -65,8 +78,7 @@ class PathWalk {
   bool toEntry(const path& below) {
     if (!toDirectory(below.parent_path())) return false;
     _leaf = below.empty() ? "." : below.filename().string();
-    if (isEntryName(_leaf)) return look(_leaf, _target);
-    return true;
+    return !isEntryName(_leaf) || look(_directories.back(), _leaf, _overlay, _target);
   }
 
   Descriptor takeDirectory() { return std::move(_directories.back().descriptor); }
@@ -89,7 +101,7 @@ class PathWalk {
     if (name == ".") return true;
     if (name == "..") return goUp();
     Entry entry;
-    if (!look(name, entry)) return false;
+    if (!look(_directories.back(), name, _overlay, entry)) return false;
     if (!entry.isThere() && !isAtEnd) return failWith(ENOENT);
     if (S_ISLNK(entry.status.st_mode)) {
       if (!follow(entry)) return false;
@@ -100,20 +112,6 @@ class PathWalk {
     _leaf = name;
     _target = std::move(entry);
     return true;
-  }
-
-  bool look(const std::string& name, Entry& entry) const {
-    const Entry& directory = _directories.back();
-    const Overlay::Node* const node = _overlay == nullptr ? nullptr : _overlay->find(directory.status, name);
-    if (node != nullptr) {
-      entry = {copyOf(directory.descriptor), node->status, node};
-      return entry.descriptor.isOpen();
-    }
-    entry = {};
-    if (Overlay::isMade(directory.status)) return true;
-    entry.descriptor =
-        Descriptor{::openat(directory.descriptor.number(), name.c_str(), O_PATH | O_NOFOLLOW | O_CLOEXEC)};
-    return readStatus(entry) || errno == ENOENT;
   }
 
   bool enter(Entry entry) {
@@ -222,17 +220,29 @@ Descriptor openWithoutLinks(int base, const char* path, unsigned flags, unsigned
   return Descriptor{retried([&] { return static_cast<int>(::syscall(SYS_openat2, base, path, &how, sizeof how)); })};
 }
 
-// Whether a path is absolute and made of names alone, so that it leads where it says if no link stands in its way.
-bool isPlain(std::string_view text) {
-  if (!text.starts_with('/')) return false;
+// Whether the test holds for every name of an absolute path.
+template <typename Test>
+bool everyName(std::string_view text, const Test& test) {
   while (!text.empty()) {
     const std::size_t end = std::min(text.find('/', 1), text.size());
-    const std::string_view name = text.substr(1, end - 1);
-    if (name.empty() || name == "." || name == "..") return false;
+    if (!test(text.substr(1, end - 1))) return false;
     text.remove_prefix(end);
   }
   return true;
 }
+
+// Whether a path is absolute and made of names alone, so that it leads where it says if no link stands in its way.
+bool isPlain(std::string_view text) {
+  return text.starts_with('/') &&
+         everyName(text, [](std::string_view name) { return !name.empty() && name != "." && name != ".."; });
+}
+
+// The directory above a plain path.
+std::string above(const path& plain) {
+  return plain.native().substr(0, std::max<std::size_t>(plain.native().rfind('/'), 1));
+}
+
+std::string leafOf(const path& plain) { return plain.native().substr(plain.native().rfind('/') + 1); }
 
 }  // namespace
 
@@ -264,17 +274,20 @@ Descriptor PathResolver::openPlain(const path& path) const {
   return {};
 }
 
-Descriptor PathResolver::openFile(const path& path) const {
-  const Place place = openParentOfTarget(path);
-  return place.parent.isOpen() ? openOwnFile(place) : Descriptor{};
+Descriptor PathResolver::openFile(const path& path, struct stat& opened) const {
+  const Place place = openParent(path);
+  Descriptor file = place.parent.isOpen() ? openOwnFile(place, opened) : Descriptor{};
+  const bool isLink = !file.isOpen() && place.parent.isOpen() && errno == ELOOP;
+  if (!isLink) return file;
+  const Place target = openParentOfTarget(path);
+  return target.parent.isOpen() ? openOwnFile(target, opened) : Descriptor{};
 }
 
-Place PathResolver::openParent(const path& path) const {
+Place PathResolver::openParent(const path& path, bool isToSync) const {
+  const unsigned flags = isToSync ? O_RDONLY | O_DIRECTORY : O_PATH | O_DIRECTORY;
   if (isPlain(path.native()) && !isBase(path)) {
-    const std::size_t end = path.native().rfind('/');
-    const std::string above = path.native().substr(0, std::max<std::size_t>(end, 1));
-    Descriptor directory = openWithoutLinks(AT_FDCWD, above.c_str(), O_PATH | O_DIRECTORY);
-    if (directory.isOpen() || !isToBeWalked()) return {std::move(directory), path.native().substr(end + 1)};
+    Descriptor directory = openWithoutLinks(AT_FDCWD, above(path).c_str(), flags);
+    if (directory.isOpen() || !isToBeWalked()) return {std::move(directory), leafOf(path), isToSync};
   }
   const std::filesystem::path whole = wholePath(path);
   if (whole.empty()) {
@@ -283,15 +296,15 @@ Place PathResolver::openParent(const path& path) const {
   }
   const Base& base = baseOf(whole);
   const std::filesystem::path below = relativeTo(base, whole);
-  const std::filesystem::path above = below.parent_path();
+  const std::filesystem::path holder = below.parent_path();
   const std::string leaf = below.empty() ? "." : below.filename().string();
   const Descriptor start = openAsGiven(base.path);
   if (!start.isOpen()) return {{}, leaf};
   Descriptor directory =
-      openWithoutLinks(start.number(), above.empty() ? "." : above.c_str(), O_PATH | O_DIRECTORY, RESOLVE_BENEATH);
-  if (directory.isOpen() || !isToBeWalked()) return {std::move(directory), leaf};
+      openWithoutLinks(start.number(), holder.empty() ? "." : holder.c_str(), flags, RESOLVE_BENEATH);
+  if (directory.isOpen() || !isToBeWalked()) return {std::move(directory), leaf, isToSync};
   PathWalk walk{base, nullptr};
-  return {walk.toDirectory(above) ? walk.takeDirectory() : Descriptor{}, leaf};
+  return {walk.toDirectory(holder) ? walk.takeDirectory() : Descriptor{}, leaf};
 }
 
 Place PathResolver::openParentOfTarget(const path& path) const {
@@ -307,7 +320,23 @@ Place PathResolver::openParentOfTarget(const path& path) const {
   return {walk.takeDirectory(), walk.leaf()};
 }
 
+// Directories of the path that nobody changed in the rehearsal are entered as on the device.
+bool PathResolver::isWayChanged(const path& path) const {
+  const std::string directories = above(path);
+  return _overlay != nullptr && directories != "/" &&
+         !everyName(directories, [this](std::string_view name) { return !_overlay->isKnown(name); });
+}
+
 std::optional<Spot> PathResolver::find(const path& path) const {
+  if (isPlain(path.native()) && !isBase(path) && !isWayChanged(path)) {
+    Spot spot;
+    spot.leaf = leafOf(path);
+    spot.directory.descriptor = openWithoutLinks(AT_FDCWD, above(path).c_str(), O_PATH | O_DIRECTORY);
+    if (readStatus(spot.directory)) {
+      return look(spot.directory, spot.leaf, _overlay, spot.entry) ? std::optional{std::move(spot)} : std::nullopt;
+    }
+    if (!isToBeWalked()) return std::nullopt;
+  }
   const std::filesystem::path whole = wholePath(path);
   if (whole.empty()) {
     errno = ENOENT;

@@ -53,7 +53,10 @@ class PathResolver {
   explicit PathResolver(const FileTrees& trees = {}, const Overlay* overlay = nullptr);
 
   // The path's place on the device, its parent directory opened; what stands at the path itself is not looked at.
-  [[nodiscard]] Place openParent(const std::filesystem::path& path) const;
+  [[nodiscard]] Place openParent(const std::filesystem::path& path) const { return openParent(path, false); }
+
+  // The same for changes that are to be synced.
+  [[nodiscard]] Place openParentToChange(const std::filesystem::path& path) const { return openParent(path, true); }
 
   // The same for what the path leads to where a link stands at it.
   [[nodiscard]] Place openParentOfTarget(const std::filesystem::path& path) const;
@@ -68,7 +71,7 @@ class PathResolver {
   [[nodiscard]] Descriptor openPlain(const std::filesystem::path& path) const;
 
   // The regular file that the path leads to, for reading, as openOwnFile has it.
-  [[nodiscard]] Descriptor openFile(const std::filesystem::path& path) const;
+  [[nodiscard]] Descriptor openFile(const std::filesystem::path& path, struct stat& opened) const;
 
   struct Base {
     std::filesystem::path path;
@@ -76,8 +79,10 @@ class PathResolver {
   };
 
  private:
+  [[nodiscard]] Place openParent(const std::filesystem::path& path, bool isToSync) const;
   [[nodiscard]] const Base& baseOf(const std::filesystem::path& path) const;
   [[nodiscard]] bool isBase(const std::filesystem::path& path) const;
+  [[nodiscard]] bool isWayChanged(const std::filesystem::path& path) const;
 
   std::vector<Base> _bases;
   const Overlay* _overlay;

@@ -72,15 +72,19 @@ Place placeOf(const Spot& spot) {
   return {Descriptor{::fcntl(spot.directory.descriptor.number(), F_DUPFD_CLOEXEC, 0)}, spot.leaf};
 }
 
-bool readDeviceFile(const Descriptor& file, std::size_t sizeLimit, Bytes& bytes) {
-  return file.isOpen() && readUpTo(file.number(), sizeLimit, bytes);
+// `open` is how the device's file is opened: openOwnFile or openRegularFile.
+template <typename Open>
+bool readDeviceFile(const Spot& spot, const Open& open, std::size_t sizeLimit, Bytes& bytes) {
+  struct stat opened {};
+  const Descriptor file = open(placeOf(spot), opened);
+  return file.isOpen() && readUpTo(file.number(), opened, sizeLimit, bytes);
 }
 
 bool readContents(const Spot& spot, std::size_t sizeLimit, Bytes& bytes) {
   if (!isThere(spot.entry)) return false;
   if (isDirectory(spot.entry)) return failWith(EISDIR);
   if (!S_ISREG(spot.entry.status.st_mode)) return failWith(S_ISLNK(spot.entry.status.st_mode) ? ELOOP : EINVAL);
-  if (spot.entry.node == nullptr) return readDeviceFile(openOwnFile(placeOf(spot)), sizeLimit, bytes);
+  if (spot.entry.node == nullptr) return readDeviceFile(spot, openOwnFile, sizeLimit, bytes);
   if (spot.entry.node->bytes.size() > sizeLimit) return failWith(EFBIG);
   bytes = spot.entry.node->bytes;
   return true;
@@ -92,7 +96,7 @@ bool takeContents(const Spot& spot, Bytes& bytes) {
     bytes = spot.entry.node->bytes;
     return true;
   }
-  if (!S_ISLNK(spot.entry.status.st_mode)) return readDeviceFile(openRegularFile(placeOf(spot)), SIZE_MAX, bytes);
+  if (!S_ISLNK(spot.entry.status.st_mode)) return readDeviceFile(spot, openRegularFile, SIZE_MAX, bytes);
   std::array<char, PATH_MAX> text{};
   const ssize_t size = ::readlinkat(spot.entry.descriptor.number(), "", text.data(), text.size());
   if (size < 0) return false;
