@@ -27,6 +27,7 @@ from recording_disk import RecordingDisk, between_flushes, can_be_had
 HOST = Path(os.environ["MIGRATION_HOST"])
 STATES = int(os.environ.get("POWER_CUTS", "5000"))  # in all, at least
 FLUSHES = 60  # of a run, on an average of all file systems and scenarios
+PATIENCE = 600  # seconds; a hang, not a machine that is busy with something else
 MEGABYTE = 1 << 20
 MOBILE = (501, 501)
 SETTINGS_MODE = 0o600
@@ -115,7 +116,7 @@ def options_for(scenario, device, options=None):
 
 
 def run(scenario, device, options=None):
-    return run_host(HOST, "--root", device.root, *options_for(scenario, device, options))
+    return run_host(HOST, "--root", device.root, *options_for(scenario, device, options), timeout=PATIENCE)
 
 
 def prepare(scenario, device):
@@ -277,7 +278,7 @@ def try_cuts(file_system, scenario, parts):
             tried += 1
             try:
                 look_at(file_system, scenario, recording, disk, place)
-            except (Fault, OSError, ValueError, plistlib.InvalidFileException, subprocess.CalledProcessError) as fault:
+            except (Fault, OSError, ValueError, plistlib.InvalidFileException, subprocess.SubprocessError) as fault:
                 faults.append(f"{file_system.name}, {scenario.name}, flush {number}, {len(further)} writes: {fault!r}")
     return tried, faults, len(recording.groups)
 

@@ -115,6 +115,16 @@ class Deaths(MortalCase):
         self.assertIn("E1", [each["Identifier"] for each in device.read_plist(SETTINGS)["Accounts"]])
         self.assertFalse(device.path(SENTINEL).exists())
 
+    def test_what_a_sentinel_of_unknown_origin_cost_comes_back_and_is_converted_once_that_is_removed(self):
+        device = self.old_device()
+        device.write(SENTINEL, "")
+        self.assertEqual("lost", device.migrate(HOST, *self.with_snapshots).result()["verdict"])
+        undo = device.migrate(HOST, *self.with_snapshots, "--undo")
+        self.assertEqual((0, True, True), (undo.status, device.path(SENTINEL).exists(), device.path(LEGACY_MAIL).exists()))
+        device.path(SENTINEL).unlink()
+        self.assertEqual("kept", device.migrate(HOST, *self.with_snapshots).result()["verdict"])
+        self.assertLessEqual({"E1", "M1"}, {each["Identifier"] for each in device.read_plist(SETTINGS)["Accounts"]})
+
     def test_a_second_host_waits_for_the_first_with_the_same_directory(self):
         _, changes = self.undisturbed()
         device = self.old_device()
