@@ -55,6 +55,18 @@ TEST_F(ExplainedSteps, TellThatMailWentUnderANewParent) {
               ElementsAre("added " + parent, "moved N in " + parent + " into " + parent));
 }
 
+TEST_F(ExplainedSteps, TellIntoWhichMailAccountACalendarWasFolded) {
+  const Dictionary principal{{"Login_Key", "jane"}, {"CalDAV_Server_Key", "www.google.com"}};
+  const Dictionary configuration{{"CalDAV_PrincipalPath_Key", "/calendar/dav/jane/user"}};
+  load({account("Mail", "GmailAccount", "G", {{"Username", "jane"}}),
+        account("CalDAV", "MobileCalDAVAccount", "C",
+                {{"CalDAVPrincipalConfiguration", principal}, {"CalDAVAccountConfiguration", configuration}})},
+       4);
+  ASSERT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  EXPECT_THAT(told("_migrateAccountsFrom7A242:"),
+              Contains("folded C into G (the same user's calendars at the same service)"));
+}
+
 struct FailingMigrator {
   bool fail(AccountsManager&) { return false; }
 };
@@ -104,6 +116,18 @@ TEST_F(ExplainedConversions, TellFromWhatEachAccountWasMade) {
                                              AllOf(StartsWith("converted 2: "), EndsWith("(MailAccounts[1]" + of))));
 }
 
+TEST_F(ExplainedConversions, TellFromWhatEachExchangeAccountWasMade) {
+  load({});
+  device.put(accountsettings::daAccountPath(),
+             {{"DAAccountsKey", Array{Dictionary{{"DAAccountConfigurationClass", "ASAccount"},
+                                                 {"DAAccountConfigurationAccountID", "E"}}}}});
+  ASSERT_TRUE(migrator._migrateDAAccounts(*store));
+  store->tellChanges();
+  EXPECT_THAT(recorder->lines(),
+              ElementsAre(AllOf(StartsWith("converted E: "),
+                                EndsWith("(DAAccountsKey[0] of " + accountsettings::daAccountPath() + ")"))));
+}
+
 // What is told of legacy files whose removal was interrupted: they go without being converted again.
 class ExplainedRemovals : public ExplainedSteps {
  protected:
@@ -134,6 +158,22 @@ TEST_F(ExplainedRemovals, TellOfEachLegacyAccountThatTheSettingsDoNotHold) {
               ElementsAre("lost E (not-saved: DAAccountsKey[1] of " + accountsettings::daAccountPath() + ")",
                           "lost D (not-saved: DeliveryAccounts[0]" + of, "lost M (not-saved: MailAccounts[1]" + of,
                           "lost SAVED (not-saved: MailAccounts[2]" + of));
+}
+
+TEST_F(ExplainedRemovals, TellOfLegacyFilesAsTheSourcesThatTheyAre) {
+  device.put(accountsettings::daAccountPath(), {});
+  device.put(accountsettings::mailAccountsPath(), {});
+  migrator._removeOldAccountsInfo();
+  EXPECT_THAT(recorder->lines(), Contains("source-removed").Times(2));
+}
+
+TEST_F(ExplainedRemovals, TellOfALegacyFileThatIsStillThere) {
+  device.put(accountsettings::daAccountPath(), {});
+  device.files->failing.insert("remove " + accountsettings::daAccountPath());
+  migrator._foundOldDAAccountsToMigrate = true;
+  migrator._removeOldAccountsInfo();
+  EXPECT_THAT(recorder->lines(), Contains("file-not-removed (Could not remove " + accountsettings::daAccountPath() +
+                                          ": Input/output error (errno 5))"));
 }
 
 TEST_F(ExplainedRemovals, TellNothingOfFilesThatAreNotThere) { EXPECT_THAT(told(), ElementsAre()); }
