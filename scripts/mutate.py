@@ -1,13 +1,16 @@
 #!/usr/bin/env python3
 """Says what part of the mutants of accountsettings/ and migrator/ the unit tests notice.
 
-    scripts/mutate.py --build DIRECTORY [--jobs N] [SOURCE...]
+    scripts/mutate.py --build DIRECTORY [--jobs N] [--left] [SOURCE...]
 
 Builds the target `mutants` of a build tree (tests/mutation): one program of tests in which each mutant stands behind a
 switch of its own. Every test runs once alone and tells which mutants it reaches; then each mutant runs the tests that
 reach it until one fails, dies or does not end. A mutant that none of them notices is named, with its reason from
 tests/mutation/survivors.txt. Fails where one has none there, where one that is listed is noticed or no more there, and
-where less than 95 % are noticed. With SOURCEs only the mutants of these are tried.
+where less than 95 % are noticed.
+
+What was found stays in the build tree: a run that was stopped goes on where it was, until a program is built again. With
+SOURCEs only the mutants of these are tried, with --left only those that no earlier run found noticed.
 """
 
 import argparse
@@ -30,8 +33,10 @@ SURVIVORS = TREE / "tests" / "mutation" / "survivors.txt"
 PROGRAMS = ("accountsettings_tests", "migrator_mutant_tests", "run_sequence_mutant_tests")
 LEAST = 0.95
 MEMORY = 4 << 30
-PATIENCE = 600  # seconds, for a test that sleeps; one that computes is stopped earlier
+PATIENCE = 300  # seconds, for a test that sleeps; one that computes is stopped earlier
 LONGEST = 2  # seconds of processor time; a test that takes longer is not among those that are tried
+SLOW = 0.1  # seconds of processor time; a test that takes longer is tried after all others
+SAME = "Equivalent: "  # begins the reason of a mutant that nothing could notice
 
 
 @dataclass
@@ -71,7 +76,7 @@ class Runner:
     def __init__(self, directory):
         self.environment = os.environ | {"LD_LIBRARY_PATH": str(directory / "lib")}
 
-    def passes(self, test, seconds=60, **variables):
+    def passes(self, test, seconds, **variables):
         return self.run(test, seconds, variables)[0]
 
     def run(self, test, seconds, variables):
@@ -108,37 +113,45 @@ class Runner:
                 test.reached = reached.read_text().split()
 
 
-class Trial:
-    """Finds for each mutant the first test that notices it. Remembers them from run to run, and tries those first."""
+class Findings:
+    """Which test noticed each mutant (None: none did), kept from run to run."""
 
-    def __init__(self, runner, memory, limit):
-        self.runner, self.memory, self.limit = runner, memory, limit
-        self.killers = json.loads(memory.read_text()) if memory.exists() else {}
+    def __init__(self, path, stamp):
+        self.path, self.stamp = path, stamp
+        kept = json.loads(path.read_text()) if path.exists() else {"stamp": None, "settled": {}, "earlier": {}}
+        self.settled = kept["settled"] if kept["stamp"] == stamp else {}  # with the programs as they are
+        self.earlier = kept["earlier"] | kept["settled"]
+
+    def keep(self):
+        written = self.path.with_suffix(".new")
+        written.write_text(json.dumps({"stamp": self.stamp, "settled": dict(self.settled), "earlier": self.earlier}))
+        written.replace(self.path)
+
+
+class Trial:
+    """Finds for each mutant a test that notices it: tries first what noticed it, or its neighbours, before."""
+
+    def __init__(self, runner, findings):
+        self.runner, self.findings = runner, findings
         self.by_function = defaultdict(list)
         self.tried = 0
 
-    def killer_of(self, mutant):
+    def settle(self, mutant):
+        self.findings.settled[mutant.key] = self.first_that_notices(mutant)
         self.tried += 1
-        if self.tried % 100 == 0:
+        if self.tried % 50 == 0:
             print(f"{self.tried} tried", file=sys.stderr, flush=True)
-            self.remember()
-        return self.first_that_notices(mutant)
+            self.findings.keep()
 
     def first_that_notices(self, mutant):
         near = self.by_function[mutant.source, mutant.function]
-        first = [self.killers.get(mutant.key)] + near[::-1]
-        tests = sorted(mutant.tests, key=lambda test: first.index(test.name) if test.name in first else len(first))
-        for test in tests[:self.limit]:
+        likely = [self.findings.earlier.get(mutant.key), *near[::-1]]
+        for test in sorted(mutant.tests, key=lambda test: likely.index(test.name) if test.name in likely else len(likely)):
             if not self.runner.passes(test, math.ceil(2 + 10 * test.seconds), MUTANT=mutant.name):
-                self.killers[mutant.key] = test.name
                 if test.name not in near:
                     near.append(test.name)
                 return test.name
-        self.killers.pop(mutant.key, None)
         return None
-
-    def remember(self):
-        self.memory.write_text(json.dumps(dict(self.killers), indent=1) + "\n")
 
 
 def kept_reasons():
@@ -166,19 +179,19 @@ def prepare(options):
     runner = Runner(directory)
     places = {path.name: path for path in (options.build / "tests").glob("**/*_tests")}
     tests = [test for program in PROGRAMS for test in runner.tests_of(places[program])]
-    learn_all(runner, tests, options.jobs, directory / "reached.json")
+    library = directory / "lib" / "libaccountsettings.so.1"
+    stamp = {str(path): path.stat().st_mtime_ns for path in [library, *(places[program] for program in PROGRAMS)]}
+    learn_all(runner, tests, options.jobs, stamp, directory / "reached.json")
     mutants = {mutant.name: mutant for mutant in mutants_of(directory / "copies")}
     # A test that reaches little is the likeliest to notice what becomes different there.
-    for test in sorted(tests, key=lambda test: (len(test.reached), test.seconds)):
+    for test in sorted(tests, key=lambda test: (test.seconds >= SLOW, len(test.reached))):
         for name in test.reached:
             mutants[name].tests.append(test)
-    return runner, list(mutants.values())
+    return Trial(runner, Findings(directory / "found.json", stamp)), list(mutants.values())
 
 
-def learn_all(runner, tests, jobs, memory):
+def learn_all(runner, tests, jobs, stamp, memory):
     """What each test reaches; asked again only once the programs are others."""
-    library = runner.environment["LD_LIBRARY_PATH"] + "/libaccountsettings.so.1"
-    stamp = {str(path): os.stat(path).st_mtime_ns for path in sorted({library, *(str(test.program) for test in tests)})}
     known = json.loads(memory.read_text()) if memory.exists() else {}
     if known.get("stamp") != stamp:
         in_parallel(jobs, runner.learn, tests)
@@ -191,12 +204,16 @@ def learn_all(runner, tests, jobs, memory):
 
 
 def tell_score(mutants, survivors):
+    reasons = kept_reasons()
     for folder in [*sorted({re.sub("/.*", "/", mutant.source) for mutant in mutants}), ""]:
         tried = [mutant for mutant in mutants if mutant.source.startswith(folder)]
         left = [mutant for mutant in survivors if mutant.source.startswith(folder)]
         unreached = sum(not mutant.tests for mutant in left)
-        print(f"{folder or 'both'}: {len(tried)} mutants, {len(tried) - len(left)} noticed "
-              f"({1 - len(left) / len(tried):.2%}), {len(left)} not, {unreached} of them reached by no test")
+        noticed = len(tried) - len(left)
+        same = sum(reasons.get(mutant.key, "").startswith(SAME) for mutant in left)
+        print(f"{folder or 'both'}: {len(tried)} mutants, {noticed} noticed ({noticed / len(tried):.2%}), {len(left)} not, "
+              f"{unreached} of them reached by no test; {noticed / max(1, len(tried) - same):.2%} without the {same} that "
+              f"change nothing")
 
 
 def complaints(mutants, survivors, everything):
@@ -217,22 +234,25 @@ def main():
     parser = argparse.ArgumentParser(description=__doc__, formatter_class=argparse.RawDescriptionHelpFormatter)
     parser.add_argument("--build", type=Path, required=True, help="the build tree")
     parser.add_argument("--jobs", type=int, default=os.cpu_count())
-    parser.add_argument("--tests", type=int, help="tries no more than so many tests for each mutant: quicker, and notices less")
+    parser.add_argument("--left", action="store_true", help="tries only what no earlier run found noticed")
     parser.add_argument("sources", nargs="*", metavar="SOURCE", help="as in accountsettings/basic_account.cpp")
     options = parser.parse_args()
     options.build = options.build.absolute()
     os.nice(max(0, 10 - os.nice(0)))
-    runner, mutants = prepare(options)
+    trial, mutants = prepare(options)
     mutants = [mutant for mutant in mutants if not options.sources or mutant.source in options.sources]
-    print(f"{len(mutants)} mutants", flush=True)
-    trial = Trial(runner, options.build / "tests" / "mutation" / "killers.json", options.tests)
-    killers = in_parallel(options.jobs, trial.killer_of, mutants)
-    trial.remember()
-    survivors = [mutant for mutant, killer in zip(mutants, killers) if killer is None]
+    findings = trial.findings
+    noticed_earlier = {key for key, name in findings.earlier.items() if options.left and name}
+    left = [mutant for mutant in mutants if mutant.key not in findings.settled and mutant.key not in noticed_earlier]
+    print(f"{len(mutants)} mutants, {len(left)} of them to be tried", flush=True)
+    in_parallel(options.jobs, trial.settle, left)
+    findings.keep()
+    known = findings.earlier | findings.settled
+    survivors = [mutant for mutant in mutants if known[mutant.key] is None]
     tell_score(mutants, survivors)
-    found = list(complaints(mutants, survivors, not options.sources))
-    print(*found, sep="\n", end="\n" if found else "")
-    return 1 if found else 0
+    complained = list(complaints(mutants, survivors, not options.sources))
+    print(*complained, sep="\n", end="\n" if complained else "")
+    return 1 if complained else 0
 
 
 if __name__ == "__main__":

@@ -249,7 +249,8 @@ class Copy:
         if point.form.startswith("{{"):
             return point.form.format(f"{self.switch}({mutants[0][0]})", plain)
         choice = "".join(f"{self.switch}({number}) ? ({new}) : " for number, new in mutants)
-        return point.form.format(choice + (f"({plain})" if point.start < point.end else ""))
+        kept = TRUTH if point.form == TRUTH else "({})"
+        return point.form.format(choice + (kept.format(plain) if point.start < point.end else ""))
 
     def mutants(self):
         seen = {}
