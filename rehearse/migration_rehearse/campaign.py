@@ -6,6 +6,7 @@ from itertools import islice
 from typing import NamedTuple
 
 from migration_rehearse.engines import DIED
+from migration_rehearse.faults import NO_CONTENTS
 from migration_rehearse.host import Host, Limits
 from migration_rehearse.rehearsal import Identified, Image, Task, identify, rehearse, unrehearsed
 from migration_rehearse.results import Release, shown
@@ -97,7 +98,7 @@ class _Run:
     def _identified(self, chunk, answer):
         if answer is not DIED:
             return answer
-        return [Identified(image.path, "", "", "none:" + shown(image.path), ("worker-died", "")) for image in chunk]
+        return [Identified(image.path, "", "", NO_CONTENTS + shown(image.path), ("worker-died", "")) for image in chunk]
 
     def _is_new(self, image):
         """Whether there is something left to do for it."""

@@ -4,6 +4,7 @@ import os
 from typing import NamedTuple
 
 from migration_rehearse.campaign import LOSING
+from migration_rehearse.faults import NO_CONTENTS
 from migration_rehearse.results import ResultFault
 
 MOST_KINDS = 20  # of differences that are told in words
@@ -53,24 +54,38 @@ class Group:
             self.size, self.example = size, content
 
 
+# Of the rehearsals in a file, those count that an image has; those of an image that is not there are compared with nothing.
+SIDES = f"""
+CREATE TEMP VIEW earlier AS
+  SELECT * FROM old.rehearsals WHERE release = {{earlier}} AND content IN (SELECT content FROM old.images);
+CREATE TEMP VIEW later AS
+  SELECT * FROM main.rehearsals WHERE release = {{later}} AND content IN (SELECT content FROM main.images);
+CREATE TEMP TABLE pairs AS
+  SELECT content, old.id AS old, old.verdict AS old_verdict, old.cause AS old_cause, old.processor_seconds AS old_seconds,
+    new.id AS new, new.verdict AS new_verdict, new.cause AS new_cause, new.processor_seconds AS new_seconds,
+    coalesce(new.accounts, 0) AS accounts,
+    (old.fingerprint, old.verdict, old.cause) IS NOT (new.fingerprint, new.verdict, new.cause) AS is_different
+  FROM later AS new JOIN earlier AS old USING (content) WHERE content NOT GLOB '{NO_CONTENTS}*';
+CREATE TEMP VIEW earlier_only AS
+  SELECT content FROM earlier WHERE content NOT GLOB '{NO_CONTENTS}*' AND content NOT IN (SELECT content FROM later);
+CREATE TEMP VIEW later_only AS
+  SELECT content FROM later WHERE content NOT GLOB '{NO_CONTENTS}*' AND content NOT IN (SELECT content FROM earlier);
+"""
+
+
 class Comparison:
     """The rehearsals of `results` under `release` beside those of another file, `other`, under `earlier`."""
 
     def __init__(self, results, release, other, earlier):
         self.results, self.release, self.earlier = results, release, earlier
         place = os.path.abspath(other.path).replace("%", "%25").replace("?", "%3f").replace("#", "%23")
+        results.database.execute("PRAGMA temp_store = FILE")
         results.database.execute("ATTACH ? AS old", (f"file:{place}?mode=ro",))
-        self.compared = self._number(f"SELECT count(*) {self._pairs}")
-        self.alone = [self._number("SELECT count(*) FROM old.rehearsals WHERE release = ?", earlier) - self.compared,
-                      self._number("SELECT count(*) FROM main.rehearsals WHERE release = ?", release) - self.compared]
+        results.database.executescript(SIDES.format(earlier=earlier.id, later=release.id))
+        self.compared, *self.alone = (self._count(side) for side in ("pairs", "earlier_only", "later_only"))
         self.groups = {}
         for kind, size, content in self._differences():
             self.groups.setdefault(kind, Group()).add(size, content)
-
-    @property
-    def _pairs(self):
-        return ("FROM main.rehearsals AS new JOIN old.rehearsals AS old USING (content)"
-                f" WHERE new.release = {self.release.id} AND old.release = {self.earlier.id}")
 
     @property
     def different(self):
@@ -85,29 +100,27 @@ class Comparison:
         return row[0] or content
 
     def newly_lost(self):
-        return self._number(
-            f"SELECT count(*) {self._pairs} AND new.verdict IN {LOSING} AND (old.verdict NOT IN {LOSING}"
-            " OR coalesce(new.lost, 0) > coalesce(old.lost, 0))")
+        return self._count(f"pairs JOIN main.rehearsals AS now ON now.id = new JOIN old.rehearsals AS before ON before.id = old"
+                           f" WHERE new_verdict IN {LOSING} AND (old_verdict NOT IN {LOSING}"
+                           " OR coalesce(now.lost, 0) > coalesce(before.lost, 0))")
 
     def losing(self):
-        return self._number(f"SELECT count(*) FROM main.rehearsals WHERE release = ? AND verdict IN {LOSING}", self.release)
+        return self._count(f"later WHERE verdict IN {LOSING}")
 
     def unrehearsed(self):
-        return self._number("SELECT count(*) FROM main.rehearsals WHERE release = ? AND verdict = 'unrehearsed'", self.release)
+        return self._count("later WHERE verdict = 'unrehearsed'")
 
     def slower(self, factor):
-        return self._number(f"SELECT count(*) {self._pairs} AND new.processor_seconds > {float(factor)} * old.processor_seconds"
-                            f" AND new.processor_seconds - old.processor_seconds > {NOTICEABLE}")
+        return self._count(f"pairs WHERE new_seconds > {float(factor)} * old_seconds AND new_seconds - old_seconds > {NOTICEABLE}")
 
     def processor_seconds(self):
         """Of all that were compared: before and after."""
-        return self.results.row(f"SELECT total(old.processor_seconds), total(new.processor_seconds) {self._pairs}")
+        return self.results.row("SELECT total(old_seconds), total(new_seconds) FROM pairs")
 
     def _differences(self):
         named = [self._kinds(database) for database in ("old", "main")]
-        query = (f"SELECT content, old.id, new.id, old.verdict, old.cause, new.verdict, new.cause,"
-                 f" coalesce(new.accounts, 0) {self._pairs}"
-                 " AND (old.fingerprint, old.verdict, old.cause) IS NOT (new.fingerprint, new.verdict, new.cause)")
+        query = ("SELECT content, old, new, old_verdict, old_cause, new_verdict, new_cause, accounts FROM pairs"
+                 " WHERE is_different")
         for content, old, new, *verdicts, accounts in self.results.rows(query):
             facts = [self._facts(database, names, rehearsal)
                      for database, names, rehearsal in zip(("old", "main"), named, (old, new))]
@@ -126,8 +139,8 @@ class Comparison:
     def _losses(self, database, rehearsal):
         return {code for code, in self.results.rows(f"SELECT code FROM {database}.losses WHERE rehearsal = ?", (rehearsal,))}
 
-    def _number(self, query, release=None):
-        return self.results.row(query, (release.id,) if release else ())[0]
+    def _count(self, what):
+        return self.results.row(f"SELECT count(*) FROM {what}")[0]
 
 
 def _verdict(verdict, cause):

@@ -1,5 +1,6 @@
 """Why an image could not be rehearsed: each cause has a code, which stands in the results, and a sentence."""
 
+NO_CONTENTS = "none:"  # what the contents of an image are called that is not there, before something of its path
 CAUSES = {
     "missing": "there is no such directory or file",
     "unreadable": "it cannot be read",

@@ -13,7 +13,7 @@ import zlib
 from typing import NamedTuple
 
 from migration_rehearse import explained, footprint, host, serving, unpacker, unpacking
-from migration_rehearse.faults import Fault
+from migration_rehearse.faults import NO_CONTENTS, Fault
 
 DIRECTORY, ARCHIVE = "directory", "archive"
 ENDED = {0, 1, 6, 7}  # what the host ends with where the plug-in was called
@@ -112,7 +112,7 @@ def _identify_directory(path):
 
 def _faulty(path, cause, detail=""):
     """What is not there has no contents: it is named by its place."""
-    return Identified(path, "", "", "none:" + hashlib.sha256(os.fsencode(path)).hexdigest(), (cause, detail))
+    return Identified(path, "", "", NO_CONTENTS + hashlib.sha256(os.fsencode(path)).hexdigest(), (cause, detail))
 
 
 def rehearse(task):

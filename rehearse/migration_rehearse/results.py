@@ -10,6 +10,8 @@ import sqlite3
 import time
 from typing import NamedTuple
 
+from migration_rehearse.faults import NO_CONTENTS
+
 APPLICATION = 0x4D524831
 SCHEMA_VERSION = 1
 SCHEMA = """
@@ -194,9 +196,13 @@ class Results:
         return self.row("SELECT verdict, cause FROM rehearsals WHERE content = ? AND release = ?", (content, release.id))
 
     def add_image(self, identified):
+        """Keeps what an image is. That it was not there is forgotten once it is."""
+        path = shown(identified.path)
+        self.change("DELETE FROM rehearsals WHERE content = (SELECT content FROM images WHERE path = ? AND content GLOB ?)"
+                    " AND content != ?", (path, NO_CONTENTS + "*", identified.content))
         self.change("INSERT INTO images VALUES (?, ?, ?, ?) ON CONFLICT (path) DO UPDATE SET"
                     " kind = excluded.kind, signature = excluded.signature, content = excluded.content",
-                    (shown(identified.path), identified.kind, identified.signature, identified.content))
+                    (path, identified.kind, identified.signature, identified.content))
 
     def add(self, content, release, rehearsed):
         """Keeps a rehearsal in place of an earlier one of the same contents under the same release."""

@@ -26,6 +26,11 @@ class Compare(RehearseTest):
                 results.add(device, release, rehearsed)
         return path
 
+    def forget_image(self, name, device):
+        """The image has other contents by now."""
+        with Results(self.scratch / name) as results:
+            results.change("UPDATE images SET content = 'other' WHERE content = ?", (device,))
+
     def compared(self, old, new, *options, status=1):
         files = self.filled("old", "d", **old), self.filled("new", "e", **new)
         return self.command("compare", *files, *options, status=status)
@@ -55,6 +60,14 @@ class Compare(RehearseTest):
         told = self.compared({"a": ended(), "b": ended()}, {"b": ended(), "c": ended(), "e": ended()}, status=0)
         self.assertIn("1 devices are in the earlier results only.\n2 devices are in the later results only.", told)
 
+    def test_counts_nothing_that_no_image_has_any_more(self):
+        self.filled("old", "d", a=ended(), b=ended())
+        self.filled("new", "e", a=ended(), b=ended("lost", 1), c=ended("lost", 1))
+        self.forget_image("old", "b")
+        self.forget_image("new", "c")
+        told = self.command("compare", self.scratch / "old", self.scratch / "new")
+        self.assertRegex(told, "^1 devices under .*\n +1  end the same\n1 devices are in the later results only.\n")
+
     def test_takes_two_releases_of_one_file(self):
         path = self.filled("both", "d", a=ended())
         self.command("compare", path, path, status=4)
@@ -79,6 +92,12 @@ class Gate(Compare):
         self.assertIn("break none-different", self.gate("none-different", 1, kept=ended(mark=9)))
         self.assertIn("break all-rehearsed", self.gate("all-rehearsed", 1, kept=Rehearsed("unrehearsed", "timeout")))
         self.assertIn("break none-slower", self.gate("none-slower=2", 1, slow=ended(processor_seconds=0.5)))
+
+    def test_forgets_what_no_image_has_any_more(self):
+        files = self.filled("old", "d", a=ended()), self.filled("new", "e", a=ended(), b=ended("lost", 1))
+        self.command("compare", *files, "--gate", "none-lost", status=1)
+        self.forget_image("new", "b")
+        self.command("compare", *files, "--gate", "none-lost")
 
     def test_says_what_is_no_rule(self):
         for rules in ("none", "none-slower", "none-slower=fast", "none-lost=1", ""):

@@ -121,6 +121,14 @@ class Again(RehearseTest):
         self.rehearse(self.image("one", [KEPT, UNFIXABLE]), status=1)
         self.assertEqual({"one": ("lost", "")}, self.verdicts())
 
+    def test_forgets_that_an_image_was_not_there(self):
+        place = self.scratch / "one"
+        self.rehearse(place, status=3)
+        self.rehearse(self.image("one"))
+        self.assertEqual([("kept",)], self.rows("SELECT verdict FROM rehearsals"))
+        shutil.copy(self.file, self.scratch / "later")
+        self.command("compare", self.file, self.scratch / "later", "--gate", "all-rehearsed")
+
     def test_does_all_under_another_release(self):
         root = self.image("one")
         self.rehearse(root)
