@@ -14,6 +14,7 @@ from device_case import PLUGINS, DeviceTest
 CLIENT = PLUGINS / "changing_client"
 PROGRAMS = 16
 CHANGES = int(os.environ.get("CHANGES", "1000"))
+ADDED = min(CHANGES, 3_000)  # the file grows with each
 FEWER = 160
 # A program of a short run is killed about once; one of a long run again and again, until its end.
 SHARE_THAT_LIVES, LONGEST_LIFE = (0.5, 1) if CHANGES <= 1000 else (0, 20)
@@ -89,7 +90,7 @@ class ManyChanges(DeviceTest):
 
     def test_are_all_in_the_file_and_told_once(self):
         watcher = Watcher(self, self.tree.root)
-        programs = self.run_programs("add", min(CHANGES, 1000))
+        programs = self.run_programs("add", ADDED)
         added, keys = self.named()
         answered = set().union(*(of(each.name, each.answered) for each in programs))
         unknown = set().union(*(of(each.name, each.unknown) for each in programs))
@@ -122,7 +123,7 @@ class ManyChanges(DeviceTest):
     def test_lose_to_an_editor_without_the_lock_what_was_saved_while_it_edited(self):
         watcher, editor = Watcher(self, self.tree.root), Editor(self.tree)
         with editor:
-            programs = self.run_programs("add", 1000 if CHANGES > 1000 else FEWER)
+            programs = self.run_programs("add", ADDED if CHANGES > 1000 else FEWER)
         added, keys = self.named()
         self.assertEqual((len(added), len(keys)), (len(set(added)), len(set(keys))))
         for program in programs:
