@@ -7,12 +7,14 @@ import os
 import pydoc
 import select
 import struct
+import subprocess
 import sys
 import threading
 import traceback
 import unittest
 from datetime import datetime, timezone
 from pathlib import Path
+from textwrap import dedent
 
 SANITIZE = os.environ["SANITIZE"]
 SOURCES = Path(os.environ["SOURCE_TREE"])
@@ -276,6 +278,77 @@ class Watching(PythonModule):
             self.assertEqual([watch], select.select([watch], [], [], 10)[0])
             watch.dispatch()
         self.assertEqual([("Enabled Dataclasses",)], [change.keys for change in told])
+
+    def run_program(self, text):
+        """What a program of its own prints that ends by itself, since what is dropped wrongly ends the whole process."""
+        program = [sys.executable, "-B", "-c", dedent(text), self.tree.root]
+        environment = {**os.environ, "PYTHONPATH": str(SOURCES / "bindings/python")}
+        run = subprocess.run(program, env=environment, capture_output=True, text=True, timeout=100, check=False)
+        self.assertEqual((0, ""), (run.returncode, run.stderr))
+        return run.stdout
+
+    def test_ends_when_it_is_dropped_while_it_tells(self):
+        self.assertEqual("whole\n", self.run_program("""
+            import sys, time
+            from account_settings import AccountSettings
+            settings = AccountSettings(sys.argv[1])
+            seen = settings.accounts
+            with settings.edit() as edit:
+                edit["M1"]["Port"] = 1
+            sys.setswitchinterval(100)  # the watch's thread has to wait before each call
+            for _ in range(20):
+                watch = settings.watch(lambda change: None, since=seen)
+                end = time.monotonic() + 0.03
+                while time.monotonic() < end:
+                    pass
+                del watch
+            print("whole")
+        """))
+
+    def test_ends_with_a_program_that_still_watches(self):
+        for seconds in (0, 0.002, 0.01, 0.05):
+            self.assertEqual("told\n", self.run_program(f"""
+                import sys, threading, time
+                from account_settings import AccountSettings
+                settings, is_told = AccountSettings(sys.argv[1]), threading.Event()
+                seen = settings.accounts
+                with settings.edit() as edit:
+                    edit["M1"]["Port"], edit["V1"]["Port"] = time.time_ns(), 1
+                def tell(change):
+                    is_told.set()
+                    time.sleep({seconds})
+                watch = settings.watch(tell, since=seen)
+                is_told.wait(10)
+                print("told")
+            """))
+
+    def test_may_be_closed_and_dropped_by_its_own_callback(self):
+        self.assertEqual("told\n", self.run_program("""
+            import sys, threading
+            from account_settings import AccountSettings
+            settings, watches, is_over = AccountSettings(sys.argv[1]), [], threading.Event()
+            def tell(change):
+                watches.pop().close()
+                print("told")
+                is_over.set()
+            watches.append(settings.watch(tell))
+            with settings.edit() as edit:
+                edit["M1"]["Port"] = 1
+            is_over.wait(10)
+        """))
+
+    def test_ends_in_a_forked_child_where_nothing_follows_it(self):
+        with self.settings().watch(print) as watch:
+            self.assert_passes_in_child(lambda: self.assert_fails(Code.FINISHED, watch.fileno))
+            self.assertEqual(-1, watch.fileno())
+
+    def test_is_over_once_it_is_closed(self):
+        for own_thread in (True, False):
+            watch = self.settings().watch(print, own_thread=own_thread)
+            watch.close()
+            watch.close()
+            self.assert_fails(Code.FINISHED, watch.fileno)
+            self.assert_fails(Code.FINISHED, watch.dispatch)
 
     def test_says_where_nothing_can_be_watched(self):
         settings = self.settings()

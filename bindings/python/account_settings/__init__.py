@@ -18,13 +18,17 @@ settings; an edit belongs to one thread at a time.
 
 from __future__ import annotations
 
+import atexit
 import ctypes
+import os
 from collections.abc import Callable, Iterator, Mapping
 from dataclasses import dataclass
 from enum import IntEnum
+from itertools import count
 from os import PathLike, fspath
 from types import TracebackType
 from typing import Any
+from weakref import WeakValueDictionary
 
 from . import _library as _c
 from ._library import AccountSettingsError, Code, Property
@@ -251,18 +255,18 @@ class EditedAccount(Account):
 
     def __setitem__(self, key: str, value: Property) -> None:
         with _c.c_value(value) as made:
-            _c.attempt("edit_set", self._edit.handle, self._named(), _c.encoded(key), made)
+            _c.attempt("edit_set", self._edit._handle, self._named(), _c.encoded(key), made)
         self._look_again()
 
     def __delitem__(self, key: str) -> None:
         if key not in self:
             raise KeyError(key)
-        _c.attempt("edit_erase", self._edit.handle, self._named(), _c.encoded(key))
+        _c.attempt("edit_erase", self._edit._handle, self._named(), _c.encoded(key))
         self._look_again()
 
     def enable(self, dataclass: str, enabled: bool = True) -> None:
         """Switches a data class on or off."""
-        _c.attempt("edit_set_enabled", self._edit.handle, self._named(), _c.encoded(dataclass), enabled)
+        _c.attempt("edit_set_enabled", self._edit._handle, self._named(), _c.encoded(dataclass), enabled)
         self._look_again()
 
     def _named(self) -> bytes:
@@ -270,7 +274,7 @@ class EditedAccount(Account):
 
     def _look_again(self) -> None:
         # What could not be loaded again is shown as it was; saving says so.
-        if account := _c.call("edit_find", self._edit.handle, self._named()):
+        if account := _c.call("edit_find", self._edit._handle, self._named()):
             self._handle = _c.handle("account", account)
 
 
@@ -290,35 +294,29 @@ class Edit:
         self.changes = []
         self.not_announced = None
         begun = _c.attempt("trial_begin" if is_trial else "edit_begin", settings)
-        self._handle: _c.Handle | None = _c.handle("edit", begun)
-
-    @property
-    def handle(self) -> _c.Handle:
-        if self._handle is None:
-            raise AccountSettingsError(Code.FINISHED, "the edit is over")
-        return self._handle
+        self._handle = _c.handle("edit", begun)
 
     @property
     def accounts(self) -> list[EditedAccount]:
         """The top-level accounts, with what was changed so far."""
-        listed = Accounts(_c.handle("accounts", _c.call("edit_accounts", self.handle)))
+        listed = Accounts(_c.handle("accounts", _c.call("edit_accounts", self._handle)))
         return [EditedAccount(account._handle, self) for account in listed]
 
     def __getitem__(self, identifier: str) -> EditedAccount:
-        account = _c.call("edit_find", self.handle, _c.encoded(identifier))
+        account = _c.call("edit_find", self._handle, _c.encoded(identifier))
         if not account:
             raise KeyError(identifier)
         return EditedAccount(_c.handle("account", account), self)
 
     def __contains__(self, identifier: str) -> bool:
-        account = _c.call("edit_find", self.handle, _c.encoded(identifier))
+        account = _c.call("edit_find", self._handle, _c.encoded(identifier))
         return bool(account and _c.handle("account", account))
 
     def __delitem__(self, identifier: str) -> None:
         """Removes an account with its children, or a child."""
         if identifier not in self:
             raise KeyError(identifier)
-        _c.attempt("edit_remove", self.handle, _c.encoded(identifier))
+        _c.attempt("edit_remove", self._handle, _c.encoded(identifier))
 
     def add(
         self, type: str, account_class: str, properties: Mapping[str, Property] | None = None, *, parent: str | None = None
@@ -326,19 +324,19 @@ class Edit:
         """Adds an account, or a child of the parent. A text under "Identifier" is kept, else one is made."""
         with _c.c_value(dict(properties or {})) as made:
             account = _c.attempt(
-                "edit_add", self.handle, _c.encoded(type), _c.encoded(account_class), made,
+                "edit_add", self._handle, _c.encoded(type), _c.encoded(account_class), made,
                 None if parent is None else _c.encoded(parent),
             )
         return EditedAccount(_c.handle("account", account), self)
 
     def rewrite(self) -> None:
         """Has the save write the file even where nothing was changed, so that what loading repaired stands in it."""
-        _c.call("edit_rewrite", self.handle)
+        _c.call("edit_rewrite", self._handle)
 
     def save(self) -> list[Change]:
         """Saves the changes, gives the lock back and tells those who listen. The edit is over then, also if it fails."""
         try:
-            saved = _c.handle("changes", _c.attempt("edit_save", self.handle))
+            saved = _c.handle("changes", _c.attempt("edit_save", self._handle))
         finally:
             self.close()
         reason = _c.call("changes_not_announced", saved)
@@ -348,9 +346,7 @@ class Edit:
 
     def close(self) -> None:
         """Gives the lock back; what was not saved is forgotten."""
-        handle, self._handle = self._handle, None
-        if handle is not None:
-            handle.free()
+        self._handle.free()
 
     def __enter__(self) -> Edit:
         return self
@@ -358,23 +354,41 @@ class Edit:
     def __exit__(self, kind: type | None, error: BaseException | None, trace: TracebackType | None) -> None:
         if kind is not None:
             self.close()
-        elif self._handle is not None:
+        elif self._handle.is_held:
             self.save()
 
 
+# By the number that the library calls with; the function it calls stays for as long as the process.
+_watches: WeakValueDictionary[int, Watch] = WeakValueDictionary()
+_numbers = count(1)
+
+
+@_c.CALLBACK
+def _tell(changes: int, number: int) -> None:
+    watch = _watches.get(number)
+    if watch is not None:
+        watch._callback(_changes(changes)[0])
+
+
 class Watch:
-    """Tells of each change until it is closed; to be used in a `with` statement, or closed."""
+    """Tells of each change until it is closed, dropped, or the program ends; to be used in a `with` statement.
+
+    Any thread may close it. Where it has no thread of its own, one thread at a time asks for its descriptor, dispatches
+    or closes it, or the callback does. A forked child does not watch: there it is over.
+    """
 
     def __init__(
         self, settings: _c.Handle, since: Accounts, callback: Callable[[Change], object], own_thread: bool
     ):
-        def told(changes: int, _data: int) -> None:
-            callback(_changes(changes)[0])
-
-        self._callback = _c.CALLBACK(told)
-        self._handle = _c.handle(
-            "watch", _c.attempt("watch_begin", settings, since._handle, self._callback, None, 0 if own_thread else 1)
-        )
+        self._callback = callback
+        number = next(_numbers)
+        _watches[number] = self  # which may be called before the library answers
+        try:
+            begun = _c.attempt("watch_begin", settings, since._handle, _tell, number, 0 if own_thread else 1)
+        except BaseException:
+            del _watches[number]
+            raise
+        self._handle = _c.handle("watch", begun)
 
     def fileno(self) -> int:
         """For `select` and event loops: readable when there is something to dispatch. -1 with a thread of its own."""
@@ -385,7 +399,7 @@ class Watch:
         _c.call("watch_dispatch", self._handle)
 
     def close(self) -> None:
-        """From then on nothing is called; waits for a call that is under way in another thread."""
+        """From then on nothing is called; waits for a call that is under way in another thread. May be called again."""
         self._handle.free()
 
     def __enter__(self) -> Watch:
@@ -393,6 +407,20 @@ class Watch:
 
     def __exit__(self, kind: type | None, error: BaseException | None, trace: TracebackType | None) -> None:
         self.close()
+
+
+@atexit.register
+def _close_watches() -> None:
+    for watch in list(_watches.values()):
+        watch.close()
+
+
+def _forget_watches() -> None:
+    for watch in list(_watches.values()):
+        watch._handle.forget()
+
+
+os.register_at_fork(after_in_child=_forget_watches)
 
 
 class AccountSettings:

@@ -112,13 +112,27 @@ class Handle:
     """What the library handed out, freed when nobody has it any more."""
 
     def __init__(self, kind: str, pointer: int):
+        self._kind, self._pointer = kind, pointer
         self._free = _functions[kind + "_free" if kind else "free"]
-        self._as_parameter_: int | None = pointer
+
+    @property
+    def pointer(self) -> int:
+        if not self._pointer:
+            raise AccountSettingsError(Code.FINISHED, f"the {self._kind} is over")
+        return self._pointer
+
+    @property
+    def is_held(self) -> bool:
+        return bool(self._pointer)
 
     def free(self) -> None:
-        pointer, self._as_parameter_ = self._as_parameter_, None
-        if pointer:
+        if pointer := self.forget():
             self._free(pointer)
+
+    def forget(self) -> int:
+        """What is to be freed by somebody else, or by nobody."""
+        pointer, self._pointer = self._pointer, 0
+        return pointer
 
     def __del__(self) -> None:
         self.free()
@@ -131,14 +145,18 @@ def handle(kind: str, pointer: int | None) -> Handle:
     return Handle(kind, pointer)
 
 
+def _given(arguments: tuple) -> Iterator[Any]:
+    return (each.pointer if isinstance(each, Handle) else each for each in arguments)
+
+
 def call(name: str, *arguments: Any) -> Any:
-    return _functions[name](*arguments)
+    return _functions[name](*_given(arguments))
 
 
 def attempt(name: str, *arguments: Any) -> Any:
     """What the function answers, or the error that it tells."""
     error = c_void_p()
-    answer = _attempts[name](*arguments, byref(error))
+    answer = _attempts[name](*_given(arguments), byref(error))
     if not error.value:
         if not answer:
             raise MemoryError
@@ -161,7 +179,7 @@ class Opaque:
     """A value of a kind that nobody reads; it can be given back as it is."""
 
     def __init__(self, value: Handle):
-        self._as_parameter_ = value
+        self.handle = value
 
 
 def _read(name: str, kind: Any, value: Handle) -> Any:
@@ -253,7 +271,7 @@ def _filled(value: Any) -> Handle:
 def c_value(value: Any) -> Iterator[Handle]:
     """The value as the library has it, for the length of a block."""
     if isinstance(value, Opaque):
-        yield value._as_parameter_
+        yield value.handle
         return
     made = _made(value)
     try:
