@@ -5,12 +5,7 @@ using accounts::c::handle;
 using accounts::c::isDone;
 using accounts::c::made;
 using accounts::c::orElse;
-
-namespace {
-
-std::string textOf(const char* text) { return text == nullptr ? std::string{} : std::string{text}; }
-
-}  // namespace
+using accounts::c::orEmpty;
 
 extern "C" {
 
@@ -43,7 +38,7 @@ account_settings_account* account_settings_edit_add(account_settings_edit* edit,
                                                     const char* account_class, const account_settings_value* properties,
                                                     const char* parent, account_settings_error** error) {
   return made(error, [&]() -> account_settings_account* {
-    accounts::NewAccount account{textOf(type), textOf(account_class), {}, textOf(parent)};
+    accounts::NewAccount account{orEmpty(type), orEmpty(account_class), {}, orEmpty(parent)};
     if (properties != nullptr) account.properties = properties->value.dictionary().value_or(account.properties);
     const auto added = edit->edit.add(account);
     return isDone(added, error) ? new account_settings_account{*added} : nullptr;
@@ -109,6 +104,10 @@ const char* account_settings_changes_key(const account_settings_changes* changes
 
 const char* account_settings_changes_not_announced(const account_settings_changes* changes) {
   return changes->notAnnounced ? changes->notAnnounced->sentence.c_str() : nullptr;
+}
+
+size_t account_settings_changes_key_count(const account_settings_changes* changes, size_t place) {
+  return place < changes->changes.size() ? changes->changes[place].keys.size() : 0;
 }
 
 void account_settings_changes_free(account_settings_changes* changes) { delete changes; }

@@ -1,6 +1,7 @@
 #pragma once
 
 #include <exception>
+#include <map>
 #include <memory>
 #include <mutex>
 #include <new>
@@ -61,6 +62,8 @@ struct account_settings_account {
   std::string parent;
   mutable std::once_flag serviceAsked = {};  // which opens a module
   mutable std::optional<accounts::Service> service = std::nullopt;
+  mutable std::mutex textsMutex = {};
+  mutable std::map<std::string, std::string> texts = {};  // that were asked for, by their keys
 };
 
 struct account_settings_accounts {
@@ -107,7 +110,7 @@ auto made(account_settings_error** error, const Function& function) noexcept -> 
   try {
     return function();
   } catch (const std::exception&) {
-    tell(error, ACCOUNT_SETTINGS_NO_MEMORY, "");
+    tell(error, ACCOUNT_SETTINGS_NO_MEMORY, "no memory");  // short enough to need none
     return {};
   }
 }
@@ -122,6 +125,8 @@ template <typename Handle, typename Content>
 Handle* handle(std::optional<Content> content) {
   return content ? new Handle{*std::move(content)} : nullptr;
 }
+
+inline std::string orEmpty(const char* text) { return text == nullptr ? std::string{} : std::string{text}; }
 
 template <typename Content>
 bool put(const std::optional<Content>& content, Content* place) {

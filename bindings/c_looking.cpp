@@ -6,6 +6,7 @@ using accounts::c::handle;
 using accounts::c::isDone;
 using accounts::c::made;
 using accounts::c::orElse;
+using accounts::c::orEmpty;
 using accounts::c::put;
 
 namespace {
@@ -63,10 +64,33 @@ void account_settings_error_free(account_settings_error* error) { delete error; 
 
 account_settings* account_settings_open(const char* root, int64_t time_limit_ms, uint32_t flags,
                                         account_settings_error** error) {
+  return account_settings_open_at(root, nullptr, nullptr, time_limit_ms, flags, nullptr, nullptr, error);
+}
+
+bool account_settings_wait_for_migration(const char* root, int64_t time_limit_ms, account_settings_error** error) {
+  return made(error, [&] {
+    accounts::OpenOptions options;
+    options.root = orEmpty(root);
+    options.timeLimit = std::chrono::milliseconds{time_limit_ms};
+    return isDone(accounts::AccountSettings::waitForMigration(options), error);
+  });
+}
+
+void account_settings_free(account_settings* settings) { delete settings; }
+
+account_settings* account_settings_open_at(const char* root, const char* home, const char* resources,
+                                           int64_t time_limit_ms, uint32_t flags,
+                                           account_settings_waiting while_waiting, void* data,
+                                           account_settings_error** error) {
   return made(error, [&]() -> account_settings* {
     accounts::OpenOptions options;
-    options.root = root == nullptr ? "" : root;
+    options.root = orEmpty(root);
+    options.home = orEmpty(home);
+    options.resources = orEmpty(resources);
     options.timeLimit = std::chrono::milliseconds{time_limit_ms};
+    if (while_waiting != nullptr) {
+      options.whileWaiting = [while_waiting, data](const std::string& say) { while_waiting(say.c_str(), data); };
+    }
     options.mayBeMissing = (flags & ACCOUNT_SETTINGS_MAY_BE_MISSING) != 0;
     options.mayDropUnreadable = (flags & ACCOUNT_SETTINGS_MAY_DROP_UNREADABLE) != 0;
     options.mayBeOfOtherRelease = (flags & ACCOUNT_SETTINGS_MAY_BE_OF_OTHER_RELEASE) != 0;
@@ -76,17 +100,6 @@ account_settings* account_settings_open(const char* root, int64_t time_limit_ms,
     return isDone(settings, error) ? new account_settings{std::move(settings).value()} : nullptr;
   });
 }
-
-bool account_settings_wait_for_migration(const char* root, int64_t time_limit_ms, account_settings_error** error) {
-  return made(error, [&] {
-    accounts::OpenOptions options;
-    options.root = root == nullptr ? "" : root;
-    options.timeLimit = std::chrono::milliseconds{time_limit_ms};
-    return isDone(accounts::AccountSettings::waitForMigration(options), error);
-  });
-}
-
-void account_settings_free(account_settings* settings) { delete settings; }
 
 account_settings_accounts* account_settings_look(const account_settings* settings, account_settings_error** error) {
   return made(error, [&]() -> account_settings_accounts* {
@@ -200,6 +213,19 @@ bool account_settings_account_boolean(const account_settings_account* account, c
 
 account_settings_value* account_settings_account_properties(const account_settings_account* account) {
   return orElse(kNoValue, [&] { return new account_settings_value{Value{account->account.ownProperties()}}; });
+}
+
+const char* account_settings_account_text(const account_settings_account* account, const char* key) {
+  return orElse(static_cast<const char*>(nullptr), [&]() -> const char* {
+    const auto text = account->account.text(key);
+    if (!text) return nullptr;
+    const std::lock_guard guard{account->textsMutex};
+    return account->texts.emplace(key, *text).first->second.c_str();
+  });
+}
+
+bool account_settings_account_lists_dataclasses(const account_settings_account* account) {
+  return orElse(false, [&] { return account->account.listsDataclasses(); });
 }
 
 void account_settings_account_free(account_settings_account* account) { delete account; }

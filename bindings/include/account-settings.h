@@ -84,6 +84,18 @@ ACCOUNT_SETTINGS_API bool account_settings_wait_for_migration(const char* root, 
                                                               account_settings_error** error);
 ACCOUNT_SETTINGS_API void account_settings_free(account_settings* settings);
 
+/* The sentence, which is lent for the call, says for whom a thread has been waiting for a second. Must not throw, or
+ * jump out. */
+typedef void (*account_settings_waiting)(const char* sentence, void* data);
+
+/* As account_settings_open, with the mobile user's home directory and the directory of the configuration; NULL for
+ * those of the root and of the installed library. Each thread that waits, now or for a change, calls `while_waiting`
+ * where that is not NULL. */
+ACCOUNT_SETTINGS_API account_settings* account_settings_open_at(const char* root, const char* home,
+                                                                const char* resources, int64_t time_limit_ms,
+                                                                uint32_t flags, account_settings_waiting while_waiting,
+                                                                void* data, account_settings_error** error);
+
 /* --- Look --- */
 
 /* The accounts as the file has them now; waits for nobody. */
@@ -139,6 +151,11 @@ ACCOUNT_SETTINGS_API bool account_settings_account_boolean(const account_setting
 /* A dictionary of the account's own properties. */
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_account_properties(
     const account_settings_account* account);
+/* The property where it is a text; a child's is its parent's where it has none itself. */
+ACCOUNT_SETTINGS_API const char* account_settings_account_text(const account_settings_account* account,
+                                                               const char* key);
+/* Whether there is a list of the data classes that are switched on, be it an empty one. */
+ACCOUNT_SETTINGS_API bool account_settings_account_lists_dataclasses(const account_settings_account* account);
 ACCOUNT_SETTINGS_API void account_settings_account_free(account_settings_account* account);
 
 /* --- Values --- */
@@ -246,6 +263,8 @@ ACCOUNT_SETTINGS_API const char* account_settings_changes_key(const account_sett
                                                               size_t key);
 /* NULL where everybody who listens was told, else why not. */
 ACCOUNT_SETTINGS_API const char* account_settings_changes_not_announced(const account_settings_changes* changes);
+/* How many keys there are; none of an account that was added or removed, and behind the last change. */
+ACCOUNT_SETTINGS_API size_t account_settings_changes_key_count(const account_settings_changes* changes, size_t place);
 ACCOUNT_SETTINGS_API void account_settings_changes_free(account_settings_changes* changes);
 
 /* --- Watch --- */

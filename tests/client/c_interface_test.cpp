@@ -182,5 +182,87 @@ TEST_F(FailuresInC, SayThatNothingCanBeWatched) {
             ACCOUNT_SETTINGS_NOT_WATCHED);
 }
 
+TEST_F(FailuresInC, OfAnotherDirectorySayThatTheConfigurationIsMissing) {
+  const char* const root = device.root.path().c_str();
+  EXPECT_EQ(codeOf([&](auto** error) {
+              return owned(account_settings_open_at(root, nullptr, root, 0, 0, nullptr, nullptr, error)) != nullptr;
+            }),
+            ACCOUNT_SETTINGS_BROKEN_INSTALLATION);
+}
+
+TEST_F(FailuresInC, SayThatThereIsNotEnoughMemory) {
+  runOutOfMemory();
+  EXPECT_EQ(codeOf([](auto** error) { return owned(account_settings_open(nullptr, 0, 0, error)) != nullptr; }),
+            ACCOUNT_SETTINGS_NO_MEMORY);
+}
+
+TEST_F(FailuresInC, OfBeginningRefuseALockFileThatAStrangerMayHold) {
+  if (::geteuid() != 0) GTEST_SKIP() << "only root can give a file away";
+  EXPECT_EQ(besideAStrangersLock([this] { return whyNotBegun(); }), ACCOUNT_SETTINGS_REFUSED);
+}
+
+TEST_F(FailuresInC, OfSavingSayThatALaterReleasesFileIsThereNow) {
+  const auto settings = opened();
+  const auto edit = begun(settings.get());
+  ASSERT_TRUE(set(edit.get(), "M1", "Port"));
+  replaceAccounts(kAccounts, 99);
+  EXPECT_EQ(whyNotSaved(edit.get()), ACCOUNT_SETTINGS_NEWER);
+}
+
+TEST_F(FailuresInC, SayThatTheProcessWatchesTooMuchAlready) {
+  const auto settings = opened();
+  const auto seen = owned(account_settings_look(settings.get(), nullptr));
+  EXPECT_EQ(withoutDescriptors([&] {
+              return codeOf([&](auto** error) {
+                return account_settings_watch_begin(settings.get(), seen.get(), nullptr, nullptr,
+                                                    ACCOUNT_SETTINGS_EVENT_LOOP, error) != nullptr;
+              });
+            }),
+            ACCOUNT_SETTINGS_NOT_WATCHED);
+}
+
+class LookingInC : public FailuresInC {};
+
+TEST_F(LookingInC, ReadsATextThatAChildHasOfItsParent) {
+  const auto seen = owned(account_settings_look(opened().get(), nullptr));
+  const auto child = owned(account_settings_accounts_find(seen.get(), "C1"));
+  const char* const name = account_settings_account_text(child.get(), "DisplayName");
+  EXPECT_STREQ(name, "Cirrant");
+  EXPECT_EQ(account_settings_account_text(child.get(), "DisplayName"), name);
+  EXPECT_EQ(account_settings_account_text(child.get(), "Enabled Dataclasses"), nullptr);
+  EXPECT_EQ(account_settings_account_text(child.get(), "unknown"), nullptr);
+}
+
+TEST_F(LookingInC, TellsAnAccountThatListsNoDataclassesFromOneThatSwitchedAllOff) {
+  putAccounts(account("A") + account("B", "LDAP", "<key>Enabled Dataclasses</key><array/>"));
+  const auto seen = owned(account_settings_look(opened().get(), nullptr));
+  const auto lists = [&](const char* identifier) {
+    return account_settings_account_lists_dataclasses(
+        owned(account_settings_accounts_find(seen.get(), identifier)).get());
+  };
+  EXPECT_FALSE(lists("A"));
+  EXPECT_TRUE(lists("B"));
+}
+
+TEST_F(LookingInC, CountsTheKeysOfAChange) {
+  const auto edit = begun(opened().get());
+  ASSERT_TRUE(set(edit.get(), "M1", "A") && set(edit.get(), "M1", "B"));
+  const auto saved = owned(account_settings_edit_save(edit.get(), nullptr));
+  EXPECT_EQ(account_settings_changes_key_count(saved.get(), 0), 2U);
+  EXPECT_EQ(account_settings_changes_key_count(saved.get(), 1), 0U);
+}
+
+TEST_F(LookingInC, SaysForWhomAThreadIsWaiting) {
+  device.root.put(kLock, "");
+  const int lock = ::open((device.root / kLock).c_str(), O_RDONLY | O_CLOEXEC);
+  ::flock(lock, LOCK_EX);
+  std::string said;
+  const auto tell = [](const char* sentence, void* data) { *static_cast<std::string*>(data) += sentence; };
+  EXPECT_EQ(account_settings_open_at(device.root.path().c_str(), nullptr, nullptr, 1500, 0, tell, &said, nullptr),
+            nullptr);
+  EXPECT_THAT(said, testing::StartsWith("waiting for "));
+  ::close(lock);
+}
+
 }  // namespace
 }  // namespace tests

@@ -1,9 +1,11 @@
 #pragma once
 
 #include <gmock/gmock.h>
+#include <sys/resource.h>
 #include <unistd.h>
 
 #include <filesystem>
+#include <new>
 #include <string>
 #include <utility>
 
@@ -91,6 +93,44 @@ class DeviceWithAccounts : public ::testing::Test {
     const auto answer = function();
     EXPECT_EQ(::seteuid(user), 0);
     return answer;
+  }
+
+  // What the function answers to the settings' owner where the migration lock is a stranger's file; for root only.
+  template <typename Function>
+  auto besideAStrangersLock(const Function& function) const -> decltype(function()) {
+    device.root.put(kLock, "");
+    for (const char* directory : {"", "tmp", "var/mobile/Library/Preferences"}) {
+      std::filesystem::permissions(device.root / directory, std::filesystem::perms::all);
+    }
+    EXPECT_EQ(::chown((device.root / kLock).c_str(), 12345, 12345), 0);
+    EXPECT_EQ(::chown((device.root / kSettings).c_str(), 12346, 12346), 0);
+    EXPECT_EQ(::seteuid(12346), 0);
+    const auto answer = function();
+    EXPECT_EQ(::seteuid(0), 0);
+    return answer;
+  }
+
+  // What the function answers where the process can have no further file, and no further watch.
+  template <typename Function>
+  static auto withoutDescriptors(const Function& function) -> decltype(function()) {
+    rlimit before{};
+    EXPECT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
+    const int lowest = ::dup(0);
+    ::close(lowest);
+    const rlimit none{static_cast<rlim_t>(lowest), before.rlim_max};
+    EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &none), 0);
+    const auto answer = function();
+    EXPECT_EQ(::setrlimit(RLIMIT_NOFILE, &before), 0);
+    return answer;
+  }
+
+  // Makes the process's platform this device, and its memory too short for the first file that is asked for.
+  void runOutOfMemory() const {
+    platform::Platform services = platform::makeLinuxPlatform({.systemRoot = device.root.path()});
+    const Mishap mishap{.kind = Mishap::Kind::diesBefore, .operation = 1};
+    services.files =
+        std::make_shared<MishapFileSystem>(services.files, mishap, []() -> void { throw std::bad_alloc{}; });
+    platform::setCurrent(std::move(services));
   }
 
   // Makes the process's platform this device, of which nobody is told and whose disk is full at that operation.
