@@ -223,16 +223,7 @@ TEST_F(ChangingAccounts, TakesTheMigrationLock) {
 
 TEST_F(ChangingAccounts, RefusesALockFileThatAStrangerMayHold) {
   if (::geteuid() != 0) GTEST_SKIP() << "only root can become somebody else";
-  std::filesystem::permissions(device.root.path(), std::filesystem::perms::all);
-  std::filesystem::permissions(device.root / "var/mobile/Library/Preferences", std::filesystem::perms::all);
-  device.root.put(kLock, "");
-  std::filesystem::permissions(device.root / "tmp", std::filesystem::perms::all);
-  ASSERT_EQ(::chown((device.root / kLock).c_str(), 12345, 12345), 0);
-  ASSERT_EQ(::chown((device.root / kSettings).c_str(), 12346, 12346), 0);
-  ASSERT_EQ(::seteuid(12346), 0);
-  const Code code = codeOf(setPort(1));
-  ASSERT_EQ(::seteuid(0), 0);
-  EXPECT_EQ(code, Code::refused);
+  EXPECT_EQ(besideAStrangersLock([this] { return codeOf(setPort(1)); }), Code::refused);
 }
 
 // --- Somebody who takes no lock replaces the file meanwhile ---

@@ -63,6 +63,17 @@ TEST_F(OpeningAccountSettings, RefusesAFileThatAnybodyMayHavePlanted) {
   EXPECT_EQ(whyNot(), Code::refused);
 }
 
+TEST_F(OpeningAccountSettings, SaysThatTheConfigurationIsMissing) {
+  auto elsewhere = options();
+  elsewhere.resources = device.root.path();
+  EXPECT_EQ(codeOf(AccountSettings::open(elsewhere)), Code::brokenInstallation);
+}
+
+TEST_F(OpeningAccountSettings, ThrowsForWantOfMemoryAlone) {
+  runOutOfMemory();
+  EXPECT_THROW(static_cast<void>(AccountSettings::open()), std::bad_alloc);
+}
+
 TEST_F(OpeningAccountSettings, SaysWhatIsWrong) {
   putAccounts(kAccounts, 13);
   const auto result = AccountSettings::open(options());

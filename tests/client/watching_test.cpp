@@ -130,6 +130,12 @@ TEST_F(WatchingAccounts, MayChangeWhatItIsToldOf) {
   EXPECT_THAT(toldAtLeast(2), ElementsAre("changed M1 Port", "changed M1 Port"));
 }
 
+TEST_F(WatchingAccounts, SaysThatTheProcessWatchesTooMuchAlready) {
+  const auto settings = opened();
+  const auto seen = looked();
+  EXPECT_EQ(withoutDescriptors([&] { return codeOf(settings.watch(seen, recorder())); }), accounts::Code::notWatched);
+}
+
 TEST_F(WatchingAccounts, SaysWhereThereIsNothingToWatch) {
   const auto settings = opened();
   const auto seen = looked();
