@@ -1,36 +1,25 @@
-"""The Python module, and through it the C interface: values, changes, and each failure that can show."""
+"""The Python module, and through it the C interface: values, changes, and each failure that can show.
+
+`CANCELLED` cannot: who gives an edit up closes it, or leaves its block by an exception.
+"""
 
 import ctypes
 import errno
 import fcntl
 import os
-import pydoc
-import select
+import resource
+import signal
 import struct
-import subprocess
-import sys
 import threading
-import traceback
+import time
 import unittest
 from datetime import datetime, timezone
 from pathlib import Path
-from textwrap import dedent
 
-SANITIZE = os.environ["SANITIZE"]
-SOURCES = Path(os.environ["SOURCE_TREE"])
-LIBRARY = Path(os.environ["BUILD_TREE"]) / os.environ["LIBRARY_DIRECTORY"]
-if os.environ.get("LD_LIBRARY_PATH") != str(LIBRARY):  # which the dynamic linker reads as a program starts
-    os.environ["LD_LIBRARY_PATH"] = str(LIBRARY)
-    os.execv(sys.executable, [sys.executable, "-B", *sys.argv])
-if SANITIZE:
-    sys.exit(77)  # the sanitizer's run time stands in the program, and Python has none
-sys.path.insert(0, str(SOURCES / "bindings/python"))
-
-import account_settings  # noqa: E402
-from account_settings import AccountSettings, AccountSettingsError, Code, Kind  # noqa: E402
-from accountctl_case import CLOUD, HOME_MAIL, MAIL, NOTES  # noqa: E402
-from device import CURRENT_VERSION, SETTINGS, exactly  # noqa: E402
-from device_case import DeviceTest  # noqa: E402
+from python_module_case import PythonModule
+from account_settings import AccountSettings, AccountSettingsError, Change, Code, Kind
+from accountctl_case import CLOUD, HOME_MAIL, MAIL, NOTES
+from device import CURRENT_VERSION, SETTINGS, exactly
 
 
 PR_SET_NO_NEW_PRIVS, PR_SET_SECCOMP, SECCOMP_MODE_FILTER = 38, 22, 2
@@ -48,36 +37,6 @@ def refuse_to_sync():
     libc = ctypes.CDLL(None, use_errno=True)
     if libc.prctl(PR_SET_NO_NEW_PRIVS, 1, 0, 0, 0) or libc.prctl(PR_SET_SECCOMP, SECCOMP_MODE_FILTER, program, 0, 0):
         raise OSError(ctypes.get_errno(), "no filter of system calls")
-
-
-class PythonModule(DeviceTest):
-    def setUp(self):
-        super().setUp()
-        self.tree = self.device(Version=CURRENT_VERSION, Accounts=[HOME_MAIL, CLOUD])
-
-    def settings(self, **options):
-        return AccountSettings(self.tree.root, time_limit=0.1, **options)
-
-    def assert_fails(self, code, function):
-        with self.assertRaises(AccountSettingsError) as caught:
-            function()
-        self.assertEqual(code, caught.exception.code)
-        self.assertRegex(str(caught.exception), "^[^ ].*[^.]$")
-
-    def assert_passes_in_child(self, function):
-        """In a process of its own, which may become another one than this."""
-        child = os.fork()
-        if child == 0:
-            try:
-                function()
-                os._exit(0)
-            except BaseException:
-                traceback.print_exc()
-                os._exit(1)
-        self.assertEqual(0, os.waitstatus_to_exitcode(os.waitpid(child, 0)[1]))
-
-    def accounts(self):
-        return self.tree.read_plist(SETTINGS)["Accounts"]
 
 
 class Looking(PythonModule):
@@ -137,10 +96,79 @@ class Looking(PythonModule):
             self.assert_fails(Code.BUSY, lambda: AccountSettings.wait_for_migration(self.tree.root, time_limit=0))
             self.assertEqual(2, len(self.settings(may_be_migrating=True).accounts))
 
-    def test_is_worth_reading_in_help(self):
-        page = pydoc.plain(pydoc.render_doc(account_settings))
-        for text in ("with settings.edit() as edit", "time_limit: the seconds for which", "The accounts as the file has them now"):
-            self.assertIn(text, page)
+    def test_says_that_the_configuration_is_missing(self):
+        self.assertEqual("BROKEN_INSTALLATION\n", self.run_program("""
+            import sys
+            from account_settings import AccountSettings, AccountSettingsError
+            try:
+                AccountSettings(sys.argv[1], resources=sys.argv[1])
+            except AccountSettingsError as error:
+                print(error.code.name)
+        """))
+
+    def test_reads_what_a_child_has_of_its_parent(self):
+        accounts = self.settings().accounts
+        self.assertEqual(("Cirrant", None), (accounts["C1"].text("DisplayName"), accounts["M1"].text("Enabled Dataclasses")))
+        self.assertTrue(accounts["M1"].lists_dataclasses)
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": [{"Type": "LDAP", "Class": "A", "Identifier": "L"}]})
+        self.assertFalse(self.settings().accounts["L"].lists_dataclasses)
+
+    def test_compares_accounts_by_their_properties(self):
+        first, second = self.settings().accounts, self.settings().accounts
+        self.assertEqual({first["M1"], first["V1"]}, {second["V1"], second["M1"], first["M1"]})
+        change = Change(Kind.ADDED, first["M1"], ())
+        self.assertEqual({change}, {Change(Kind.ADDED, second["M1"], ())})
+
+
+class Waiting(PythonModule):
+    def setUp(self):
+        super().setUp()
+        self.tree.write("tmp/AccountMigrationInProgress", "")
+        lock = self.tree.path("tmp/AccountMigrationInProgress").open("rb")
+        self.addCleanup(lock.close)
+        fcntl.flock(lock, fcntl.LOCK_EX)
+
+    def seconds(self, function):
+        began = time.monotonic()
+        function()
+        return time.monotonic() - began
+
+    def test_ends_with_the_time_limit(self):
+        for limit in (0, 0.05, 0.3, 0.7):
+            waited = self.seconds(lambda: self.assert_fails(Code.BUSY, lambda: AccountSettings(self.tree.root, time_limit=limit)))
+            self.assertGreaterEqual(waited, limit * 0.9)
+            self.assertLess(waited, limit + 3)
+
+    def test_takes_no_time_that_is_none(self):
+        for limit in (-1, -0.001, float("nan"), float("-inf"), 1e30):
+            with self.assertRaisesRegex(ValueError, "is no time limit"):
+                AccountSettings(self.tree.root, time_limit=limit)
+
+    def test_lasts_for_as_long_as_it_takes_without_a_limit(self):
+        for limit in (None, float("inf")):
+            settings = AccountSettings(self.tree.root, time_limit=limit, may_be_migrating=True)
+            self.assert_interrupted(settings.edit)
+
+    def test_is_interrupted_by_the_keyboard(self):
+        settings = AccountSettings(self.tree.root, time_limit=100, may_be_migrating=True)
+        for wait in (settings.edit, lambda: AccountSettings(self.tree.root, time_limit=100),
+                     lambda: AccountSettings.wait_for_migration(self.tree.root, time_limit=100)):
+            self.assert_interrupted(wait)
+
+    def assert_interrupted(self, wait):
+        threading.Timer(0.5, os.kill, (os.getpid(), signal.SIGINT)).start()
+        with self.assertRaises(KeyboardInterrupt):
+            self.assertLess(self.seconds(wait), 20)
+
+    def test_says_for_whom(self):
+        told = []
+        options = {"time_limit": 1.7, "while_waiting": told.append}
+        self.assert_fails(Code.BUSY, lambda: AccountSettings(self.tree.root, **options))
+        self.assert_fails(Code.BUSY, lambda: AccountSettings.wait_for_migration(self.tree.root, **options))
+        lock = self.tree.path("tmp/AccountMigrationInProgress")
+        self.assertEqual(2, len(told))
+        for each in told:
+            self.assertRegex(each, f"^waiting for .*process .*{os.getpid()}.*, which holds the lock {lock}$")
 
 
 class Changing(PythonModule):
@@ -186,6 +214,8 @@ class Changing(PythonModule):
             self.assert_fails(Code.UNKNOWN_ACCOUNT, lambda: edit.add("CalDAV", "A", parent="unknown"))
             self.assertRaises(TypeError, account.__setitem__, "Port", object())
             self.assertRaises(OverflowError, account.__setitem__, "Port", 2**64)
+            self.assertRaises(TypeError, account.update, {"Port": 1, "Secure": object()})
+            self.assertNotIn("Port", account)
             del edit["M1"]
             self.assert_fails(Code.UNKNOWN_ACCOUNT, lambda: account.__setitem__("Port", 1))
         self.assert_fails(Code.FINISHED, edit.save)
@@ -198,6 +228,11 @@ class Changing(PythonModule):
         edit["M1"]["Port"] = 1
         self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": [CLOUD]})
         self.assert_fails(Code.CONFLICT, edit.save)
+        edit = self.settings().edit()
+        edit["V1"]["Port"] = 1
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION + 1, "Accounts": [CLOUD]})
+        self.assert_fails(Code.NEWER, edit.save)
+        self.tree.write_plist(SETTINGS, {"Version": CURRENT_VERSION, "Accounts": [CLOUD]})
         edit = self.settings().edit()
         edit["V1"]["Port"] = 1
         self.tree.write("var/mobile/tmp", "a file in the directory's place")
@@ -229,6 +264,55 @@ class Changing(PythonModule):
         self.assertIn("saved, but not announced", edit.not_announced)
         self.assertEqual(1, self.accounts()[0]["Port"])
 
+    def test_says_that_a_strangers_lock_file_is_refused(self):
+        def fail_to_begin():
+            os.seteuid(12346)
+            self.assert_fails(Code.REFUSED, self.settings().edit)
+
+        if os.geteuid() != 0:
+            self.skipTest("only root can give a file away")
+        lock = self.tree.path("tmp/AccountMigrationInProgress")
+        self.tree.write(lock, "")
+        for directory in (self.scratch, self.tree.root, lock.parent, self.tree.path(SETTINGS).parent):
+            directory.chmod(0o777)
+        os.chown(lock, 12345, 12345)
+        os.chown(self.tree.path(SETTINGS), 12346, 12346)
+        self.assert_passes_in_child(fail_to_begin)
+
+    def test_raises_want_of_memory_as_python_does(self):
+        def fail_to_set():
+            data = bytes(1 << 26)
+            edit = self.settings().edit()
+            used = int(Path("/proc/self/statm").read_text().split()[0]) * os.sysconf("SC_PAGE_SIZE")
+            resource.setrlimit(resource.RLIMIT_AS, (used + (1 << 25), resource.RLIM_INFINITY))
+            self.assertRaises(MemoryError, edit["M1"].__setitem__, "Data", data)
+
+        self.assert_passes_in_child(fail_to_set)
+
+    def test_finds_accounts_in_an_edit_as_elsewhere(self):
+        with self.settings().edit() as edit:
+            edit.accounts["C1"]["Username"] = "ada"
+            for account in edit.accounts.of_type("Mail"):
+                account["Username"] = "ada"
+            next(iter(edit.accounts["V1"].children))["Port"] = 1
+            self.assertIsNone(edit.accounts.get("unknown"))
+            self.assertEqual((True, False, 2), ("C1" in edit.accounts, "unknown" in edit.accounts, len(edit.accounts)))
+        self.assertEqual([("M1", ("Username",)), ("C1", ("Username", "Port"))], [
+            (each.account.identifier, each.keys) for each in edit.changes])
+
+    def test_sets_several_properties_at_once(self):
+        with self.settings().edit() as edit:
+            account = edit["M1"]
+            account.update({"Port": 993, "Ports": (143, 993)})
+            self.assertEqual([143, 993], account["Ports"])
+        self.assertEqual([("Port", "Ports")], [each.keys for each in edit.changes])
+
+    def test_is_no_sequence(self):
+        with self.settings().edit() as edit:
+            for ask in (lambda: list(edit), lambda: 3 in edit, lambda: "M1" in edit):
+                with self.assertRaisesRegex(TypeError, "edit.accounts"):
+                    ask()
+
     def test_tries_without_writing(self):
         before = self.accounts()
         with self.settings().trial() as trial:
@@ -252,109 +336,6 @@ class Changing(PythonModule):
         other.join()
         edit.close()
         self.assertEqual([Code.NESTED, Code.BUSY], codes)
-
-
-class Watching(PythonModule):
-    def test_tells_in_a_thread_of_its_own(self):
-        told, settings = [], self.settings()
-        is_told = threading.Event()
-
-        def tell(change):
-            told.append((change.kind, change.account.identifier, change.keys))
-            is_told.set()
-
-        with settings.watch(tell):
-            with settings.edit() as edit:
-                edit["C1"]["Username"] = "ada"
-            self.assertTrue(is_told.wait(10))
-        self.assertEqual([(Kind.CHANGED, "C1", ("Username",))], told)
-
-    def test_tells_an_event_loop_what_came_since_the_look(self):
-        told, settings = [], self.settings()
-        seen = settings.accounts
-        with settings.edit() as edit:
-            edit["M1"].enable(MAIL, False)
-        with settings.watch(told.append, since=seen, own_thread=False) as watch:
-            self.assertEqual([watch], select.select([watch], [], [], 10)[0])
-            watch.dispatch()
-        self.assertEqual([("Enabled Dataclasses",)], [change.keys for change in told])
-
-    def run_program(self, text):
-        """What a program of its own prints that ends by itself, since what is dropped wrongly ends the whole process."""
-        program = [sys.executable, "-B", "-c", dedent(text), self.tree.root]
-        environment = {**os.environ, "PYTHONPATH": str(SOURCES / "bindings/python")}
-        run = subprocess.run(program, env=environment, capture_output=True, text=True, timeout=100, check=False)
-        self.assertEqual((0, ""), (run.returncode, run.stderr))
-        return run.stdout
-
-    def test_ends_when_it_is_dropped_while_it_tells(self):
-        self.assertEqual("whole\n", self.run_program("""
-            import sys, time
-            from account_settings import AccountSettings
-            settings = AccountSettings(sys.argv[1])
-            seen = settings.accounts
-            with settings.edit() as edit:
-                edit["M1"]["Port"] = 1
-            sys.setswitchinterval(100)  # the watch's thread has to wait before each call
-            for _ in range(20):
-                watch = settings.watch(lambda change: None, since=seen)
-                end = time.monotonic() + 0.03
-                while time.monotonic() < end:
-                    pass
-                del watch
-            print("whole")
-        """))
-
-    def test_ends_with_a_program_that_still_watches(self):
-        for seconds in (0, 0.002, 0.01, 0.05):
-            self.assertEqual("told\n", self.run_program(f"""
-                import sys, threading, time
-                from account_settings import AccountSettings
-                settings, is_told = AccountSettings(sys.argv[1]), threading.Event()
-                seen = settings.accounts
-                with settings.edit() as edit:
-                    edit["M1"]["Port"], edit["V1"]["Port"] = time.time_ns(), 1
-                def tell(change):
-                    is_told.set()
-                    time.sleep({seconds})
-                watch = settings.watch(tell, since=seen)
-                is_told.wait(10)
-                print("told")
-            """))
-
-    def test_may_be_closed_and_dropped_by_its_own_callback(self):
-        self.assertEqual("told\n", self.run_program("""
-            import sys, threading
-            from account_settings import AccountSettings
-            settings, watches, is_over = AccountSettings(sys.argv[1]), [], threading.Event()
-            def tell(change):
-                watches.pop().close()
-                print("told")
-                is_over.set()
-            watches.append(settings.watch(tell))
-            with settings.edit() as edit:
-                edit["M1"]["Port"] = 1
-            is_over.wait(10)
-        """))
-
-    def test_ends_in_a_forked_child_where_nothing_follows_it(self):
-        with self.settings().watch(print) as watch:
-            self.assert_passes_in_child(lambda: self.assert_fails(Code.FINISHED, watch.fileno))
-            self.assertEqual(-1, watch.fileno())
-
-    def test_is_over_once_it_is_closed(self):
-        for own_thread in (True, False):
-            watch = self.settings().watch(print, own_thread=own_thread)
-            watch.close()
-            watch.close()
-            self.assert_fails(Code.FINISHED, watch.fileno)
-            self.assert_fails(Code.FINISHED, watch.dispatch)
-
-    def test_says_where_nothing_can_be_watched(self):
-        settings = self.settings()
-        seen = settings.accounts
-        self.tree.path("var/mobile/Library").rename(self.tree.path("elsewhere"))
-        self.assert_fails(Code.NOT_WATCHED, lambda: settings.watch(print, since=seen))
 
 
 if __name__ == "__main__":

@@ -1,25 +1,45 @@
-"""The C interface as Python calls it: functions by their name, handles that free themselves, values both ways."""
+"""What `account_settings` is made of. Here: the C interface as Python calls it, functions by their name, and handles
+that free themselves."""
 
 from __future__ import annotations
 
 import ctypes
-from collections.abc import Iterator, Mapping
-from contextlib import contextmanager
-from ctypes import POINTER, byref, c_bool, c_char_p, c_double, c_int, c_int32, c_int64, c_size_t, c_uint16, c_uint32, c_uint64, c_void_p
-from datetime import datetime, timedelta, timezone
+from collections.abc import Iterator
+from ctypes import POINTER, byref, c_bool, c_char_p, c_double, c_int, c_int32, c_int64, c_size_t, c_uint16, c_uint32
+from ctypes import c_uint64, c_void_p
 from enum import IntEnum
-from typing import Any, Union
-
-Property = Union[str, int, float, bool, datetime, bytes, "list[Property]", "dict[str, Property]", "Opaque"]
+from typing import Any
 
 CALLBACK = ctypes.CFUNCTYPE(None, c_void_p, c_void_p)
-MOST = 2**31
-_EPOCH = datetime(2001, 1, 1, tzinfo=timezone.utc)
 _library = ctypes.CDLL("libaccountsettings-client.so.1")
 
 
 class Code(IntEnum):
-    """Why something was not done."""
+    """Why something was not done.
+
+    MISSING: the device has no accounts file
+    NOT_MIGRATED: the accounts are an earlier release's; a migration has to upgrade them
+    NEWER: the accounts are a later release's
+    UNREADABLE: the file is no accounts file, or damaged
+    REFUSED: somebody may have planted the accounts file or a lock file
+    NO_PERMISSION: whoever runs the program may not do this
+    BUSY: a migration or a change did not end within the time limit
+    NESTED: this thread is changing the accounts already
+    NO_SPACE: the disk or the user's share of it is full
+    NOT_SAVED: the file could not be replaced for another reason
+    WOULD_BE_DROPPED: an account could not be loaded again
+    WOULD_DROP_OTHERS: a save would remove records that this release cannot load
+    UNKNOWN_ACCOUNT: there is no account of this identifier
+    ALREADY_THERE: there is an account of this identifier already
+    UNSUITABLE: a value that cannot be
+    CONFLICT: a program that takes no lock removed or added the account meanwhile
+    CANCELLED: the change was given up by whoever asked for it; nothing in Python answers it
+    FINISHED: the edit or the watch is over
+    NOT_ANNOUNCED: saved, but those who listen could not be told
+    NOT_WATCHED: the file's directory cannot be watched
+    BROKEN_INSTALLATION: the library's own configuration or modules are missing
+    NO_MEMORY: there is not enough memory; raised as MemoryError
+    """
 
     MISSING = 1
     NOT_MIGRATED = 2
@@ -46,17 +66,19 @@ class Code(IntEnum):
 
 
 class AccountSettingsError(Exception):
-    """Something was not done: `code` says why to the program, the text to people."""
+    """Something was not done: `code` says why to the program, the text to people.
+
+    The code is a `Code`, or a plain number where a later release of the library has a new one.
+    """
 
     def __init__(self, code: int, sentence: str):
         super().__init__(sentence)
-        #: A `Code`; a plain number where a later release of the library has a new one.
         self.code: int = Code(code) if code in list(Code) else code
 
 
 # What each function answers and takes, without the error that the last ones of the table tell by.
 _TEXT, _HANDLE, _SIZE = c_char_p, c_void_p, c_size_t
-_PLAIN = {
+_PLAIN: dict[str, tuple[Any, ...]] = {
     "error_code": (c_int32, _HANDLE), "error_sentence": (_TEXT, _HANDLE),
     "accounts_count": (_SIZE, _HANDLE), "accounts_at": (_HANDLE, _HANDLE, _SIZE),
     "accounts_find": (_HANDLE, _HANDLE, _TEXT), "accounts_find_sync": (_HANDLE, _HANDLE, _TEXT),
@@ -66,6 +88,7 @@ _PLAIN = {
     **{f"account_{name}": (_HANDLE, _HANDLE) for name in ("children", "supported", "enabled", "properties")},
     "accounts_version": (c_uint64, _HANDLE), "accounts_unreadable": (_SIZE, _HANDLE),
     "account_service": (c_bool, _HANDLE, POINTER(c_char_p), POINTER(c_uint16), POINTER(c_bool)),
+    "account_lists_dataclasses": (c_bool, _HANDLE), "account_text": (_TEXT, _HANDLE, _TEXT),
     "account_is_enabled": (c_bool, _HANDLE, _TEXT), "account_property": (_HANDLE, _HANDLE, _TEXT),
     "account_integer": (c_bool, _HANDLE, _TEXT, POINTER(c_int64)),
     "account_boolean": (c_bool, _HANDLE, _TEXT, POINTER(c_bool)),
@@ -81,13 +104,14 @@ _PLAIN = {
     "edit_accounts": (_HANDLE, _HANDLE), "edit_find": (_HANDLE, _HANDLE, _TEXT), "edit_rewrite": (None, _HANDLE),
     "changes_count": (_SIZE, _HANDLE), "changes_kind": (c_int32, _HANDLE, _SIZE),
     "changes_account": (_HANDLE, _HANDLE, _SIZE), "changes_key": (_TEXT, _HANDLE, _SIZE, _SIZE),
+    "changes_key_count": (_SIZE, _HANDLE, _SIZE),
     "changes_not_announced": (_TEXT, _HANDLE),
     "watch_descriptor": (c_int, _HANDLE), "watch_dispatch": (None, _HANDLE),
     **{name + "free": (None, _HANDLE) for name in (
         "", "error_", "account_", "accounts_", "value_", "edit_", "changes_", "watch_")},
 }
-_FAILING = {
-    "open": (_HANDLE, _TEXT, c_int64, c_uint32), "look": (_HANDLE, _HANDLE), "edit_begin": (_HANDLE, _HANDLE),
+_FAILING: dict[str, tuple[Any, ...]] = {
+    "open_at": (_HANDLE, _TEXT, _TEXT, _TEXT, c_int64, c_uint32, c_void_p, c_void_p), "look": (_HANDLE, _HANDLE), "edit_begin": (_HANDLE, _HANDLE),
     "trial_begin": (_HANDLE, _HANDLE), "wait_for_migration": (c_bool, _TEXT, c_int64),
     "will_change": (c_bool, _HANDLE, _HANDLE, _TEXT), "did_change": (c_bool, _HANDLE, _HANDLE, _TEXT),
     "edit_add": (_HANDLE, _HANDLE, _TEXT, _TEXT, _HANDLE, _TEXT), "edit_remove": (c_bool, _HANDLE, _TEXT),
@@ -97,7 +121,7 @@ _FAILING = {
 }
 
 
-def _declared(name: str, signature: tuple, *more: Any) -> Any:
+def _declared(name: str, signature: tuple[Any, ...], *more: Any) -> Any:
     function = getattr(_library, "account_settings_" + name)
     function.restype, *arguments = signature
     function.argtypes = [*arguments, *more]
@@ -145,12 +169,18 @@ def handle(kind: str, pointer: int | None) -> Handle:
     return Handle(kind, pointer)
 
 
-def _given(arguments: tuple) -> Iterator[Any]:
+def _given(arguments: tuple[Any, ...]) -> Iterator[Any]:
     return (each.pointer if isinstance(each, Handle) else each for each in arguments)
 
 
 def call(name: str, *arguments: Any) -> Any:
     return _functions[name](*_given(arguments))
+
+
+def text(name: str, *arguments: Any) -> str | None:
+    """The text that the function answers, or none."""
+    answer: bytes | None = call(name, *arguments)
+    return answer.decode() if answer is not None else None
 
 
 def attempt(name: str, *arguments: Any) -> Any:
@@ -165,7 +195,7 @@ def attempt(name: str, *arguments: Any) -> Any:
     code = call("error_code", told)
     if code == Code.NO_MEMORY:
         raise MemoryError
-    raise AccountSettingsError(code, call("error_sentence", told).decode())
+    raise AccountSettingsError(code, text("error_sentence", told) or "")
 
 
 def encoded(text: str) -> bytes:
@@ -173,108 +203,3 @@ def encoded(text: str) -> bytes:
     if "\0" in text:
         raise ValueError("a text with a NUL")
     return text.encode()
-
-
-class Opaque:
-    """A value of a kind that nobody reads; it can be given back as it is."""
-
-    def __init__(self, value: Handle):
-        self.handle = value
-
-
-def _read(name: str, kind: Any, value: Handle) -> Any:
-    place = kind()
-    return place.value if call("value_" + name, value, byref(place)) else None
-
-
-def _data(value: Handle) -> bytes:
-    size = c_size_t()
-    return ctypes.string_at(call("value_data", value, byref(size)), size.value)
-
-
-def _elements(value: Handle) -> Iterator[Any]:
-    for place in range(call("value_count", value)):
-        yield python_value(call("value_at", value, place))
-
-
-def _dictionary(value: Handle) -> dict[str, Any]:
-    return {call("value_key_at", value, place).decode(): each for place, each in enumerate(_elements(value))}
-
-
-def _integer(value: Handle) -> int:
-    signed = _read("integer", c_int64, value)
-    return signed if signed is not None else _read("unsigned", c_uint64, value)
-
-
-def _date(value: Handle) -> Any:
-    try:
-        return _EPOCH + timedelta(seconds=_read("date", c_double, value))
-    except (OverflowError, ValueError):  # no time of this calendar, or none at all
-        return Opaque(value)
-
-
-# By the number of the kind.
-_READERS = (
-    lambda value: call("value_text", value).decode(),
-    _integer,
-    lambda value: _read("real", c_double, value),
-    lambda value: _read("boolean", c_bool, value),
-    _date,
-    _data,
-    lambda value: list(_elements(value)),
-    _dictionary,
-    Opaque,
-)
-
-
-def python_value(pointer: int | None) -> Any:
-    """The value as Python has it; takes the handle over."""
-    value = handle("value", pointer)
-    return _READERS[call("value_kind", value)](value)
-
-
-def _made(value: Any) -> Handle:
-    if isinstance(value, str):
-        return handle("value", call("value_of_text", encoded(value)))
-    if isinstance(value, bool):
-        return handle("value", call("value_of_boolean", value))
-    if isinstance(value, int):
-        if not -(2**63) <= value < 2**64:
-            raise OverflowError("an integer that no property list holds")
-        return handle("value", call("value_of_integer" if value < 2**63 else "value_of_unsigned", value))
-    if isinstance(value, float):
-        return handle("value", call("value_of_real", value))
-    if isinstance(value, datetime):
-        return handle("value", call("value_of_date", (value.astimezone(timezone.utc) - _EPOCH).total_seconds()))
-    if isinstance(value, (bytes, bytearray)):
-        return handle("value", call("value_of_data", bytes(value), len(value)))
-    return _filled(value)
-
-
-def _filled(value: Any) -> Handle:
-    if isinstance(value, Mapping):
-        made = handle("value", call("value_of_dictionary"))
-        for key, element in value.items():
-            with c_value(element) as each:
-                call("value_set", made, encoded(key), each)
-        return made
-    if isinstance(value, (list, tuple)):
-        made = handle("value", call("value_of_list"))
-        for element in value:
-            with c_value(element) as each:
-                call("value_append", made, each)
-        return made
-    raise TypeError(f"no property is a {type(value).__name__}")
-
-
-@contextmanager
-def c_value(value: Any) -> Iterator[Handle]:
-    """The value as the library has it, for the length of a block."""
-    if isinstance(value, Opaque):
-        yield value.handle
-        return
-    made = _made(value)
-    try:
-        yield made
-    finally:
-        made.free()
