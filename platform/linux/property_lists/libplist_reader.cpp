@@ -5,10 +5,11 @@
 #include <algorithm>
 #include <array>
 #include <clocale>
-#include <map>
 #include <string_view>
+#include <unordered_map>
 #include <vector>
 
+#include "platform/insertion_ordered_map.h"
 #include "platform/linux/property_lists/binary_plist_scan.h"
 #include "platform/linux/property_lists/libplist_node.h"
 #include "platform/linux/property_lists/writing_cost.h"
@@ -121,7 +122,7 @@ class Conversion {
     return array;
   }
 
-  std::map<std::string_view, Key> _keys;  // by views of their texts
+  std::unordered_map<std::string_view, Key, SeededHash> _keys;  // by views of their texts
   RecentTexts _texts;
   std::size_t _dictionaries = 0;
   std::size_t _size = 0;

@@ -20,6 +20,8 @@ constexpr std::uint64_t kMaxUnevenness = 8;                // times what evenly 
 // What the library makes of a kind before it looks at the characters or the eight bytes.
 enum class Kind : std::uint32_t { integer = 1, real = 2, text = 3, date = 6, key = 8, uid = 9 };
 
+bool isText(Kind kind) { return kind == Kind::text || kind == Kind::key; }
+
 std::uint32_t placeOf(Kind kind, std::string_view bytes) {
   std::uint32_t hash = 5381 + static_cast<std::uint32_t>(kind);
   for (const char byte : bytes) hash = hash * 33 + static_cast<std::uint32_t>(byte);
@@ -70,7 +72,7 @@ class Uses {
  public:
   void see(Kind kind, std::string_view bytes) {
     ++_total;
-    ++_ofPlace[placeOf(kind, bytes)];
+    ++_ofPlace[isText(kind) ? placeOfText(kind, bytes) : placeOf(kind, bytes)];
   }
   [[nodiscard]] std::uint64_t total() const { return _total; }
   [[nodiscard]] std::uint64_t of(std::size_t place) const { return _ofPlace[place]; }
@@ -82,8 +84,24 @@ class Uses {
   }
 
  private:
+  struct Known {
+    const char* characters = nullptr;
+    Kind kind = Kind::integer;
+    std::uint32_t place = 0;
+  };
+
+  // The keys and most texts of one file share their characters, so where those lie tells them.
+  std::uint32_t placeOfText(Kind kind, std::string_view text) {
+    Known& known = _known[reinterpret_cast<std::uintptr_t>(text.data()) / kAlignment % _known.size()];
+    if (known.characters != text.data() || known.kind != kind) known = {text.data(), kind, placeOf(kind, text)};
+    return known.place;
+  }
+
+  static constexpr std::size_t kAlignment = 16;  // of what an allocator hands out
+
   std::uint64_t _total = 0;
   std::vector<std::uint32_t> _ofPlace = std::vector<std::uint32_t>(kTableSize);
+  std::array<Known, 256> _known{};
 };
 
 // Sums up the comparisons, telling equal ones from different ones.
@@ -93,8 +111,8 @@ class Comparisons {
 
   void see(Kind kind, std::string_view bytes) {
     // What numbers are made of does not outlive the call.
-    const bool isNew = kind == Kind::text || kind == Kind::key ? _texts.emplace(kind, bytes).second
-                                                               : _numbers.emplace(kind, numberIn(bytes)).second;
+    const bool isNew =
+        isText(kind) ? _texts.emplace(kind, bytes).second : _numbers.emplace(kind, numberIn(bytes)).second;
     if (isNew) _sum += _uses.of(placeOf(kind, bytes));
   }
   [[nodiscard]] bool areUneven() const {
