@@ -4,17 +4,26 @@ import os
 from typing import NamedTuple
 
 from migration_rehearse.campaign import LOSING
-from migration_rehearse.faults import NO_CONTENTS
+from migration_rehearse.faults import NO_CONTENTS, OF_THE_RUN
 from migration_rehearse.results import ResultFault
 
 MOST_KINDS = 20  # of differences that are told in words
 NOTICEABLE = 0.1  # seconds; who takes less more is not slower, but measured beside somebody else
+
+# By name: what a rule says, and the contents that break it.
 RULES = {
-    "none-lost": "no device may lose anything",
-    "none-newly-lost": "no device may lose what it did not lose before",
-    "none-different": "no device may end differently",
-    "all-rehearsed": "every image must have been rehearsed",
-    "none-slower": "none-slower=FACTOR: no device may take so many times its processor time",
+    "none-lost": ("no device may lose anything, or break the run",
+                  f"SELECT content FROM later WHERE verdict IN {LOSING} OR cause IN {OF_THE_RUN}"),
+    "none-newly-lost": ("no device may lose what it did not lose before, or break the run that it did not break",
+                        f"""SELECT content FROM pairs WHERE new_verdict IN {LOSING} AND new_verdict != old_verdict
+                        OR new_cause IN {OF_THE_RUN} AND old_verdict != 'unrehearsed'
+                        OR EXISTS (SELECT 1 FROM main.losses AS now WHERE rehearsal = new AND count > coalesce(
+                          (SELECT count FROM old.losses WHERE rehearsal = pairs.old AND code = now.code), 0))"""),
+    "none-different": ("no device may end differently", "SELECT content FROM pairs WHERE is_different"),
+    "all-rehearsed": ("every image must have been rehearsed", "SELECT content FROM later WHERE verdict = 'unrehearsed'"),
+    "none-slower": ("none-slower=FACTOR: no device may take so many times its processor time",
+                    f"""SELECT content FROM pairs WHERE new_seconds > {{0}} * old_seconds
+                    AND new_seconds - old_seconds > {NOTICEABLE}"""),
 }
 
 
@@ -99,19 +108,9 @@ class Comparison:
         row = self.results.row("SELECT min(path) FROM main.images WHERE content = ?", (content,))
         return row[0] or content
 
-    def newly_lost(self):
-        return self._count(f"pairs JOIN main.rehearsals AS now ON now.id = new JOIN old.rehearsals AS before ON before.id = old"
-                           f" WHERE new_verdict IN {LOSING} AND (old_verdict NOT IN {LOSING}"
-                           " OR coalesce(now.lost, 0) > coalesce(before.lost, 0))")
-
-    def losing(self):
-        return self._count(f"later WHERE verdict IN {LOSING}")
-
-    def unrehearsed(self):
-        return self._count("later WHERE verdict = 'unrehearsed'")
-
-    def slower(self, factor):
-        return self._count(f"pairs WHERE new_seconds > {float(factor)} * old_seconds AND new_seconds - old_seconds > {NOTICEABLE}")
+    def breaking(self, rule, number):
+        """How many devices break a rule; `number` is the rule's, where it has one."""
+        return self._count(f"({RULES[rule][1].format(number)})")
 
     def processor_seconds(self):
         """Of all that were compared: before and after."""
@@ -174,12 +173,7 @@ def rules_of(text):
 
 def broken(comparison, rules):
     """The rules that are broken: each with how many devices break it."""
-    count = {
-        "none-lost": lambda _: comparison.losing(), "none-newly-lost": lambda _: comparison.newly_lost(),
-        "none-different": lambda _: comparison.different, "all-rehearsed": lambda _: comparison.unrehearsed(),
-        "none-slower": comparison.slower,
-    }
-    counted = {name: count[name](number) for name, number in rules.items()}
+    counted = {name: comparison.breaking(name, number) for name, number in rules.items()}
     return {name: devices for name, devices in counted.items() if devices}
 
 

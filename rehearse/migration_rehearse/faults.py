@@ -24,6 +24,9 @@ CAUSES = {
     "worker-died": "the process that worked on it died, each time",
 }
 
+# Those that are the run's, and not the image's: a release that brings one about would do harm to the device.
+OF_THE_RUN = ("timeout", "memory", "crashed", "too-much-output", "no-explanation", "worker-died")
+
 
 class Fault(Exception):
     """An image that cannot be rehearsed. `cause` is one of CAUSES; `detail` is for people and may be empty."""

@@ -117,7 +117,7 @@ def make_comparison(arguments, version):
     from migration_rehearse import compare
 
     made = options.parser("compare", version, "Tells which devices end differently under another release.",
-                          epilog="Rules: " + "; ".join(f"{name} ({words})" for name, words in compare.RULES.items())
+                          epilog="Rules: " + "; ".join(f"{name} ({words})" for name, (words, _) in compare.RULES.items())
                           + "\n\nExit status: 0 nothing differs, or no rule of the gate is broken; 1 otherwise; 2 wrong use;\n"
                           "4 a result file cannot be read.")
     made.add_argument("old", metavar="OLD", help="the results of the earlier release")
@@ -136,7 +136,7 @@ def make_comparison(arguments, version):
         failed = compare.broken(comparison, rules or {})
         print(json.dumps(compare.as_json(comparison, failed), indent=2) if asked.json else compare.in_words(comparison))
     for name, devices in failed.items():
-        say(f"gate: {devices:,} devices break {name} ({compare.RULES[name]})", LOSSES)
+        say(f"gate: {devices:,} devices break {name} ({compare.RULES[name][0]})", LOSSES)
     return LOSSES if failed or rules is None and comparison.different else NOTHING_LOST
 
 

@@ -2,6 +2,7 @@
 
 import json
 import unittest
+from collections import Counter
 
 from migration_rehearse.rehearsal import Identified, Rehearsed
 from migration_rehearse.results import Results
@@ -11,12 +12,16 @@ LOADED = {("load", "loaded", ""): 1}
 
 
 def ended(verdict="kept", mark=0, codes=(), facts=LOADED, accounts=1, **more):
-    """A rehearsal; `mark` stands for all that is in its explanation."""
-    return Rehearsed(verdict, accounts=accounts, losses=dict.fromkeys(codes, 1), counts={"lost": len(codes)}, facts=facts,
+    """A rehearsal; `mark` stands for all that is in its explanation. A code that is there twice lost two accounts."""
+    return Rehearsed(verdict, accounts=accounts, losses=Counter(codes), counts={"lost": len(codes)}, facts=facts,
                      fingerprint=bytes([mark]) * 16, **more)
 
 
-class Compare(RehearseTest):
+def failed(cause):
+    return Rehearsed("unrehearsed", cause)
+
+
+class CompareTest(RehearseTest):
     def filled(self, name, digest, **devices):
         path = self.scratch / name
         with Results(path) as results:
@@ -35,6 +40,8 @@ class Compare(RehearseTest):
         files = self.filled("old", "d", **old), self.filled("new", "e", **new)
         return self.command("compare", *files, *options, status=status)
 
+
+class Compare(CompareTest):
     def difference(self, old, new):
         return json.loads(self.compared({"device": old}, {"device": new}, "--json"))["differences"][0]
 
@@ -75,7 +82,7 @@ class Compare(RehearseTest):
         self.assertIn("kept → lost", self.command("compare", path, path, "--earlier", "d", status=1))
 
 
-class Gate(Compare):
+class Gate(CompareTest):
     OLD = {"kept": ended(), "lossy": ended("lost", 1, ["c"]), "slow": ended(processor_seconds=0.2)}
 
     def gate(self, rules, status, **new):
@@ -92,6 +99,27 @@ class Gate(Compare):
         self.assertIn("break none-different", self.gate("none-different", 1, kept=ended(mark=9)))
         self.assertIn("break all-rehearsed", self.gate("all-rehearsed", 1, kept=Rehearsed("unrehearsed", "timeout")))
         self.assertIn("break none-slower", self.gate("none-slower=2", 1, slow=ended(processor_seconds=0.5)))
+
+    def test_takes_what_the_release_could_not_do_as_lost(self):
+        for cause in ("crashed", "timeout", "memory", "too-much-output", "no-explanation", "worker-died"):
+            self.assertIn("1 devices break none-newly-lost", self.gate("none-newly-lost", 1, kept=failed(cause)), cause)
+            self.assertIn("2 devices break none-lost", self.gate("none-lost", 1, kept=failed(cause)), cause)
+
+    def test_takes_what_is_wrong_with_an_image_as_no_loss(self):
+        self.gate("none-newly-lost", 0, kept=failed("damaged-archive"))
+        self.assertIn("1 devices break none-lost", self.gate("none-lost", 1, kept=failed("unreadable")))
+
+    def test_takes_what_the_earlier_release_could_not_do_either_as_no_new_loss(self):
+        self.compared({"a": failed("crashed")}, {"a": failed("crashed")}, "--gate", "none-newly-lost", status=0)
+
+    def test_tells_losses_apart_by_their_codes(self):
+        for codes in (["other"], ["c", "other"], ["c", "c"]):
+            self.gate("none-newly-lost", 1, lossy=ended("lost", 2, codes))
+        self.gate("none-newly-lost", 0, lossy=ended("lost", 3, ["c"]))
+
+    def test_takes_a_worse_end_as_a_new_loss(self):
+        for verdict in ("not saved", "failed", "refused"):
+            self.gate("none-newly-lost", 1, lossy=ended(verdict, 2, ["c"]))
 
     def test_forgets_what_no_image_has_any_more(self):
         files = self.filled("old", "d", a=ended()), self.filled("new", "e", a=ended(), b=ended("lost", 1))
