@@ -1,5 +1,6 @@
 """Two releases over the same images: which devices end differently, by kind of difference, and whether that may pass."""
 
+import math
 import os
 from typing import NamedTuple
 
@@ -20,7 +21,8 @@ RULES = {
                         OR EXISTS (SELECT 1 FROM main.losses AS now WHERE rehearsal = new AND count > coalesce(
                           (SELECT count FROM old.losses WHERE rehearsal = pairs.old AND code = now.code), 0))"""),
     "none-different": ("no device may end differently", "SELECT content FROM pairs WHERE is_different"),
-    "all-rehearsed": ("every image must have been rehearsed", "SELECT content FROM later WHERE verdict = 'unrehearsed'"),
+    "all-rehearsed": ("every image must have been rehearsed, those of the earlier results, too",
+                      "SELECT content FROM later WHERE verdict = 'unrehearsed' UNION ALL SELECT content FROM earlier_only"),
     "none-slower": ("none-slower=FACTOR: no device may take so many times its processor time",
                     f"""SELECT content FROM pairs WHERE new_seconds > {{0}} * old_seconds
                     AND new_seconds - old_seconds > {NOTICEABLE}"""),
@@ -162,13 +164,20 @@ def rules_of(text):
         name, equals, number = word.partition("=")
         if name not in RULES or bool(equals) != (name == "none-slower"):
             raise WrongRule(f"{word} is no rule; there are {', '.join(RULES)}")
-        try:
-            rules[name] = float(number) if equals else None
-        except ValueError as failure:
-            raise WrongRule(f"{word}: {number} is no number") from failure
+        rules[name] = _factor(number) if equals else None
     if not rules:
         raise WrongRule(f"no rule is given; there are {', '.join(RULES)}")
     return rules
+
+
+def _factor(text):
+    try:
+        factor = float(text)
+    except ValueError:
+        factor = 0
+    if not 0 < factor < math.inf:
+        raise WrongRule(f"{text} is no number above 0")
+    return factor
 
 
 def broken(comparison, rules):

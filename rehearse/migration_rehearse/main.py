@@ -118,8 +118,8 @@ def make_comparison(arguments, version):
 
     made = options.parser("compare", version, "Tells which devices end differently under another release.",
                           epilog="Rules: " + "; ".join(f"{name} ({words})" for name, (words, _) in compare.RULES.items())
-                          + "\n\nExit status: 0 nothing differs, or no rule of the gate is broken; 1 otherwise; 2 wrong use;\n"
-                          "4 a result file cannot be read.")
+                          + "\n\nExit status: 0 nothing differs, or, with a gate, devices were compared and no rule is broken;\n"
+                          "1 otherwise; 2 wrong use; 4 a result file cannot be read.")
     made.add_argument("old", metavar="OLD", help="the results of the earlier release")
     made.add_argument("new", metavar="NEW", help="those of the later one; the same file where it has both")
     made.add_argument("--earlier", metavar="RELEASE", default="", help="the earlier release, by version or digest")
@@ -135,9 +135,19 @@ def make_comparison(arguments, version):
         comparison = compare.comparison_of(old, new, asked.earlier, asked.later)
         failed = compare.broken(comparison, rules or {})
         print(json.dumps(compare.as_json(comparison, failed), indent=2) if asked.json else compare.in_words(comparison))
+    if rules is None:
+        return LOSSES if comparison.different else NOTHING_LOST
+    return _gate(comparison, failed)
+
+
+def _gate(comparison, failed):
+    from migration_rehearse import compare
+
     for name, devices in failed.items():
         say(f"gate: {devices:,} devices break {name} ({compare.RULES[name][0]})", LOSSES)
-    return LOSSES if failed or rules is None and comparison.different else NOTHING_LOST
+    if not comparison.compared:
+        say("gate: no device was compared, so none can pass", LOSSES)
+    return NOTHING_LOST if comparison.compared and not failed else LOSSES
 
 
 def make_anonymous(arguments, version):

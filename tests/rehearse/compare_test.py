@@ -121,6 +121,23 @@ class Gate(CompareTest):
         for verdict in ("not saved", "failed", "refused"):
             self.gate("none-newly-lost", 1, lossy=ended(verdict, 2, ["c"]))
 
+    def test_stops_what_was_compared_with_nothing(self):
+        for new in ({}, {"another": ended()}):
+            told = self.compared(self.OLD, new, "--gate", "none-lost", status=1)
+            self.assertIn("gate: no device was compared, so none can pass", told)
+        gone = Identified("/fleet/gone", "", "", "none:gone", ("missing", ""))
+        for name in ("old", "new"):
+            self.filled(name, name)
+            with Results(self.scratch / name) as results:
+                results.add_image(gone)
+                results.add(gone.content, results.chosen_release(), failed("missing"))
+        self.command("compare", self.scratch / "old", self.scratch / "new", "--gate", "none-lost", status=1)
+
+    def test_stops_where_a_device_was_left_out(self):
+        told = self.compared(self.OLD, {"kept": ended()}, "--gate", "all-rehearsed,none-lost", status=1)
+        self.assertIn("2 devices break all-rehearsed", told)
+        self.compared({"kept": ended()}, {**self.OLD, "lossy": ended()}, "--gate", "all-rehearsed", status=0)
+
     def test_forgets_what_no_image_has_any_more(self):
         files = self.filled("old", "d", a=ended()), self.filled("new", "e", a=ended(), b=ended("lost", 1))
         self.command("compare", *files, "--gate", "none-lost", status=1)
@@ -128,7 +145,7 @@ class Gate(CompareTest):
         self.command("compare", *files, "--gate", "none-lost")
 
     def test_says_what_is_no_rule(self):
-        for rules in ("none", "none-slower", "none-slower=fast", "none-lost=1", ""):
+        for rules in ("none", "none-slower", "none-slower=fast", "none-slower=nan", "none-slower=-1", "none-lost=1", ""):
             self.gate(rules, 2)
 
 
