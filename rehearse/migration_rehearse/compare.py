@@ -1,5 +1,6 @@
 """Two releases over the same images: which devices end differently, by kind of difference, and whether that may pass."""
 
+import json
 import math
 import os
 from typing import NamedTuple
@@ -82,6 +83,15 @@ CREATE TEMP VIEW earlier_only AS
 CREATE TEMP VIEW later_only AS
   SELECT content FROM later WHERE content NOT GLOB '{NO_CONTENTS}*' AND content NOT IN (SELECT content FROM earlier);
 """
+PATH = ("coalesce((SELECT min(path) FROM main.images WHERE content = found.content),"
+        " (SELECT min(path) FROM old.images WHERE content = found.content), found.content)")
+
+
+class Broken(NamedTuple):
+    """By how many devices a rule is broken, and the path of one of them."""
+
+    devices: int
+    example: str
 
 
 class Comparison:
@@ -94,9 +104,7 @@ class Comparison:
         results.database.execute("ATTACH ? AS old", (f"file:{place}?mode=ro",))
         results.database.executescript(SIDES.format(earlier=earlier.id, later=release.id))
         self.compared, *self.alone = (self._count(side) for side in ("pairs", "earlier_only", "later_only"))
-        self.groups = {}
-        for kind, size, content in self._differences():
-            self.groups.setdefault(kind, Group()).add(size, content)
+        self.groups = self._grouped()
 
     @property
     def different(self):
@@ -107,16 +115,37 @@ class Comparison:
         return sorted(self.groups.items(), key=lambda each: (not each[0].verdicts, -each[1].devices, each[0].in_words()))
 
     def path(self, content):
-        row = self.results.row("SELECT min(path) FROM main.images WHERE content = ?", (content,))
-        return row[0] or content
+        """Of the first image with these contents: of the later results, where they have one."""
+        return self.results.row(f"SELECT {PATH} FROM (SELECT ? AS content) AS found", (content,))[0]
 
     def breaking(self, rule, number):
-        """How many devices break a rule; `number` is the rule's, where it has one."""
-        return self._count(f"({RULES[rule][1].format(number)})")
+        """How many devices break a rule, and one of them; `number` is the rule's, where it has one."""
+        devices, example = self.results.row(f"SELECT count(*), min(content) FROM ({RULES[rule][1].format(number)})")
+        return Broken(devices, self.path(example))
+
+    def each(self, rules):
+        """Each device that ends differently, with how, and each that breaks one of the rules; by their paths."""
+        words = [kind.in_words() for kind in self.groups]
+        for path, kind in self.results.rows(f"SELECT {PATH} AS path, kind FROM different AS found ORDER BY path"):
+            yield {"device": path, "difference": words[kind]}
+        for rule, number in rules.items():
+            query = f"SELECT {PATH} AS path FROM ({RULES[rule][1].format(number)}) AS found ORDER BY path"
+            yield from ({"device": path, "breaks": rule} for path, in self.results.rows(query))
 
     def processor_seconds(self):
         """Of all that were compared: before and after."""
         return self.results.row("SELECT total(old_seconds), total(new_seconds) FROM pairs")
+
+    def _grouped(self):
+        """Devices that end differently, by kind of difference; which is of which kind, numbered as they come, is for the
+        database to remember."""
+        groups, numbers = {}, {}
+        self.results.database.execute("CREATE TEMP TABLE different (content TEXT, kind INTEGER)")
+        for kind, size, content in self._differences():
+            groups.setdefault(kind, Group()).add(size, content)
+            number = numbers.setdefault(kind, len(numbers))
+            self.results.database.execute("INSERT INTO different VALUES (?, ?)", (content, number))
+        return groups
 
     def _differences(self):
         named = [self._kinds(database) for database in ("old", "main")]
@@ -181,9 +210,15 @@ def _factor(text):
 
 
 def broken(comparison, rules):
-    """The rules that are broken: each with how many devices break it."""
-    counted = {name: comparison.breaking(name, number) for name, number in rules.items()}
-    return {name: devices for name, devices in counted.items() if devices}
+    """The rules that are broken: each with what breaks it."""
+    found = {name: comparison.breaking(name, number) for name, number in rules.items()}
+    return {name: breaking for name, breaking in found.items() if breaking.devices}
+
+
+def write_devices(comparison, rules, path):
+    """Which devices they are that differ or break a rule, a JSON document a line."""
+    with open(path, "w", encoding="utf-8") as file:
+        file.writelines(json.dumps(device) + "\n" for device in comparison.each(rules))
 
 
 def in_words(comparison):
@@ -204,11 +239,11 @@ def in_words(comparison):
 def as_json(comparison, failed):
     """The same for machines."""
     return {
-        "schema": 1, "earlier": str(comparison.earlier), "later": str(comparison.release), "compared": comparison.compared,
+        "schema": 2, "earlier": str(comparison.earlier), "later": str(comparison.release), "compared": comparison.compared,
         "different": comparison.different, "onlyEarlier": comparison.alone[0], "onlyLater": comparison.alone[1],
         "differences": [{**kind._asdict(), "devices": group.devices, "example": comparison.path(group.example)}
                         for kind, group in comparison.ordered()],
-        "broken": failed,
+        "broken": {rule: breaking._asdict() for rule, breaking in failed.items()},
     }
 
 

@@ -119,13 +119,14 @@ def make_comparison(arguments, version):
     made = options.parser("compare", version, "Tells which devices end differently under another release.",
                           epilog="Rules: " + "; ".join(f"{name} ({words})" for name, (words, _) in compare.RULES.items())
                           + "\n\nExit status: 0 nothing differs, or, with a gate, devices were compared and no rule is broken;\n"
-                          "1 otherwise; 2 wrong use; 4 a result file cannot be read.")
+                          "1 otherwise; 2 wrong use; 4 a result file cannot be read, or FILE not written.")
     made.add_argument("old", metavar="OLD", help="the results of the earlier release")
     made.add_argument("new", metavar="NEW", help="those of the later one; the same file where it has both")
     made.add_argument("--earlier", metavar="RELEASE", default="", help="the earlier release, by version or digest")
     made.add_argument("--later", metavar="RELEASE", default="", help="the later release (default: the last)")
     made.add_argument("--gate", metavar="RULES", help="which differences may not pass, separated by commas")
     made.add_argument("--json", action="store_true", help="print a JSON document")
+    made.add_argument("--output", metavar="FILE", help="write which devices differ or break a rule, a line of JSON for each")
     asked = made.parse_args(arguments)
     try:
         rules = compare.rules_of(asked.gate) if asked.gate is not None else None
@@ -134,6 +135,11 @@ def make_comparison(arguments, version):
     with Results(asked.old, read_only=True) as old, Results(asked.new, read_only=True) as new:
         comparison = compare.comparison_of(old, new, asked.earlier, asked.later)
         failed = compare.broken(comparison, rules or {})
+        try:
+            if asked.output:
+                compare.write_devices(comparison, rules or {}, asked.output)
+        except OSError as failure:
+            return say(f"{asked.output}: {failure.strerror}", RESULTS_UNWRITABLE)
         print(json.dumps(compare.as_json(comparison, failed), indent=2) if asked.json else compare.in_words(comparison))
     if rules is None:
         return LOSSES if comparison.different else NOTHING_LOST
@@ -143,8 +149,8 @@ def make_comparison(arguments, version):
 def _gate(comparison, failed):
     from migration_rehearse import compare
 
-    for name, devices in failed.items():
-        say(f"gate: {devices:,} devices break {name} ({compare.RULES[name][0]})", LOSSES)
+    for name, breaking in failed.items():
+        say(f"gate: {breaking.devices:,} devices break {name}, such as {breaking.example} ({compare.RULES[name][0]})", LOSSES)
     if not comparison.compared:
         say("gate: no device was compared, so none can pass", LOSSES)
     return NOTHING_LOST if comparison.compared and not failed else LOSSES

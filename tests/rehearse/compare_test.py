@@ -63,6 +63,17 @@ class Compare(CompareTest):
                              {name: ended("lost", 1, accounts=size) for name, size in sizes.items()})
         self.assertRegex(told, r"\n +3  kept → lost\n +such as /fleet/small\n")
 
+    def test_lists_each_device_that_ends_differently_and_each_that_breaks_a_rule(self):
+        listed = self.scratch / "listed"
+        new = {"a": ended(), "b\n": ended("lost", 1, ["c"]), "d": ended("lost", 2, ["c"])}
+        self.compared(dict.fromkeys(new, ended()) | {"e": ended()}, new, "--gate", "none-lost,all-rehearsed", "--output", listed)
+        told = [json.loads(line) for line in listed.read_text().splitlines()]
+        lost = "kept → lost; loses by: c"
+        self.assertEqual([{"device": "/fleet/b\n", "difference": lost}, {"device": "/fleet/d", "difference": lost},
+                          {"device": "/fleet/b\n", "breaks": "none-lost"}, {"device": "/fleet/d", "breaks": "none-lost"},
+                          {"device": "/fleet/e", "breaks": "all-rehearsed"}], told)
+        self.compared({"a": ended()}, {"a": ended()}, "--output", self.scratch / "no/where", status=4)
+
     def test_compares_only_what_both_have(self):
         told = self.compared({"a": ended(), "b": ended()}, {"b": ended(), "c": ended(), "e": ended()}, status=0)
         self.assertIn("1 devices are in the earlier results only.\n2 devices are in the later results only.", told)
@@ -85,8 +96,8 @@ class Compare(CompareTest):
 class Gate(CompareTest):
     OLD = {"kept": ended(), "lossy": ended("lost", 1, ["c"]), "slow": ended(processor_seconds=0.2)}
 
-    def gate(self, rules, status, **new):
-        return self.compared(self.OLD, {**self.OLD, **new}, "--gate", rules, status=status)
+    def gate(self, rules, status, *options, **new):
+        return self.compared(self.OLD, {**self.OLD, **new}, "--gate", rules, *options, status=status)
 
     def test_passes_what_breaks_no_rule(self):
         self.gate("none-newly-lost,none-different,all-rehearsed,none-slower=1.5", 0)
@@ -111,6 +122,11 @@ class Gate(CompareTest):
 
     def test_takes_what_the_earlier_release_could_not_do_either_as_no_new_loss(self):
         self.compared({"a": failed("crashed")}, {"a": failed("crashed")}, "--gate", "none-newly-lost", status=0)
+
+    def test_names_a_device_that_breaks_a_rule(self):
+        self.assertIn("1 devices break none-lost, such as /fleet/lossy (no", self.gate("none-lost", 1))
+        told = json.loads(self.gate("none-lost", 1, "--json").partition("\nmigration-rehearse")[0])
+        self.assertEqual({"none-lost": {"devices": 1, "example": "/fleet/lossy"}}, told["broken"])
 
     def test_tells_losses_apart_by_their_codes(self):
         for codes in (["other"], ["c", "other"], ["c", "c"]):
