@@ -232,7 +232,8 @@ class Results:
         return self._kinds[fact]
 
     def merge(self, other):
-        """Takes over what another result file has and this one has not; what both have stays as it is here."""
+        """Takes over what another result file has and this one has not. What both have stays as it is here; but an image that
+        was there is known before one that was not, and what was rehearsed before what could not be."""
         Results(other, read_only=True).database.close()
         if os.path.samefile(self.path, other):
             raise ResultFault(f"{other}: a result file is not merged with itself")
@@ -245,20 +246,27 @@ class Results:
         self.database.execute("DETACH other")
 
 
-# Every row of the other file gets a number above those of this one; releases and kinds are known by their names.
+# Every row of the other file gets a number above those of this one; releases and kinds are known by their names. What could
+# not be rehearsed has neither facts nor losses.
 MERGE = f"""
 INSERT INTO main.releases (version, digest, first_used)
   SELECT version, digest, first_used FROM other.releases WHERE true ORDER BY id ON CONFLICT DO NOTHING;
 INSERT INTO main.kinds (stage, action, code)
   SELECT stage, action, code FROM other.kinds WHERE true ON CONFLICT DO NOTHING;
-INSERT INTO main.images SELECT * FROM other.images WHERE true ON CONFLICT DO NOTHING;
+INSERT INTO main.images SELECT * FROM other.images WHERE true ON CONFLICT (path) DO UPDATE
+  SET kind = excluded.kind, signature = excluded.signature, content = excluded.content
+  WHERE main.images.content GLOB '{NO_CONTENTS}*' AND excluded.content NOT GLOB '{NO_CONTENTS}*';
 INSERT INTO main.explanations SELECT * FROM other.explanations WHERE true ON CONFLICT DO NOTHING;
 CREATE TEMP TABLE taken AS
   SELECT theirs.id AS old, (SELECT coalesce(max(id), 0) FROM main.rehearsals) + theirs.id AS new, mine.id AS release
   FROM other.rehearsals theirs JOIN other.releases named ON named.id = theirs.release
   JOIN main.releases mine ON mine.digest = named.digest
-  WHERE NOT EXISTS (SELECT 1 FROM main.rehearsals WHERE content = theirs.content AND release = mine.id);
+  WHERE NOT EXISTS (SELECT 1 FROM main.rehearsals AS known WHERE known.content = theirs.content AND known.release = mine.id
+    AND (known.verdict != 'unrehearsed' OR theirs.verdict = 'unrehearsed'));
 CREATE INDEX temp.taken_by_old ON taken (old);
+DELETE FROM main.rehearsals WHERE verdict = 'unrehearsed' AND EXISTS
+  (SELECT 1 FROM other.rehearsals theirs JOIN taken ON taken.old = theirs.id
+   WHERE theirs.content = main.rehearsals.content AND taken.release = main.rehearsals.release);
 INSERT INTO main.rehearsals (id, {', '.join(COLUMNS)})
   SELECT taken.new, content, taken.release, {', '.join(COLUMNS[2:])}
   FROM taken JOIN other.rehearsals theirs ON theirs.id = taken.old;
@@ -267,6 +275,7 @@ INSERT INTO main.facts SELECT taken.new, mine.id, count
   JOIN main.kinds mine ON (mine.stage, mine.action, mine.code) = (theirs.stage, theirs.action, theirs.code);
 INSERT INTO main.losses SELECT taken.new, code, count FROM taken JOIN other.losses ON rehearsal = taken.old;
 DROP TABLE taken;
+DELETE FROM main.rehearsals WHERE content GLOB '{NO_CONTENTS}*' AND content NOT IN (SELECT content FROM main.images);
 """
 
 

@@ -7,7 +7,7 @@ import subprocess
 import unittest
 
 from migration_rehearse.results import Release, ResultFault, Results
-from migration_rehearse.rehearsal import Rehearsed
+from migration_rehearse.rehearsal import Identified, Rehearsed
 from rehearse_case import REHEARSE, RehearseTest
 
 FACTS = {("load", "loaded", ""): 1, ("save", "saved", ""): 2}
@@ -41,6 +41,30 @@ class ResultFiles(RehearseTest):
                          self.scratch / "new")
         self.assertIn(("other", "load", "dropped", "x", 7), rows)
         self.assertEqual(5, len(rows))
+
+    def known(self, name, path, kind, content, rehearsed):
+        """A result file that knows one image."""
+        with Results(self.scratch / name) as results:
+            results.add_image(Identified(path, kind, "", content))
+            results.add(content, results.release("1", "d"), rehearsed)
+        return self.scratch / name
+
+    def test_merged_know_an_image_by_who_found_it(self):
+        rehearsed = Rehearsed("lost", losses={"code": 3}, facts=FACTS)
+        for order in (("missed", "found"), ("found", "missed")):
+            self.known("missed", "/x", "", "none:x", Rehearsed("unrehearsed", "missing"))
+            self.known("found", "/x", "directory", "x", rehearsed)
+            self.command("merge", "-".join(order), *order, cwd=self.scratch)
+            self.assertEqual({"x": ("lost", "")}, self.verdicts(self.scratch / "-".join(order)), order)
+            self.assertEqual([1, 2, 1], self.counts(self.scratch / "-".join(order)))
+
+    def test_merged_have_what_was_rehearsed_in_place_of_what_could_not_be(self):
+        for order in (("good", "bad"), ("bad", "good")):
+            self.known("bad", "/x", "directory", "x", Rehearsed("unrehearsed", "timeout"))
+            self.known("good", "/x", "directory", "x", Rehearsed("lost", losses={"code": 3}, facts=FACTS))
+            self.command("merge", "-".join(order), *order, cwd=self.scratch)
+            self.assertEqual({"x": ("lost", "")}, self.verdicts(self.scratch / "-".join(order)), order)
+            self.assertEqual([1, 2, 1], self.counts(self.scratch / "-".join(order)))
 
     def test_of_shards_are_together_those_of_one_call(self):
         images = self.fleet(12)
