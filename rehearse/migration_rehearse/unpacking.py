@@ -53,7 +53,7 @@ class Unpacking:
                 for entry in reader:
                     self._take(entry)
         except libarchive.ArchiveError as failure:
-            raise Fault("damaged-archive", str(failure)) from failure
+            raise Fault("damaged-archive", failure.msg or "") from failure  # its text has an address of the moment
         if not self.entries:
             raise Fault("damaged-archive", "it is empty")
 

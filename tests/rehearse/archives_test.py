@@ -128,8 +128,7 @@ class TheProcessThatUnpacks(ArchiveTest):
         self.assertEqual(self.process(), self.process())
 
     def test_goes_with_an_archive_that_is_damaged(self):
-        (self.scratch / "none").write_bytes(b"nothing of the kind" * 100)
-        self.assertEqual("damaged-archive", self.rehearsed(self.scratch / "none").cause)
+        self.assertEqual("damaged-archive", self.rehearsed(self.damaged("none")).cause)
         self.assertIsNone(self.process())
 
     def test_is_ended_where_it_takes_too_long(self):
@@ -158,10 +157,13 @@ class Faults(ArchiveTest):
     def test_of_an_archive_that_is_cut_off_or_none(self):
         whole = self.archive(*self.files).read_bytes()
         (self.scratch / "cut").write_bytes(whole[: len(whole) // 2])
-        (self.scratch / "none").write_bytes(b"nothing of the kind" * 100)
+        self.damaged("none")
         (self.scratch / "empty").write_bytes(b"")
         for name in ("cut", "none", "empty"):
             self.assertEqual("damaged-archive", self.rehearsed(self.scratch / name).cause, name)
+
+    def test_of_a_damaged_archive_tell_nothing_of_the_moment(self):
+        self.assertEqual("Unrecognized archive format", self.rehearsed(self.damaged("none")).detail)
 
     def test_of_an_archive_with_its_bytes_changed_is_an_answer(self):
         whole = bytearray(self.archive(*self.files).read_bytes())

@@ -35,17 +35,17 @@ class Cluster(RehearseTest):
             return client.scheduler.address, started
 
     def test_gives_the_same_results_though_a_worker_dies(self):
-        images = self.fleet(60)
+        images = [*self.fleet(60), self.damaged("damaged")]
         address, (_, doomed, _) = self.cluster(3)
         running = subprocess.Popen([REHEARSE, "--results", self.file, "--scheduler", address, *images],
                                    stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True)
         self.wait_for_results(5)
         doomed.kill()
         told, _ = running.communicate(timeout=200)
-        self.assertEqual(1, running.returncode, told)
+        self.assertEqual(3, running.returncode, told)
         local = self.scratch / "local"
-        self.rehearse(*images, results=local, status=1)
-        self.assertEqual(60, len(self.verdicts()))
+        self.rehearse(*images, results=local, status=3)
+        self.assertEqual(61, len(self.verdicts()))
         self.assertEqual(self.told(local), self.told())
 
     def wait_for_results(self, count):

@@ -207,10 +207,10 @@ class Hosts(RehearseTest):
 
 class Workers(RehearseTest):
     def test_however_many_come_to_the_same(self):
-        images = self.fleet(20)
-        self.rehearse(*images, "--workers", 1, status=1)
+        images = [*self.fleet(20), self.damaged("damaged")]
+        self.rehearse(*images, "--workers", 1, status=3)
         other = self.scratch / "other"
-        self.rehearse(*reversed(images), "--workers", 5, status=1, results=other)
+        self.rehearse(*reversed(images), "--workers", 5, status=3, results=other)
         self.assertEqual(self.told(), self.told(other))
 
     def test_that_are_no_root_rehearse_as_the_devices_own_user(self):

@@ -34,6 +34,11 @@ class RehearseTest(DeviceTest):
         Device(root).write_plist(LEGACY_MAIL, {"MailAccounts": [{"AccountType": "IMAPAccount", "uniqueId": "M"}]})
         return root
 
+    def damaged(self, name):
+        """What is called an archive, and is none."""
+        (self.scratch / name).write_bytes(b"nothing of the kind" * 100)
+        return self.scratch / name
+
     def fleet(self, count):
         """Devices that all differ, every third of which loses an account."""
         return [self.image(f"device-{number}", [{**KEPT, "Identifier": f"K{number}"}, *([UNFIXABLE] * (number % 3 == 0))],
@@ -79,15 +84,18 @@ class RehearseTest(DeviceTest):
                  f" WHERE path = '{path}'")
         return json.loads(zlib.decompress(self.rows(query)[0][0]))
 
+    def plugin(self):
+        (plugin,) = HOST.parent.parent.glob("lib*/**/accounts-migrator.so")
+        return plugin
+
     def host_alone(self, first="true"):
         """Options for the real host as one that does not serve, and that does this first for each image."""
         program = self.scratch / "host-alone"
         program.write_text(f'#!/bin/sh\n[ "$1" = --serve-rehearsals ] && exit 2\n[ "$1" = --version ] || {first}\n'
                            f'exec {HOST} "$@"\n')
         program.chmod(0o755)
-        (plugin,) = HOST.parent.parent.glob("lib*/**/accounts-migrator.so")
         resources = HOST.parent.parent / os.environ["DATA_DIRECTORY"] / "account-settings"
-        return ["--host", program, "--plugin", plugin, "--resources", resources]
+        return ["--host", program, "--plugin", self.plugin(), "--resources", resources]
 
     def rehearsed(self, path, **bounds):
         """One image, rehearsed in this process."""
