@@ -4,6 +4,7 @@ import os
 import shutil
 import sys
 import tempfile
+from pathlib import Path
 
 from migration_rehearse.campaign import in_shard
 
@@ -11,8 +12,9 @@ STANDARD_INPUT = "-"
 
 
 class Listing:
-    """The paths of images, in the order in which they are named; iterated as often as need be. Lists hold one path a line,
-    or end each with a zero byte. Raises OSError where a list cannot be read."""
+    """The absolute paths of images, in the order in which they are named; iterated as often as need be. Lists hold one path a
+    line, or end each with a zero byte. Which shard an image belongs to is decided by the path as it is named, so that machines
+    that have the list in different places divide it alike. Raises OSError where a list cannot be read."""
 
     def __init__(self, named, lists, shard=(1, 1), is_zero_ended=False):
         self.named = named
@@ -21,7 +23,7 @@ class Listing:
         self.lists = [_spooled(sys.stdin.buffer) if each == STANDARD_INPUT else open(each, "rb") for each in lists]
 
     def __iter__(self):
-        return (path for path in self._all() if in_shard(path, self.shard))
+        return (absolute(path) for path in self._all() if in_shard(path, self.shard))
 
     def count(self):
         return sum(1 for _ in self)
@@ -38,6 +40,11 @@ class Listing:
             *whole, rest = (rest + block).split(self.end)
             yield from whole
         yield rest
+
+
+def absolute(path):
+    """The same place from wherever a worker runs. Parents are left for links to mean what they do; no path stays none."""
+    return str(Path(path).absolute()) if path else path
 
 
 def _spooled(stream):

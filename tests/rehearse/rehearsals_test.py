@@ -64,6 +64,21 @@ class Lists(RehearseTest):
         self.rehearse("--list", listed, images[0], status=1)
         self.assertEqual(3, len(self.verdicts()))
 
+    def test_name_an_image_by_its_place_wherever_they_are_read(self):
+        root = self.image("one")
+        self.rehearse("one", "./one/", root, "one/../one", cwd=self.scratch, text="one\n")
+        self.assertEqual({(str(root),), (f"{root}/../one",)}, set(self.rows("SELECT path FROM images")))
+
+    def test_divide_images_by_the_names_that_they_have_there(self):
+        self.fleet(9)
+        for place in ("here", "elsewhere"):
+            (self.scratch / place).mkdir()
+            shutil.copytree(self.scratch, self.scratch / place, ignore=shutil.ignore_patterns("here", "elsewhere"), dirs_exist_ok=True)
+            self.rehearse(*(f"device-{each}" for each in range(9)), "--shard", "1/2", cwd=self.scratch / place, status=1)
+        paths = [Path(path) for path, in self.rows("SELECT path FROM images")]
+        here, elsewhere = [{path.name for path in paths if path.parent.name == place} for place in ("here", "elsewhere")]
+        self.assertEqual(here, elsewhere)
+
     def test_come_by_standard_input_with_any_name(self):
         odd = self.image("two\nlines")
         self.rehearse("--list", "-", "--null", text=f"{odd}\0{self.image('plain')}\0")
