@@ -91,6 +91,11 @@ class Host(NamedTuple):
             digest.update(part.name.encode() + b"\0" + hashlib.sha256(part.read_bytes()).digest())
         return digest.hexdigest()
 
+    def digests(self):
+        """Of the program and of the plug-in, each by itself, as sha256sum prints them."""
+        program, plugin, *_ = self._parts()
+        return [hashlib.sha256(part.read_bytes()).hexdigest() for part in (program, plugin)]
+
     def _parts(self):
         """The program, the plug-in, the system's own libraries that the two load, and the resources."""
         program = Path(self.program).resolve()

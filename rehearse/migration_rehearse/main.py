@@ -55,7 +55,7 @@ def run(arguments, version):
         return say(f"{failure.filename}: {failure.strerror}", WRONG_USE)
     with Results(asked.results) as results:
         rehearsing = host.Host(asked.host, asked.plugin, asked.resources).found()
-        release = results.release(rehearsing.version(), rehearsal.digest_here(rehearsing))
+        release = results.release(rehearsing.version(), rehearsal.digest_here(rehearsing), *rehearsing.digests())
         how = campaign.Campaign(release, rehearsing, options.limits_of(asked), options.bounds_of(asked), asked.again)
         engine = engines.DaskEngine(asked.scheduler) if asked.scheduler else engines.LocalEngine(asked.workers)
         try:

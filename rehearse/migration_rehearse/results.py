@@ -13,12 +13,13 @@ from typing import NamedTuple
 from migration_rehearse.faults import NO_CONTENTS
 
 APPLICATION = 0x4D524831
-SCHEMA_VERSION = 1
+SCHEMA_VERSION = 2
 SCHEMA = """
 CREATE TABLE releases (
   id INTEGER PRIMARY KEY,
   version TEXT NOT NULL,           -- as the host tells it
   digest TEXT NOT NULL UNIQUE,     -- of host, plug-in, libraries and resources
+  host TEXT NOT NULL, plugin TEXT NOT NULL,  -- the digest of each by itself
   first_used TEXT NOT NULL);       -- UTC
 CREATE TABLE images (
   path TEXT PRIMARY KEY,
@@ -163,10 +164,10 @@ class Results:
     def row(self, query, values=()):
         return next(self.rows(query, values), None)
 
-    def release(self, version, digest):
-        """The release of this name, made where it is new."""
-        self.change("INSERT INTO releases (version, digest, first_used) VALUES (?, ?, datetime('now'))"
-                    " ON CONFLICT DO NOTHING", (version, digest))
+    def release(self, version, digest, host="", plugin=""):
+        """The release with this digest, made where it is new, of a host and a plug-in with digests of their own."""
+        self.change("INSERT INTO releases (version, digest, host, plugin, first_used) VALUES (?, ?, ?, ?, datetime('now'))"
+                    " ON CONFLICT DO NOTHING", (version, digest, host, plugin))
         self.commit()
         return self._release("digest = ?", digest)
 
@@ -249,8 +250,8 @@ class Results:
 # Every row of the other file gets a number above those of this one; releases and kinds are known by their names. What could
 # not be rehearsed has neither facts nor losses.
 MERGE = f"""
-INSERT INTO main.releases (version, digest, first_used)
-  SELECT version, digest, first_used FROM other.releases WHERE true ORDER BY id ON CONFLICT DO NOTHING;
+INSERT INTO main.releases (version, digest, host, plugin, first_used)
+  SELECT version, digest, host, plugin, first_used FROM other.releases WHERE true ORDER BY id ON CONFLICT DO NOTHING;
 INSERT INTO main.kinds (stage, action, code)
   SELECT stage, action, code FROM other.kinds WHERE true ON CONFLICT DO NOTHING;
 INSERT INTO main.images SELECT * FROM other.images WHERE true ON CONFLICT (path) DO UPDATE

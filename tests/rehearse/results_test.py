@@ -1,11 +1,13 @@
 """The result file by itself: merged, full, and not one at all."""
 
+import hashlib
 import os
 import resource
 import sqlite3
 import subprocess
 import unittest
 
+from device_case import HOST
 from migration_rehearse.results import Release, ResultFault, Results
 from migration_rehearse.rehearsal import Identified, Rehearsed
 from rehearse_case import REHEARSE, RehearseTest
@@ -66,6 +68,16 @@ class ResultFiles(RehearseTest):
             self.assertEqual({"x": ("lost", "")}, self.verdicts(self.scratch / "-".join(order)), order)
             self.assertEqual([1, 2, 1], self.counts(self.scratch / "-".join(order)))
 
+    def test_tell_host_and_plugin_apart(self):
+        plugin = self.scratch / "other.so"
+        plugin.write_bytes(self.plugin().read_bytes() + b"another build")
+        self.rehearse("/nowhere", status=3)
+        self.rehearse("/nowhere", "--plugin", plugin, status=3)
+        (first, *one), (second, *other) = self.rows("SELECT digest, host, plugin FROM releases ORDER BY id")
+        self.assertNotEqual(first, second)
+        self.assertEqual([hashlib.sha256(each.read_bytes()).hexdigest() for each in (HOST, self.plugin())], one)
+        self.assertEqual([one[0], hashlib.sha256(plugin.read_bytes()).hexdigest()], other)
+
     def test_of_shards_are_together_those_of_one_call(self):
         images = self.fleet(12)
         parts = [self.scratch / name for name in ("a", "b", "c")]
@@ -86,11 +98,11 @@ class ResultFiles(RehearseTest):
         foreign = sqlite3.connect(self.scratch / "foreign")
         foreign.execute("CREATE TABLE mine (x)")
         foreign.close()
-        newer = self.filled("newer", "a")
-        opened = sqlite3.connect(newer)
-        opened.execute("PRAGMA user_version = 99")
-        opened.close()
-        for name in ("foreign", "newer"):
+        for name, version in (("newer", 99), ("older", 1)):
+            opened = sqlite3.connect(self.filled(name, "a"))
+            opened.execute(f"PRAGMA user_version = {version}")
+            opened.close()
+        for name in ("foreign", "newer", "older"):
             with self.assertRaises(ResultFault):
                 Results(self.scratch / name)
 
