@@ -29,7 +29,8 @@ class DeviceTable {
     const more = this.fleet.images - this.all.length;
     const made = section("devices", "Devices",
       more > 0 ? element("p", {}, `${number(this.all.length)} of ${number(this.fleet.images)}: all that lose something and that `
-        + "could not be rehearsed as far as there is room, the slowest and the strangest, and others by chance.") : null,
+        + "could not be rehearsed as far as there is room, first some for each reason; the slowest and the strangest; and "
+        + "others by chance.") : null,
       this._filters(), element("p", { "aria-live": "polite", class: "faint" }),
       element("div", { class: "scroll" }, element("table", {}, element("caption", {}, "Devices; a name opens what the run would do"),
         element("thead", {}), element("tbody", {}))),
@@ -56,8 +57,13 @@ class DeviceTable {
     return element("button", { type: "button", class: "button", click: () => { this.page += by; this.show(); } }, words);
   }
 
-  // Only the devices behind a reason or a cause.
-  showCode(code) {
+  // A button that shows only the devices behind a reason or a cause; nothing where none of them is in the table.
+  buttonFor(words, code) {
+    return this.fleet.codes.includes(code) ? element("button", { type: "button", class: "link",
+      click: () => this._showCode(code), "aria-label": `${words}: ${code}` }, words) : "";
+  }
+
+  _showCode(code) {
     this.search.value = this.verdict.value = "";
     this.code.value = this.fleet.codes.indexOf(code);
     this.page = 0;

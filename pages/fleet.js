@@ -52,7 +52,7 @@ function lossSection(fleet, devices) {
   if (!fleet.losses.length) return section("losses", "Losses by reason", element("p", {}, "Nothing is lost."));
   return section("losses", "Losses by reason", table("Accounts that would be lost, and the devices behind each reason",
     ["Reason", "Accounts", "Devices", ""], fleet.losses.map(({ code, accounts, devices: behind }) => [
-      element("code", {}, code), number(accounts), number(behind), filterButton("Show the devices", () => devices.showCode(code), code),
+      element("code", {}, code), number(accounts), number(behind), devices.buttonFor("Show the devices", code),
     ])));
 }
 
@@ -60,11 +60,8 @@ function causeSection(fleet, devices) {
   if (!fleet.unrehearsed.length) return null;
   return section("causes", "What could not be rehearsed", table("Images by cause", ["Cause", "Images", "", ""],
     fleet.unrehearsed.map(({ cause, images }) => [element("code", {}, cause), number(images), CAUSES[cause] || "",
-      filterButton("Show the images", () => devices.showCode(cause), cause)])));
+      devices.buttonFor("Show the images", cause)])));
 }
-
-const filterButton = (words, click, about) => element("button",
-  { type: "button", class: "link", click, "aria-label": `${words}: ${about}` }, words);
 
 function stepSection(fleet) {
   const rows = fleet.steps.map(({ stage, action, code, devices, accounts }) => [

@@ -39,8 +39,8 @@ class Fleet:
         database.execute(
             f"CREATE TEMP TABLE fleet AS SELECT {DEVICE} FROM images CROSS JOIN rehearsals USING (content)"
             " WHERE release = ?", (release.id,))
-        database.execute("CREATE TEMP TABLE weights (rehearsal INTEGER PRIMARY KEY, images INTEGER)")
-        database.execute("INSERT INTO weights SELECT id, count(*) FROM fleet GROUP BY id")
+        database.execute("CREATE TEMP TABLE weights (rehearsal INTEGER PRIMARY KEY, images INTEGER, path TEXT)")
+        database.execute("INSERT INTO weights SELECT id, count(*), min(path) FROM fleet GROUP BY id")
 
     def images(self):
         return self._number("SELECT count(*) FROM fleet")
@@ -100,18 +100,24 @@ class Fleet:
         self.results.database.execute(
             "INSERT INTO surprise SELECT kind, log2(1.0 * ? / count(*)) FROM facts JOIN weights USING (rehearsal)"
             " GROUP BY kind", (total,))
-        query = ("SELECT min(path), bits FROM (SELECT rehearsal, sum(bits) AS bits FROM facts JOIN weights USING (rehearsal)"
-                 " JOIN surprise USING (kind) GROUP BY rehearsal ORDER BY bits DESC, rehearsal LIMIT ?)"
-                 " JOIN fleet ON fleet.id = rehearsal GROUP BY rehearsal ORDER BY bits DESC, rehearsal")
+        query = ("SELECT path, sum(bits) AS bits FROM facts JOIN weights USING (rehearsal) JOIN surprise USING (kind)"
+                 " GROUP BY rehearsal ORDER BY bits DESC, path LIMIT ?")
         return [(path, bits) for path, bits in self._rows(query, (MOST_NOTABLE,)) if bits > 0]
 
+    def behind_reasons(self):
+        """Some devices of each reason of a loss and of each cause, with a number from 1 on among those of their reason."""
+        return list(self._rows(
+            "SELECT path, place FROM (SELECT path, row_number() OVER (PARTITION BY reason ORDER BY path) AS place FROM"
+            " (SELECT code AS reason, path FROM losses JOIN weights USING (rehearsal)"
+            " UNION ALL SELECT cause, path FROM fleet WHERE cause != '')) WHERE place <= ?", (MOST_NOTABLE,)))
+
     def devices(self, most, wanted):
-        """At most so many: those with the wanted paths, then those that lose or could not be rehearsed, then others, by
-        their paths."""
+        """At most so many: those with the wanted paths, by their ranks, the least first; then those that lose or could not be
+        rehearsed, then others, by their paths."""
         database = self.results.database
-        database.execute("CREATE TEMP TABLE wanted (path TEXT PRIMARY KEY)")
-        database.executemany("INSERT OR IGNORE INTO wanted VALUES (?)", [(path,) for path in wanted])
-        query = (f"SELECT * FROM (SELECT {DEVICE} FROM fleet ORDER BY path NOT IN (SELECT path FROM wanted),"
+        database.execute("CREATE TEMP TABLE wanted (path TEXT PRIMARY KEY, rank INTEGER)")
+        database.executemany("INSERT INTO wanted VALUES (?, ?) ON CONFLICT DO UPDATE SET rank = min(rank, excluded.rank)", wanted)
+        query = (f"SELECT * FROM (SELECT {DEVICE} FROM fleet LEFT JOIN wanted USING (path) ORDER BY rank IS NULL, rank,"
                  " verdict = 'kept', fingerprint, path LIMIT ?) ORDER BY path")
         return [Device(*row) for row in self._rows(query, (most,))]
 

@@ -33,7 +33,7 @@ def page_of(results, release, most, template):
     """The parts of the page, in order."""
     fleet = Fleet(results, release)
     slowest, strangest = fleet.slowest(), fleet.strangest()
-    devices = fleet.devices(most, [path for path, _ in (*slowest, *strangest)])
+    devices = fleet.devices(most, [*fleet.behind_reasons(), *((path, 1) for path, _ in (*slowest, *strangest))])
     blocks, places = _blocks(fleet, devices)
     document = {"fleet": {
         "release": str(release), "made": time.strftime("%Y-%m-%d"), "results": os.path.basename(results.path),

@@ -141,6 +141,21 @@ class LargeReport(ReportTest):
         Select(self.one("select")).select_by_visible_text("accounts lost")
         self.assertEqual("200 devices, page 1 of 2", self.one("[aria-live]").text)
 
+    def test_names_a_device_behind_each_reason_however_few_they_are(self):
+        with Results(self.simulated(2000)) as results:
+            rare = self.simulated_rehearsal(1990)._replace(losses={"rare": 1}, seconds=0.01)
+            results.add_image(Identified("/fleet/zzz", "directory", "", "zzz"))
+            results.add("zzz", results.chosen_release(), rare)
+        self.opened(self.report("--devices", 100))
+        self.one("button[aria-label='Show the devices: rare']").send_keys("\n")
+        self.assertEqual(["/fleet/zzz"], self.texts(NAMES))
+
+    def test_offers_no_devices_behind_a_reason_where_none_is_named(self):
+        self.simulated(2000)
+        self.opened(self.report("--devices", 3))
+        self.assertEqual(5, len(self.all("#losses ~ .scroll tbody tr")))
+        self.assertTrue(1 <= len(self.all("#losses ~ .scroll button")) <= 3)
+
     def test_is_made_of_the_release_that_is_asked_for(self):
         with Results(self.simulated(3)) as results:
             results.release("2", "e")
