@@ -12,7 +12,7 @@ import tempfile
 from typing import NamedTuple
 
 from migration_rehearse import host, rehearsal, unpacker, unpacking
-from migration_rehearse.faults import Fault
+from migration_rehearse.faults import CAUSES, Fault
 from migration_rehearse.footprint import DIRECTORIES, FILES, GROUPS, USERS, read_file, resolved, target_of
 from migration_rehearse.replacing import Replacer
 from migration_rehearse.vocabulary import FRAGMENTS, KEYS
@@ -23,6 +23,7 @@ DEVICE_INFO = "etc/vorlix/device-info.plist"
 LISTS = tuple(path for path in FILES if path.endswith(".plist") and "CrashReporter" not in path)
 PLACEHOLDER = b"anonymised"  # where only its being there counts
 SHORTEST_WORD = 6  # that is looked for in the result: a shorter one is found by chance
+EXPLAINED = ("kept", "lost", "not saved", "failed")  # verdicts of a migration that was gone through
 SAME = ("verdict", "cause", "status", "stored_version", "accounts", "counts", "losses", "facts")
 
 
@@ -178,10 +179,17 @@ def check_words(pieces, replacer):
 
 def check_facts(image, archive, program):
     """That the migration does the same with both."""
-    before, after = (_rehearsed(each, program) for each in (image, archive))
+    before = _rehearsed(image, program)
+    if before.verdict not in EXPLAINED:
+        raise CannotAnonymise(f"{image}: there is no explanation of what the migration does with it ({_why(before)})")
+    after = _rehearsed(archive, program)
     different = [name for name in SAME if getattr(before, name) != getattr(after, name)]
     if different:
         raise CannotAnonymise(f"the migration would do something else with it: its {', '.join(different)} would differ")
+
+
+def _why(rehearsed):
+    return rehearsed.detail or CAUSES.get(rehearsed.cause, rehearsed.verdict)
 
 
 def _rehearsed(path, program):

@@ -87,6 +87,12 @@ class Devices(RehearseTest):
         Device(root).write(LEGACY_EXCHANGE, whole[:-20])
         self.assertNotIn(b"Smithson", b"".join(self.anonymised(root).values()))
 
+    def test_of_which_the_host_tells_nothing_are_not_made(self):
+        root = self.image("device", [PERSON])
+        with self.assertRaisesRegex(anonymise.CannotAnonymise, "no explanation"):
+            anonymise.anonymise(str(root), KEY, str(self.scratch / "out"), host.Host(str(HOST), "/bin/true"))
+        self.assertFalse((self.scratch / "out").exists())
+
     def test_have_no_other_user_than_the_settings_owner(self):
         root = self.image("device")
         with open(root / "etc/passwd", "a", encoding="utf-8") as file:
