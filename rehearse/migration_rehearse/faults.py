@@ -16,6 +16,7 @@ CAUSES = {
     "hard-link": "a file that a run reads is a second name of another file in the archive",
     "special-file": "a file that a run reads is a device, a pipe or a socket",
     "unpacking-failed": "the archive could not be unpacked into the temporary directory",
+    "locked": "another program holds the image's lock",
     "timeout": "the rehearsal took longer than --timeout allows",
     "memory": "the rehearsal needed more memory than --memory allows",
     "crashed": "the host was ended by a signal",

@@ -20,6 +20,7 @@ RESOURCES_FROM_PROGRAM = "../share/account-settings"
 PRLIMIT = "/usr/bin/prlimit"
 MAX_TABLE = 1 << 20  # bytes of a device's passwd or group file
 MAX_ERRORS = 1 << 20
+SECONDS_FOR_A_LOCK = 5
 SECONDS_TO_END = 1.0  # after its last word
 
 
@@ -33,6 +34,11 @@ class Limits(NamedTuple):
     seconds: float = 60
     memory: int = 2 << 30
     output: int = 64 << 20
+
+    @property
+    def lock_seconds(self):
+        """How long the host waits for who holds an image's lock: it has time left to say so."""
+        return min(SECONDS_FOR_A_LOCK, int(self.seconds / 2)) if self.seconds else SECONDS_FOR_A_LOCK
 
 
 class Ended(NamedTuple):
@@ -54,16 +60,17 @@ class Host(NamedTuple):
     plugin: str = ""
     resources: str = ""
 
-    def command(self, root):
+    def command(self, root, limits):
         """That rehearses the one image."""
-        return [self.program, "--root", root, "--dry-run", "--explain=json", *self._options()]
+        return [self.program, "--root", root, "--dry-run", "--explain=json", *self._options(limits)]
 
-    def serving(self):
+    def serving(self, limits):
         """That rehearses image after image; see serving.py."""
-        return [self.program, "--serve-rehearsals", *self._options()]
+        return [self.program, "--serve-rehearsals", *self._options(limits)]
 
-    def _options(self):
-        options = ["--plugin", self.plugin] if self.plugin else []
+    def _options(self, limits):
+        options = [f"--lock-timeout={limits.lock_seconds}"]
+        options += ["--plugin", self.plugin] if self.plugin else []
         return options + (["--resources", self.resources] if self.resources else [])
 
     def found(self):

@@ -18,6 +18,7 @@ from migration_rehearse.faults import NO_CONTENTS, Fault
 DIRECTORY, ARCHIVE = "directory", "archive"
 ENDED = {0, 1, 6, 7}  # what the host ends with where the plug-in was called
 REFUSED = 8  # before it was called, since something is wrong with the device
+GIVEN_UP = "wait any longer for "  # what the host says of a lock that it did not get in time
 REHEARSAL_NOTICE = "this is a rehearsal"
 NEAR = 0.75
 COMPRESSION = 2  # the fastest that still takes nearly what the best does
@@ -161,6 +162,8 @@ def _rehearse_tree(task, root, identifiers):
         return unrehearsed(cause, _why_it_died(ended, console), **measured)
     if ended.status != 0 and _ran_out_of_memory(ended, task.limits):
         return unrehearsed("memory", " / ".join(console[-1:]), **measured)
+    if ended.status == REFUSED and GIVEN_UP in " ".join(console[-1:]):
+        return unrehearsed("locked", console[-1], **measured)
     if ended.status == REFUSED:
         return Rehearsed("refused", detail=" / ".join(console[-1:]), **_packed({"console": console}), **measured)
     if ended.status not in ENDED:

@@ -105,9 +105,9 @@ def rehearse(program, root, limits):
     """How the rehearsal of the image at `root` by this host ended. Raises ServerLost where the host that serves was lost
     with the image, and the one after it, too."""
     user = host.as_mobile(root)
-    server = _server([*user, *program.serving()]) if _is_text(root) else None
+    server = _server([*user, *program.serving(limits)]) if _is_text(root) else None
     if server is None:
-        return host.run([*user, *program.command(root)], limits)
+        return host.run([*user, *program.command(root, limits)], limits)
     try:
         return server.rehearse(root, limits)
     except ServerLost:

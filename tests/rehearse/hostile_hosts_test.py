@@ -1,5 +1,6 @@
 """Hosts that hang, crash, eat memory or talk without end, as a hostile image might make them: each ends as one row."""
 
+import fcntl
 import os
 import signal
 import threading
@@ -7,7 +8,7 @@ import unittest
 
 from device_case import HOST as REAL_HOST
 from device_case import PLUGINS
-from rehearse_case import KEPT, RehearseTest
+from rehearse_case import KEPT, UNFIXABLE, RehearseTest
 
 from migration_rehearse import host, serving
 
@@ -94,6 +95,23 @@ class HostileImages(RehearseTest):
             threading.Timer(0.2, process.kill).start()
 
         self.assert_nothing_is_lost(kill)
+
+
+class LockedImages(RehearseTest):
+    def test_are_one_row_with_who_holds_them_though_there_is_time_left(self):
+        images = [self.image("free"), self.image("held", [UNFIXABLE])]
+        (images[1] / "tmp").mkdir()
+        with open(images[1] / "tmp/AccountMigrationInProgress", "wb") as lock:
+            fcntl.flock(lock, fcntl.LOCK_EX)
+            self.rehearse(*images, "--timeout", 8, status=3)
+        self.assertEqual({"free": ("kept", ""), "held": ("unrehearsed", "locked")}, self.verdicts())
+        ((detail,),) = self.rows("SELECT detail FROM rehearsals WHERE cause = 'locked'")
+        self.assertIn(f"process {os.getpid()} ", detail)
+        self.rehearse(*images, "--again", status=1)
+
+    def test_are_waited_for_no_longer_than_the_image_may_take(self):
+        waits = {limit: host.Limits(seconds=limit).lock_seconds for limit in (0, 0.5, 2, 4, 60)}
+        self.assertEqual({0: 5, 0.5: 0, 2: 1, 4: 2, 60: 5}, waits)
 
 
 class HostileHosts(RehearseTest):
