@@ -13,6 +13,7 @@ from migration_rehearse.results import Release, shown
 from migration_rehearse.unpacking import Bounds
 
 CHUNK = 16  # images that one worker identifies at a time
+PATIENCE = 0.25  # seconds after which what came is kept, though nothing else comes
 LOSING = ("lost", "not saved", "failed", "refused")
 
 
@@ -71,19 +72,21 @@ class _Run:
         self.under_way = {}  # contents that are being rehearsed: how many images have them
 
     def over(self, paths):
-        for task, answer in self.engine.map(rehearse, self._tasks(paths)):
-            self._keep(task, answer)
+        for given in self.engine.map(rehearse, self._tasks(paths), PATIENCE):
+            if given:
+                self._keep(*given)
             self.results.commit_if_due()
             yield self.tally
         self.results.commit()
         yield self.tally
 
     def _tasks(self, paths):
-        for chunk, answer in self.engine.map(identify, self._chunks(paths)):
-            for image in self._identified(chunk, answer):
+        for given in self.engine.map(identify, self._chunks(paths), PATIENCE):
+            for image in self._identified(*given) if given else ():
                 self.results.add_image(image)
                 if self._is_new(image):
                     yield self._task(image)
+            yield None  # what is known of these is kept, whatever the next are like
 
     def _task(self, image):
         how = self.campaign

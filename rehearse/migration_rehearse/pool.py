@@ -53,12 +53,12 @@ class Pool:
         self._unsent.append(message)
         self._send()
 
-    def hear(self):
-        """Waits until something is said: answers, each the number of the task and what the function answered or raised.
-        There may be none. Raises WorkerDied."""
+    def hear(self, seconds=None):
+        """Waits until something is said, or for so long: answers, each the number of the task and what the function
+        answered or raised. There may be none. Raises WorkerDied."""
         self._poll.register(self._tasks, select.POLLOUT if self._unsent else 0)
         answers = []
-        for descriptor, _ in self._poll.poll():
+        for descriptor, _ in self._poll.poll(None if seconds is None else 1000 * seconds):
             if descriptor == self._tasks.fileno():
                 self._send()
             else:

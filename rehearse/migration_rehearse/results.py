@@ -63,7 +63,7 @@ MEASURED = ("verdict", "cause", "detail", "status", "stored_version", "accounts"
             "peak_memory", "fingerprint")
 COLUMNS = ("content", "release", *MEASURED, *COUNTS)
 LARGEST = (1 << 63) - 1
-SECONDS_BETWEEN_COMMITS = 0.5
+SECONDS_BETWEEN_COMMITS = 0.25
 
 
 class ResultFault(Exception):

@@ -6,7 +6,8 @@ import sys
 import time
 import unittest
 
-from rehearse_case import REHEARSE, RehearseTest
+from device_case import PLUGINS
+from rehearse_case import KEPT, REHEARSE, RehearseTest
 
 MODULES = REHEARSE.parent.parent / os.environ["DATA_DIRECTORY"] / "account-settings" / "rehearse"
 
@@ -47,6 +48,18 @@ class Cluster(RehearseTest):
         self.rehearse(*images, results=local, status=3)
         self.assertEqual(61, len(self.verdicts()))
         self.assertEqual(self.told(local), self.told())
+
+    def test_keeps_what_came_while_another_image_hangs(self):
+        images = [self.image(kind, [{**KEPT, "Identifier": kind}]) for kind in ("hang", "fine", "well")]
+        for image in images:
+            (image / "etc/direction").write_text(image.name)
+        address, _ = self.cluster(2)
+        running = subprocess.Popen([REHEARSE, "--results", self.file, "--scheduler", address, "--timeout", "300",
+                                    "--plugin", PLUGINS / "directed_migrator.so", *images], stdout=subprocess.DEVNULL)
+        self.addCleanup(running.wait)
+        self.addCleanup(running.kill)
+        self.wait_for_results(2)
+        self.assertEqual({"fine", "well"}, set(self.verdicts()))
 
     def wait_for_results(self, count):
         deadline = time.monotonic() + 100

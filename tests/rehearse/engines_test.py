@@ -3,7 +3,9 @@
 import os
 import signal
 import tempfile
+import time
 import unittest
+from itertools import islice
 
 from migration_rehearse.engines import AHEAD, DIED, LocalEngine
 
@@ -16,6 +18,21 @@ def killed_by_seven(number):
     if number == 7:
         os.kill(os.getpid(), signal.SIGKILL)
     return number
+
+
+def killed_by_a_seven(number):
+    return killed_by_seven(7 if number % 10 == 7 else number)
+
+
+def asleep(seconds):
+    time.sleep(seconds)
+    return seconds
+
+
+def killed_then_asleep(marker):
+    if killed_once(marker):
+        open(os.path.dirname(marker) + "/again", "w").close()
+        time.sleep(60)
 
 
 def killed_once(marker):
@@ -69,6 +86,26 @@ class LocalProcesses(unittest.TestCase):
     def test_that_die_once_lose_nothing(self):
         with tempfile.TemporaryDirectory() as scratch:
             self.assertEqual({"": False, scratch + "/marker": True}, self.results(killed_once, ["", scratch + "/marker"]))
+
+    def test_that_die_one_beside_the_other_lose_only_what_kills_them(self):
+        self.assertEqual({number: DIED if number % 10 == 7 else number for number in range(30)},
+                         self.results(killed_by_a_seven, range(30)))
+
+    def test_let_who_is_patient_for_a_moment_know_that_nothing_came(self):
+        answers = self.engine.map(asleep, [0, 60], 0.1)
+        begun = time.monotonic()
+        self.assertEqual((0, 0), next(each for each in answers if each))
+        self.assertEqual([None] * 3, list(islice(answers, 3)))
+        self.assertLess(time.monotonic() - begun, 20)
+
+    def test_answer_though_nobody_knows_the_next_task(self):
+        tasks = (given and given[0] for given in self.engine.map(asleep, [0, 60], 0.1))
+        self.assertEqual((0, 0), next(each for each in self.engine.map(doubled, tasks, 0.1) if each))
+
+    def test_try_a_task_that_kills_alone_without_keeping_others_waiting(self):
+        with tempfile.TemporaryDirectory() as scratch:
+            answers = self.engine.map(killed_then_asleep, [scratch + "/marker"], 0.1)
+            self.assertEqual([None] * 3, list(islice(filter(lambda _: os.path.exists(scratch + "/again"), answers), 3)))
 
     def test_raise_what_a_task_raises(self):
         with self.assertRaisesRegex(ValueError, "5"):

@@ -11,6 +11,7 @@ import time
 import unittest
 from pathlib import Path
 
+from device_case import PLUGINS
 from rehearsal_case import every_detail
 from rehearse_case import KEPT, REHEARSE, UNFIXABLE, RehearseTest
 
@@ -167,10 +168,21 @@ class Again(RehearseTest):
         self.assertIn(f"Rehearsed {400 - done} now", self.rehearse(*images, status=1))
         self.assertEqual(400, len(self.verdicts()))
 
-    def wait_for_some_results(self):
+    def test_keeps_what_came_while_another_image_hangs(self):
+        images = [self.image(kind, [{**KEPT, "Identifier": kind}]) for kind in ("hang", "fine", "well")]
+        for image in images:
+            (image / "etc/direction").write_text(image.name)
+        running = subprocess.Popen([REHEARSE, "--results", self.file, "--plugin", PLUGINS / "directed_migrator.so",
+                                    "--timeout", "300", "--workers", "2", *images], stdout=subprocess.DEVNULL)
+        self.addCleanup(running.wait)
+        self.addCleanup(running.kill)
+        self.wait_for_some_results(2)
+        self.assertEqual({"fine", "well"}, set(self.verdicts()))
+
+    def wait_for_some_results(self, least=1):
         deadline = time.monotonic() + 60
         while time.monotonic() < deadline:
-            if self.file.exists() and self.file.stat().st_size and self.count():
+            if self.file.exists() and self.file.stat().st_size and self.count() >= least:
                 return
             time.sleep(0.02)
         self.fail("no results")
