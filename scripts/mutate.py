@@ -14,6 +14,7 @@ SOURCEs only the mutants of these are tried, with --left only those that no earl
 """
 
 import argparse
+import hashlib
 import itertools
 import json
 import math
@@ -182,7 +183,7 @@ def prepare(options):
     places = {path.name: path for path in (options.build / "tests").glob("**/*_tests")}
     tests = [test for program in PROGRAMS for test in runner.tests_of(places[program])]
     library = directory / "lib" / "libaccountsettings.so.1"
-    stamp = {str(path): path.stat().st_mtime_ns for path in [library, *(places[program] for program in PROGRAMS)]}
+    stamp = [hashlib.sha256(path.read_bytes()).hexdigest() for path in [library, *(places[program] for program in PROGRAMS)]]
     learn_all(runner, tests, options.jobs, stamp, directory / "reached.json")
     mutants = {mutant.name: mutant for mutant in mutants_of(directory / "copies")}
     # A test that reaches little is the likeliest to notice what becomes different there.
