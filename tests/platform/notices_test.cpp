@@ -1,5 +1,6 @@
 // The notices on a real bus, a private one, with a real subscriber.
 
+#include <dlfcn.h>
 #include <gmock/gmock.h>
 #include <gtest/gtest.h>
 #include <sys/socket.h>
@@ -16,6 +17,24 @@
 #include "tests/support/fake_platform.h"
 #include "tests/support/private_bus.h"
 #include "tests/support/scratch_directory.h"
+
+namespace tests {
+namespace {
+
+bool isBusLibraryGone = false;
+bool isBusLibraryAskedFor = false;
+
+}  // namespace
+}  // namespace tests
+
+// Stands in the way of the C library's own.
+extern "C" [[gnu::visibility("default")]] void* dlopen(const char* file, int flags) {
+  const bool isBusLibrary = file != nullptr && std::strstr(file, "libsystemd") != nullptr;
+  tests::isBusLibraryAskedFor = tests::isBusLibraryAskedFor || isBusLibrary;
+  if (isBusLibrary && tests::isBusLibraryGone) return nullptr;
+  static const auto kOpen = reinterpret_cast<void* (*)(const char*, int)>(::dlsym(RTLD_NEXT, "dlopen"));
+  return kOpen(file, flags);
+}
 
 namespace tests {
 namespace {
@@ -82,6 +101,16 @@ TEST(Notices, AreLostWithoutABus) {
   EXPECT_NO_THROW(device.cloudTabs->post(true));
   EXPECT_NO_THROW(device.preferencesChanged->post("domain", "key"));
   EXPECT_LT(std::chrono::steady_clock::now() - start, 1s);
+}
+
+// Each test has a process of its own, so nothing has opened the library before.
+TEST(Notices, AreLostWithoutTheBusLibrary) {
+  const PrivateBus bus;
+  isBusLibraryGone = true;
+  const auto device = platform::makeLinuxPlatform();
+  EXPECT_NO_THROW(device.cloudTabs->post(true));
+  EXPECT_NO_THROW(device.preferencesChanged->post("domain", "key"));
+  EXPECT_TRUE(isBusLibraryAskedFor);
 }
 
 TEST(Notices, StartNoProgramInPlaceOfABus) {
