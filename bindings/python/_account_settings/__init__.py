@@ -111,8 +111,9 @@ _PLAIN: dict[str, tuple[Any, ...]] = {
         "", "error_", "account_", "accounts_", "value_", "edit_", "changes_", "watch_")},
 }
 _FAILING: dict[str, tuple[Any, ...]] = {
-    "open_at": (_HANDLE, _TEXT, _TEXT, _TEXT, c_int64, c_uint32, c_void_p, c_void_p), "look": (_HANDLE, _HANDLE), "edit_begin": (_HANDLE, _HANDLE),
-    "trial_begin": (_HANDLE, _HANDLE), "wait_for_migration": (c_bool, _TEXT, c_int64),
+    "open_at": (_HANDLE, _TEXT, _TEXT, _TEXT, c_int64, c_uint32, c_void_p, c_void_p),
+    "look": (_HANDLE, _HANDLE), "edit_begin": (_HANDLE, _HANDLE), "trial_begin": (_HANDLE, _HANDLE),
+    "wait_for_migration": (c_bool, _TEXT, c_int64),
     "will_change": (c_bool, _HANDLE, _HANDLE, _TEXT), "did_change": (c_bool, _HANDLE, _HANDLE, _TEXT),
     "edit_add": (_HANDLE, _HANDLE, _TEXT, _TEXT, _HANDLE, _TEXT), "edit_remove": (c_bool, _HANDLE, _TEXT),
     "edit_set": (c_bool, _HANDLE, _TEXT, _TEXT, _HANDLE), "edit_erase": (c_bool, _HANDLE, _TEXT, _TEXT),

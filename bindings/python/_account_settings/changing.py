@@ -53,7 +53,10 @@ def _keys_of(changes: Any, place: int) -> int:
 
 
 class EditedAccount(Account):
-    """An account in an edit, as it was when it was asked for. Setting and deleting its items changes the edit."""
+    """An account in an edit, as it was when it was asked for. Setting and deleting its items changes the edit.
+
+    It belongs to one thread at a time, the one that uses the edit.
+    """
 
     __hash__ = None  # type: ignore[assignment]
 
@@ -99,7 +102,8 @@ class EditedAccount(Account):
 
 
 class EditedAccounts(Accounts):
-    """The accounts of an edit, with what was changed when they were asked for. What they give changes the edit."""
+    """The accounts of an edit, with what was changed when they were asked for. What they give changes the edit, and
+    belongs to the thread that uses it."""
 
     def __iter__(self) -> Iterator[EditedAccount]:
         return (self._edited(account) for account in super().__iter__())
@@ -189,7 +193,8 @@ class Edit:
         raise TypeError("an edit is no sequence: ask whether an identifier is in edit.accounts")
 
     def add(
-        self, type: str, account_class: str, properties: Mapping[str, Settable] | None = None, *, parent: str | None = None
+        self, type: str, account_class: str, properties: Mapping[str, Settable] | None = None, *,
+        parent: str | None = None,
     ) -> EditedAccount:
         """Adds an account, or a child of the parent. A text under "Identifier" is kept, else one is made."""
         account = attempt(
@@ -203,7 +208,7 @@ class Edit:
         call("edit_rewrite", self._handle)
 
     def save(self) -> list[Change]:
-        """Saves the changes, gives the lock back and tells those who listen. The edit is over then, also if it fails."""
+        """Saves the changes, gives the lock back and tells those who listen. The edit is over then, whatever comes."""
         try:
             saved = handle("changes", attempt("edit_save", self._handle))
         finally:

@@ -27,6 +27,7 @@ class Account(Mapping[str, Property]):
     """An account as it was when it was looked at: a mapping of its own properties. It never changes.
 
     Two are equal where their own properties are. It can be an element of a set and a key of a dictionary.
+    Any thread may read it.
     """
 
     @classmethod
@@ -148,7 +149,7 @@ class Account(Mapping[str, Property]):
 
 class Accounts:
     """The accounts as they were when they were looked at. Iterating gives the top-level accounts, in the file's order;
-    by their identifiers, children are found, too."""
+    by their identifiers, children are found, too. Any thread may read them."""
 
     @classmethod
     def _of(cls, accounts: int | None) -> Accounts:

@@ -39,7 +39,7 @@ def _path(path: str | PathLike[str] | None) -> bytes | None:
 
 
 class AccountSettings:
-    """The accounts of one device.
+    """The accounts of one device. Any thread may call anything at any time.
 
     root: the root of the device's file tree; None for the device that the program runs on.
     time_limit: the seconds for which a migration, or another program's change, is waited for; None for no limit.
