@@ -3,6 +3,7 @@
 import json
 import math
 import os
+from argparse import ArgumentTypeError
 from typing import NamedTuple
 
 from migration_rehearse.campaign import LOSING
@@ -30,8 +31,8 @@ RULES = {
 }
 
 
-class WrongRule(ValueError):
-    """A rule that is none."""
+class WrongRule(ArgumentTypeError):
+    """A rule that is none; the command line tells of it."""
 
 
 class Kind(NamedTuple):
@@ -213,6 +214,13 @@ def broken(comparison, rules):
     """The rules that are broken: each with what breaks it."""
     found = {name: comparison.breaking(name, number) for name, number in rules.items()}
     return {name: breaking for name, breaking in found.items() if breaking.devices}
+
+
+def complaints(comparison, failed):
+    """Why a gate with these broken rules does not pass; nothing where it does."""
+    told = [f"{breaking.devices:,} devices break {name}, such as {breaking.example} ({RULES[name][0]})"
+            for name, breaking in failed.items()]
+    return told if comparison.compared else [*told, "no device was compared, so none can pass"]
 
 
 def write_devices(comparison, rules, path):
