@@ -105,14 +105,23 @@ class Lists(RehearseTest):
         few, many = self.peak_with(200), self.peak_with(10_000)
         self.assertLess((many - few) * 1024 / 9_800, 105)  # bytes an image: less than a list with its path would take
 
+    def test_that_are_devices_with_explanations_need_no_more_memory(self):
+        devices = self.fleet(400)
+        few, many = self.peak_of(devices[:50]), self.peak_of(devices)
+        self.assertLess((many - few) * 1024 / 350, 2048)  # bytes an image: half of what is kept of one in the results
+
     def peak_with(self, count):
         """The program's memory, in KiB, with so many images that are not there."""
+        return self.peak_of(f"/nowhere/{number}" for number in range(count))
+
+    def peak_of(self, images):
         listed = self.scratch / "many"
-        listed.write_text("".join(f"/nowhere/{number}\n" for number in range(count)))
-        running = subprocess.Popen([REHEARSE, "--results", self.scratch / f"{count}.sqlite", "--list", listed],
-                                   stdout=subprocess.DEVNULL)
-        _, _, usage = os.wait4(running.pid, 0)
-        running.returncode = 3
+        listed.write_text("".join(f"{image}\n" for image in images))
+        results = self.scratch / "many.sqlite"
+        results.unlink(missing_ok=True)
+        running = subprocess.Popen([REHEARSE, "--results", results, "--list", listed], stdout=subprocess.DEVNULL)
+        _, status, usage = os.wait4(running.pid, 0)
+        running.returncode = os.waitstatus_to_exitcode(status)
         return usage.ru_maxrss
 
 
@@ -234,7 +243,7 @@ class Hosts(RehearseTest):
 
 class Workers(RehearseTest):
     def test_however_many_come_to_the_same(self):
-        images = [*self.fleet(20), self.damaged("damaged")]
+        images = self.mixed_fleet(20)
         self.rehearse(*images, "--workers", 1, status=3)
         other = self.scratch / "other"
         self.rehearse(*reversed(images), "--workers", 5, status=3, results=other)

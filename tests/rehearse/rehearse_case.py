@@ -3,6 +3,7 @@
 import json
 import os
 import subprocess
+import tarfile
 import zlib
 from pathlib import Path
 
@@ -43,6 +44,18 @@ class RehearseTest(DeviceTest):
         """Devices that all differ, every third of which loses an account."""
         return [self.image(f"device-{number}", [{**KEPT, "Identifier": f"K{number}"}, *([UNFIXABLE] * (number % 3 == 0))],
                            version=number % (CURRENT_VERSION + 1)) for number in range(count)]
+
+    def mixed_fleet(self, count):
+        """The same, a fifth of them archives, and what cannot be rehearsed: a damaged archive, nothing, no device."""
+        images = [root if number % 5 else self.packed(root) for number, root in enumerate(self.fleet(count))]
+        (self.scratch / "empty").mkdir()
+        return [*images, self.damaged("damaged"), self.scratch / "missing", self.scratch / "empty"]
+
+    def packed(self, root):
+        archive = self.scratch / f"{root.name}.tar.gz"
+        with tarfile.open(archive, "w:gz") as writer:
+            writer.add(root, ".")
+        return archive
 
     def rehearse(self, *arguments, status=0, results=None, text=None, **more):
         """Runs the program, which must end with this status; answers what it printed."""
