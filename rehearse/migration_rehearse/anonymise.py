@@ -8,13 +8,13 @@ import plistlib
 import secrets
 import stat
 import tarfile
-import tempfile
 from typing import NamedTuple
 
 from migration_rehearse import host, rehearsal, unpacker, unpacking
 from migration_rehearse.faults import CAUSES, Fault
 from migration_rehearse.footprint import DIRECTORIES, FILES, GROUPS, USERS, read_file, resolved, target_of
 from migration_rehearse.replacing import Replacer
+from migration_rehearse.scratch import Scratch
 from migration_rehearse.vocabulary import FRAGMENTS, KEYS
 
 KEY_SIZE = 32
@@ -58,7 +58,7 @@ def key_of(path):
 def anonymise(image, key, output, program):
     """Writes the archive, and proves it: the host does the same with both, and no word that was replaced is in it.
     Raises CannotAnonymise; then nothing is written."""
-    with tempfile.TemporaryDirectory(prefix="migration-rehearse-", dir=os.path.dirname(os.path.abspath(output))) as scratch:
+    with Scratch(os.path.dirname(os.path.abspath(output))) as scratch:
         replacer = Replacer(key, product_texts(program))
         try:
             root = image if os.path.isdir(image) else unpacker.unpack(image, _made(scratch, "original"))

@@ -10,12 +10,12 @@ import importlib.util
 import itertools
 import pickle
 import queue
-import tempfile
 from collections import deque
 from itertools import islice
 from typing import NamedTuple
 
 from migration_rehearse.pool import Pool, WorkerDied
+from migration_rehearse.scratch import Scratch
 
 DIED = object()
 PACKAGE = __name__.partition(".")[0]
@@ -75,7 +75,7 @@ class LocalEngine(_Engine):
 
     def __init__(self, workers):
         self.workers = workers
-        self._scratch = _temporary_directory()
+        self._scratch = _scratch_for_all()
         self._numbers = itertools.count(1)
         self._given = {}  # by its number
         self._suspect = None  # the number of the task that is alone with a worker
@@ -83,11 +83,10 @@ class LocalEngine(_Engine):
 
     def close(self):
         self._pool.close()
-        if self._scratch:
-            self._scratch.cleanup()
+        self._scratch.cleanup()
 
     def _new_pool(self, workers):
-        return Pool(workers, self._scratch and self._scratch.name)
+        return Pool(workers, self._scratch.name)
 
     def _ahead(self):
         return self.workers * AHEAD
@@ -132,12 +131,12 @@ class LocalEngine(_Engine):
             self._pool.give(given.message)
 
 
-def _temporary_directory():
-    """For all workers, so that it goes whatever becomes of them. Where none can be made, who needs one says so."""
+def _scratch_for_all():
+    """So that it goes whatever becomes of the workers."""
     try:
-        return tempfile.TemporaryDirectory(prefix="migration-rehearse-", ignore_cleanup_errors=True)
-    except OSError:
-        return None
+        return Scratch()
+    except OSError as failure:
+        raise EngineFault(f"{failure.filename}: no temporary directory can be made: {failure.strerror}") from failure
 
 
 class DaskEngine(_Engine):

@@ -14,7 +14,7 @@ WORKERS_A_CORE = 2  # while one waits for a disk, for its archive or for its hos
 STATUSES = """\
 Exit status: 0 nothing is lost, 1 accounts are lost, not saved or not migrated, 2 wrong use, 3 some images could not be
 rehearsed (whatever came of the others), 4 the result file could not be written: what is in it is whole, and the same
-command goes on from there; 5 the host or the scheduler cannot be used, 130 interrupted."""
+command goes on from there; 5 the host, the scheduler or the temporary directory cannot be used, 130 interrupted."""
 DESCRIPTION = """\
 Rehearses a release of the account migration over many device images, none of which is changed.
 

@@ -28,7 +28,7 @@ class WorkerDied(Exception):
 
 class Pool:
     """Workers, none of which is of use when one has died. A task is a message: its number from 1, a function and what that
-    is given, pickled. `scratch` is where they make their temporary directories, None where the system says."""
+    is given, pickled. `scratch` is where they make their temporary directories."""
 
     def __init__(self, workers, scratch):
         self._tasks, theirs = socket.socketpair(socket.AF_UNIX, socket.SOCK_SEQPACKET)
@@ -126,7 +126,7 @@ def end_with(parent):
 def _work(parent, tasks, telling, taken, place, scratch):
     """The whole life of a worker."""
     end_with(parent)
-    tempfile.tempdir = scratch or tempfile.tempdir
+    os.environ["TMPDIR"] = tempfile.tempdir = scratch
     with open(telling, "wb") as answers:
         while message := _message_from(tasks):
             number, function, task = pickle.loads(message)

@@ -7,13 +7,13 @@ import json
 import os
 import platform
 import stat
-import tempfile
 import threading
 import zlib
 from typing import NamedTuple
 
 from migration_rehearse import explained, footprint, host, serving, unpacker, unpacking
 from migration_rehearse.faults import NO_CONTENTS, Fault
+from migration_rehearse.scratch import Scratch
 
 DIRECTORY, ARCHIVE = "directory", "archive"
 ENDED = {0, 1, 6, 7}  # what the host ends with where the plug-in was called
@@ -138,7 +138,7 @@ _kept = threading.local()
 def scratch():
     """Where this thread unpacks archive after archive."""
     if not hasattr(_kept, "scratch"):
-        _kept.scratch = tempfile.TemporaryDirectory(prefix="migration-rehearse-", ignore_cleanup_errors=True)
+        _kept.scratch = Scratch()
     return _kept.scratch.name
 
 

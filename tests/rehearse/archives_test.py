@@ -10,7 +10,7 @@ import zipfile
 from pathlib import Path
 
 from device import PREFERENCES, SETTINGS, Device
-from rehearse_case import KEPT, UNFIXABLE, RehearseTest
+from rehearse_case import KEPT, REHEARSE, UNFIXABLE, RehearseTest
 
 from migration_rehearse import rehearsal, unpacker
 
@@ -226,6 +226,19 @@ class Faults(ArchiveTest):
         self.assertEqual([], list(temporary.iterdir()))
         self.assertEqual({"damaged": ("unrehearsed", "damaged-archive"), "bad": ("unrehearsed", "path-out"),
                           "good": ("kept", ""), "device": ("kept", "")}, self.verdicts())
+
+    def test_of_a_full_temporary_directory_are_rows_and_nothing_is_unpacked_elsewhere(self):
+        archive, volume, here = self.archive(*self.files), self.scratch / "small", self.scratch / "here"
+        volume.mkdir()
+        here.mkdir()
+        flags = ["--mount"] if os.getuid() == 0 else ["--mount", "--user", "--map-root-user"]
+        filled = ('mount -t tmpfs -o size=64k small "$0" && { head -c 64k /dev/zero > "$0/full";'
+                  ' TMPDIR="$0" exec "$@"; }')
+        ended = subprocess.run(["unshare", *flags, "sh", "-c", filled, volume, REHEARSE, "--results", self.file, archive,
+                                self.scratch / "device"], cwd=here, stdout=subprocess.DEVNULL, check=False)
+        self.assertEqual(3, ended.returncode)
+        self.assertEqual({"archive.tar.gz": ("unrehearsed", "unpacking-failed"), "device": ("kept", "")}, self.verdicts())
+        self.assertEqual([], list(here.iterdir()))
 
     def test_of_a_directory(self):
         empty = Device(self.scratch / "x").root.parent / "empty"

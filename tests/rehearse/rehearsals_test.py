@@ -1,5 +1,7 @@
 """Images rehearsed by the program as it is installed: what stands in the results, and how it ends."""
 
+import contextlib
+import fcntl
 import os
 import plistlib
 import pty
@@ -203,15 +205,37 @@ class Again(RehearseTest):
             return 0
 
     def test_leaves_no_worker_when_killed(self):
+        self.kill_at_work()
+
+    def kill_at_work(self, **more):
+        """Ends with no worker left."""
         slow = self.scratch / "slow-host"
-        slow.write_text('#!/bin/sh\nif [ "$1" = --version ]; then echo migration-host 9; else sleep 60; fi\n')
+        slow.write_text('#!/bin/sh\nif [ "$1" = --version ]; then echo migration-host 9; else touch "$0-began"; sleep 60; fi\n')
         slow.chmod(0o755)
         running = subprocess.Popen([REHEARSE, "--results", self.file, "--host", slow, "--plugin", slow,
-                                    self.image("one")], stdout=subprocess.DEVNULL)
-        workers = self.wait_for(lambda: children_of(running.pid))
+                                    self.image("one")], stdout=subprocess.DEVNULL, **more)
+        self.wait_for((self.scratch / "slow-host-began").exists)
+        workers = children_of(running.pid)
         running.send_signal(signal.SIGKILL)
         running.wait()
         self.wait_for(lambda: not any(is_alive(worker) for worker in workers))
+
+    def test_removes_what_a_killed_one_left_and_nothing_else(self):
+        temporary = self.scratch / "temporary"
+        temporary.mkdir()
+        environment = {**os.environ, "TMPDIR": str(temporary)}
+        self.kill_at_work(env=environment)
+        (left,) = temporary.iterdir()
+        others = [temporary / name for name in ("migration-rehearse-longer_than_ours", "migration-rehearse-held_one",
+                                                "another-12345678")]
+        for other in others:
+            other.mkdir()
+        (temporary / "migration-rehearse-linkedto").symlink_to(self.image("two"))
+        with holding(others[1]):
+            self.rehearse(self.image("one"), env=environment)
+        self.assertFalse(left.exists())
+        self.assertEqual({*others, temporary / "migration-rehearse-linkedto"}, set(temporary.iterdir()))
+        self.assertTrue((self.scratch / "two/etc").is_dir())
 
     def wait_for(self, condition):
         deadline = time.monotonic() + 30
@@ -219,6 +243,14 @@ class Again(RehearseTest):
             self.assertLess(time.monotonic(), deadline)
             time.sleep(0.02)
         return answer
+
+
+@contextlib.contextmanager
+def holding(directory):
+    descriptor = os.open(directory, os.O_RDONLY)
+    fcntl.flock(descriptor, fcntl.LOCK_EX)
+    yield
+    os.close(descriptor)
 
 
 def children_of(process):
@@ -284,6 +316,11 @@ class Telling(RehearseTest):
             told = self.rehearse(*arguments, status=2)
             self.assertRegex(told, f"^migration-rehearse: .*{re.escape(message)}")
             self.assertEqual(1, told.count("\n"))
+
+    def test_of_a_temporary_directory_that_cannot_be_used_ends_with_5(self):
+        for wrong in ("/nowhere", "/dev/null"):
+            told = self.rehearse(self.image("one"), status=5, env={**os.environ, "TMPDIR": wrong})
+            self.assertIn(f"{wrong}/migration-rehearse-", told)
 
     def test_of_a_host_that_cannot_be_used_ends_with_5(self):
         self.assertIn("no such program", self.rehearse("--host", "/nowhere", "/", status=5))
