@@ -13,7 +13,7 @@ from typing import NamedTuple
 from migration_rehearse import host, rehearsal, unpacker, unpacking
 from migration_rehearse.faults import CAUSES, Fault
 from migration_rehearse.footprint import DIRECTORIES, FILES, GROUPS, USERS, read_file, resolved, target_of
-from migration_rehearse.replacing import Replacer
+from migration_rehearse.replacing import CannotAnonymise, Replacer
 from migration_rehearse.scratch import Scratch
 from migration_rehearse.vocabulary import FRAGMENTS, KEYS
 
@@ -25,10 +25,6 @@ PLACEHOLDER = b"anonymised"  # where only its being there counts
 SHORTEST_WORD = 6  # that is looked for in the result: a shorter one is found by chance
 EXPLAINED = ("kept", "lost", "not saved", "failed")  # verdicts of a migration that was gone through
 SAME = ("verdict", "cause", "status", "stored_version", "accounts", "counts", "losses", "facts")
-
-
-class CannotAnonymise(Exception):
-    """The archive would not do, so there is none."""
 
 
 class Piece(NamedTuple):

@@ -3,35 +3,56 @@
 A text is replaced word by word, a word being letters and digits in a row, and what stands between the words stays. So two
 texts are equal, or begin with the same words, after they were replaced exactly where they did before; an address
 stays an address, and the name in it the name that stands elsewhere. What the migration looks for in texts stays.
+
+The key shuffles all words of one form among themselves, but for those that mean something to the migration. So words that
+differ stay different, and what a word becomes is decided by the key alone, not by what came before it.
 """
 
 import hashlib
+import math
 import re
-import unicodedata
-from functools import cache
+from bisect import bisect_left
 
+from migration_rehearse import alphabets
+from migration_rehearse.alphabets import Alphabet
+from migration_rehearse.shuffle import Shuffle
 from migration_rehearse.vocabulary import FRAGMENTS, KEYS, READ_KEYS, TEXTS, names_credential
 
 UUID = re.compile(r"\b[0-9A-Fa-f]{8}-(?:[0-9A-Fa-f]{4}-){3}[0-9A-Fa-f]{12}\b")
+UUID_KIND = (14, 19)  # the places of the digits that tell of which kind it is
+HEX_DIGITS, HEX_LETTERS, DIGITS = Alphabet("0123456789ABCDEF"), Alphabet("ABCDEF"), Alphabet("0123456789")
 WORD = re.compile(r"[^\W_]+")
 ESCAPES = re.compile(r"(?:%[0-9A-Fa-f]{2})+")
 READ_TEXT = re.compile(r"\s*(?:[+-]?\d{1,20}|yes|no|true|false)\s*", re.I)
 LEADING_INTEGER = re.compile(r"\s*[+-]?\d+")
 SMALL_INTEGER = 100_000  # ports, counts and switches; what is larger may be somebody's number
-BLOCK = 128  # code points that share a script, and a length in bytes
-TOLD = 4  # characters from which a word that is left would tell something
+RANGES = ((-(1 << 63), -1), (0, (1 << 63) - 1), (1 << 63, (1 << 64) - 1))  # that the numbers of property lists fit into
+RESERVED = TEXTS | KEYS  # of these, words stay, and are what no other becomes
+PIECE = 64  # letters that are shuffled at a time; no reserved word is longer
+
+
+class CannotAnonymise(Exception):
+    """The archive would not do, so there is none."""
 
 
 class Replacer:
-    """Replaces for one key. The texts that are `known` to the product beside its vocabulary stay, too; `words` are those
-    that were replaced and must not be found again."""
+    """Replaces for one key. The texts that are `known` to the product beside its vocabulary stay, too. Raises
+    CannotAnonymise for what nothing else can stand for."""
 
     def __init__(self, key, known=()):
         self._key = hashlib.blake2b(key).digest()
         self.known = TEXTS | frozenset(known)
-        self._made = {}
-        self._taken = set()
-        self.words = set()
+        self._made = {}  # by kind and text
+
+    @property
+    def words(self):
+        """Those that were replaced, and must not be found again."""
+        return {text for _, text in self._made}
+
+    @property
+    def replacements(self):
+        """What stands for them."""
+        return set(self._made.values())
 
     def text(self, text, key=""):
         """The text in place of one that stands under a key."""
@@ -45,22 +66,21 @@ class Replacer:
         return key if key in KEYS else self._replaced(key)
 
     def integer(self, number, key=""):
-        if key in READ_KEYS or (abs(number) < SMALL_INTEGER and not names_credential(key)):
+        if key in READ_KEYS or number == 0 or (abs(number) < SMALL_INTEGER and not names_credential(key)):
             return number
-        digits = self._once("number", str(abs(number)), self._digits)
-        return int(digits) * (-1 if number < 0 else 1)
+        return int(self._once("number", str(number), self._number))
 
     def real(self, number, key=""):
         if key in READ_KEYS or not abs(number) >= SMALL_INTEGER or number in (float("inf"), float("-inf")):
             return number
-        mantissa, _, exponent = repr(abs(number)).partition("e")
-        whole, dot, rest = mantissa.partition(".")
-        replaced = self._digits(whole) + dot + rest + ("e" + exponent if exponent else "")
-        return float(replaced) * (-1 if number < 0 else 1)
+        mantissa, _, exponent = repr(number).partition("e")
+        whole, _, rest = mantissa.partition(".")
+        digits = self._once("number", whole + rest if exponent else whole, self._number)
+        return float(f"{digits[:len(whole)]}.{digits[len(whole):] or rest}e{exponent or 0}")
 
     def data(self, data):
-        stream = hashlib.shake_256(self._key + b"data" + data).digest(len(data))
-        return stream
+        number = self._shuffled(f"data {len(data)}", int.from_bytes(data, "big"), 256 ** len(data))
+        return number.to_bytes(len(data), "big")
 
     def _read_text(self, text):
         if READ_TEXT.fullmatch(text):
@@ -86,73 +106,91 @@ class Replacer:
         return "".join(replaced) + self._plain_words(text[kept:])
 
     def _plain_words(self, text):
-        return WORD.sub(lambda word: self._once("word", word[0], self._word), text)
+        return WORD.sub(lambda word: self._plain_word(word[0]), text)
+
+    def _plain_word(self, word):
+        return word if word in RESERVED else self._once("word", word, self._word)
 
     def _once(self, kind, text, make):
-        """What `make` makes of a text and a number: the first that is no other's, and says nothing of the text."""
         if (kind, text) not in self._made:
-            made = next(each for each in (make(text, attempt) for attempt in range(10_000))
-                        if (kind, each) not in self._taken and _may_replace(kind, each, text))
+            made = make(text)
+            if made == text:
+                raise CannotAnonymise(f"nothing else can stand for a text of {len(text)} characters")
             self._made[kind, text] = made
-            self._taken.add((kind, made))
-            self.words.add(text)
         return self._made[kind, text]
 
-    def _choices(self, kind, text, attempt):
-        """Numbers without end that only the key, the text and the attempt decide."""
-        number = 0
-        while True:
-            seed = f"{kind}\0{attempt}\0{number}\0{text}".encode(errors="surrogatepass")
-            yield from hashlib.blake2b(seed, key=self._key).digest()
-            number += 1
+    def _word(self, word):
+        reserved = [each for each in RESERVED if len(each) == len(word)]
+        return self._spelt("word", word, [alphabets.of_character(character) for character in word], reserved)
 
-    def _word(self, word, attempt):
-        return "".join(_one_like(character, choice)
-                       for character, choice in zip(word, _pairs(self._choices("word", word, attempt))))
-
-    def _secret(self, text, attempt):
+    def _secret(self, text):
         """Of the same length and script; of marks and blanks not even their places are told."""
-        return "".join(_one_like(character if character.isalnum() or ord(character) > 127 else "a", choice)
-                       for character, choice in zip(text, _pairs(self._choices("secret", text, attempt))))
+        return self._spelt("secret", text, [alphabets.of_secret(character) for character in text])
 
-    def _uuid(self, uuid, attempt):
-        choices = self._choices("uuid", uuid.upper(), attempt)
-        digits = "".join("-" if character == "-" else f"{choice % 16:x}" for character, choice in zip(uuid, choices))
-        digits = digits[:14] + uuid[14] + digits[15:19] + uuid[19] + digits[20:]
-        return digits if uuid.lower() == uuid else digits.upper()
+    def _uuid(self, uuid):
+        """In small letters the same as in capitals."""
+        if uuid == uuid.lower():
+            return self._spelt("uuid", uuid.upper(), _uuid_letters(uuid.upper())).lower()
+        return self._spelt("uuid", uuid, _uuid_letters(uuid))
 
-    def _digits(self, digits, attempt=0):
-        choices = self._choices("number", digits, attempt)
-        return "".join(str(choice % 9 + 1 if place == 0 else choice % 10)
-                       for place, (_, choice) in enumerate(zip(digits, choices)))
+    def _number(self, digits):
+        """Of the same length and sign, in the same range."""
+        number, length = int(digits), len(digits.lstrip("-"))
+        ranges = [each for each in RANGES if each[0] <= number <= each[1]]
+        if not ranges:
+            raise CannotAnonymise(f"a number of {length} digits is none of a property list")
+        ends = [10 ** (length - 1), 10 ** length - 1] if number > 0 else [1 - 10 ** length, -(10 ** (length - 1))]
+        least, most = max(ends[0], ranges[0][0]), min(ends[1], ranges[0][1])
+        return str(least + self._shuffled(f"number {least} {most}", number - least, most - least + 1))
+
+    def _spelt(self, kind, text, letters, reserved=()):
+        """Another text, of which each letter is from the alphabet that stands at its place among `letters`."""
+        pieces = [slice(begin, begin + PIECE) for begin in range(0, len(text), PIECE)]
+        return "".join(self._spelt_piece(kind, text[piece], letters[piece], reserved) for piece in pieces)
+
+    def _spelt_piece(self, kind, text, letters, reserved):
+        excluded = sorted(_place(each, letters) for each in reserved
+                          if all(letter in alphabet.places for letter, alphabet in zip(each, letters)))
+        form = " ".join([kind, *(f"{alphabet.characters[0]}{len(alphabet)}" for alphabet in letters)])
+        place, size = _place(text, letters), _size(letters)
+        place = self._shuffled(form, place - bisect_left(excluded, place), size - len(excluded))
+        for each in excluded:
+            place += each <= place
+        return _text(place, letters)
+
+    def _shuffled(self, form, number, size):
+        """Among the numbers below a size, for each form in a way of its own."""
+        key = hashlib.blake2b(form.encode(errors="surrogatepass"), key=self._key).digest()
+        return Shuffle(key, size).other(number) if size > 1 else number
 
 
-def _may_replace(kind, made, text):
-    """Whether it is another text and means nothing to the migration; of a number, whether it fits where that did."""
-    if kind == "number":
-        return made != text and max(int(made).bit_length(), 63) == max(int(text).bit_length(), 63)
-    return (made != text or len(text) < TOLD) and made not in TEXTS
+def _uuid_letters(uuid):
+    """The alphabets of an identifier's digits, of which some stay."""
+    return [Alphabet(digit) if digit == "-" or place in UUID_KIND else HEX_DIGITS if uuid == uuid.upper() else
+            DIGITS if digit.isdigit() else HEX_LETTERS if digit.isupper() else Alphabet("abcdef")
+            for place, digit in enumerate(uuid)]
 
 
-def _pairs(choices):
-    return ((high << 8) + low for high, low in zip(choices, choices))
+def _size(letters):
+    """How many texts there are of letters from these alphabets."""
+    return math.prod(map(len, letters))
 
 
-def _one_like(character, choice):
-    alike = _alike(character)
-    return alike[choice % len(alike)]
+def _place(text, letters):
+    """The number of a text among them."""
+    place = 0
+    for letter, alphabet in zip(text, letters):
+        place = place * len(alphabet) + alphabet.places[letter]
+    return place
 
 
-@cache
-def _alike(character):
-    """The characters of the same kind, script and length; the character alone where there is no other."""
-    category = unicodedata.category(character)
-    begin = ord(character) // BLOCK * BLOCK
-    found = [chr(code) for code in range(begin, begin + BLOCK)
-             if unicodedata.category(chr(code)) == category
-             and len(chr(code).encode(errors="surrogatepass")) == len(character.encode(errors="surrogatepass"))
-             and unicodedata.normalize("NFC", chr(code)) == chr(code)]
-    return found if character in found and category[0] in "LN" else [character]
+def _text(place, letters):
+    """The text of this number."""
+    text = []
+    for alphabet in reversed(letters):
+        place, letter = divmod(place, len(alphabet))
+        text.append(alphabet.characters[letter])
+    return "".join(reversed(text))
 
 
 def _unescaped(text):

@@ -10,9 +10,9 @@ import unittest
 
 from device import EXAMPLES, LEGACY_EXCHANGE, LEGACY_MAIL, PREFERENCES, SETTINGS, Device
 from device_case import HOST
-from migration_rehearse import anonymise, host
+from migration_rehearse import alphabets, anonymise, host
 from migration_rehearse.replacing import Replacer
-from migration_rehearse.vocabulary import CLASSES, DATACLASSES, KEYS, TYPES
+from migration_rehearse.vocabulary import CLASSES, DATACLASSES, KEYS, TEXTS, TYPES
 from random_devices import RandomDevice
 from rehearse_case import REHEARSE, RehearseTest
 
@@ -141,9 +141,11 @@ class Words(unittest.TestCase):
     def test_of_secrets_are_replaced_whole_and_no_secret_stays_none(self):
         replacer = Replacer(KEY)
         secret, again, empty = (replacer.text(text, "Password") for text in ("sword-fish 7", "sword-fish 7", ""))
-        self.assertEqual((secret, ""), (again, empty))
-        self.assertRegex(secret, r"^\w{12}$")
+        self.assertEqual((secret, "", 12), (again, empty, len(secret)))
         self.assertNotIn("sword", secret)
+        printable = [chr(code) for code in range(0x20, 0x7F)]
+        replaced = [replacer.text(each, "Password") for each in printable]  # of any kind by any
+        self.assertEqual((printable, []), (sorted(replaced), [each for each in zip(printable, replaced) if len(set(each)) < 2]))
 
     def test_are_others_under_another_key(self):
         self.assertNotEqual(self.replaced("Jane Smithson"), self.replaced("Jane Smithson", key=b"another key of a campaign"))
@@ -156,9 +158,33 @@ class Words(unittest.TestCase):
             self.assertEqual([(character.isupper(), character.isalpha()) for character in text],
                              [(character.isupper(), character.isalpha()) for character in made])
 
-    def test_that_differ_stay_different(self):
-        words = [first + second for first in "abcdefghijklmnopqrstuvwxyz" for second in "abcdefghijklmnopqrstuvwxyz"]
-        self.assertEqual(len(words), len(set(self.replaced(*words))))
+    def test_that_differ_stay_different_and_become_the_same_in_any_order(self):
+        letters = [first + second for first in "abcdefghijklmnopqrstuvwxyz" for second in "abcdefghijklmnopqrstuvwxyz"]
+        for words in (letters, [str(number) for number in range(10, 100)], list("ÀÁÂÃÄÅ"), ["x" * 200, "x" * 199 + "y"]):
+            replaced = self.replaced(*words)
+            self.assertEqual(len(words), len(set(replaced)))
+            self.assertEqual(replaced, list(reversed(self.replaced(*reversed(words)))))
+            self.assertFalse([word for word, other in zip(words, replaced) if word == other])
+
+    def test_that_few_are_like_are_replaced_too(self):
+        for text in ("ـ" * 5, "\ufa19" * 2, "\ufa19" * 5, "ªº", "ǅǈ", "𞥋a", "Ⅻ٢²"):
+            made, = self.replaced(text)
+            self.assertNotEqual(text, made)
+            self.assertEqual([len(text.encode(code)) for code in ("utf-8", "utf-16-be")],
+                             [len(made.encode(code)) for code in ("utf-8", "utf-16-be")])
+
+    def test_that_nothing_can_stand_for_are_refused(self):
+        with self.assertRaises(anonymise.CannotAnonymise):
+            self.replaced("𞥋")
+
+    def test_of_the_migration_stay_and_nothing_else_becomes_one(self):
+        replacer = Replacer(KEY)
+        reserved = sorted(word for word in TEXTS | KEYS if len(word) == 4 and word.isalpha())
+        self.assertEqual([f"{word} Jr" for word in reserved], [replacer.text(f"{word} Jr")[:4] + " Jr" for word in reserved])
+        letters = [alphabets.of_character(letter) for letter in "Port"]
+        for number in range(2000):
+            self.assertNotIn(replacer.text("P" + "".join(letters[1].characters[number // 13 ** place % 13]
+                                                         for place in range(3))), reserved)
 
     def test_that_are_read_as_numbers_say_the_same(self):
         replacer = Replacer(KEY)
@@ -169,10 +195,13 @@ class Words(unittest.TestCase):
 
     def test_of_digits_fit_where_the_number_did(self):
         replacer = Replacer(KEY)
-        for number in (123456, 1 << 62, (1 << 63) - 1, 1 << 63, (1 << 64) - 1, -(1 << 63)):
+        for number in (123456, 1 << 62, (1 << 63) - 1, 1 << 63, (1 << 64) - 1, -123456, -(1 << 63)):
             made = replacer.integer(number)
-            self.assertEqual((max(number.bit_length(), 63), number < 0), (max(made.bit_length(), 63), made < 0))
+            self.assertEqual((number >= 1 << 63, number < 0), (made >= 1 << 63, made < 0))
             self.assertEqual(len(str(number)), len(str(made)))
+            self.assertNotEqual(number, made)
+            for form in (plistlib.FMT_XML, plistlib.FMT_BINARY):
+                self.assertEqual(made, plistlib.loads(plistlib.dumps(made, fmt=form)))
 
     def test_of_the_migration_are_all_known(self):
         types = plistlib.loads((RESOURCES / "AccountTypesProperties.plist").read_bytes())
