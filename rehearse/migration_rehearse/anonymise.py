@@ -1,6 +1,7 @@
 """An archive of what a run reads of a device, for sharing: names, addresses, hosts, identifiers and secrets are replaced,
 and whatever the migration looks at stays, so that it does with the archive what it does with the device."""
 
+import contextlib
 import datetime
 import io
 import os
@@ -13,7 +14,7 @@ from typing import NamedTuple
 from migration_rehearse import host, rehearsal, unpacker, unpacking
 from migration_rehearse.faults import CAUSES, Fault
 from migration_rehearse.footprint import DIRECTORIES, FILES, GROUPS, USERS, read_file, resolved, target_of
-from migration_rehearse.replacing import CannotAnonymise, Replacer
+from migration_rehearse.replacing import CannotAnonymise, Replacer, words_of
 from migration_rehearse.scratch import Scratch
 from migration_rehearse.vocabulary import FRAGMENTS, KEYS
 
@@ -22,7 +23,8 @@ SHORTEST_KEY = 16
 DEVICE_INFO = "etc/vorlix/device-info.plist"
 LISTS = tuple(path for path in FILES if path.endswith(".plist") and "CrashReporter" not in path)
 PLACEHOLDER = b"anonymised"  # where only its being there counts
-SHORTEST_WORD = 6  # that is looked for in the result: a shorter one is found by chance
+SHORTEST_WORD = 6  # that is looked for in any part of the result: a shorter one is found by chance
+SHORTEST_NAME = 4  # that is looked for among its words
 EXPLAINED = ("kept", "lost", "not saved", "failed")  # verdicts of a migration that was gone through
 SAME = ("verdict", "cause", "status", "stored_version", "accounts", "counts", "losses", "facts")
 
@@ -164,13 +166,35 @@ def write(pieces, path):
 
 
 def check_words(pieces, replacer):
-    """That no word that was replaced stands in any file, in whatever way a property list writes it."""
+    """That no word that was replaced stands in any file, in whatever way a property list writes it; nor a shorter name as a
+    word of its own, but where it stands for another."""
     known = " ".join((*replacer.known, *KEYS, FRAGMENTS.pattern.replace("\\", ""), PLACEHOLDER.decode())).lower()
     content = b"\n".join(piece.content or b"" for piece in pieces)
-    for word in replacer.words:
+    words = replacer.words
+    names = {word for word in words if len(word) >= SHORTEST_NAME and word.isalpha() and word.lower() not in known}
+    if names & names_in(pieces) - replacer.replacements:
+        raise CannotAnonymise("a name that was to be replaced is still in it")
+    for word in words:
         if len(word) >= SHORTEST_WORD and word.lower() not in known and any(
                 form in content for form in (word.encode(errors="replace"), word.encode("utf-16-be", errors="replace"))):
             raise CannotAnonymise("a text that was to be replaced is still in it")
+
+
+def names_in(pieces):
+    """All words of all texts in the property lists."""
+    texts = []
+    for piece in pieces:
+        with contextlib.suppress(Exception):  # what cannot be read is none of the device's any more
+            texts += texts_in(plistlib.loads(piece.content or b""))
+    return {word for text in texts for word in words_of(text)}
+
+
+def texts_in(value):
+    if isinstance(value, dict):
+        return [text for pair in value.items() for each in pair for text in texts_in(each)]
+    if isinstance(value, list):
+        return [text for each in value for text in texts_in(each)]
+    return [value] if isinstance(value, str) else []
 
 
 def check_facts(image, archive, program):

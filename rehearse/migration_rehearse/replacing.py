@@ -193,6 +193,11 @@ def _text(place, letters):
     return "".join(reversed(text))
 
 
+def words_of(text):
+    """The words of which a text consists that are not an identifier's."""
+    return WORD.findall(UUID.sub("", _unescaped(text)[0]))
+
+
 def _unescaped(text):
     """A text with its percent escapes read, and which of its characters were escaped how: in capitals or not."""
     plain, escaped = "", {}

@@ -2,6 +2,7 @@
 
 ANONYMISED_DEVICES says of how many random devices that is tried (default: a few)."""
 
+import contextlib
 import os
 import plistlib
 import shutil
@@ -86,6 +87,14 @@ class Devices(RehearseTest):
         whole = plistlib.dumps({"DAAccountsKey": [{"DAAccountDescription": "Jane Smithson"}]}, fmt=plistlib.FMT_BINARY)
         Device(root).write(LEGACY_EXCHANGE, whole[:-20])
         self.assertNotIn(b"Smithson", b"".join(self.anonymised(root).values()))
+
+    def test_with_a_name_left_in_them_are_not_made(self):
+        replacer = Replacer(KEY)
+        jane, other = replacer.text("Jane"), replacer.text("ann-jane@x.example")
+        for text, is_left in ((jane, False), (other, False), ("Jane", True), ("of Jane, too", True), ("J%61ne", True)):
+            pieces = [anonymise.Piece(SETTINGS, 0o644, plistlib.dumps({"Accounts": [{"DisplayName": text}]}))]
+            with self.assertRaises(anonymise.CannotAnonymise) if is_left else contextlib.nullcontext():
+                anonymise.check_words(pieces, replacer)
 
     def test_of_which_the_host_tells_nothing_are_not_made(self):
         root = self.image("device", [PERSON])
