@@ -158,7 +158,7 @@ Value::Dictionary Account::ownProperties() const {
 
 Accounts::Accounts(std::shared_ptr<const Content> content) : _content{std::move(content)} {}
 
-const std::vector<Account>& Accounts::all() const { return content().topLevel(); }
+const std::vector<Account>& Accounts::all() const& { return content().topLevel(); }
 
 std::uint64_t Accounts::dataVersion() const { return content().store->dataVersion(); }
 std::size_t Accounts::unreadable() const { return content().store->loadOutcome().leftOut.size(); }

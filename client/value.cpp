@@ -40,8 +40,11 @@ Value::Value(std::string_view text) : _content{holding(text)} {}
 Value::Value(const std::string& text) : _content{holding(text)} {}
 Value::Value(bool boolean) : _content{holding(boolean)} {}
 Value::Value(int integer) : _content{holding(integer)} {}
-Value::Value(std::int64_t integer) : _content{holding(integer)} {}
-Value::Value(std::uint64_t integer) : _content{holding(integer)} {}
+Value::Value(unsigned integer) : _content{holding(std::uint64_t{integer})} {}
+Value::Value(long integer) : _content{holding(std::int64_t{integer})} {}
+Value::Value(unsigned long integer) : _content{holding(std::uint64_t{integer})} {}
+Value::Value(long long integer) : _content{holding(std::int64_t{integer})} {}
+Value::Value(unsigned long long integer) : _content{holding(std::uint64_t{integer})} {}
 Value::Value(double real) : _content{holding(real)} {}
 Value::Value(Date date) : _content{holding(platform::Date{date.secondsSince2001})} {}
 Value::Value(Data data) : _content{holding(std::move(data))} {}

@@ -76,7 +76,7 @@ TEST_F(ChangingAccounts, GivesANewAccountAnIdentifierOfItsOwn) {
   std::string identifier;
   ASSERT_TRUE(opened()
                   .change([&](Edit& edit) {
-                    identifier = edit.add({"LDAP", "LDAPAccount", {}, ""})->identifier();
+                    identifier = edit.add({"LDAP", "LDAPAccount", {}, ""}).value().identifier();
                     return true;
                   })
                   .isOk());

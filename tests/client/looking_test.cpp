@@ -8,6 +8,11 @@ using accounts::Value;
 using testing::ElementsAre;
 using testing::Optional;
 
+template <typename Result>
+concept HasArrow = requires(Result&& result) { std::forward<Result>(result).operator->(); };
+template <typename List>
+concept HasIterators = requires(List&& list) { std::forward<List>(list).begin(); };
+
 class LookingAtAccounts : public DeviceWithAccounts {
  protected:
   static std::vector<std::string> identifiersOf(const std::vector<Account>& accounts) {
@@ -83,6 +88,20 @@ TEST_F(LookingAtAccounts, AsksNoModuleOfAnotherDeviceForAService) {
   EXPECT_FALSE(looked().withIdentifier("M1")->service().has_value());
 }
 
+TEST_F(LookingAtAccounts, OutlivesTheUnnamedResultThatItCameIn) {
+  const auto settings = opened();
+  std::vector<std::string> seen;
+  for (const Account& each : *settings.accounts()) seen.push_back(each.identifier());
+  for (const Account& each : settings.accounts().value().all()) seen.push_back(each.identifier());
+  for (const Account& each : looked().all()) seen.push_back(each.identifier());
+  EXPECT_THAT(seen, ElementsAre("M1", "V1", "M1", "V1", "M1", "V1"));
+  using Looked = accounts::Result<accounts::Accounts>;
+  static_assert(std::is_same_v<decltype(*std::declval<Looked>()), accounts::Accounts>);
+  static_assert(std::is_same_v<decltype(std::declval<Looked>().error()), accounts::Error>);
+  static_assert(HasArrow<Looked&> && !HasArrow<Looked>);
+  static_assert(HasIterators<accounts::Accounts&> && !HasIterators<accounts::Accounts>);
+}
+
 TEST_F(LookingAtAccounts, KeepsWhatWasSeenWhateverBecomesOfTheFile) {
   std::optional<Account> child;
   {
@@ -119,6 +138,7 @@ TEST_F(LookingAtAccounts, CarriesEveryKindOfValue) {
   EXPECT_EQ(read[7].second.kind(), Value::Kind::other);
   EXPECT_EQ(read[7].second.reference()->number, 7U);
   EXPECT_NE(Value{1}, Value{1.0});
+  for (const Value& one : {Value{1U}, Value{1L}, Value{1UL}, Value{1LL}, Value{1ULL}}) EXPECT_EQ(one, Value{1});
 }
 
 }  // namespace

@@ -90,7 +90,7 @@ TEST_F(OpeningAccountSettings, ShowsTheAccountsOfAnotherReleaseWhereItMayButChan
   for (const auto& [version, code] : {std::pair{11, Code::notMigrated}, {13, Code::newer}}) {
     putAccounts(kAccounts, version);
     const AccountSettings settings = opened(may);
-    EXPECT_EQ(settings.accounts()->dataVersion(), static_cast<std::uint64_t>(version));
+    EXPECT_EQ(settings.accounts().value().dataVersion(), static_cast<std::uint64_t>(version));
     EXPECT_EQ(codeOf(settings.edit()), code);
     EXPECT_EQ(codeOf(settings.trial()), code);
   }
@@ -100,7 +100,7 @@ TEST_F(OpeningAccountSettings, WaitsForNoMigrationWhereItMayBeOne) {
   const int lock = heldLock();
   auto may = options();
   may.mayBeMigrating = true;
-  EXPECT_EQ(opened(may).accounts()->size(), 2U);
+  EXPECT_EQ(opened(may).accounts().value().size(), 2U);
   EXPECT_EQ(codeOf(AccountSettings::waitForMigration(may)), Code::busy);
   ::close(lock);
   EXPECT_TRUE(AccountSettings::waitForMigration(may).isOk());
@@ -109,7 +109,7 @@ TEST_F(OpeningAccountSettings, WaitsForNoMigrationWhereItMayBeOne) {
 TEST_F(OpeningAccountSettings, LooksAtTheFileAsItIsByThen) {
   const AccountSettings settings = opened();
   replaceAccounts(account("A"));
-  EXPECT_TRUE(settings.accounts()->withIdentifier("A").has_value());
+  EXPECT_TRUE(settings.accounts().value().withIdentifier("A").has_value());
 }
 
 TEST_F(OpeningAccountSettings, GivesAMigrationNoMoreThanTheTimeLimit) {

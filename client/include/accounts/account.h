@@ -72,10 +72,13 @@ class ACCOUNTS_API Account {
 // The accounts of a device as they were when they were looked at. Like an account, it is a value.
 class ACCOUNTS_API Accounts {
  public:
-  // The top-level accounts, in the file's order.
-  [[nodiscard]] const std::vector<Account>& all() const;
-  [[nodiscard]] std::vector<Account>::const_iterator begin() const { return all().begin(); }
-  [[nodiscard]] std::vector<Account>::const_iterator end() const { return all().end(); }
+  // The top-level accounts, in the file's order. Those of a list without a name are copied, and it has no iterators.
+  [[nodiscard]] const std::vector<Account>& all() const&;
+  [[nodiscard]] std::vector<Account> all() && { return all(); }
+  [[nodiscard]] std::vector<Account>::const_iterator begin() const& { return all().begin(); }
+  [[nodiscard]] std::vector<Account>::const_iterator end() const& { return all().end(); }
+  std::vector<Account>::const_iterator begin() && = delete;
+  std::vector<Account>::const_iterator end() && = delete;
   [[nodiscard]] std::size_t size() const { return all().size(); }
   [[nodiscard]] bool empty() const { return all().empty(); }
   // The data version of the file; 0 where there is none.

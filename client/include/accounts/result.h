@@ -41,7 +41,8 @@ struct Error {
   std::string sentence;  // for people, in English, without a full stop
 };
 
-// A value, or the error that stands in its place.
+// A value, or the error that stands in its place. One thread at a time uses it, or several that only read; so with the
+// error in it.
 template <typename Value>
 class [[nodiscard]] Result {
  public:
@@ -53,16 +54,21 @@ class [[nodiscard]] Result {
   [[nodiscard]] bool isOk() const noexcept { return _outcome.index() == 0; }
   explicit operator bool() const noexcept { return isOk(); }
 
-  // Only where there is one; asking for the other ends the program.
+  // Only where there is one; asking for the other ends the program. A result that has no name gives away what it holds,
+  // so a loop over it, or over a part of it, goes over what lives as long as the loop.
   [[nodiscard]] const Value& value() const& noexcept { return std::get<0>(_outcome); }
   [[nodiscard]] Value& value() & noexcept { return std::get<0>(_outcome); }
-  [[nodiscard]] Value&& value() && noexcept { return std::get<0>(std::move(_outcome)); }
-  [[nodiscard]] const Error& error() const noexcept { return std::get<1>(_outcome); }
+  [[nodiscard]] Value value() && noexcept { return std::get<0>(std::move(_outcome)); }
+  [[nodiscard]] const Error& error() const& noexcept { return std::get<1>(_outcome); }
+  [[nodiscard]] Error error() && noexcept { return std::get<1>(std::move(_outcome)); }
 
-  // As `value`.
-  const Value& operator*() const noexcept { return value(); }
-  const Value* operator->() const noexcept { return &value(); }
-  Value* operator->() noexcept { return &value(); }
+  // As `value`. An arrow would lead into a result that is gone at the end of its line, so that one has none.
+  const Value& operator*() const& noexcept { return value(); }
+  Value& operator*() & noexcept { return value(); }
+  Value operator*() && noexcept { return std::move(*this).value(); }
+  const Value* operator->() const& noexcept { return &value(); }
+  Value* operator->() & noexcept { return &value(); }
+  Value* operator->() && = delete;
 
  private:
   std::variant<Value, Error> _outcome;

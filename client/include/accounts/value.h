@@ -41,8 +41,11 @@ class ACCOUNTS_API Value {
   Value(const std::string& text);
   Value(bool boolean);
   Value(int integer);
-  Value(std::int64_t integer);
-  Value(std::uint64_t integer);
+  Value(unsigned integer);
+  Value(long integer);
+  Value(unsigned long integer);
+  Value(long long integer);
+  Value(unsigned long long integer);
   Value(double real);
   Value(Date date);
   Value(Data data);
