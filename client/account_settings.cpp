@@ -83,7 +83,7 @@ Outcome AccountSettings::didChange(const Account& account, std::string_view data
 Result<Saved> AccountSettings::change(const std::function<bool(Edit&)>& function) const {
   Result<Edit> edit = this->edit();
   if (!edit.isOk()) return edit.error();
-  if (!function(edit.value())) return Error{Code::cancelled, "the change was given up"};
+  if (!function(edit.value())) return edit->failure().value_or(Error{Code::cancelled, "the change was given up"});
   return edit.value().save();
 }
 

@@ -6,6 +6,7 @@
 
 #include "client/changes.h"
 #include "client/changing_thread.h"
+#include "client/target.h"
 
 namespace accounts {
 namespace {
@@ -40,52 +41,10 @@ Records recordsOf(const AccountsManager& store) {
   return records;
 }
 
-// The account of an identifier: a top-level record, or the place of a child's properties in its record.
-struct Target {
-  Record record;
-  std::optional<std::size_t> child;
-};
-
-Target targetIn(const AccountsManager& store, std::string_view identifier) {
-  Record record = store.accountWithIdentifier(identifier);
-  if (record == nullptr || record->identifier() == Text{identifier}) return {std::move(record), std::nullopt};
-  const auto* const children = std::as_const(*record).properties().array(kAccountChildAccounts);
-  for (std::size_t place = children == nullptr ? 0 : children->size(); place > 0; --place) {
-    const Dictionary* const child = (*children)[place - 1].asDictionary();
-    const Text* const own = child == nullptr ? nullptr : child->text(kAccountIdentifier);
-    if (own != nullptr && *own == identifier) return {std::move(record), place - 1};
-  }
-  return {};
-}
-
-Record recordOf(const Target& target) {
-  const Dictionary& own = std::as_const(*target.record).properties();
-  if (!target.child) return BasicAccount::initWithProperties(own);
-  Record child = BasicAccount::initWithProperties(*(*own.array(kAccountChildAccounts))[*target.child].asDictionary());
-  if (child != nullptr) child->setParentAccount(BasicAccount::initWithProperties(own));
-  return child;
-}
-
 // Null where there is no such account, or it could not be loaded as it was changed.
 Record copyIn(const AccountsManager& store, std::string_view identifier) {
   const Target target = targetIn(store, identifier);
   return target.record == nullptr ? nullptr : recordOf(target);
-}
-
-void put(AccountsManager& store, const Target& target, Dictionary properties) {
-  if (!target.child) {
-    target.record->properties() = std::move(properties);
-    return;
-  }
-  platform::Array children = *std::as_const(*target.record).properties().array(kAccountChildAccounts);
-  children[*target.child] = std::move(properties);
-  target.record->setAccountProperty_forKey(std::move(children), kAccountChildAccounts);
-  store._loadChildrenFromAccount(target.record);
-}
-
-Dictionary propertiesOf(const Target& target) {
-  const Dictionary& own = std::as_const(*target.record).properties();
-  return target.child ? *(*own.array(kAccountChildAccounts))[*target.child].asDictionary() : own;
 }
 
 // The store takes out one record at a time, and several may have the identifier.
@@ -179,6 +138,7 @@ struct Edit::Content {
   std::optional<HeldLocks> locks = std::nullopt;
   bool isOver = false;
   bool rewrites = false;
+  std::optional<Error> failure = std::nullopt;
   FileIdentity file = {};
   Store store = nullptr;
   Records before = {};
@@ -257,18 +217,41 @@ struct Edit::Content {
     thread.reset();
   }
 
+  // What the step answers; the first that fails is kept.
+  template <typename Step>
+  auto run(const Step& step) -> decltype(step()) {
+    if (isOver) return finished();
+    auto answer = answerOf([&] {
+      const Within within{*device};
+      return step();
+    });
+    if (!answer.isOk() && !failure) failure = answer.error();
+    return answer;
+  }
+
   // Changes the properties of one account by the function, which answers them.
   template <typename Function>
   Outcome alter(std::string_view identifier, const Function& altered) {
-    if (isOver) return finished();
-    return answerOf([&]() -> Outcome {
-      const Within within{*device};
+    return run([&]() -> Outcome {
       const Target target = targetIn(*store, identifier);
       if (target.record == nullptr) return unknownAccount(identifier);
       Result<Dictionary> properties = altered(target);
       if (!properties.isOk()) return properties.error();
       put(*store, target, std::move(properties).value());
       return done();
+    });
+  }
+
+  // Changes what the key says of an account by the function, which is given all its properties.
+  template <typename Function>
+  Outcome alterAt(std::string_view key, std::string_view identifier, const Function& altered) {
+    return alter(identifier, [&](const Target& target) -> Result<Dictionary> {
+      if (key == kAccountIdentifier || key == kAccountChildAccounts) {
+        return Error{Code::unsuitable, std::string{key} + " cannot be changed"};
+      }
+      Dictionary properties = propertiesOf(target);
+      altered(properties);
+      return properties;
     });
   }
 
@@ -298,6 +281,7 @@ Result<Edit> beginEdit(std::shared_ptr<const Device> device, Manner manner) {
 
 std::vector<Account> Edit::accounts() const {
   std::vector<Account> accounts;
+  if (_content == nullptr) return accounts;
   const Within within{*_content->device};
   for (const Dictionary& properties : recordsOf(*_content->store)) {
     if (Record record = BasicAccount::initWithProperties(properties)) {
@@ -308,15 +292,15 @@ std::vector<Account> Edit::accounts() const {
 }
 
 std::optional<Account> Edit::account(std::string_view identifier) const {
+  if (_content == nullptr) return std::nullopt;
   const Within within{*_content->device};
   Record record = copyIn(*_content->store, identifier);
   return record == nullptr ? std::nullopt : std::optional{accountOf(_content->device, std::move(record))};
 }
 
 Result<Account> Edit::add(const NewAccount& account) {
-  if (_content->isOver) return finished();
-  return answerOf([&]() -> Result<Account> {
-    const Within within{*_content->device};
+  if (_content == nullptr) return finished();
+  return _content->run([&]() -> Result<Account> {
     Dictionary properties;
     if (!account.type.empty()) properties.set(accountsettings::kAccountType, account.type);
     if (!account.accountClass.empty()) properties.set(accountsettings::kAccountClass, account.accountClass);
@@ -335,9 +319,8 @@ Result<Account> Edit::add(const NewAccount& account) {
 }
 
 Outcome Edit::remove(std::string_view identifier) {
-  if (_content->isOver) return finished();
-  return answerOf([&]() -> Outcome {
-    const Within within{*_content->device};
+  if (_content == nullptr) return finished();
+  return _content->run([&]() -> Outcome {
     const Target target = targetIn(*_content->store, identifier);
     if (target.record == nullptr) return unknownAccount(identifier);
     if (target.child) {
@@ -349,33 +332,19 @@ Outcome Edit::remove(std::string_view identifier) {
   });
 }
 
-namespace {
-
-bool isKept(std::string_view key) { return key == kAccountIdentifier || key == kAccountChildAccounts; }
-
-Outcome keptKey(std::string_view key) { return failed(Code::unsuitable, std::string{key} + " cannot be changed"); }
-
-}  // namespace
-
 Outcome Edit::set(std::string_view identifier, std::string_view key, const Value& value) {
-  if (isKept(key)) return keptKey(key);
-  return _content->alter(identifier, [&](const Target& target) -> Result<Dictionary> {
-    Dictionary properties = propertiesOf(target);
-    properties.set(key, value.content().value);
-    return properties;
-  });
+  if (_content == nullptr) return finished();
+  return _content->alterAt(key, identifier,
+                           [&](Dictionary& properties) { properties.set(key, value.content().value); });
 }
 
 Outcome Edit::erase(std::string_view identifier, std::string_view key) {
-  if (isKept(key)) return keptKey(key);
-  return _content->alter(identifier, [&](const Target& target) -> Result<Dictionary> {
-    Dictionary properties = propertiesOf(target);
-    properties.remove(key);
-    return properties;
-  });
+  if (_content == nullptr) return finished();
+  return _content->alterAt(key, identifier, [&](Dictionary& properties) { properties.remove(key); });
 }
 
 Outcome Edit::setEnabled(std::string_view identifier, std::string_view dataclass, bool enabled) {
+  if (_content == nullptr) return finished();
   return _content->alter(identifier, [&](const Target& target) -> Result<Dictionary> {
     const Record record = recordOf(target);
     const auto& supported = record == nullptr ? BasicAccount::Dataclasses{} : record->supportedDataclasses();
@@ -387,10 +356,14 @@ Outcome Edit::setEnabled(std::string_view identifier, std::string_view dataclass
   });
 }
 
-void Edit::rewrite() { _content->rewrites = true; }
+std::optional<Error> Edit::failure() const { return _content == nullptr ? std::nullopt : _content->failure; }
+
+void Edit::rewrite() {
+  if (_content != nullptr) _content->rewrites = true;
+}
 
 Result<Saved> Edit::save() {
-  if (_content->isOver) return finished();
+  if (_content == nullptr || _content->isOver) return finished();
   Result<Saved> saved = answerOf([this] { return _content->write(); });
   _content->letGo();
   const bool isWritten = saved && (_content->rewrites || !saved->changes.empty());

@@ -31,13 +31,11 @@ int main(int count, char** arguments) {
   const auto settings = accounts::AccountSettings::open(options);
   if (!settings) return fail(settings.error());
   if (count == 4) {
-    accounts::Outcome switched = std::monostate{};
     const auto saved = settings->change([&](accounts::Edit& edit) {
       const auto account = edit.account(arguments[2]);
-      switched = edit.setEnabled(arguments[2], arguments[3], account && !account->isEnabled(arguments[3]));
-      return switched.isOk();
+      return edit.setEnabled(arguments[2], arguments[3], account && !account->isEnabled(arguments[3])).isOk();
     });
-    if (!saved) return fail(switched ? saved.error() : switched.error());
+    if (!saved) return fail(saved.error());
   }
   const auto accounts = settings->accounts();
   if (!accounts) return fail(accounts.error());

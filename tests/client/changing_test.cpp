@@ -166,6 +166,34 @@ TEST_F(ChangingAccounts, SaysWhichSingleStepCannotBeDone) {
   EXPECT_EQ(codeOf(edit->add({"CalDAV", "A", {}, "C1"})), Code::unsuitable);
 }
 
+TEST_F(ChangingAccounts, AnswersTheFirstStepThatFailedWhereItIsGivenUp) {
+  const auto saved = opened().change([](Edit& edit) {
+    static_cast<void>(edit.set("M1", "Port", 1));
+    static_cast<void>(edit.add({"No such type", "A", {}, ""}));
+    return edit.remove("X").isOk();
+  });
+  EXPECT_EQ(codeOf(saved), Code::wouldBeDropped);
+  EXPECT_THAT(saved.error().sentence, testing::HasSubstr("No such type"));
+  auto edit = opened().edit();
+  EXPECT_EQ(edit->failure(), std::nullopt);
+  EXPECT_EQ(codeOf(edit->erase("V1", "Identifier")), Code::unsuitable);
+  EXPECT_EQ(edit->failure()->code, Code::unsuitable);
+}
+
+TEST_F(ChangingAccounts, IsOverOnceItWasMovedFrom) {
+  auto from = std::move(opened().edit()).value();
+  const auto to = std::move(from);
+  EXPECT_EQ(codeOf(from.set("M1", "Port", 1)), Code::finished);
+  EXPECT_EQ(codeOf(from.add({"LDAP", "A", {}, ""})), Code::finished);
+  EXPECT_EQ(codeOf(from.remove("M1")), Code::finished);
+  EXPECT_EQ(codeOf(from.save()), Code::finished);
+  from.rewrite();
+  EXPECT_THAT(from.accounts(), ElementsAre());
+  EXPECT_FALSE(from.account("M1").has_value());
+  EXPECT_FALSE(from.failure().has_value());
+  EXPECT_EQ(to.accounts().size(), 2U);
+}
+
 TEST_F(ChangingAccounts, IsOverOnceItIsSaved) {
   auto edit = opened().edit();
   ASSERT_TRUE(edit->save().isOk());

@@ -58,8 +58,9 @@ class ACCOUNTS_API AccountSettings {
   [[nodiscard]] Result<Accounts> accounts() const;
 
   // Calls the function with the accounts as the file has them now, and saves what it did before anybody else may change
-  // them. It answers false to save nothing (cancelled). What the function throws passes through; nothing is saved then.
-  // Fails like `open`, and with nested, noSpace, notSaved, wouldBeDropped, wouldDropOthers, conflict or cancelled.
+  // them. It answers false to save nothing: the answer then is the error of its first step that failed, else cancelled.
+  // What the function throws passes through; nothing is saved then. Fails like `open`, and with nested, noSpace,
+  // notSaved, wouldBeDropped, wouldDropOthers or conflict.
   Result<Saved> change(const std::function<bool(Edit&)>& function) const;
 
   // The same in two steps, for whom a function does not suit.

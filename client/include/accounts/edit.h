@@ -41,14 +41,17 @@ class ACCOUNTS_API Edit {
   [[nodiscard]] std::vector<Account> accounts() const;
   [[nodiscard]] std::optional<Account> account(std::string_view identifier) const;
 
-  // Each names a top-level account or a child. "Identifier" and "ChildAccounts" cannot be set or erased (unsuitable).
-  // A type or class that cannot be is found by `save`.
+  // Each names a top-level account or a child, and leaves everything as it is where it fails. "Identifier" and
+  // "ChildAccounts" cannot be set or erased (unsuitable). A type or class that cannot be is found by `save`.
   Result<Account> add(const NewAccount& account);
   Outcome remove(std::string_view identifier);  // with its children; of several of this identifier, all
   Outcome set(std::string_view identifier, std::string_view key, const Value& value);
   Outcome erase(std::string_view identifier, std::string_view key);
   // One that accounts of this type cannot have is unsuitable.
   Outcome setEnabled(std::string_view identifier, std::string_view dataclass, bool enabled);
+
+  // The first of these steps that failed; nothing where all were done.
+  [[nodiscard]] std::optional<Error> failure() const;
 
   // Has `save` write the file even where nothing was changed here: what loading repaired stands in it then, though not
   // among the changes that are answered.
