@@ -132,6 +132,12 @@ Device::Device(OpenOptions options) : _options{std::move(options)} {
   _settingsFile = AccountsManager::fullPathToAccountSettingsPlist();
 }
 
+Path Device::beginning() const {
+  const Path root = this->root();
+  const Path below = _settingsFile.lexically_relative(root);
+  return below.empty() || *below.begin() == ".." ? _services.directories->home() : root;
+}
+
 bool Device::opensModules() const { return mayOpenModules(_options, _services); }
 
 Outcome Device::waitForMigration() const {

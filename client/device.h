@@ -46,6 +46,9 @@ class Device {
 
   [[nodiscard]] const OpenOptions& options() const { return _options; }
   [[nodiscard]] const platform::Path& settingsFile() const { return _settingsFile; }
+  // Where absolute links on the way to it begin, and where that way itself does: there, or at a home outside of it.
+  [[nodiscard]] platform::Path root() const { return _services.directories->systemRoot(); }
+  [[nodiscard]] platform::Path beginning() const;
   // Whether its modules may be opened, and so whether anybody is told of its changes.
   [[nodiscard]] bool opensModules() const;
 

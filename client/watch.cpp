@@ -3,19 +3,21 @@
 #include <poll.h>
 #include <sys/epoll.h>
 #include <sys/eventfd.h>
-#include <sys/inotify.h>
 #include <sys/timerfd.h>
 
 #include <array>
 #include <atomic>
 #include <cerrno>
 #include <csignal>
-#include <cstring>
+#include <list>
+#include <new>
+#include <optional>
 #include <system_error>
 #include <thread>
 #include <utility>
 
 #include "client/changes.h"
+#include "client/path_notices.h"
 #include "platform/linux/files/descriptor.h"
 
 namespace accounts {
@@ -24,9 +26,6 @@ namespace {
 using platform::Descriptor;
 using std::chrono::nanoseconds;
 
-// Hard links come with IN_CREATE, what is written in place with IN_CLOSE_WRITE, every save with IN_MOVED_TO.
-constexpr std::uint32_t kWatched = IN_MOVED_TO | IN_CREATE | IN_CLOSE_WRITE | IN_MOVE_SELF | IN_DELETE_SELF;
-constexpr std::uint32_t kDirectoryGone = IN_MOVE_SELF | IN_DELETE_SELF | IN_IGNORED;
 constexpr nanoseconds kAtOnce{1};
 constexpr nanoseconds kBetweenTries = std::chrono::seconds{1};
 
@@ -53,42 +52,57 @@ void drain(const Descriptor& counter) {
 
 struct Watch::Content {
   Content(std::shared_ptr<const Device> watched, const Accounts& since, Callback told)
-      : device{std::move(watched)}, records{identifiedRecords(*since.content().store)}, callback{std::move(told)} {}
+      : device{std::move(watched)},
+        records{identifiedRecords(*since.content().store)},
+        callback{std::move(told)},
+        notices{device->beginning(), device->root(), device->settingsFile()} {}
 
   std::shared_ptr<const Device> device;
-  Records records;  // as they were told last
+  Records records;  // as they were found last
   Callback callback;
-  Descriptor notices{::inotify_init1(IN_NONBLOCK | IN_CLOEXEC)};
+  std::list<Change> untold;
+  PathNotices notices;
   Descriptor timer{::timerfd_create(CLOCK_MONOTONIC, TFD_NONBLOCK | TFD_CLOEXEC)};
   Descriptor both{::epoll_create1(EPOLL_CLOEXEC)};
   Descriptor stop{::eventfd(0, EFD_NONBLOCK | EFD_CLOEXEC)};
   std::atomic<bool> isOver = false;
-  int directory = -1;
+  bool isWayFollowed = false;
+  std::optional<FileIdentity> file = std::nullopt;  // that was found last, unless it may differ without showing it
   std::thread thread = {};
 
   // Answers false, with errno, where the system does not let it.
   [[nodiscard]] bool begin() {
-    if (!notices.isOpen() || !timer.isOpen() || !both.isOpen() || !stop.isOpen()) return false;
-    for (const Descriptor* each : {&notices, &timer}) {
+    if (!notices.descriptor().isOpen() || !timer.isOpen() || !both.isOpen() || !stop.isOpen()) return false;
+    for (const Descriptor* each : {&notices.descriptor(), &std::as_const(timer)}) {
       epoll_event event{.events = EPOLLIN, .data = {}};
       if (::epoll_ctl(both.number(), EPOLL_CTL_ADD, each->number(), &event) != 0) return false;
     }
-    // What came since the accounts were looked at is looked for once the directory is watched.
-    return watchDirectory() && lookIn(kAtOnce);
+    // What came since the accounts were looked at is looked for once their file is watched.
+    isWayFollowed = notices.follow();
+    return isWayFollowed && lookIn(kAtOnce);
   }
 
   void dispatch() {
     drain(timer);
-    const bool isGone = takeNotices();
-    if (isGone && !watchDirectory()) static_cast<void>(lookIn(kBetweenTries));
-    look();
+    try {
+      listen();
+      look();
+      tell();
+    } catch (const std::bad_alloc&) {
+      static_cast<void>(lookIn(kBetweenTries));
+      throw;
+    }
   }
 
-  void follow() {
+  void run() {
     std::array<pollfd, 2> descriptors{{{both.number(), POLLIN, 0}, {stop.number(), POLLIN, 0}}};
     while (!isOver) {
       if (::poll(descriptors.data(), descriptors.size(), -1) < 0 && errno != EINTR) return;
-      if (!isOver) dispatch();
+      try {
+        if (!isOver) dispatch();
+      } catch (const std::bad_alloc&) {
+        continue;  // dispatching goes on where it was
+      }
     }
   }
 
@@ -101,47 +115,53 @@ struct Watch::Content {
   }
 
  private:
-  [[nodiscard]] bool watchDirectory() {
-    if (directory >= 0) ::inotify_rm_watch(notices.number(), directory);
-    const auto path = device->settingsFile().parent_path();
-    directory = ::inotify_add_watch(notices.number(), path.c_str(), kWatched | IN_ONLYDIR);
-    return directory >= 0;
-  }
-
   [[nodiscard]] bool lookIn(nanoseconds time) const {
     const auto seconds = std::chrono::duration_cast<std::chrono::seconds>(time);
     const itimerspec once{.it_interval = {}, .it_value = {seconds.count(), (time - seconds).count()}};
     return ::timerfd_settime(timer.number(), 0, &once, nullptr) == 0;
   }
 
-  // Whether the directory is to be watched anew. Which of its files was touched does not matter: what was not changed
-  // is not told of.
-  [[nodiscard]] bool takeNotices() const {
-    alignas(inotify_event) std::array<char, 4096> buffer{};
-    bool isGone = directory < 0;
-    for (ssize_t size = 0; (size = ::read(notices.number(), buffer.data(), buffer.size())) > 0;) {
-      for (ssize_t place = 0; place < size;) {
-        inotify_event event{};
-        std::memcpy(&event, buffer.data() + place, sizeof event);
-        if (event.wd == directory && (event.mask & kDirectoryGone) != 0) isGone = true;
-        place += static_cast<ssize_t>(sizeof event + event.len);
-      }
+  void listen() {
+    if (notices.take() == PathNotices::News::onTheWay) {
+      isWayFollowed = false;
+      file.reset();
     }
-    return isGone;
+    if (isWayFollowed) return;
+    isWayFollowed = notices.follow();
+    if (isWayFollowed) file.reset();
+    if (!isWayFollowed) static_cast<void>(lookIn(kBetweenTries));
   }
 
+  // What the file has is untold from then on. A file that is not there changes nothing.
   void look() {
+    const FileIdentity identity = FileIdentity::of(device->settingsFile());
+    if (file == identity) return;
     const Result<Store> store = device->load();
-    if (!store.isOk()) {
+    const bool isMissing = store.isOk() ? !(*store)->loadOutcome().reading.isOk() : store.error().code == Code::missing;
+    if (!store.isOk() && !isMissing) {
       static_cast<void>(lookIn(kBetweenTries));
       return;
     }
-    Records now = identifiedRecords(**store);
-    const std::vector<Change> changes = changesBetween(records, now, device);
-    records = std::move(now);
-    for (const Change& change : changes) {
-      if (isOver) return;
-      callback(change);
+    if (!isMissing) {
+      Records now = identifiedRecords(**store);
+      const std::vector<Change> changes = changesBetween(records, now, device);
+      untold.insert(untold.end(), changes.begin(), changes.end());
+      records = std::move(now);
+    }
+    file = identity;
+  }
+
+  // A callback that memory did not suffice for is called again.
+  void tell() {
+    while (!untold.empty() && !isOver) {
+      std::list<Change> next;
+      next.splice(next.begin(), untold, untold.begin());
+      try {
+        callback(next.front());
+      } catch (const std::bad_alloc&) {
+        untold.splice(untold.begin(), next);
+        throw;
+      }
     }
   }
 };
@@ -155,7 +175,7 @@ Result<Watch> beginWatch(std::shared_ptr<const Device> device, const Accounts& s
   auto content = std::make_shared<Watch::Content>(std::move(device), since, std::move(callback));
   if (!content->begin()) return failure(std::generic_category().message(errno));
   try {
-    if (caller == Watch::Caller::ownThread) content->thread = threadWithoutSignals([content] { content->follow(); });
+    if (caller == Watch::Caller::ownThread) content->thread = threadWithoutSignals([content] { content->run(); });
   } catch (const std::system_error& refused) {
     return failure(refused.what());
   }
@@ -166,7 +186,8 @@ Watch::Watch(std::shared_ptr<Content> content) : _content{std::move(content)} {}
 Watch::Watch(Watch&&) noexcept = default;
 
 Watch& Watch::operator=(Watch&& other) noexcept {
-  std::swap(_content, other._content);
+  Watch own{std::move(other)};
+  std::swap(_content, own._content);
   return *this;
 }
 
@@ -174,11 +195,13 @@ Watch::~Watch() {
   if (_content != nullptr) _content->end();
 }
 
-int Watch::descriptor() const { return _content->thread.joinable() ? -1 : _content->both.number(); }
+int Watch::descriptor() const {
+  return _content == nullptr || _content->thread.joinable() ? -1 : _content->both.number();
+}
 
 void Watch::dispatch() {
   const std::shared_ptr<Content> held = _content;  // the callback may destroy the watch
-  if (!held->thread.joinable()) held->dispatch();
+  if (held != nullptr && !held->thread.joinable()) held->dispatch();
 }
 
 }  // namespace accounts

@@ -1,8 +1,10 @@
 #include <poll.h>
+#include <sys/inotify.h>
 
 #include <condition_variable>
 #include <mutex>
 
+#include "platform/linux/files/descriptor.h"
 #include "tests/support/device_with_accounts.h"
 
 namespace tests {
@@ -90,6 +92,79 @@ TEST_F(WatchingAccounts, GoesOnWhereTheDirectoryIsReplaced) {
   EXPECT_THAT(toldAtLeast(1), ElementsAre("added E1"));
 }
 
+TEST_F(WatchingAccounts, GoesOnWhereADirectoryOnTheWayIsReplacedAndTheFileChangedLater) {
+  const Watch watch = watched(recorder());
+  std::filesystem::rename(device.root / "var/mobile/Library", device.root / "var/mobile/Old");
+  putAccounts(kAccounts + account("E1"));
+  EXPECT_THAT(toldAtLeast(1), ElementsAre("added E1"));
+  setPort(1);
+  EXPECT_THAT(toldAtLeast(2), ElementsAre("added E1", "changed M1 Port"));
+}
+
+TEST_F(WatchingAccounts, TellsWhatComesWithADirectoryThatIsMovedIntoItsPlace) {
+  const Watch watch = watched(recorder());
+  std::filesystem::rename(device.root / "var/mobile", device.root / "var/old");
+  putAccounts(kAccounts + account("E1"));
+  EXPECT_THAT(toldAtLeast(1), ElementsAre("added E1"));
+  std::filesystem::rename(device.root / "var/mobile", device.root / "var/new");
+  std::filesystem::rename(device.root / "var/old", device.root / "var/mobile");
+  EXPECT_THAT(toldAtLeast(2), ElementsAre("added E1", "removed E1"));
+}
+
+TEST_F(WatchingAccounts, TellsOfAFileThatTheSettingsAreALinkTo) {
+  std::filesystem::rename(device.root / kSettings, device.root / "real.plist");
+  std::filesystem::create_symlink("../../../../real.plist", device.root / kSettings);
+  const Watch watch = watched(recorder());
+  device.root.put("real.plist", withAccounts(kAccounts + account("E1")));
+  EXPECT_THAT(toldAtLeast(1), ElementsAre("added E1"));
+}
+
+TEST_F(WatchingAccounts, FollowsALinkOnTheWayThatIsLedElsewhere) {
+  std::filesystem::rename(device.root / "var/mobile/Library", device.root / "first");
+  std::filesystem::copy(device.root / "first", device.root / "second", std::filesystem::copy_options::recursive);
+  std::filesystem::create_symlink("/first", device.root / "var/mobile/Library");
+  const Watch watch = watched(recorder());
+  device.root.put("second/Preferences/com.vorlix.accountsettings.plist", withAccounts(kAccounts + account("E1")));
+  std::filesystem::create_symlink("/second", device.root / "link");
+  std::filesystem::rename(device.root / "link", device.root / "var/mobile/Library");
+  EXPECT_THAT(toldAtLeast(1), ElementsAre("added E1"));
+}
+
+TEST_F(WatchingAccounts, TakesAFileThatIsGoneForNoChangeWhereItMayBeMissing) {
+  auto may = options();
+  may.mayBeMissing = true;
+  Watch watch = opened(may).watch(looked(), recorder(), Watch::Caller::eventLoop).value();
+  watch.dispatch();
+  const std::string kept = device.root.contents(kSettings);
+  std::filesystem::remove(device.root / kSettings);
+  device.root.put("var/mobile/Library/Preferences/other.plist", "");
+  watch.dispatch();
+  device.root.put(kSettings, kept);
+  watch.dispatch();
+  EXPECT_THAT(told, ElementsAre());
+}
+
+TEST_F(WatchingAccounts, TellsAgainWhatMemoryDidNotSufficeFor) {
+  bool isFirst = true;
+  const Watch watch = watched([&](const Change& change) {
+    if (std::exchange(isFirst, false)) throw std::bad_alloc{};
+    recorder()(change);
+  });
+  setPort(1);
+  EXPECT_THAT(toldAtLeast(1), ElementsAre("changed M1 Port"));
+}
+
+TEST_F(WatchingAccounts, LoadsNothingWhereAnotherFileOfTheDirectoryIsWritten) {
+  Watch watch = watched(recorder(), Watch::Caller::eventLoop);
+  watch.dispatch();
+  const platform::Descriptor reads{::inotify_init1(IN_NONBLOCK | IN_CLOEXEC)};
+  ASSERT_GE(::inotify_add_watch(reads.number(), (device.root / kSettings).c_str(), IN_OPEN), 0);
+  device.root.put("var/mobile/Library/Preferences/other.plist", "");
+  watch.dispatch();
+  pollfd descriptor{reads.number(), POLLIN, 0};
+  EXPECT_EQ(::poll(&descriptor, 1, 0), 0);
+}
+
 TEST_F(WatchingAccounts, ServesAnEventLoop) {
   Watch watch = watched(recorder(), Watch::Caller::eventLoop);
   watch.dispatch();
@@ -134,6 +209,18 @@ TEST_F(WatchingAccounts, SaysThatTheProcessWatchesTooMuchAlready) {
   const auto settings = opened();
   const auto seen = looked();
   EXPECT_EQ(withoutDescriptors([&] { return codeOf(settings.watch(seen, recorder())); }), accounts::Code::notWatched);
+}
+
+TEST_F(WatchingAccounts, WatchesNothingOnceItWasMovedFrom) {
+  Watch from = watched(recorder(), Watch::Caller::eventLoop);
+  Watch to = watched(recorder(), Watch::Caller::eventLoop);
+  to = std::move(from);
+  setPort(1);
+  EXPECT_EQ(from.descriptor(), -1);
+  from.dispatch();
+  EXPECT_THAT(told, ElementsAre());
+  to.dispatch();
+  EXPECT_THAT(told, ElementsAre("changed M1 Port"));
 }
 
 TEST_F(WatchingAccounts, SaysWhereThereIsNothingToWatch) {

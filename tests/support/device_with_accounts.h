@@ -47,8 +47,11 @@ class DeviceWithAccounts : public ::testing::Test {
   }
 
   void putAccounts(const std::string& accounts, int version = accountsettings::kCurrentVersion) const {
-    device.put(kSettings, "<key>Accounts</key><array>" + accounts + "</array><key>Version</key><integer>" +
-                              std::to_string(version) + "</integer>");
+    device.root.put(kSettings, withAccounts(accounts, version));
+  }
+  static std::string withAccounts(const std::string& accounts, int version = accountsettings::kCurrentVersion) {
+    return RealDevice::xml("<key>Accounts</key><array>" + accounts + "</array><key>Version</key><integer>" +
+                           std::to_string(version) + "</integer>");
   }
 
   // An account that comes behind the others, or stands alone.
