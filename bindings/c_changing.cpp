@@ -1,6 +1,6 @@
 #include "bindings/c_handles.h"
 
-using accounts::Account;
+using accounts::c::areGiven;
 using accounts::c::handle;
 using accounts::c::isDone;
 using accounts::c::made;
@@ -30,6 +30,7 @@ account_settings_accounts* account_settings_edit_accounts(const account_settings
 }
 
 account_settings_account* account_settings_edit_find(const account_settings_edit* edit, const char* identifier) {
+  if (identifier == nullptr) return nullptr;
   return orElse(static_cast<account_settings_account*>(nullptr),
                 [&] { return handle<account_settings_account>(edit->edit.account(identifier)); });
 }
@@ -39,29 +40,44 @@ account_settings_account* account_settings_edit_add(account_settings_edit* edit,
                                                     const char* parent, account_settings_error** error) {
   return made(error, [&]() -> account_settings_account* {
     accounts::NewAccount account{orEmpty(type), orEmpty(account_class), {}, orEmpty(parent)};
-    if (properties != nullptr) account.properties = properties->value.dictionary().value_or(account.properties);
+    if (properties != nullptr) account.properties = properties->whole().dictionary().value_or(account.properties);
     const auto added = edit->edit.add(account);
     return isDone(added, error) ? new account_settings_account{*added} : nullptr;
   });
 }
 
 bool account_settings_edit_remove(account_settings_edit* edit, const char* identifier, account_settings_error** error) {
-  return made(error, [&] { return isDone(edit->edit.remove(identifier), error); });
+  return made(error, [&] { return areGiven({identifier}, error) && isDone(edit->edit.remove(identifier), error); });
 }
 
 bool account_settings_edit_set(account_settings_edit* edit, const char* identifier, const char* key,
                                const account_settings_value* value, account_settings_error** error) {
-  return made(error, [&] { return isDone(edit->edit.set(identifier, key, value->value), error); });
+  return made(error, [&] {
+    if (!areGiven({identifier, key, value}, error)) return false;
+    return isDone(edit->edit.set(identifier, key, value->whole()), error);
+  });
 }
 
 bool account_settings_edit_erase(account_settings_edit* edit, const char* identifier, const char* key,
                                  account_settings_error** error) {
-  return made(error, [&] { return isDone(edit->edit.erase(identifier, key), error); });
+  return made(error, [&] {
+    return areGiven({identifier, key}, error) && isDone(edit->edit.erase(identifier, key), error);
+  });
 }
 
 bool account_settings_edit_set_enabled(account_settings_edit* edit, const char* identifier, const char* dataclass,
                                        bool enabled, account_settings_error** error) {
-  return made(error, [&] { return isDone(edit->edit.setEnabled(identifier, dataclass, enabled), error); });
+  return made(error, [&] {
+    if (!areGiven({identifier, dataclass}, error)) return false;
+    return isDone(edit->edit.setEnabled(identifier, dataclass, enabled), error);
+  });
+}
+
+account_settings_error* account_settings_edit_failure(const account_settings_edit* edit) {
+  return orElse(static_cast<account_settings_error*>(nullptr), [&]() -> account_settings_error* {
+    const auto failure = edit->edit.failure();
+    return failure ? new account_settings_error{static_cast<int32_t>(failure->code), failure->sentence} : nullptr;
+  });
 }
 
 void account_settings_edit_rewrite(account_settings_edit* edit) { edit->edit.rewrite(); }
@@ -78,26 +94,34 @@ void account_settings_edit_free(account_settings_edit* edit) { delete edit; }
 
 bool account_settings_will_change(const account_settings* settings, const account_settings_account* account,
                                   const char* dataclass, account_settings_error** error) {
-  return made(error, [&] { return isDone(settings->settings.willChange(account->account, dataclass), error); });
+  return made(error, [&] {
+    if (!areGiven({dataclass}, error)) return false;
+    return isDone(settings->settings.willChange(account->account, dataclass), error);
+  });
 }
 
 bool account_settings_did_change(const account_settings* settings, const account_settings_account* account,
                                  const char* dataclass, account_settings_error** error) {
-  return made(error, [&] { return isDone(settings->settings.didChange(account->account, dataclass), error); });
+  return made(error, [&] {
+    if (!areGiven({dataclass}, error)) return false;
+    return isDone(settings->settings.didChange(account->account, dataclass), error);
+  });
 }
 
 size_t account_settings_changes_count(const account_settings_changes* changes) { return changes->changes.size(); }
 
 int32_t account_settings_changes_kind(const account_settings_changes* changes, size_t place) {
-  return static_cast<int32_t>(changes->changes[place].kind);
+  return place < changes->changes.size() ? static_cast<int32_t>(changes->changes[place].kind) : -1;
 }
 
 account_settings_account* account_settings_changes_account(const account_settings_changes* changes, size_t place) {
+  if (place >= changes->changes.size()) return nullptr;
   return orElse(static_cast<account_settings_account*>(nullptr),
                 [&] { return new account_settings_account{changes->changes[place].account}; });
 }
 
 const char* account_settings_changes_key(const account_settings_changes* changes, size_t place, size_t key) {
+  if (place >= changes->changes.size()) return nullptr;
   const auto& keys = changes->changes[place].keys;
   return key < keys.size() ? keys[key].c_str() : nullptr;
 }

@@ -1,12 +1,15 @@
 #pragma once
 
+#include <algorithm>
 #include <exception>
+#include <initializer_list>
 #include <map>
 #include <memory>
 #include <mutex>
 #include <new>
 #include <optional>
 #include <string>
+#include <unordered_map>
 #include <utility>
 #include <vector>
 
@@ -27,18 +30,37 @@ struct account_settings_error {
 struct account_settings_value {
   explicit account_settings_value(accounts::Value given)
       : value{std::move(given)}, text{value.text()}, data{value.data()} {
-    if (const auto list = value.list()) elements = *list;
-    for (auto& [key, element] : value.dictionary().value_or(accounts::Value::Dictionary{})) {
-      keys.push_back(key);
-      elements.push_back(std::move(element));
-    }
+    if (auto list = value.list()) elements = *std::move(list);
+    if (auto dictionary = value.dictionary()) entries = *std::move(dictionary);
+  }
+
+  // With what it was filled with since it was made.
+  [[nodiscard]] accounts::Value whole() const {
+    if (!isFilled) return value;
+    return value.kind() == accounts::Value::Kind::list ? accounts::Value{elements} : accounts::Value{entries};
+  }
+
+  void append(const accounts::Value& element) {
+    elements.push_back(element);
+    isFilled = true;
+  }
+
+  void set(const char* key, const accounts::Value& element) {
+    for (auto place = places.size(); place < entries.size(); ++place) places.emplace(entries[place].first, place);
+    const std::string name = *accounts::Value{key}.text();  // as a file has it
+    const auto known = places.find(name);
+    if (known == places.end()) entries.emplace_back(name, element);
+    if (known != places.end()) entries[known->second].second = element;
+    isFilled = true;
   }
 
   accounts::Value value;
   std::optional<std::string> text;
   std::optional<accounts::Value::Data> data;
-  accounts::Value::List elements = {};
-  std::vector<std::string> keys = {};  // of a dictionary, in the places of its elements
+  accounts::Value::List elements = {};                       // of a list
+  accounts::Value::Dictionary entries = {};                  // of a dictionary
+  std::unordered_map<std::string, std::size_t> places = {};  // of the first entries, by their keys
+  bool isFilled = false;
 };
 
 struct account_settings_account {
@@ -119,6 +141,13 @@ template <typename Answer>
 bool isDone(const accounts::Result<Answer>& result, account_settings_error** error) {
   if (!result.isOk()) tell(error, static_cast<std::int32_t>(result.error().code), result.error().sentence);
   return result.isOk();
+}
+
+// Whether nothing of what a call needs is NULL.
+inline bool areGiven(std::initializer_list<const void*> arguments, account_settings_error** error) {
+  const bool areAll = std::find(arguments.begin(), arguments.end(), nullptr) == arguments.end();
+  if (!areAll) tell(error, ACCOUNT_SETTINGS_UNSUITABLE, "a text or a value is NULL");
+  return areAll;
 }
 
 template <typename Handle, typename Content>

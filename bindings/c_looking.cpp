@@ -117,6 +117,7 @@ account_settings_account* account_settings_accounts_at(const account_settings_ac
 
 account_settings_account* account_settings_accounts_find(const account_settings_accounts* accounts,
                                                          const char* identifier) {
+  if (identifier == nullptr) return nullptr;
   return orElse(kNoAccount, [&] {
     if (accounts->whole) return handle<account_settings_account>(accounts->whole->withIdentifier(identifier));
     return found(*accounts, [&](const Account& account) { return account.identifier() == identifier; });
@@ -125,6 +126,7 @@ account_settings_account* account_settings_accounts_find(const account_settings_
 
 account_settings_account* account_settings_accounts_find_sync(const account_settings_accounts* accounts,
                                                               const char* sync_identifier) {
+  if (sync_identifier == nullptr) return nullptr;
   return orElse(kNoAccount, [&] {
     if (accounts->whole) return handle<account_settings_account>(accounts->whole->withSyncIdentifier(sync_identifier));
     return found(*accounts, [&](const Account& account) { return account.syncIdentifier() == sync_identifier; });
@@ -133,12 +135,14 @@ account_settings_account* account_settings_accounts_find_sync(const account_sett
 
 account_settings_accounts* account_settings_accounts_of_type(const account_settings_accounts* accounts,
                                                              const char* type) {
+  if (type == nullptr) return nullptr;
   return orElse(kNoAccounts,
                 [&] { return all(*accounts, [&](const Account& account) { return account.type() == type; }); });
 }
 
 account_settings_accounts* account_settings_accounts_with_dataclass(const account_settings_accounts* accounts,
                                                                     const char* dataclass) {
+  if (dataclass == nullptr) return nullptr;
   return orElse(kNoAccounts,
                 [&] { return all(*accounts, [&](const Account& account) { return account.isEnabled(dataclass); }); });
 }
@@ -184,6 +188,7 @@ account_settings_value* account_settings_account_enabled(const account_settings_
 }
 
 bool account_settings_account_is_enabled(const account_settings_account* account, const char* dataclass) {
+  if (dataclass == nullptr) return false;
   return orElse(false, [&] { return account->account.isEnabled(dataclass); });
 }
 
@@ -200,14 +205,17 @@ bool account_settings_account_service(const account_settings_account* account, c
 }
 
 account_settings_value* account_settings_account_property(const account_settings_account* account, const char* key) {
+  if (key == nullptr) return nullptr;
   return orElse(kNoValue, [&] { return handle<account_settings_value>(account->account.property(key)); });
 }
 
 bool account_settings_account_integer(const account_settings_account* account, const char* key, int64_t* value) {
+  if (key == nullptr) return false;
   return orElse(false, [&] { return put(account->account.integer(key), value); });
 }
 
 bool account_settings_account_boolean(const account_settings_account* account, const char* key, bool* value) {
+  if (key == nullptr) return false;
   return orElse(false, [&] { return put(account->account.boolean(key), value); });
 }
 
@@ -265,17 +273,21 @@ const uint8_t* account_settings_value_data(const account_settings_value* value, 
   return value->data->empty() ? &kNone : value->data->data();
 }
 
-size_t account_settings_value_count(const account_settings_value* value) { return value->elements.size(); }
+size_t account_settings_value_count(const account_settings_value* value) {
+  return value->elements.size() + value->entries.size();
+}
 
 account_settings_value* account_settings_value_at(const account_settings_value* value, size_t place) {
-  return place < value->elements.size() ? newOf<account_settings_value>(value->elements[place]) : nullptr;
+  if (place >= account_settings_value_count(value)) return nullptr;
+  return newOf<account_settings_value>(value->entries.empty() ? value->elements[place] : value->entries[place].second);
 }
 
 const char* account_settings_value_key_at(const account_settings_value* value, size_t place) {
-  return place < value->keys.size() ? value->keys[place].c_str() : nullptr;
+  return place < value->entries.size() ? value->entries[place].first.c_str() : nullptr;
 }
 
 account_settings_value* account_settings_value_of_text(const char* text) {
+  if (text == nullptr) return nullptr;
   return orElse(kNoValue, [&] { return new account_settings_value{Value{text}}; });
 }
 
@@ -300,6 +312,7 @@ account_settings_value* account_settings_value_of_date(double seconds) {
 }
 
 account_settings_value* account_settings_value_of_data(const uint8_t* data, size_t size) {
+  if (data == nullptr && size > 0) return nullptr;
   return orElse(kNoValue, [&] { return new account_settings_value{Value{Value::Data(data, data + size)}}; });
 }
 
@@ -312,22 +325,18 @@ account_settings_value* account_settings_value_of_dictionary(void) {
 }
 
 bool account_settings_value_append(account_settings_value* list, const account_settings_value* element) {
+  if (element == nullptr || list->value.kind() != Value::Kind::list) return false;
   return orElse(false, [&] {
-    auto elements = list->value.list();
-    if (!elements) return false;
-    elements->push_back(element->value);
-    *list = account_settings_value{Value{*elements}};
+    list->append(element->whole());
     return true;
   });
 }
 
 bool account_settings_value_set(account_settings_value* dictionary, const char* key,
                                 const account_settings_value* element) {
+  if (key == nullptr || element == nullptr || dictionary->value.kind() != Value::Kind::dictionary) return false;
   return orElse(false, [&] {
-    auto entries = dictionary->value.dictionary();
-    if (!entries) return false;
-    entries->emplace_back(key, element->value);
-    *dictionary = account_settings_value{Value{*entries}};
+    dictionary->set(key, element->whole());
     return true;
   });
 }

@@ -5,10 +5,12 @@
  * handle needs another one to live. Strings are UTF-8.
  *
  * Errors: where something could not be done a function answers NULL or false and, where `error` is not NULL, makes an
- * error that the caller frees. Nothing is thrown and nothing ends the program.
+ * error that the caller frees. Nothing is thrown and nothing ends the program. A handle that is asked something is a
+ * live one; a text or a value may be NULL, and a place may be too high: NULL, false or -1 is answered then, with
+ * ACCOUNT_SETTINGS_UNSUITABLE where there is an `error`. Places where something is put may be NULL.
  *
- * Threads: settings may be used by any thread at any time, an edit by one at a time. Everything else never changes once
- * it is made, but for values that are being filled.
+ * Threads: at each handle below stands who may use it. Whatever the handle, freeing it is left to one thread, once no
+ * other one uses it.
  */
 #ifndef ACCOUNT_SETTINGS_H
 #define ACCOUNT_SETTINGS_H
@@ -23,14 +25,19 @@ extern "C" {
 
 #define ACCOUNT_SETTINGS_API __attribute__((visibility("default")))
 
-/* What the functions below hand out and take. */
+/* What the functions below hand out and take. Those of the first group may be used by any thread at any time. */
 typedef struct account_settings account_settings;
 typedef struct account_settings_error account_settings_error;
 typedef struct account_settings_account account_settings_account;
 typedef struct account_settings_accounts account_settings_accounts; /* a list */
+typedef struct account_settings_changes account_settings_changes;   /* a list */
+/* Read by any thread, but while one fills it, by no other. */
 typedef struct account_settings_value account_settings_value;
+/* Used by one thread at a time; a thread that has one and begins another is answered
+ * ACCOUNT_SETTINGS_NESTED. */
 typedef struct account_settings_edit account_settings_edit;
-typedef struct account_settings_changes account_settings_changes; /* a list */
+/* Used by one thread at a time. Its callback is called by one thread at a time, and may use everything, and free the
+ * watch. Freeing it waits for a call that its own thread is making, unless that call frees it. */
 typedef struct account_settings_watch account_settings_watch;
 
 /* Why something was not done. The numbers never change their meaning; later releases may add some. */
@@ -110,7 +117,7 @@ ACCOUNT_SETTINGS_API account_settings_account* account_settings_accounts_find(co
                                                                               const char* identifier);
 ACCOUNT_SETTINGS_API account_settings_account* account_settings_accounts_find_sync(
     const account_settings_accounts* accounts, const char* sync_identifier);
-/* With children behind their parents. NULL for want of memory only. */
+/* With children behind their parents. NULL for want of memory, and where the text is. */
 ACCOUNT_SETTINGS_API account_settings_accounts* account_settings_accounts_of_type(
     const account_settings_accounts* accounts, const char* type);
 ACCOUNT_SETTINGS_API account_settings_accounts* account_settings_accounts_with_dataclass(
@@ -188,7 +195,7 @@ ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_at(const acc
                                                                        size_t place);
 ACCOUNT_SETTINGS_API const char* account_settings_value_key_at(const account_settings_value* value, size_t place);
 
-/* NULL for want of memory only. */
+/* NULL for want of memory, where the text is NULL, and where the data is, but for a size of 0. */
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_text(const char* text);
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_integer(int64_t integer);
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_unsigned(uint64_t integer);
@@ -198,7 +205,8 @@ ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_date(doub
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_data(const uint8_t* data, size_t size);
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_list(void);
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_dictionary(void);
-/* Fills a list or dictionary with a copy of the element. False for another kind, and for want of memory. */
+/* Fills a list or dictionary with a copy of the element, at a cost that does not grow with what it has. False for another
+ * kind, and for want of memory. */
 ACCOUNT_SETTINGS_API bool account_settings_value_append(account_settings_value* list,
                                                         const account_settings_value* element);
 ACCOUNT_SETTINGS_API bool account_settings_value_set(account_settings_value* dictionary, const char* key,
@@ -234,6 +242,8 @@ ACCOUNT_SETTINGS_API bool account_settings_edit_erase(account_settings_edit* edi
 ACCOUNT_SETTINGS_API bool account_settings_edit_set_enabled(account_settings_edit* edit, const char* identifier,
                                                             const char* dataclass, bool enabled,
                                                             account_settings_error** error);
+/* The first of the steps above that failed, which need not be asked for its error itself; NULL where all were done. */
+ACCOUNT_SETTINGS_API account_settings_error* account_settings_edit_failure(const account_settings_edit* edit);
 /* Has the save write the file even where nothing was changed, so that what loading repaired stands in it. */
 ACCOUNT_SETTINGS_API void account_settings_edit_rewrite(account_settings_edit* edit);
 /* What was saved. The edit is over then, whatever is answered, and is still to be freed. */
@@ -253,7 +263,7 @@ ACCOUNT_SETTINGS_API bool account_settings_did_change(const account_settings* se
 enum { ACCOUNT_SETTINGS_ADDED, ACCOUNT_SETTINGS_CHANGED, ACCOUNT_SETTINGS_REMOVED };
 
 /* What became of how many accounts: of each, one of the kinds above, and the account as it is afterwards; one that was
- * removed, as it was before. */
+ * removed, as it was before. -1 and NULL behind the last one. */
 ACCOUNT_SETTINGS_API size_t account_settings_changes_count(const account_settings_changes* changes);
 ACCOUNT_SETTINGS_API int32_t account_settings_changes_kind(const account_settings_changes* changes, size_t place);
 ACCOUNT_SETTINGS_API account_settings_account* account_settings_changes_account(const account_settings_changes* changes,
@@ -269,7 +279,8 @@ ACCOUNT_SETTINGS_API void account_settings_changes_free(account_settings_changes
 
 /* --- Watch --- */
 
-/* The change is lent for the call: a list of this one. Must not throw, or jump out. */
+/* The change is lent for the call: a list of this one. Must not throw, or jump out. Called by the watch's own thread, or
+ * by the one that dispatches. */
 typedef void (*account_settings_callback)(const account_settings_changes* change, void* data);
 
 enum { ACCOUNT_SETTINGS_OWN_THREAD, ACCOUNT_SETTINGS_EVENT_LOOP };

@@ -1,13 +1,15 @@
-// Each failure of the interface as programs in C see it. None of them can be `cancelled`: who gives an edit up frees
-// it.
+// The interface as programs in C see it, each of its failures above all. None of them can be `cancelled`: who gives an
+// edit up frees it.
 
 #include <fcntl.h>
 #include <sys/file.h>
 
+#include <ctime>
 #include <functional>
 #include <memory>
 #include <set>
 #include <string>
+#include <vector>
 
 #include "account-settings.h"
 #include "tests/support/device_with_accounts.h"
@@ -18,6 +20,7 @@ namespace {
 using Call = std::function<bool(account_settings_error** error)>;
 
 struct Freed {
+  void operator()(account_settings_error* error) const { account_settings_error_free(error); }
   void operator()(account_settings* settings) const { account_settings_free(settings); }
   void operator()(account_settings_edit* edit) const { account_settings_edit_free(edit); }
   void operator()(account_settings_account* account) const { account_settings_account_free(account); }
@@ -126,6 +129,90 @@ TEST_F(FailuresInC, OfOneStepSayWhatItCannotDo) {
                      nullptr;
             }),
             ACCOUNT_SETTINGS_ALREADY_THERE);
+}
+
+TEST_F(FailuresInC, OfAnEditAreTheFirstOfItsSteps) {
+  const auto settings = opened();
+  const auto edit = begun(settings.get());
+  ASSERT_TRUE(set(edit.get(), "M1", "Port"));
+  EXPECT_EQ(account_settings_edit_failure(edit.get()), nullptr);
+  EXPECT_FALSE(set(edit.get(), "X", "Port") || set(edit.get(), "M1", "Identifier"));
+  const auto failure = owned(account_settings_edit_failure(edit.get()));
+  EXPECT_EQ(account_settings_error_code(failure.get()), ACCOUNT_SETTINGS_UNKNOWN_ACCOUNT);
+  EXPECT_STREQ(account_settings_error_sentence(failure.get()), "no account has the identifier X");
+}
+
+TEST_F(FailuresInC, OfTextsThatAreNullAreAnswered) {
+  const auto settings = opened();
+  const auto seen = owned(account_settings_look(settings.get(), nullptr));
+  const auto account = owned(account_settings_accounts_at(seen.get(), 0));
+  const auto edit = begun(settings.get());
+  for (const Call& call : std::vector<Call>{
+           [&](auto** error) { return set(edit.get(), nullptr, "Port", error); },
+           [&](auto** error) { return set(edit.get(), "M1", nullptr, error); },
+           [&](auto** error) { return account_settings_edit_set(edit.get(), "M1", "Port", nullptr, error); },
+           [&](auto** error) { return account_settings_edit_remove(edit.get(), nullptr, error); },
+           [&](auto** error) { return account_settings_edit_erase(edit.get(), "M1", nullptr, error); },
+           [&](auto** error) { return account_settings_edit_set_enabled(edit.get(), "M1", nullptr, true, error); },
+           [&](auto** error) { return account_settings_did_change(settings.get(), account.get(), nullptr, error); }}) {
+    EXPECT_EQ(codeOf(call), ACCOUNT_SETTINGS_UNSUITABLE);
+  }
+  EXPECT_EQ(account_settings_edit_find(edit.get(), nullptr), nullptr);
+  EXPECT_EQ(account_settings_accounts_find(seen.get(), nullptr), nullptr);
+  EXPECT_EQ(account_settings_accounts_find_sync(seen.get(), nullptr), nullptr);
+  EXPECT_EQ(account_settings_accounts_of_type(seen.get(), nullptr), nullptr);
+  EXPECT_EQ(account_settings_accounts_with_dataclass(seen.get(), nullptr), nullptr);
+  EXPECT_EQ(account_settings_account_property(account.get(), nullptr), nullptr);
+  EXPECT_FALSE(account_settings_account_is_enabled(account.get(), nullptr));
+}
+
+TEST_F(FailuresInC, OfPlacesThatAreNotThereAreAnswered) {
+  const auto settings = opened();
+  const auto edit = begun(settings.get());
+  ASSERT_TRUE(set(edit.get(), "M1", "Port"));
+  const auto saved = owned(account_settings_edit_save(edit.get(), nullptr));
+  EXPECT_EQ(account_settings_changes_kind(saved.get(), 0), ACCOUNT_SETTINGS_CHANGED);
+  EXPECT_EQ(account_settings_changes_kind(saved.get(), 1), -1);
+  EXPECT_EQ(account_settings_changes_account(saved.get(), 1), nullptr);
+  EXPECT_EQ(account_settings_changes_key(saved.get(), 1, 0), nullptr);
+  EXPECT_EQ(account_settings_changes_key(saved.get(), 0, 1), nullptr);
+}
+
+TEST(ValuesInC, AreNoneWhereWhatTheyAreToHoldIsNull) {
+  const auto list = owned(account_settings_value_of_list());
+  const auto dictionary = owned(account_settings_value_of_dictionary());
+  EXPECT_EQ(account_settings_value_of_text(nullptr), nullptr);
+  EXPECT_EQ(account_settings_value_of_data(nullptr, 1), nullptr);
+  EXPECT_NE(owned(account_settings_value_of_data(nullptr, 0)), nullptr);
+  EXPECT_FALSE(account_settings_value_append(list.get(), nullptr));
+  EXPECT_FALSE(account_settings_value_append(dictionary.get(), list.get()));
+  EXPECT_FALSE(account_settings_value_set(dictionary.get(), nullptr, list.get()));
+  EXPECT_FALSE(account_settings_value_set(dictionary.get(), "key", nullptr));
+  EXPECT_EQ(account_settings_value_at(list.get(), 0), nullptr);
+}
+
+TEST(ValuesInC, AreFilledAtACostThatDoesNotGrow) {
+  const auto list = owned(account_settings_value_of_list());
+  const auto one = owned(account_settings_value_of_integer(1));
+  const std::clock_t began = std::clock();
+  for (int count = 0; count < 20000; ++count) ASSERT_TRUE(account_settings_value_append(list.get(), one.get()));
+  EXPECT_LT(std::clock() - began, 2 * CLOCKS_PER_SEC);
+  EXPECT_EQ(account_settings_value_count(list.get()), 20000U);
+}
+
+TEST(ValuesInC, ArePassedOnWithAllThatTheyWereFilledWith) {
+  const auto list = owned(account_settings_value_of_list());
+  const auto dictionary = owned(account_settings_value_of_dictionary());
+  const auto one = owned(account_settings_value_of_integer(1));
+  ASSERT_TRUE(account_settings_value_set(dictionary.get(), "key", list.get()));
+  ASSERT_TRUE(account_settings_value_set(dictionary.get(), "key", one.get()));
+  ASSERT_TRUE(account_settings_value_set(dictionary.get(), "other", one.get()));
+  ASSERT_TRUE(account_settings_value_append(list.get(), dictionary.get()));
+  const auto held = owned(account_settings_value_at(list.get(), 0));
+  ASSERT_EQ(account_settings_value_count(held.get()), 2U);
+  EXPECT_STREQ(account_settings_value_key_at(held.get(), 0), "key");
+  std::int64_t integer = 0;
+  EXPECT_TRUE(account_settings_value_integer(owned(account_settings_value_at(held.get(), 0)).get(), &integer));
 }
 
 TEST_F(FailuresInC, OfSavingSayWhyNothingWasSaved) {
