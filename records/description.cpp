@@ -174,7 +174,8 @@ bool namesCredential(std::string_view key) {
   }
   if (std::ranges::find(kPlainKeys, folded) != kPlainKeys.end()) return false;
   const auto isPart = [&folded](std::string_view word) { return folded.find(word) != std::string::npos; };
-  return std::ranges::any_of(kCredentialWords, isPart) || hasShortCredentialWord(key);
+  return std::ranges::any_of(kCredentialWords, isPart) ||
+         (std::ranges::any_of(kShortCredentialWords, isPart) && hasShortCredentialWord(key));
 }
 
 std::string description(const PropertyValue& value) {

@@ -33,10 +33,13 @@ std::string MessageArgument::rendered() const {
 
 std::string message(std::string_view format, std::span<const MessageArgument> arguments) {
   std::string text;
-  while (!format.empty()) {
-    const std::size_t length = arguments.empty() ? 0 : placeholderLength(format);
+  for (std::size_t place = format.find('%'); place != std::string_view::npos && !arguments.empty();
+       place = format.find('%')) {
+    text += format.substr(0, place);
+    format.remove_prefix(place);
+    const std::size_t length = placeholderLength(format);
     if (length == 0) {
-      text.push_back(format.front());
+      text.push_back('%');
       format.remove_prefix(1);
     } else {
       text += arguments.front().rendered();
@@ -44,7 +47,7 @@ std::string message(std::string_view format, std::span<const MessageArgument> ar
       format.remove_prefix(length);
     }
   }
-  return text;
+  return text.append(format);
 }
 
 }  // namespace records
