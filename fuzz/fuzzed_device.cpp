@@ -129,7 +129,8 @@ void FuzzedDevice::begin(Input& input) {
   _input = &input;
   _identifiers = 0;
   _markers = 0;
-  files->nodes = _ownFiles;
+  std::erase_if(files->nodes, [this](const auto& node) { return !_ownFiles.contains(node.first); });
+  for (const auto& [path, node] : _ownFiles) files->nodes[path] = node;
   files->failing.clear();
   files->hasTemporaryNames = true;
   identifiers->made = 0;
@@ -243,7 +244,7 @@ void FuzzedDevice::putFiles() {
   hasLegacyExchange = (has & 4U) != 0;
   hasSentinel = (has & 0x38U) == 0x38U;
   hasFaults = (has & 0xC0U) == 0xC0U;
-  systemLog->readers = (has & 0x40U) != 0;
+  systemLog->readers = (has & 0x58U) == 0x58U;  // seldom: what is logged takes as long as all else
   const std::int64_t version = static_cast<std::int64_t>(_input->below(15)) - 1;
   const std::size_t isOdd = _input->below(8);
   Dictionary contents;

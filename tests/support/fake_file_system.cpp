@@ -1,5 +1,6 @@
 #include "tests/support/fake_file_system.h"
 
+#include <algorithm>
 #include <cerrno>
 
 namespace tests {
@@ -8,6 +9,14 @@ using platform::Bytes;
 using platform::FileKind;
 using platform::Path;
 using platform::Status;
+
+namespace {
+
+bool hasLinks(const std::map<Path, FakeFileSystem::Node>& nodes) {
+  return std::ranges::any_of(nodes, [](const auto& node) { return !node.second.target.empty(); });
+}
+
+}  // namespace
 
 void FakeFileSystem::put(const Path& path, Bytes bytes) {
   putDirectory(path.parent_path());
@@ -18,6 +27,7 @@ void FakeFileSystem::put(const Path& path, Bytes bytes) {
 void FakeFileSystem::put(const Path& path, std::string_view bytes) { put(path, Bytes{bytes.begin(), bytes.end()}); }
 
 void FakeFileSystem::putDirectory(const Path& path) {
+  if (nodes.contains(path)) return;
   Path built;
   for (const Path& part : path) {
     built /= part;
@@ -51,21 +61,21 @@ Path FakeFileSystem::followed(const Path& path, bool followsLast, int& links) co
 }
 
 Path FakeFileSystem::placeOf(const Path& path) const {
+  if (!hasLinks(nodes)) return path;
   int links = 0;
   return followed(path, false, links);
 }
 
 Path FakeFileSystem::targetOf(const Path& path) const {
+  if (!hasLinks(nodes)) return path;
   int links = 0;
   return followed(path, true, links);
 }
 
 Status FakeFileSystem::begin(const std::string& verb, const Path& path, const std::string& rest) {
-  calls.push_back(verb + " " + path.string() + rest);
-  if (failing.contains(verb) || failing.contains(verb + " " + path.string())) {
-    return Status::failure(EIO, verb + " " + path.string());
-  }
-  return {};
+  const std::string call = verb + " " + path.string();
+  calls.push_back(call + rest);
+  return failing.contains(verb) || failing.contains(call) ? Status::failure(EIO, call) : Status{};
 }
 
 platform::Result<FileKind> FakeFileSystem::kindOf(const Path& path) {
@@ -190,8 +200,9 @@ Status FakeFileSystem::rename(const Path& from, const Path& to) {
   const Path place = placeOf(to);
   if (node == nodes.end()) return Status::failure(ENOENT, "rename " + from.string());
   if (const int cause = obstacleToReplacing(place)) return Status::failure(cause, "rename to " + to.string());
-  nodes[place] = node->second;
+  Node moved = std::move(node->second);
   nodes.erase(node);
+  nodes[place] = std::move(moved);
   return {};
 }
 
