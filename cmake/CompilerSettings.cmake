@@ -45,9 +45,9 @@ else()
 endif()
 
 if(ACCOUNTS_FUZZ)
-  # What the fuzzers are guided by; only they link the fuzzing engine itself.
+  # What the fuzzers are guided by; only they link the fuzzing engine itself, which the shared libraries call.
   add_compile_options(-fsanitize=fuzzer-no-link)
-  add_link_options(-fsanitize=fuzzer-no-link)
+  add_link_options(-fsanitize=fuzzer-no-link -Wl,-z,undefs)
 endif()
 
 if(ACCOUNTS_COVERAGE)
