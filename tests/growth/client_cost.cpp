@@ -42,10 +42,10 @@ int main(int, char** arguments) {
   const auto opened = AccountSettings::open();
   require(opened.isOk() && opened->accounts().isOk());
   // Another one at each change, in whichever run: what the file holds already would not be made anew.
-  std::int64_t port = opened->accounts()->withIdentifier(identifier)->integer("Port").value();
+  std::int64_t port = opened->accounts().value().withIdentifier(identifier)->integer("Port").value();
   const std::pair<const char*, std::function<void()>> pieces[] = {
       {"look in the store", [&] { require(AccountsManager::init()->accountWithIdentifier(identifier) != nullptr); }},
-      {"look", [&] { require(opened->accounts()->withIdentifier(identifier).has_value()); }},
+      {"look", [&] { require(opened->accounts().value().withIdentifier(identifier).has_value()); }},
       {"change in the store",
        [&] {
          const auto store = AccountsManager::init();
