@@ -6,7 +6,9 @@ import sys
 import tempfile
 from pathlib import Path
 
+from migration_rehearse import scratch
 from migration_rehearse.campaign import in_shard
+from migration_rehearse.engines import EngineFault
 
 STANDARD_INPUT = "-"
 
@@ -49,6 +51,10 @@ def absolute(path):
 
 def _spooled(stream):
     """What can be read once only, kept on disk so that it can be read again."""
-    file = tempfile.TemporaryFile()
-    shutil.copyfileobj(stream, file)
+    try:
+        file = tempfile.TemporaryFile(dir=scratch.place())
+        shutil.copyfileobj(stream, file)
+        file.flush()
+    except OSError as failure:
+        raise EngineFault(f"{scratch.place()}: the list cannot be kept there: {failure.strerror}") from failure
     return file

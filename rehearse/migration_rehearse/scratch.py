@@ -17,11 +17,16 @@ PREFIX = "migration-rehearse-"
 NAME = re.compile(PREFIX + "[a-z0-9_]{8}")  # as mkdtemp makes them
 
 
+def place():
+    """Where they stand."""
+    return os.environ.get("TMPDIR") or "/tmp"
+
+
 class Scratch:
     """A directory of its own below `parent`. Raises OSError."""
 
     def __init__(self, parent=None):
-        parent = os.path.abspath(parent or os.environ.get("TMPDIR") or "/tmp")
+        parent = os.path.abspath(parent or place())
         _sweep(parent)
         self.name, descriptor = _made(parent)
         self._end = weakref.finalize(self, _remove, self.name, descriptor)

@@ -321,6 +321,8 @@ class Telling(RehearseTest):
         for wrong in ("/nowhere", "/dev/null"):
             told = self.rehearse(self.image("one"), status=5, env={**os.environ, "TMPDIR": wrong})
             self.assertIn(f"{wrong}/migration-rehearse-", told)
+            told = self.rehearse("--list", "-", status=5, text="/nowhere\n", env={**os.environ, "TMPDIR": wrong})
+            self.assertIn(f"{wrong}: the list cannot be kept there", told)
 
     def test_of_a_host_that_cannot_be_used_ends_with_5(self):
         self.assertIn("no such program", self.rehearse("--host", "/nowhere", "/", status=5))
