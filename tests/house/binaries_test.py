@@ -6,6 +6,10 @@ without lists exports nothing. After a change that was meant, write the lists an
 internal, move what is public, and read the difference:
 
     python3 tests/house/binaries_test.py --write BUILD_TREE
+
+What the client's library exports is listed in client/exported_symbols.map, too, under the version that brought it. The
+same command lists what is new under the last version there, unless that was released; then the library is to be built
+again, and the lists written again.
 """
 
 import json
@@ -20,6 +24,8 @@ from pathlib import Path
 REVIEWED = Path(__file__).resolve().parent / "exported"
 INTERNAL = ".internal"
 SOURCES = Path(__file__).resolve().parent.parent.parent
+CLIENT_MAP = SOURCES / "client" / "exported_symbols.map"
+CHANGELOG = SOURCES / "CHANGELOG.md"
 # Private to a class, and called by those of its operations that stand in the header.
 CALLED_BY_INLINE_OPERATIONS = {
     "BasicAccount::acceptProperties", "Dictionary::editable", "DeviceLocalAccount::propertiesWithClass", "LogHandle::write",
@@ -77,6 +83,55 @@ def write_lists(libraries):
             list_of(name, kind).unlink(missing_ok=True)
             if names:
                 list_of(name, kind).write_text("\n".join(sorted(names)) + "\n", encoding="utf-8")
+
+
+def marked_in(build_tree):
+    """What the sources of the client's library mark as its interface, whether it is exported or not."""
+    commands = json.loads((build_tree / "compile_commands.json").read_text(encoding="utf-8"))
+    objects = [build_tree / re.search(r" -o (\S+)", each["command"])[1] for each in commands
+               if Path(each["file"]).parent in (SOURCES / "client", SOURCES / "bindings")]
+    lines = [line.split() for line in output_of("readelf", "-sW", *objects).splitlines()]
+    names = {fields[7] for fields in lines if len(fields) == 8 and fields[4] in ("GLOBAL", "WEAK")
+             and fields[5] == "DEFAULT" and fields[6] != "UND"
+             and re.match(r"_Z(T[ISV])?NK?[RO]?8accounts|account_settings_", fields[7])}
+    return set(output_of("c++filt", *sorted(names)).splitlines())
+
+
+def versions_in(text):
+    """The symbols of each version of the client's library, by its name; the last version comes last."""
+    nodes = re.findall(r"^(\w+(?:\.\d+)*) \{\n(.*?)^\}", text, re.MULTILINE | re.DOTALL)
+    return {name: set(re.findall(r'^ +"?(accounts::[^"]+|[^"]* for accounts::[^"]+|account_settings_\w+)"?;$', symbols,
+                                 re.MULTILINE)) for name, symbols in nodes}
+
+
+def is_released(version, changelog):
+    release = ".".join([*version.rsplit("_", 1)[1].split("."), "0", "0"][:3])
+    return f"## {release} (unreleased)" not in changelog
+
+
+def map_of(versions):
+    text = "/* The interface of the client's library, each symbol under the version that brought it. Written by\n"
+    text += " * tests/house/binaries_test.py --write. */\n"
+    before = ""
+    for version, symbols in versions.items():
+        cpp = "".join(f'      "{symbol}";\n' for symbol in sorted(symbols) if "::" in symbol)
+        cpp = cpp and f'    extern "C++" {{\n{cpp}    }};\n'
+        c = "".join(f"    {symbol};\n" for symbol in sorted(symbols) if "::" not in symbol)
+        local = "" if before else "  local:\n    *;\n"
+        text += f"{version} {{\n  global:\n{cpp}{c}{local}}}{before};\n"
+        before = f" {version}"
+    return text
+
+
+def map_with(marked, text, changelog):
+    """The map where this is the interface: what is new has come with the last version."""
+    versions = versions_in(text)
+    last = list(versions)[-1]
+    new = marked.difference(*versions.values())
+    if new and is_released(last, changelog):
+        raise SystemExit(f"{last} was released: {CLIENT_MAP} needs another version for {sorted(new)}")
+    versions[last] |= new
+    return map_of({version: symbols & marked for version, symbols in versions.items()})
 
 
 def private_members(header):
@@ -174,6 +229,33 @@ class Binaries(unittest.TestCase):
                 self.assertIn("__stack_chk_fail", imported_by(path))
 
 
+class SymbolsOfTheClientsLibrary(unittest.TestCase):
+    maxDiff = None
+
+    @classmethod
+    def setUpClass(cls):
+        cls.marked = marked_in(Binaries.build_tree)
+        cls.map = CLIENT_MAP.read_text(encoding="utf-8")
+
+    def test_are_all_listed_once(self):
+        listed = [symbol for symbols in versions_in(self.map).values() for symbol in symbols]
+        self.assertGreater(len(listed), 100)
+        self.assertEqual(sorted(self.marked), sorted(listed))
+
+    def test_are_listed_as_they_are_written(self):
+        self.assertEqual(self.map, map_of(versions_in(self.map)))
+
+    def test_come_with_the_last_version_before_its_release_and_not_after(self):
+        marked = self.marked | {"account_settings_added"}
+        before = map_with(marked, self.map, "## 1.0.0 (unreleased)")
+        self.assertEqual(marked, versions_in(before)["ACCOUNTSETTINGS_CLIENT_1"])
+        with self.assertRaisesRegex(SystemExit, "ACCOUNTSETTINGS_CLIENT_1 was released.*account_settings_added"):
+            map_with(marked, self.map, "## 1.1.0 (unreleased)\n\n## 1.0.0")
+        next_version = self.map + "ACCOUNTSETTINGS_CLIENT_1.1 {\n} ACCOUNTSETTINGS_CLIENT_1;\n"
+        after = versions_in(map_with(marked, next_version, "## 1.1.0 (unreleased)\n\n## 1.0.0"))
+        self.assertEqual((self.marked, {"account_settings_added"}), tuple(after.values()))
+
+
 class Compilation(unittest.TestCase):
     """Flags that leave no trace in a binary that happens to have no use for them."""
 
@@ -196,6 +278,8 @@ class Compilation(unittest.TestCase):
 
 if __name__ == "__main__":
     if sys.argv[1:2] == ["--write"]:
+        written = map_with(marked_in(Path(sys.argv[2])), CLIENT_MAP.read_text("utf-8"), CHANGELOG.read_text("utf-8"))
+        CLIENT_MAP.write_text(written, encoding="utf-8")
         write_lists(path for path in binaries_below(Path(sys.argv[2]) / "lib"))
     else:
         unittest.main()
