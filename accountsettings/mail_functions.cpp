@@ -7,12 +7,12 @@
 namespace accountsettings {
 
 bool _UseGoogleMail() {
-  static const bool answer = [] {
+  static const bool kAnswer = [] {
     const std::optional<platform::PropertyValue> regional =
         platform::current().deviceInfo->answer("RegionalBehaviorGoogleMail");
     return regional && regional->booleanValue().value_or(false);
   }();
-  return answer;
+  return kAnswer;
 }
 
 void reportMailAccountClassFound(const platform::Dictionary& /*properties*/, std::string_view /*reason*/) {}
