@@ -205,8 +205,8 @@ ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_date(doub
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_data(const uint8_t* data, size_t size);
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_list(void);
 ACCOUNT_SETTINGS_API account_settings_value* account_settings_value_of_dictionary(void);
-/* Fills a list or dictionary with a copy of the element, at a cost that does not grow with what it has. False for another
- * kind, and for want of memory. */
+/* Fills a list or dictionary with a copy of the element, at a cost that does not grow with what it has. False for
+ * another kind, and for want of memory. */
 ACCOUNT_SETTINGS_API bool account_settings_value_append(account_settings_value* list,
                                                         const account_settings_value* element);
 ACCOUNT_SETTINGS_API bool account_settings_value_set(account_settings_value* dictionary, const char* key,
@@ -279,8 +279,8 @@ ACCOUNT_SETTINGS_API void account_settings_changes_free(account_settings_changes
 
 /* --- Watch --- */
 
-/* The change is lent for the call: a list of this one. Must not throw, or jump out. Called by the watch's own thread, or
- * by the one that dispatches. */
+/* The change is lent for the call: a list of this one. Must not throw, or jump out. Called by the watch's own thread,
+ * or by the one that dispatches. */
 typedef void (*account_settings_callback)(const account_settings_changes* change, void* data);
 
 enum { ACCOUNT_SETTINGS_OWN_THREAD, ACCOUNT_SETTINGS_EVENT_LOOP };
