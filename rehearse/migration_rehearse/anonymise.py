@@ -3,6 +3,7 @@ and whatever the migration looks at stays, so that it does with the archive what
 
 import contextlib
 import datetime
+import functools
 import io
 import os
 import plistlib
@@ -53,20 +54,20 @@ def key_of(path):
     return key
 
 
-def anonymise(image, key, output, program):
+def anonymise(image, key, output, program, limits=host.Limits(), bounds=unpacking.Bounds()):
     """Writes the archive, and proves it: the host does the same with both, and no word that was replaced is in it.
     Raises CannotAnonymise; then nothing is written."""
     with Scratch(os.path.dirname(os.path.abspath(output))) as scratch:
         replacer = Replacer(key, product_texts(program))
         try:
-            root = image if os.path.isdir(image) else unpacker.unpack(image, _made(scratch, "original"))
+            root = image if os.path.isdir(image) else unpacker.unpack(image, _made(scratch, "original"), bounds)
         except Fault as fault:
             raise CannotAnonymise(f"{image}: {fault}") from fault
         pieces = list(pieces_of(root, replacer))
         archive = os.path.join(scratch, "anonymised.tar.gz")
         write(pieces, archive)
         check_words(pieces, replacer)
-        check_facts(image, archive, program)
+        check_facts(image, archive, functools.partial(_rehearsed, program, limits, bounds))
         os.replace(archive, output)
     return len(replacer.words)
 
@@ -197,12 +198,12 @@ def texts_in(value):
     return [value] if isinstance(value, str) else []
 
 
-def check_facts(image, archive, program):
-    """That the migration does the same with both."""
-    before = _rehearsed(image, program)
+def check_facts(image, archive, rehearsed):
+    """That the migration does the same with both; `rehearsed` answers what it does with one."""
+    before = rehearsed(image)
     if before.verdict not in EXPLAINED:
         raise CannotAnonymise(f"{image}: there is no explanation of what the migration does with it ({_why(before)})")
-    after = _rehearsed(archive, program)
+    after = rehearsed(archive)
     different = [name for name in SAME if getattr(before, name) != getattr(after, name)]
     if different:
         raise CannotAnonymise(f"the migration would do something else with it: its {', '.join(different)} would differ")
@@ -212,10 +213,9 @@ def _why(rehearsed):
     return rehearsed.detail or CAUSES.get(rehearsed.cause, rehearsed.verdict)
 
 
-def _rehearsed(path, program):
+def _rehearsed(program, limits, bounds, path):
     identified, = rehearsal.identify([rehearsal.Image(str(path))])
     if identified.fault:
         raise CannotAnonymise(f"{path}: {Fault(*identified.fault)}")
     return rehearsal.rehearse(rehearsal.Task(identified.path, identified.kind, identified.content, program,
-                                             rehearsal.digest_here(program), host.Limits(), unpacking.Bounds(),
-                                             identified.identifiers))
+                                             rehearsal.digest_here(program), limits, bounds, identified.identifiers))

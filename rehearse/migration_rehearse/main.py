@@ -157,10 +157,12 @@ def make_anonymous(arguments, version):
     made.add_argument("--key", metavar="FILE", default="campaign.key",
                       help="the campaign's key, made when it is missing (default: campaign.key)")
     options.add_host_options(made)
+    options.add_limits(made)
     asked = made.parse_args(arguments)
     program = host.Host(asked.host, asked.plugin, asked.resources).found()
     try:
-        words = anonymise.anonymise(asked.image, anonymise.key_of(asked.key), asked.output, program)
+        words = anonymise.anonymise(asked.image, anonymise.key_of(asked.key), asked.output, program,
+                                    options.limits_of(asked), options.bounds_of(asked))
     except anonymise.CannotAnonymise as why:
         return say(why, SOME_UNREHEARSED)
     except OSError as failure:

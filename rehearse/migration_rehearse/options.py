@@ -114,11 +114,11 @@ def run_parser(version):
     where.add_argument("--scheduler", metavar="ADDRESS", help="the workers of this Dask scheduler instead")
     where.add_argument("--shard", metavar="N/M", type=shard, default=(1, 1),
                        help="only the Nth of M parts of the images, the same in every call")
-    _add_limits(made)
+    add_limits(made)
     return made
 
 
-def _add_limits(made):
+def add_limits(made):
     limits, bounds = Limits(), Bounds()
     group = made.add_argument_group("limits, for each image")
     for name, metavar, reader, default, of_what in (

@@ -67,7 +67,8 @@ def pattern_of(lines):
 # What the sanitizers keep beside a program's memory is more than any limit of it.
 REHEARSE = """#!/bin/sh
 case "$SANITIZE $1" in
-  ' '* | *' merge' | *' report' | *' compare' | *' anonymise') exec "{program}" "$@" ;;
+  ' '* | *' merge' | *' report' | *' compare') exec "{program}" "$@" ;;
+  *' anonymise') shift; exec "{program}" anonymise --memory 0 "$@" ;;
   *) exec "{program}" --memory 0 "$@" ;;
 esac
 """
