@@ -27,6 +27,7 @@ struct Freed {
   void operator()(account_settings_accounts* accounts) const { account_settings_accounts_free(accounts); }
   void operator()(account_settings_changes* changes) const { account_settings_changes_free(changes); }
   void operator()(account_settings_value* value) const { account_settings_value_free(value); }
+  void operator()(account_settings_watch* watch) const { account_settings_watch_free(watch); }
 };
 template <typename Handle>
 std::unique_ptr<Handle, Freed> owned(Handle* handle) {
@@ -299,13 +300,14 @@ TEST_F(FailuresInC, OfSavingSayThatALaterReleasesFileIsThereNow) {
 TEST_F(FailuresInC, SayThatTheProcessWatchesTooMuchAlready) {
   const auto settings = opened();
   const auto seen = owned(account_settings_look(settings.get(), nullptr));
-  EXPECT_EQ(withoutDescriptors([&] {
-              return codeOf([&](auto** error) {
-                return account_settings_watch_begin(settings.get(), seen.get(), nullptr, nullptr,
-                                                    ACCOUNT_SETTINGS_EVENT_LOOP, error) != nullptr;
-              });
-            }),
-            ACCOUNT_SETTINGS_NOT_WATCHED);
+  const auto begun = [&](auto** error) {
+    return account_settings_watch_begin(settings.get(), seen.get(), nullptr, nullptr, ACCOUNT_SETTINGS_EVENT_LOOP,
+                                        error);
+  };
+  const auto other = owned(begun(static_cast<account_settings_error**>(nullptr)));
+  EXPECT_NE(other, nullptr);
+  const auto codeOfOneMore = [&] { return codeOf([&](auto** error) { return begun(error) != nullptr; }); };
+  EXPECT_EQ(withoutDescriptors(codeOfOneMore), ACCOUNT_SETTINGS_NOT_WATCHED);
 }
 
 class LookingInC : public FailuresInC {};

@@ -208,6 +208,7 @@ TEST_F(WatchingAccounts, MayChangeWhatItIsToldOf) {
 TEST_F(WatchingAccounts, SaysThatTheProcessWatchesTooMuchAlready) {
   const auto settings = opened();
   const auto seen = looked();
+  const Watch other = watched(recorder());
   EXPECT_EQ(withoutDescriptors([&] { return codeOf(settings.watch(seen, recorder())); }), accounts::Code::notWatched);
 }
 

@@ -113,7 +113,8 @@ class DeviceWithAccounts : public ::testing::Test {
     return answer;
   }
 
-  // What the function answers where the process can have no further file, and no further watch.
+  // What the function answers where the process can have no further file, and no further watch. It is to have done the
+  // same with them before: a sanitizer looks for an object's type through a pipe, and remembers what it saw.
   template <typename Function>
   static auto withoutDescriptors(const Function& function) -> decltype(function()) {
     rlimit before{};
