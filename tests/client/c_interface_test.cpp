@@ -304,8 +304,7 @@ TEST_F(FailuresInC, SayThatTheProcessWatchesTooMuchAlready) {
     return account_settings_watch_begin(settings.get(), seen.get(), nullptr, nullptr, ACCOUNT_SETTINGS_EVENT_LOOP,
                                         error);
   };
-  const auto other = owned(begun(static_cast<account_settings_error**>(nullptr)));
-  EXPECT_NE(other, nullptr);
+  EXPECT_NE(owned(begun(static_cast<account_settings_error**>(nullptr))), nullptr);
   const auto codeOfOneMore = [&] { return codeOf([&](auto** error) { return begun(error) != nullptr; }); };
   EXPECT_EQ(withoutDescriptors(codeOfOneMore), ACCOUNT_SETTINGS_NOT_WATCHED);
 }

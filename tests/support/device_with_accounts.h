@@ -7,6 +7,7 @@
 #include <filesystem>
 #include <new>
 #include <string>
+#include <system_error>
 #include <utility>
 
 #include "accounts/account_settings.h"
@@ -113,10 +114,11 @@ class DeviceWithAccounts : public ::testing::Test {
     return answer;
   }
 
-  // What the function answers where the process can have no further file, and no further watch. It is to have done the
-  // same with them before: a sanitizer looks for an object's type through a pipe, and remembers what it saw.
+  // What the function answers where the process can have no further file, and no further watch. A sanitizer looks for
+  // an object's type through a pipe, and remembers what it saw: so the same is to be done once while there are files.
   template <typename Function>
   static auto withoutDescriptors(const Function& function) -> decltype(function()) {
+    EXPECT_FALSE(std::generic_category().message(EMFILE).empty());
     rlimit before{};
     EXPECT_EQ(::getrlimit(RLIMIT_NOFILE, &before), 0);
     const int lowest = ::dup(0);
