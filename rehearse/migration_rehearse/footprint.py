@@ -47,6 +47,7 @@ BEGIN_LENGTH = 13
 MAX_LINKS = 40
 MAX_HASHED = 256 << 20  # of one file; no reader of the run takes more
 BLOCK = 1 << 20
+LINK = ("link", b"")  # what stands where a link does, and where links lead nowhere
 
 
 class Footprint(NamedTuple):
@@ -113,13 +114,15 @@ def look_at(root):
     target = target_of(root)
 
     @functools.cache
-    def is_plain(path):
-        parent = path.rpartition("/")[0]
-        return (not parent or is_plain(parent)) and target(path) is None
+    def is_plain(directory):
+        """Whether no link stands on the way to it, itself included."""
+        return not directory or (is_plain(directory.rpartition("/")[0]) and target(directory) is None)
 
     for path in (*FILES, *DIRECTORIES):
-        place = path if is_plain(path) else resolved(path, target)
-        kind, content = _what_stands_at(f"{root}/{place}") if place is not None else ("link", b"")
+        kind, content = _what_stands_at(f"{root}/{path}") if is_plain(path.rpartition("/")[0]) else LINK
+        if kind == "link":
+            place = resolved(path, target)
+            kind, content = LINK if place is None else _what_stands_at(f"{root}/{place}")
         digest.update(f"{path}\0{kind}\0{len(content)}\0".encode())
         digest.update(content)
         identifiers.update(identifier for _, identifier in identifiers_in(content.decode("latin-1")))
@@ -138,6 +141,8 @@ def _what_stands_at(place):
         status = os.lstat(place)
     except OSError as failure:
         return ("missing" if isinstance(failure, (FileNotFoundError, NotADirectoryError)) else "unreadable"), b""
+    if stat.S_ISLNK(status.st_mode):
+        return LINK
     kind = f"{status.st_mode:o} {status.st_uid} {status.st_gid} {min(status.st_nlink, 2)}"
     if stat.S_ISDIR(status.st_mode):
         return f"{status.st_mode:o} {status.st_uid} {status.st_gid}", b""
@@ -154,10 +159,11 @@ def _read(place, limit):
     except OSError:
         return None
     with open(descriptor, "rb") as file:
-        if not stat.S_ISREG(os.fstat(descriptor).st_mode):
+        status = os.fstat(descriptor)
+        if not stat.S_ISREG(status.st_mode):
             return None
         try:
-            return file.read(limit)
+            return file.read(min(limit, status.st_size))  # for what is asked for, memory is taken
         except OSError:
             return None
 

@@ -16,6 +16,7 @@ from collections import deque
 PR_SET_PDEATHSIG = 1
 NUMBER = struct.Struct("q")
 LONGEST_MESSAGE = 1 << 16  # bytes; a longer one goes by a file
+PIPE_SIZE = 1 << 16  # bytes that the kernel keeps in one
 
 
 class WorkerDied(Exception):
@@ -99,7 +100,7 @@ class _Worker:
         os.close(self.answers)
 
     def hear(self):
-        block = os.read(self.answers, 1 << 20)
+        block = os.read(self.answers, PIPE_SIZE)
         self.is_dead = not block
         self._heard += block
         answers, end = [], 0

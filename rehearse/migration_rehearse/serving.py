@@ -12,6 +12,7 @@ import threading
 import time
 
 from migration_rehearse import host
+from migration_rehearse.pool import PIPE_SIZE
 
 ENVIRONMENT = {**host.ENVIRONMENT, "LD_BIND_NOW": "1"}  # what is looked up before the fork is looked up once
 SERVE = "--serve-rehearsals"
@@ -85,7 +86,7 @@ class Server:
 
     def _hear(self, deadline):
         left = None if deadline is None else max(0, deadline - time.monotonic()) * 1000
-        heard = os.read(self._process.stdout.fileno(), 1 << 20) if self._poll.poll(left) else b""
+        heard = os.read(self._process.stdout.fileno(), PIPE_SIZE) if self._poll.poll(left) else b""
         if not heard:
             raise ServerLost("it says nothing")
         self._said += heard
