@@ -31,7 +31,8 @@ struct ForkedRun {
 };
 
 // Does the work in a child of this process, so that whatever becomes of it there becomes of nothing else, and waits for
-// its end; the work's answer is the child's exit status. The child has what this process has loaded, no input, no
+// its end; the work's answer is the child's exit status. What the child still holds then is not given back, but what it
+// has printed is said. The child has what this process has loaded, no input, no
 // descriptor of this process, a session of its own, and it dies with this process. What is left of the session after
 // it is killed. `listener` is a descriptor of a pipe for whose reader all of it is done: where that has gone, the
 // child is ended and the answer is a failure, as it is where no child can be made. To be called from one thread.

@@ -111,7 +111,10 @@ void keepResources(const platform::Platform& platform) {
   for (const auto& entry : std::filesystem::directory_iterator{platform.directories->resources(), none}) {
     if (entry.path().extension() != ".plist") continue;
     auto read = platform.propertyLists->readDictionary(entry.path());
-    if (read.isOk()) lists->emplace(entry.path(), read.take());
+    if (!read.isOk()) continue;
+    // What libplist calls to write is looked up here once, and not in each child.
+    static_cast<void>(platform.propertyLists->serialize(read.value()));
+    lists->emplace(entry.path(), read.take());
   }
   keptLists = std::move(lists);
 }
