@@ -1,5 +1,6 @@
 """The unit that runs the migration at boot: accepted by systemd, confined, and with enough rights for the work."""
 
+import fcntl
 import os
 import re
 import shutil
@@ -15,6 +16,13 @@ BUILD_TREE = Path(os.environ["BUILD_TREE"])
 UNIT = "lib/systemd/system/migration-host.service"
 # In tenths, as systemd-analyze wants it; 0 is best. What is left is what the work needs: changing owners, and root.
 WORST_EXPOSURE = 13
+# Those that the loader of programs knows; with LD_TRACE_LOADED_OBJECTS it lists libraries in place of a run.
+VARIABLES_OF_LOADER = {
+    "LD_ASSUME_KERNEL", "LD_AUDIT", "LD_BIND_NOT", "LD_BIND_NOW", "LD_DEBUG", "LD_DEBUG_OUTPUT", "LD_DYNAMIC_WEAK", "LD_HWCAP_MASK",
+    "LD_LIBRARY_PATH", "LD_ORIGIN_PATH", "LD_POINTER_GUARD", "LD_PREFER_MAP_32BIT_EXEC", "LD_PRELOAD", "LD_PROFILE",
+    "LD_PROFILE_OUTPUT", "LD_SHOW_AUXV", "LD_TRACE_LOADED_OBJECTS", "LD_TRACE_PRELINKING", "LD_USE_LOAD_BIAS", "LD_VERBOSE",
+    "LD_WARN",
+}
 ALL_CAPABILITIES = range(41)
 NEEDED_CAPABILITIES = {"CAP_CHOWN": 0, "CAP_DAC_OVERRIDE": 1, "CAP_FOWNER": 3}
 
@@ -67,7 +75,7 @@ class InstalledUnit(DeviceTest):
     def test_keeps_passwords_out_of_core_files_and_the_environment_out_of_the_host(self):
         self.assertEqual(["0"], self.settings("LimitCORE"))
         unset = " ".join(self.settings("UnsetEnvironment")).split()
-        self.assertLessEqual({"TMPDIR", "LD_PRELOAD", "LD_LIBRARY_PATH", "LD_AUDIT", "DBUS_SYSTEM_BUS_ADDRESS"}, set(unset))
+        self.assertLessEqual({"TMPDIR", "DBUS_SYSTEM_BUS_ADDRESS", *VARIABLES_OF_LOADER}, set(unset))
 
     def test_is_bounded_in_what_it_takes(self):
         self.assertEqual(["90s"], self.settings("TimeoutStartSec"))
@@ -97,6 +105,18 @@ class InstalledUnit(DeviceTest):
         self.assertEqual((4711, 4712), (status.st_uid, status.st_gid))
         self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
 
+    @unittest.skipIf(os.getuid() != 0, "only root mounts /proc")
+    def test_lets_the_host_see_for_whom_it_waits(self):
+        device = self.example("first-generation")
+        lock = device.path("tmp/AccountMigrationInProgress")
+        lock.parent.mkdir(mode=0o1777)
+        limits = {"hidepid": self.settings("ProtectProc"), "subset": self.settings("ProcSubset")}
+        options = ",".join(f"{name}={value}" for name, values in limits.items() for value in values)
+        with open(lock, "xb") as held:
+            fcntl.flock(held, fcntl.LOCK_EX)
+            mounted = ("unshare", "--mount", "sh", "-c", f'mount -t proc -o {options} proc /proc && exec "$0" "$@"')
+            said = run(*mounted, HOST, "--root", device.root, "--lock-timeout", "0", expected=8)
+        self.assertIn(f"wait any longer for process {os.getpid()} ", " ".join(said))
 
     def allowed_calls(self):
         """The system calls that the unit's filters leave, in their order: a list that is added, or taken away."""
@@ -127,7 +147,7 @@ def calls_of(name):
 
 
 class Fragments(DeviceTest):
-    """The user and the directories, made in a root of the test's own."""
+    """The user, the directories and the locks, made in a root of the test's own."""
 
     def setUp(self):
         super().setUp()
@@ -135,7 +155,7 @@ class Fragments(DeviceTest):
         (self.root / "etc").mkdir(parents=True)
         run("cmake", "--install", BUILD_TREE, "--prefix", self.root / "usr", "--component", "host")
 
-    def test_make_the_mobile_user_and_its_directories(self):
+    def test_make_the_mobile_user_its_directories_and_locks_that_nobody_else_holds(self):
         if os.getuid() != 0:
             self.skipTest("only root gives directories to another user")
         run("systemd-sysusers", f"--root={self.root}", "account-settings.conf")
@@ -148,6 +168,9 @@ class Fragments(DeviceTest):
         }.items():
             status = (self.root / "var/mobile" / directory).stat()
             self.assertEqual((int(user), int(group), mode), (status.st_uid, status.st_gid, status.st_mode & 0o7777))
+        for lock in ("AccountMigrationInProgress", "AccountSettingsChange", "AccountSettingsNext"):
+            status = (self.root / "tmp" / lock).stat()
+            self.assertEqual((0, int(group), 0o100640), (status.st_uid, status.st_gid, status.st_mode), lock)
 
 
 if __name__ == "__main__":
