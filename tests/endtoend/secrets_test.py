@@ -1,17 +1,22 @@
 """Credentials stay in the files: nothing that a program says, logs or traces shows one."""
 
 import base64
+import fcntl
 import itertools
+import os
 import plistlib
+import subprocess
 import unittest
 from pathlib import Path
 
 from accountctl_case import ACCOUNTCTL
 from device import CURRENT_VERSION, LEGACY_EXCHANGE, LEGACY_MAIL, SETTINGS, SETTINGS_COPY, run_host
 from device_case import HOST, DeviceTest
+from failed_saves_test import without_capabilities
 
 DEVICES = Path(__file__).parent / "devices"
 MARK = "S3CR3T"
+ALL_CAPABILITIES = range(41)
 HIDDEN = "<hidden>"
 CREDENTIAL_KEYS = [
     "Password", "IMAP password", "OAuth Token", "access_token", "clientSecret", "Session-Cookie", "Cookies",
@@ -117,6 +122,20 @@ class Secrets(DeviceTest):
             with self.subTest(option):
                 golden = plistlib.loads((DEVICES / "version-00" / "settings.plist").read_bytes())
                 self.migrate(self.planted_device(golden, LEGACY_MAIL_ACCOUNTS, LEGACY_EXCHANGE_ACCOUNTS), option)
+
+    @unittest.skipIf(os.environ["SANITIZE"], "a sanitizer looks at the process itself")
+    def test_in_memory_are_kept_from_core_files_and_from_programs_of_the_same_user(self):
+        device = self.device(Version=CURRENT_VERSION)
+        lock = device.path("tmp/AccountMigrationInProgress")
+        lock.parent.mkdir(mode=0o1777)
+        as_user = {"preexec_fn": without_capabilities(*ALL_CAPABILITIES), "stderr": subprocess.PIPE}
+        with open(lock, "xb") as held:
+            fcntl.flock(held, fcntl.LOCK_EX)
+            with subprocess.Popen([HOST, "--root", device.root], **as_user) as host:
+                self.assertIn(b"waiting for", host.stderr.readline())
+                looked = subprocess.run(["cat", f"/proc/{host.pid}/maps"], stdout=subprocess.PIPE, check=False, **as_user)
+                fcntl.flock(held, fcntl.LOCK_UN)
+        self.assertEqual((1, b""), (looked.returncode, looked.stdout))
 
     def ask_about_accounts(self, device):
         for words in (["list"], ["list", "--json"]):
