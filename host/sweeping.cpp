@@ -8,7 +8,6 @@
 
 #include "host/say.h"
 #include "platform/device_places.h"
-#include "platform/linux/property_lists/libplist_conversion.h"
 #include "platform/platform.h"
 #include "platform/run_observer.h"
 #include "records/fact_observer.h"
@@ -24,6 +23,7 @@ using platform::Result;
 
 constexpr std::uint32_t kOwnerOnly = 0600;
 constexpr std::string_view kContentsBegin = "bplist00";
+constexpr std::size_t kMaxRead = std::size_t{64} << 20U;  // of all together: sparse files cost who makes them nothing
 
 // Where the process died early, there is a part of it, or nothing yet.
 bool isLeftBySave(const FileCopy& file, std::uint32_t directoryOwner, std::chrono::system_clock::time_point start) {
@@ -44,10 +44,12 @@ void sweepTemporaryFiles(const snapshots::Storage& storage, std::chrono::system_
   const Result<std::vector<std::string>> entries = storage.keeper->entriesOf(directory);
   if (!entries.isOk()) return;
   const platform::RunStage stage{"before the run"};
+  std::size_t left = kMaxRead;
   for (const std::string& name : entries.value()) {
     if (!platform::isNameOfSave(name)) continue;
     const Path path = directory / name;
-    const Result<FileCopy> file = storage.keeper->read(path, platform::kMaxPropertyListSize);
+    const Result<FileCopy> file = storage.keeper->read(path, left);
+    if (file.isOk()) left -= file.value().bytes.size();
     const Result<FileAttributes> holder = storage.keeper->attributesOf(directory);
     if (!file.isOk() || !holder.isOk() || !isLeftBySave(file.value(), holder.value().owner, start)) continue;
     const platform::Status removed = storage.keeper->removeFile(path);

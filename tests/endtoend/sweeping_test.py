@@ -2,6 +2,7 @@
 
 import os
 import plistlib
+import resource
 import time
 import unittest
 
@@ -70,6 +71,15 @@ class OtherFiles(Sweeping):
     def assert_stays(self, path):
         self.assertEqual([], self.swept.migrate(HOST).errors)
         self.assertTrue(os.path.lexists(path), path)
+
+    def test_of_much_more_than_a_run_reads_stay_and_keep_no_run_from_its_end(self):
+        for number in range(100):
+            path = self.leave(f"file{number:06}", CONTENT)
+            os.truncate(path, 256 << 20)
+            os.utime(path, (AN_HOUR_AGO, AN_HOUR_AGO))
+        seconds = 10
+        run = self.swept.migrate(HOST, prepare=lambda: resource.setrlimit(resource.RLIMIT_CPU, (seconds, seconds)))
+        self.assertEqual((0, 100), (run.status, len(self.names())), run.errors)
 
     def test_of_other_names_stay(self):
         for name in ("fileAAAAA", "fileAAAAAAA", "FileAAAAAA", "fileAAAA.A", "fileAAAAA\n", "file", "xfileAAAAA", "fileÄÄÄ"):
