@@ -2,6 +2,7 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <random>
 #include <utility>
 
 #include "host/say.h"
@@ -41,8 +42,29 @@ Path numbered(const Path& place, std::string_view why, int number) {
   return place.string() + "." + std::string{why} + "-" + std::to_string(number);
 }
 
+// Of the numbers from the first to the last one.
+Result<Path> freeName(platform::FileKeeper& keeper, const Path& place, std::string_view why, int first, int last) {
+  for (int number = first; number <= last; ++number) {
+    Path name = numbered(place, why, number);
+    const Status there = keeper.attributesOf(name).status();
+    if (there.cause() == platform::Cause::missing) return name;
+    if (!there.isOk()) return there;
+  }
+  return Status::failure(EEXIST, "keep another file beside " + place.string());
+}
+
 void tellKept(const std::string& file, const Path& where) {
   records::tellFact([&] { return records::KeptAside{file, where.string()}; });
+}
+
+void tellPutAside(const MigrationFile& file, const std::string& why, const Path& where) {
+  const bool isSettings = file.part == MigrationFile::Part::settings;
+  const std::string from = isSettings ? std::string{} : file.path.string();
+  const LossCode code = isSettings ? LossCode::unreadableSettingsFile : LossCode::unreadableLegacyFile;
+  records::tellFact(
+      [&] { return records::Lost{.code = code, .account = {}, .detail = why, .file = from, .where = {}}; });
+  tellKept(from, where);
+  if (!isSettings) records::tellFact([&] { return records::FileRemoved{from, true}; });
 }
 
 void sayNoRoom(const Path& place, std::string_view why) {
@@ -55,6 +77,26 @@ void sayNoRoom(const Path& place, std::string_view why) {
 Path settingsIn(const platform::MigrationFootprint& footprint) {
   const auto found = std::ranges::find(footprint.files, MigrationFile::Part::settings, &MigrationFile::part);
   return found == footprint.files.end() ? Path{} : found->path;
+}
+
+// Another name costs no room; and whoever has taken the first ones does not know which one comes then.
+Status putAside(const snapshots::Storage& storage, const MigrationFile& file, const std::string& why,
+                bool isRehearsal) {
+  constexpr int kTooMany = 1'000'000'000;
+  const platform::RunStage stage{"before the run"};
+  Result<Path> name = freeName(*storage.keeper, file.path, kUnreadable, 1, KeepingFiles::kMaxKept);
+  if (name.status().errorNumber() == EEXIST) {
+    const auto random = static_cast<int>(std::random_device{}() % kTooMany);
+    name = freeName(*storage.keeper, file.path, kUnreadable, random + KeepingFiles::kMaxKept, kTooMany * 2);
+  }
+  if (!name.isOk()) return name.status();
+  // A rehearsal moves no directories; that nothing stands there any more is all that the run sees.
+  const Status moved =
+      isRehearsal ? storage.keeper->removeFile(file.path) : storage.files->rename(file.path, name.value());
+  if (!moved.isOk()) return moved;
+  say(file.path.string() + " is nothing that a run can read; it is kept as " + name.value().string());
+  tellPutAside(file, why, name.value());
+  return {};
 }
 
 KeepingFiles::KeepingFiles(std::shared_ptr<platform::FileSystem> files, std::shared_ptr<platform::FileKeeper> keeper,
@@ -84,30 +126,6 @@ std::string_view KeepingFiles::whyToldUnusable() const {
   return why;
 }
 
-// A link that is followed has no attributes that would do for a file.
-Result<FileCopy> KeepingFiles::settings() {
-  constexpr std::uint32_t kOwnerOnly = 0600;
-  Result<FileCopy> own = _keeper->read(_settings, platform::kMaxPropertyListSize);
-  if (!own.isOk() || own.value().attributes.kind == FileKind::file) return own;
-  FileCopy followed = own.take();
-  Result<platform::Bytes> bytes = read(_settings, platform::kMaxPropertyListSize);
-  if (!bytes.isOk()) return bytes.status();
-  followed.bytes = bytes.take();
-  followed.attributes.kind = FileKind::file;
-  followed.attributes.permissions = kOwnerOnly;
-  return followed;
-}
-
-Result<Path> KeepingFiles::freeName(const Path& place, std::string_view why) {
-  for (int number = 1; number <= kMaxKept; ++number) {
-    Path name = numbered(place, why, number);
-    const Status there = _keeper->attributesOf(name).status();
-    if (there.cause() == platform::Cause::missing) return name;
-    if (!there.isOk()) return there;
-  }
-  return Status::failure(EEXIST, "keep another file beside " + place.string());
-}
-
 // A run that could not save finds the same file again: that is kept once.
 Result<Path> KeepingFiles::keptAs(std::string_view why, const FileCopy& settings) {
   for (int number = 1; number <= kMaxKept; ++number) {
@@ -121,7 +139,7 @@ Result<Path> KeepingFiles::keptAs(std::string_view why, const FileCopy& settings
       createDirectories(directory, kDirectoryPermissions).isOk()) {
     static_cast<void>(setOwner(directory, "mobile", "mobile"));
   }
-  Result<Path> name = freeName(_footprint.copyAside, why);
+  Result<Path> name = freeName(*_keeper, _footprint.copyAside, why, 1, kMaxKept);
   if (!name.isOk()) return name;
   const Status copied = _keeper->restore(name.value(), settings.bytes, settings.attributes);
   return copied.isOk() ? std::move(name) : copied;
@@ -129,7 +147,7 @@ Result<Path> KeepingFiles::keptAs(std::string_view why, const FileCopy& settings
 
 Status KeepingFiles::keepSettings(std::string_view why) {
   if (_areSettingsKept || why.empty() || kindOf(_settings) != FileKind::file) return {};
-  const Result<FileCopy> contents = settings();
+  const Result<FileCopy> contents = _keeper->readTarget(_settings, platform::kMaxPropertyListSize);
   if (!contents.isOk()) return contents.status();
   const Result<Path> kept = keptAs(why, contents.value());
   if (!kept.isOk() && kept.status().errorNumber() != EEXIST) return kept.status();
@@ -176,7 +194,7 @@ Status KeepingFiles::remove(const Path& path) {
   if (losses.empty() || !there.isOk() || there.value().kind == FileKind::directory)
     return ForwardingFiles::remove(path);
   const std::string_view why = whyGone(losses.front().code);
-  const Result<Path> name = freeName(path, why);
+  const Result<Path> name = freeName(*_keeper, path, why, 1, kMaxKept);
   if (!name.isOk() && name.status().errorNumber() != EEXIST) return name.status();
   if (!name.isOk()) {
     sayNoRoom(path, why);

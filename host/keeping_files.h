@@ -5,6 +5,7 @@
 #include <string>
 
 #include "host/explanation.h"
+#include "host/snapshots/file_state.h"
 #include "host/snapshots/forwarding_files.h"
 #include "platform/data_class_migrator.h"
 #include "platform/file_keeper.h"
@@ -13,6 +14,11 @@ namespace host {
 
 // The settings among the files that a run may change; empty where the plug-in tells of none.
 [[nodiscard]] platform::Path settingsIn(const platform::MigrationFootprint& footprint);
+
+// Moves what no run can read out of the place of a file with accounts, whatever it is: `PATH.unreadable-1`, and so on.
+// Says so, and tells it as a loss. In a rehearsal it only goes.
+[[nodiscard]] platform::Status putAside(const snapshots::Storage& storage, const platform::MigrationFile& file,
+                                        const std::string& why, bool isRehearsal);
 
 // The device's files as the plug-in gets them where no snapshot is taken: before a run takes away accounts that stand
 // nowhere else, the file that has them is kept under a name of which no run makes use again. The settings are copied
@@ -43,9 +49,7 @@ class KeepingFiles final : public snapshots::ForwardingFiles {
   [[nodiscard]] std::string_view whyUnusable();
   [[nodiscard]] std::string_view whyToldUnusable() const;
   [[nodiscard]] platform::Status keepSettings(std::string_view why);
-  [[nodiscard]] platform::Result<platform::FileCopy> settings();
   [[nodiscard]] platform::Result<Path> keptAs(std::string_view why, const platform::FileCopy& settings);
-  [[nodiscard]] platform::Result<Path> freeName(const Path& place, std::string_view why);
 
   std::shared_ptr<platform::FileKeeper> _keeper;
   platform::MigrationFootprint _footprint;

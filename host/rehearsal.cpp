@@ -38,6 +38,10 @@ class RehearsalKeeper final : public platform::FileKeeper {
     return platform::FileCopy{attributes.value(), bytes.take()};
   }
 
+  Result<platform::FileCopy> readTarget(const Path& path, std::size_t sizeLimit) override {
+    return _changed.contains(path) ? read(path, sizeLimit) : _inner->readTarget(path, sizeLimit);
+  }
+
   Result<std::vector<std::string>> entriesOf(const Path& directory) override { return _inner->entriesOf(directory); }
 
   Status append(const Path& path, std::span<const std::uint8_t> /*bytes*/) override {

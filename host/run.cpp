@@ -82,7 +82,9 @@ void endSession(snapshots::SnapshotSession* session, std::size_t keep, Account& 
                         .onlyInSnapshot = {},
                         .explanation = account.asText(),
                         .explanationAsJson = account.asJson()};
-  for (const records::Lost& lost : verdict.lost) end.onlyInSnapshot.push_back(textOf(lost));
+  for (const records::Lost& lost : verdict.lost) {
+    if (lost.where == session->runSnapshot()) end.onlyInSnapshot.push_back(textOf(lost));
+  }
   if (verdict.lost.empty()) end.onlyInSnapshot = account.foretold;
   if (session->end(end, keep) != snapshots::Ended::rolledBack) return;
   say("the accounts could not be saved; the device is as it was before the run");

@@ -6,6 +6,7 @@
 #include "commandline/progress_line.h"
 #include "commandline/text.h"
 #include "host/explanation_page.h"
+#include "host/keeping_files.h"
 #include "host/rehearsal.h"
 #include "host/say.h"
 #include "host/snapshots/listing.h"
@@ -35,6 +36,9 @@ snapshots::SessionPlace placeFor(const Options& options, platform::MigrationFoot
           .footprint = std::move(footprint),
           .release = HOST_VERSION,
           .warn = [](const std::string& line) { say(line); },
+          .putAside = [isRehearsal = options.isRehearsal](
+                          const snapshots::Storage& of, const platform::MigrationFile& file,
+                          const std::string& why) { return putAside(of, file, why, isRehearsal); },
           .progressed =
               [](const char* what, double share, double upTo) {
                 commandline::progressLine().show({what, share, upTo});

@@ -62,8 +62,8 @@ class Judge {
     _leftOut.push_back(std::move(lost));
   }
   [[nodiscard]] std::string placeOf(const Lost& lost) const {
-    if (!_snapshot.empty()) return _snapshot;
     if (const auto kept = _kept.find(lost.file); kept != _kept.end()) return kept->second;
+    if (!_snapshot.empty()) return _snapshot;
     return lost.file.empty() ? _copy : std::string{};
   }
 

@@ -29,7 +29,7 @@ struct FileCopy {
 };
 
 // What keeping copies of files, and bringing them back exactly, needs beyond the calls of the file system. Paths are
-// absolute, no link at a path itself is followed, and a failed call names its cause.
+// absolute, no link at a path itself is followed but by `readTarget`, and a failed call names its cause.
 class FileKeeper {
  public:
   virtual ~FileKeeper() = default;
@@ -57,6 +57,10 @@ class FileKeeper {
 
   // Sees to it, on stable storage, that no file stands at the path. A directory there is an error.
   virtual Status removeFile(const Path& path) = 0;
+
+  // Reads as above what a link at the path leads to: the regular file that a run would read there, with the attributes
+  // that it has where it stands. What is none is refused (EISDIR, EINVAL), as is what may be planted (ELOOP, EMLINK).
+  virtual Result<FileCopy> readTarget(const Path& path, std::size_t sizeLimit) = 0;
 };
 
 }  // namespace platform

@@ -85,6 +85,10 @@ std::vector<Path> filesIn(const Path& directory, const std::function<bool(const 
   return files;
 }
 
+bool isNumber(std::string_view text) {
+  return !text.empty() && text.find_first_not_of("0123456789") == std::string_view::npos;
+}
+
 // What runs keep beside a file is named for why, and numbered: as in `.unreadable-1`.
 std::vector<Path> keptBeside(const Path& path) {
   constexpr std::array<std::string_view, 5> kReasons{"unreadable", "newer", "interrupted", "unconverted", "unsaved"};
@@ -93,7 +97,7 @@ std::vector<Path> keptBeside(const Path& path) {
     const std::string beginning = path.filename().string() + "." + std::string{reason} + "-";
     std::ranges::move(filesIn(path.parent_path(),
                               [&beginning](const std::string& name) {
-                                return name.size() == beginning.size() + 1 && name.starts_with(beginning);
+                                return name.starts_with(beginning) && isNumber(name.substr(beginning.size()));
                               }),
                       std::back_inserter(kept));
   }
@@ -123,7 +127,7 @@ void lookBesideTheFiles(std::vector<Leftover>& found) {
                          AccountsManager::fullPathToAccountSettingsPlist().filename();
   const Finding kept{"kept-copy", "", "", "a run kept it: what stands in it may stand nowhere else",
                      "a migration leaves it"};
-  for (const Path& path : {copyAside, exchange, mail}) {
+  for (const Path& path : {copyAside, AccountsManager::fullPathToAccountSettingsPlist(), exchange, mail}) {
     for (const Path& each : keptBeside(path)) addIfThere(each, kept, found);
   }
   const Path marker = accountsettings::mailAutoFetchMarkerPath();

@@ -18,8 +18,9 @@ using platform::FileKind;
 constexpr std::size_t kMaxSizeOfOthers = std::size_t{16} << 20U;
 constexpr std::uint32_t kOrdinaryPermissions = 0777;
 
-FileState unkept(std::string why) {
-  return {.contents = kUnkept, .attributes = {}, .bytes = {}, .whyUnkept = std::move(why)};
+FileState unkept(std::string why, bool isUnreadable = true) {
+  return {
+      .contents = kUnkept, .attributes = {}, .bytes = {}, .whyUnkept = std::move(why), .isUnreadable = isUnreadable};
 }
 
 // What whoever owns the directory can bring about keeps a file from being kept; what the machine does is a failure.
@@ -30,9 +31,9 @@ FileState stateAfter(const platform::Status& failure) {
     case EFBIG:
     case EINVAL:
     case EISDIR:
-    case ELOOP:
-    case EMLINK:
     case ENXIO: return unkept(failure.description());
+    case ELOOP:
+    case EMLINK: return unkept(failure.description(), false);
     default: fail(failure.description());
   }
 }
@@ -67,8 +68,9 @@ FileState stateAt(const Storage& storage, const Path& path, Part part) {
     file.attributes = found.value();
     file.attributes.size = 0;
   } else {
-    const std::size_t limit = holdsAccounts(part) ? platform::kMaxPropertyListSize : kMaxSizeOfOthers;
-    platform::Result<platform::FileCopy> read = storage.keeper->read(path, limit);
+    platform::Result<platform::FileCopy> read = holdsAccounts(part)
+                                                    ? storage.keeper->readTarget(path, platform::kMaxPropertyListSize)
+                                                    : storage.keeper->read(path, kMaxSizeOfOthers);
     if (!read.isOk()) return stateAfter(read.status());
     file = read.take();
   }

@@ -40,10 +40,12 @@ struct FileState {
   platform::FileAttributes attributes;  // where there is a file; at most the permissions 0777
   platform::Bytes bytes;                // of a file that is no marker
   std::string whyUnkept;                // one line
+  bool isUnreadable = false;            // is not kept since nobody, no run either, can read it as a property list
 };
 
-// Attributes and bytes are of one and the same file. No copy is kept of what is no regular file, has a second name that
-// somebody may have planted, or is larger than what can be read back. Throws a Problem where it cannot be told.
+// Attributes and bytes are of one and the same file; where a link stands at the path of settings or of a legacy file,
+// of the one that a run would read. No copy is kept of what is no regular file, has a second name that somebody may
+// have planted, or is larger than what can be read back. Throws a Problem where it cannot be told.
 [[nodiscard]] FileState stateAt(const Storage& storage, const Path& path, Part part);
 
 // One of the files that a snapshot is about, as it stood when the snapshot was taken.

@@ -146,6 +146,7 @@ std::string SnapshotSession::restore(const std::string& id) {
     if (file.hasCopy()) static_cast<void>(_store.copyOf(target, file));
   }
   _place.progressed("the present state is kept", 0.3, 0.6);
+  makeWay();
   Manifest before = snapshotFor(description(Manifest::kRestore));
   _journal.begin(before.id, id);
   _place.progressed("the files are brought back", 0.6, 1);

@@ -4,6 +4,7 @@
 #include <cerrno>
 
 #include "host/snapshots/problem.h"
+#include "platform/linux/property_lists/libplist_conversion.h"
 
 namespace host::snapshots {
 namespace {
@@ -85,11 +86,26 @@ Manifest SnapshotSession::snapshotFor(Manifest description) const {
   return _store.take(std::move(description), _place.warn);
 }
 
+// What stands in the place of a file with accounts and can neither be read nor copied, a directory, a pipe, or more
+// than a property list may have, keeps nobody's device from its migration. Only what looks like that is read here.
+void SnapshotSession::makeWay() const {
+  for (const platform::MigrationFile& file : _place.footprint.files) {
+    if (!holdsAccounts(file.part)) continue;
+    const platform::Result<platform::FileAttributes> found = _storage.keeper->attributesOf(file.path);
+    const bool isOrdinary = found.isOk() && found.value().kind == platform::FileKind::file &&
+                            found.value().size <= platform::kMaxPropertyListSize;
+    if (!found.isOk() || isOrdinary) continue;
+    const FileState state = stateAt(_storage, file.path, file.part);
+    if (state.isUnreadable) require(_place.putAside(_storage, file, state.whyUnkept));
+  }
+}
+
 std::shared_ptr<platform::FileSystem> SnapshotSession::begin() {
   requireFootprint();
   const HeldLock migration = hold(*_place.services.locks, _place.footprint.lockName);
   _store.sweep();
   recover();
+  makeWay();
   _run = snapshotFor(description(Manifest::kRun));
   _journal.begin(_run.id, std::nullopt);
   _watched = std::make_shared<WatchedFiles>(_storage, _run, _journal);
@@ -100,6 +116,7 @@ void SnapshotSession::rehearse() {
   requireFootprint();
   const HeldLock migration = hold(*_place.services.locks, _place.footprint.lockName);
   if (_isThere) recover();
+  makeWay();
   for (const platform::MigrationFile& file : _place.footprint.files) {
     requireKeepable(file.path, file.part, stateAt(_storage, file.path, file.part));
   }

@@ -22,6 +22,8 @@ struct SessionPlace {
   platform::MigrationFootprint footprint;               // of the plug-in: nothing else is restored
   std::string release;                                  // of the host
   std::function<void(const std::string&)> warn;         // a line for people, on standard error
+  // Takes what no run can read out of the place of a file with accounts, and tells where it is kept.
+  std::function<platform::Status(const Storage&, const platform::MigrationFile&, const std::string& why)> putAside;
   // How far a restore is: what it does, the share of it that is done, and the one at which that ends.
   std::function<void(const char*, double, double)> progressed = [](const char*, double, double) {};
 };
@@ -77,6 +79,7 @@ class SnapshotSession {
  private:
   using HeldLock = std::unique_ptr<platform::ExclusiveFileLock>;
 
+  void makeWay() const;
   [[nodiscard]] static HeldLock hold(platform::ExclusiveFileLocks& locks, const std::string& name);
   void requireSameDevice() const;
   void requireFootprint() const;

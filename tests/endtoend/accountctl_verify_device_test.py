@@ -178,6 +178,14 @@ class Places(DeviceVerifyTest):
         self.assertEqual(["no-owner"], self.kinds())
         self.assertEqual(6, self.tree.migrate(HOST).status)
 
+    def test_of_what_made_way_for_a_run(self):
+        self.put(DIRECTORY)
+        self.migrated()
+        for number in (1, 123456789):
+            self.tree.path(f"{SETTINGS}.unreadable-{number}").mkdir()
+        self.tree.path(f"{SETTINGS}.unreadable-1a").mkdir()
+        self.assertEqual(["kept-copy"] * 2, self.kinds())
+
     def test_of_what_a_dead_save_left(self):
         self.tree.write(LEFTOVER, b"accounts")
         self.tree.write(TEMPORARY + "/another file", b"")

@@ -93,6 +93,96 @@ class DirectoriesOfOthers(SnapshotsTest):
         self.assertEqual([], [path.name for path in self.snapshots.iterdir() if path.name.startswith(".")])
 
 
+class WhatNoRunCanRead(SnapshotsTest):
+    """In the place of a file with accounts it keeps nobody's device from its migration, and is kept itself."""
+
+    host = HOST
+
+    def device_with(self, path, put):
+        shutil.rmtree(self.scratch / "legacy-files", ignore_errors=True)
+        device = self.old_device()
+        device.path(path).unlink()
+        put(device.path(path))
+        return device
+
+    def assert_put_aside(self, device, path, name):
+        run = self.migrate(device, "--explain=json")
+        line = f"migration-host: {device.path(path)} is nothing that a run can read; it is kept as {name}"
+        self.assertEqual((0, line), (run.status, run.errors[0]), run.errors)
+        self.assertEqual(CURRENT_VERSION, device.read_plist(SETTINGS)["Version"])
+        self.assertIn(str(name), [each["where"] for each in json.loads("\n".join(run.output))["result"]["lost"]])
+
+    def test_makes_way_whatever_it_is(self):
+        for path in (SETTINGS, LEGACY_MAIL, LEGACY_EXCHANGE):
+            for put in (os.mkdir, os.mkfifo, make_huge):
+                with self.subTest(path=path, put=put):
+                    device = self.device_with(path, put)
+                    place = device.path(path)
+                    name = place.with_name(place.name + ".unreadable-1")
+                    before = place.stat()
+                    self.assert_put_aside(device, path, name)
+                    self.assertEqual((before.st_ino, before.st_mode), (name.stat().st_ino, name.stat().st_mode))
+                    self.assertEqual(0, self.migrate(device).status)
+                    shutil.rmtree(self.snapshots)
+
+    def test_is_foretold_by_a_rehearsal_which_moves_nothing(self):
+        for put in (os.mkdir, os.mkfifo, make_huge):
+            with self.subTest(put=put):
+                device = self.device_with(SETTINGS, put)
+                rehearsal = self.migrate(device, "--dry-run", "--explain=json")
+                self.assertTrue(device.path(SETTINGS).exists())
+                run = self.migrate(device, "--explain=json")
+                results = [json.loads("\n".join(each.output))["result"] for each in (rehearsal, run)]
+                self.assertEqual(*[(each["verdict"], each["lost"]) for each in results])
+                shutil.rmtree(self.snapshots)
+
+    def test_finds_a_name_however_many_are_taken(self):
+        device = self.device_with(SETTINGS, os.mkdir)
+        names = {device.path(SETTINGS).with_name(f"{device.path(SETTINGS).name}.unreadable-{number}") for number in range(1, 10)}
+        for name in names:
+            name.mkdir()
+        run = self.migrate(device)
+        self.assertEqual((0, 10), (run.status, len([*device.path(SETTINGS).parent.glob("*.unreadable-*")])), run.errors)
+
+    def test_keeps_no_restore_from_its_end(self):
+        device = self.old_device()
+        before = self.undoable(device)
+        self.migrate(device)
+        device.path(SETTINGS).unlink()
+        device.path(SETTINGS).mkdir()
+        run = self.restore(device, "latest")
+        self.assertEqual((0, before), (run.status, self.undoable(device)), run.errors)
+
+
+class GoodLinks(SnapshotsTest):
+    """What a link in the place of a file with accounts leads to is migrated, kept and brought back."""
+
+    host = HOST
+
+    def test_are_followed_as_without_snapshots(self):
+        for path in (SETTINGS, LEGACY_MAIL, LEGACY_EXCHANGE):
+            with self.subTest(path=path):
+                with_file, with_link = self.old_device(), self.old_device()
+                place = with_link.path(path)
+                place.rename(place.with_name("target"))
+                place.symlink_to("target")
+                self.assertEqual([0, 0], [device.migrate(HOST).status for device in [with_file]] + [self.migrate(with_link).status])
+                self.assertEqual(with_file.read_plist(SETTINGS), with_link.read_plist(SETTINGS))
+                shutil.rmtree(self.snapshots)
+
+    def test_come_back_as_the_files_that_they_led_to(self):
+        device = self.old_device()
+        before = self.undoable(device)
+        place = device.path(LEGACY_MAIL)
+        place.rename(place.with_name("target"))
+        place.symlink_to("target")
+        self.assertEqual(0, self.migrate(device).status)
+        self.assertEqual(0, self.restore(device, "latest").status)
+        self.assertEqual(before, self.undoable(device))
+        self.assertFalse(place.is_symlink())
+        self.assertTrue(place.with_name("target").is_file())
+
+
 class OddFiles(SnapshotsTest):
     """What a user can put at the path of a marker or a companion does not keep his device from being migrated."""
 

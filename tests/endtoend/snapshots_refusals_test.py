@@ -170,18 +170,6 @@ class Snapshots(SnapshotsTest):
         self.assertEqual(0, self.migrate(device, "--keep=1").status)
         self.assertEqual(2, len(self.list()))
 
-    def test_a_directory_in_the_place_of_a_file_cannot_be_kept(self):
-        device = self.old_device()
-        device.path(LEGACY_MAIL).unlink()
-        device.write(LEGACY_MAIL + "/precious", "kept")
-        run = self.migrate(device)
-        place = device.path(LEGACY_MAIL)
-        message = f"{place} may hold accounts, and no copy of it can be kept: {place} is no regular file"
-        self.assertEqual((5, [f"migration-host: {message}"]), (run.status, run.errors))
-        self.assertEqual([], run.console())
-        self.assertEqual([], self.list())
-        self.assertTrue(device.path(LEGACY_MAIL + "/precious").exists())
-
     def test_a_plug_in_that_does_not_tell_its_files(self):
         run = self.run_directed("succeed", "--snapshots", self.snapshots)
         message = "the plug-in does not tell which files it changes, so no snapshot can be taken"

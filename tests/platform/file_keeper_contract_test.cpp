@@ -96,6 +96,17 @@ TYPED_TEST(FileKeeperContract, ReadsAttributesAndBytesTogether) {
   EXPECT_EQ(this->keeper.read(this->subject.base, 4).value().attributes.kind, FileKind::directory);
 }
 
+TYPED_TEST(FileKeeperContract, ReadsOfTargetsFilesAlone) {
+  this->put("file", "text");
+  const auto file = this->keeper.readTarget(this->at("file"), 4);
+  ASSERT_TRUE(file.isOk());
+  EXPECT_EQ(file.value().bytes, bytes("text"));
+  EXPECT_EQ(file.value().attributes, this->keeper.attributesOf(this->at("file")).value());
+  EXPECT_EQ(this->keeper.readTarget(this->at("file"), 3).status().errorNumber(), EFBIG);
+  EXPECT_EQ(this->keeper.readTarget(this->at("nothing"), 4).status().errorNumber(), ENOENT);
+  EXPECT_EQ(this->keeper.readTarget(this->subject.base, 4).status().errorNumber(), EISDIR);
+}
+
 TYPED_TEST(FileKeeperContract, GivesNoSpecialModeBits) {
   FileAttributes special = this->attributes;
   special.permissions = 06755;

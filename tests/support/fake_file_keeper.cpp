@@ -33,6 +33,12 @@ platform::Result<platform::FileCopy> FakeFileKeeper::read(const Path& path, std:
   return platform::FileCopy{attributes.value(), _files.nodes.at(path).bytes};
 }
 
+platform::Result<platform::FileCopy> FakeFileKeeper::readTarget(const Path& path, std::size_t sizeLimit) {
+  platform::Result<platform::FileCopy> file = read(path, sizeLimit);
+  const bool isDirectory = file.isOk() && file.value().attributes.kind == FileKind::directory;
+  return isDirectory ? Status::failure(EISDIR, "read " + path.string()) : file;
+}
+
 platform::Result<std::vector<std::string>> FakeFileKeeper::entriesOf(const Path& directory) {
   const auto node = _files.nodes.find(directory);
   if (node == _files.nodes.end()) return Status::failure(ENOENT, "list " + directory.string());

@@ -17,6 +17,7 @@ class FakeFileKeeper final : public platform::FileKeeper {
 
   platform::Result<platform::FileAttributes> attributesOf(const platform::Path& path) override;
   platform::Result<platform::FileCopy> read(const platform::Path& path, std::size_t sizeLimit) override;
+  platform::Result<platform::FileCopy> readTarget(const platform::Path& path, std::size_t sizeLimit) override;
   platform::Result<std::vector<std::string>> entriesOf(const platform::Path& directory) override;
   platform::Status append(const platform::Path& path, std::span<const std::uint8_t> bytes) override;
   platform::Status restore(const platform::Path& path, std::span<const std::uint8_t> bytes,

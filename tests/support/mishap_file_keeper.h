@@ -32,6 +32,11 @@ class MishapFileKeeper final : public platform::FileKeeper {
         [&] { return _inner->read(path, sizeLimit); },
         [&path](int error) -> platform::Result<platform::FileCopy> { return failedKeeping(path)(error); });
   }
+  platform::Result<platform::FileCopy> readTarget(const platform::Path& path, std::size_t sizeLimit) override {
+    return _mishaps->counted(
+        [&] { return _inner->readTarget(path, sizeLimit); },
+        [&path](int error) -> platform::Result<platform::FileCopy> { return failedKeeping(path)(error); });
+  }
   platform::Result<std::vector<std::string>> entriesOf(const platform::Path& directory) override {
     return _mishaps->counted([&] { return _inner->entriesOf(directory); },
                              [&directory](int error) -> platform::Result<std::vector<std::string>> {

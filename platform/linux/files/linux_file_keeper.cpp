@@ -80,6 +80,15 @@ class LinuxFileKeeper final : public FileKeeper {
     return copy;
   }
 
+  Result<FileCopy> readTarget(const Path& path, std::size_t sizeLimit) override {
+    FileCopy copy;
+    struct stat status {};
+    const Descriptor file = _paths.openFile(path, status);
+    if (!file.isOpen() || !readUpTo(file.number(), status, sizeLimit, copy.bytes)) return failureOf("read", path);
+    copy.attributes = attributesFrom(status);
+    return copy;
+  }
+
   Result<std::vector<std::string>> entriesOf(const Path& directory) override {
     std::vector<std::string> names;
     Status outcome = at(directory, "list", [&names](const Place& place) {
