@@ -64,6 +64,12 @@ TEST_F(LookingUpAccounts, LetsCallersKeepAChildThatTheIndexDrops) {
   EXPECT_EQ(child->identifier(), Text{"c"});
 }
 
+TEST_F(LookingUpAccounts, ForgetsEveryChildOfAParent) {
+  const Store store = load({parent("p", {properties("c"), properties("d")}), parent("q", {properties("e")})});
+  store->_removeChildrenForAccountWithIdentifier("p");
+  EXPECT_EQ(identifiersOf(store->allBasicSyncableAccounts()), (Lines{"p", "q", "e"}));
+}
+
 TEST_F(LookingUpAccounts, SaysWhichChildrenItIgnores) {
   const Store store = load({parent("p", {Dictionary{{"Identifier", "c"}, {"Type", "CalDAV"}}, "no dictionary"})});
   EXPECT_EQ(messagesOf("-[AccountsManager _loadChildrenFromAccount:]"),

@@ -237,6 +237,16 @@ TEST_F(EditingAccounts, TakesAGivenChildFromItsParentWhereTheNewOneIsNotInTheSto
   EXPECT_EQ(allOf(store), (Lines{"old"}));
 }
 
+TEST_F(EditingAccounts, TakesAGivenChildFromNoParentThatItIsForgottenUnder) {
+  const Account oldParent = withChildren("old", {properties("c")});
+  const Account newParent = account("new", {}, "LDAP");
+  const Store store = storeOf({oldParent, newParent});
+  store->_removeChildrenForAccountWithIdentifier("old");
+  store->replaceAccountsWithTypes_withAccounts({"LDAP"}, {newParent, childOf(newParent, properties("c"))});
+  EXPECT_EQ(oldParent->accountPropertyForKey("ChildAccounts"), (PropertyValue{Array{properties("c")}}));
+  EXPECT_EQ(store->accountWithIdentifier("c"), newParent);
+}
+
 TEST_F(EditingAccounts, AddsAChildToAParentWithoutChildren) {
   const Account parent = account("p");
   const Store store = storeOf({parent});

@@ -1,3 +1,4 @@
+#include <gmock/gmock.h>
 #include <gtest/gtest.h>
 
 #include <algorithm>
@@ -174,6 +175,11 @@ TEST_F(Configuration, KnowsATypeExactlyByItsName) {
   EXPECT_TRUE(BasicAccount::_isValidAccountType("Odd"));
   EXPECT_FALSE(BasicAccount::_isValidAccountType("exchange"));
   EXPECT_FALSE(BasicAccount::_isValidAccountType(""));
+}
+
+TEST_F(Configuration, ListsEveryTypeOfTheFile) {
+  putTypes({{"Exchange", Dictionary{}}, {"Odd", 5}});
+  EXPECT_THAT(BasicAccount::accountTypes(), testing::UnorderedElementsAre(Text{"Exchange"}, Text{"Odd"}));
 }
 
 class ConfigurationOfActions : public Configuration {

@@ -62,6 +62,11 @@ TEST(EqualityKey, IsAnotherForEveryValueThatIsNotEqual) {
   }
 }
 
+TEST(EqualityKey, TellsWhereOneTextEndsAndTheNextBegins) {
+  const std::string mark(1, static_cast<char>(PropertyValue{""}.kind()));
+  EXPECT_NE(equalityKey(Array{"a" + mark + "b", "c"}), equalityKey(Array{"a", "b" + mark + "c"}));
+}
+
 TEST(EqualityKey, IsTheSameForDictionariesWhoseOrderDiffers) {
   const PropertyValue one = Dictionary{{"a", 1}, {"b", Array{"c"}}};
   const PropertyValue other = Dictionary{{"b", Array{"c"}}, {"a", 1}};

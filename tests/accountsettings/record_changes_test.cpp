@@ -97,6 +97,27 @@ TEST_F(RecordChanges, KeepChildrenOfOneIdentifierApartByTheirParents) {
   EXPECT_EQ(between(stateOf({one, other}), stateOf({other, one})), Lines{});
 }
 
+TEST_F(RecordChanges, KnowAChildWithoutIdentifierByItsParent) {
+  const Account first = parent("p", {Dictionary{{"Type", "CalDAV"}, {"Port", 1}}});
+  const StoreState before = stateOf({first});
+  first->setAccountProperty_forKey(Array{Dictionary{{"Type", "CalDAV"}, {"Port", 2}}}, "ChildAccounts");
+  EXPECT_EQ(between(before, stateOf({first})), Lines{"changed in p: Port 1 -> 2"});
+}
+
+TEST_F(RecordChanges, TakeNoAccountWithoutIdentifierForTheFirstOnesChild) {
+  const Account first = parent("p", {Dictionary{{"Type", "CalDAV"}}});
+  const StoreState before = stateOf({first});
+  first->removeAccountPropertyForKey("ChildAccounts");
+  const Account nameless = account("gone");
+  nameless->removeAccountPropertyForKey("Identifier");
+  EXPECT_EQ(between(before, stateOf({first, nameless})), (Lines{"added", "lost in p (removed-from-parent)"}));
+}
+
+TEST_F(RecordChanges, TellOfAnObjectThatStandsForTheSameRecord) {
+  const Dictionary record = properties("a");
+  EXPECT_EQ(between({{account("a"), record}}, {{account("a"), record}}), Lines{"changed a"});
+}
+
 TEST_F(RecordChanges, TellOfAnAccountThatAnotherObjectStandsFor) {
   EXPECT_EQ(between(stateOf({account("a")}), stateOf({account("a")})), Lines{"changed a"});
 }

@@ -3,6 +3,7 @@
 #include <algorithm>
 
 #include "tests/support/account_store.h"
+#include "tests/support/mishap_file_system.h"
 
 namespace tests {
 namespace {
@@ -330,6 +331,20 @@ TEST_F(SavingAccounts, RemembersThatNoDataCameWhereNobodySaidWhy) {
   device.propertyLists->serializes = false;
   store->saveAllAccounts();
   EXPECT_EQ(store->lastSaveOutcome().status.description(), "Could not serialize the accounts: No data came back");
+}
+
+TEST_F(SavingAccounts, LeavesNoTemporaryFileWhereAnythingThrows) {
+  const Store store = load({properties("a")});
+  for (const int operation : {1, 2, 3, 4}) {
+    const Mishap throwing{.kind = Mishap::Kind::diesBefore, .operation = operation};
+    device.changePlatform([&](platform::Platform& services) {
+      services.files = std::make_shared<MishapFileSystem>(device.files, throwing, [] { throw std::bad_alloc{}; });
+    });
+    EXPECT_THROW(store->saveAllAccounts(), std::bad_alloc);
+    EXPECT_TRUE(std::ranges::none_of(device.files->nodes, [](const auto& node) {
+      return node.first.string().starts_with("/var/mobile/tmp/file");
+    })) << operation;
+  }
 }
 
 TEST_F(SavingAccounts, SavesDataThatCameWithAnErrorAndSaysTheError) {

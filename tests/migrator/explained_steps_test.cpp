@@ -14,6 +14,7 @@ using testing::AllOf;
 using testing::Contains;
 using testing::ElementsAre;
 using testing::EndsWith;
+using testing::HasSubstr;
 using testing::Not;
 using testing::StartsWith;
 using tests::account;
@@ -97,6 +98,25 @@ TEST_F(ExplainedConversions, TellOfEachAccountOfAFileOfWhichOneIsRefused) {
               ElementsAre("lost G (refused-file: MailAccounts[0]" + of + ")",
                           "lost B (refused-description: MailAccounts[1]" + of + ")",
                           "lost G (refused-file: DeliveryAccounts[0]" + of + ")"));
+}
+
+TEST_F(ExplainedConversions, TellOfEachIncomingAccountBesideARefusedDeliveryAccount) {
+  const std::string of = " of " + accountsettings::mailAccountsPath();
+  EXPECT_THAT(toldOf({{"DeliveryAccounts", Array{Dictionary{{"AccountType", ""}, {"uniqueId", "D"}}}},
+                      {"MailAccounts", Array{Dictionary{{"AccountType", "IMAPAccount"}, {"uniqueId", "G"}}}}}),
+              ElementsAre("lost D (refused-description: DeliveryAccounts[0]" + of + ")",
+                          "lost G (refused-file: MailAccounts[0]" + of + ")"));
+}
+
+TEST_F(ExplainedConversions, TellWhatBecameOfADeliveryAccountAndOfOneThatIsNoDictionary) {
+  toldOf({{"DeliveryAccounts", Array{Dictionary{{"AccountType", "DeliveryAccount"}, {"uniqueId", "D"}}, "odd"}}});
+  store->tellChanges();
+  const std::string of = " of " + accountsettings::mailAccountsPath() + ")";
+  EXPECT_THAT(recorder->lines(),
+              ElementsAre(AllOf(StartsWith("converted D: AccountType now Class \"DeliveryAccount\", uniqueId now "),
+                                EndsWith("(DeliveryAccounts[0]" + of)),
+                          AllOf(HasSubstr(": +Type \"SMTP\", +Class \"SMTPAccount\", "),
+                                EndsWith("(DeliveryAccounts[1]" + of))));
 }
 
 TEST_F(ExplainedConversions, TellOfAFileThatCannotBeRead) {

@@ -54,6 +54,18 @@ TEST_F(Identifiers, AreMadeForAnAccountWithNeitherKey) {
   }
 }
 
+TEST_F(Identifiers, ThatCannotBeMadeLeaveTheirAccountAsOne) {
+  for (const auto& [type, className] :
+       {std::pair{"Mail", "IMAPAccount"}, {"Nimbra", "NimbraAccount"}, {"Exchange", "E"}, {"SMTP", "SMTPAccount"}}) {
+    load({account(type, className, "A"), account("LDAP", "LDAPAccount", "L")});
+    at(0).setAccountProperty_forKey(std::nullopt, "Identifier");
+    device.identifiers->canMake = false;
+    migrate();
+    EXPECT_EQ(store->count(), 2U) << type;
+    device.identifiers->canMake = true;
+  }
+}
+
 TEST_F(Identifiers, OfOtherTypesAreLeftAlone) {
   Array others;
   for (const std::string_view type : {"CalDAV", "CardDAV", "Subscribed Calendar", "LDAP", "OnMyDevice", "Gmail",
@@ -242,6 +254,14 @@ TEST_F(HostedNotes, AreAMatterOfTypeAndNotOfClass) {
   load({mail});
   migrate();
   EXPECT_EQ(at(0).properties(), mail);
+}
+
+TEST_F(HostedNotes, OfAnAccountWithoutIdentifierLeaveItAsOne) {
+  load({account("Nimbra", "NimbraAccount", "N")});
+  at(0).setAccountProperty_forKey(std::nullopt, "Identifier");
+  device.identifiers->canMake = false;
+  migrate();
+  EXPECT_EQ(store->count(), 1U);
 }
 
 TEST_F(HostedNotes, AreWrittenBackToTheStore) {

@@ -1,5 +1,6 @@
 #include <stdexcept>
 
+#include "migrator/hostile_accounts.h"
 #include "tests/support/step_test.h"
 
 namespace migrator {
@@ -63,6 +64,29 @@ TEST_F(HostileAccounts, WhoseManyChildrenReadALongListAreRefused) {
             "It is refused as hostile: it has 1002000 data classes in lists that children inherit, and no device has "
             "more than 1000000");
   EXPECT_EQ(refusalOf({parent(100)}), "");
+}
+
+TEST_F(HostileAccounts, WhoseChildrenReadALongListOfWhatIsProvisionedAreRefused) {
+  const Array children(501, PropertyValue{account("CalDAV", "X", "C")});
+  const Array listed(2000, PropertyValue{"com.vorlix.Dataclass.Notes"});
+  EXPECT_NE(refusalOf({account("VorlixAccount", "KQAccount", "P",
+                               {{"ChildAccounts", children}, {"Provisioned Dataclasses", listed}})}),
+            "");
+}
+
+// The values are those of the lists, of five keys and as many values, of the account itself, and 64 for the steps.
+TEST_F(HostileAccounts, OfMoreValuesThanCanBeWrittenAreRefused) {
+  const PropertyValue list{Array(1000, PropertyValue{0})};
+  const auto big = accountsettings::AccountsManager::initWithAccounsInfoArray(
+      {account("LDAP", "LDAPAccount", "A", {{"Many", Array(7991, list)}, {"More", Array(935, PropertyValue{0})}})});
+  try {
+    refuseHostileAccounts(*big);
+    FAIL() << "nothing is refused";
+  } catch (const std::runtime_error& refusal) {
+    EXPECT_STREQ(refusal.what(),
+                 "It is refused as hostile: it has 8000001 values, with those that the steps add, and no device has "
+                 "more than 8000000");
+  }
 }
 
 TEST_F(HostileAccounts, OfACurrentFileAreLeftAsTheyAre) {

@@ -71,6 +71,17 @@ TEST_F(MailAndCalDAV, FoldsAPartnerIntoItsUmbrella) {
   EXPECT_THAT(storedDataclasses(0, "Enabled Dataclasses"), ElementsAre("Mail", "Notes", "Calendars"));
 }
 
+TEST_F(MailAndCalDAV, FoldsAPartnerIntoAYahooAccountToo) {
+  const Dictionary principal{{"Login_Key", "joe"}, {"CalDAV_Server_Key", "caldav.calendar.yahoo.com"}};
+  const Dictionary configuration{{"CalDAV_PrincipalPath_Key", "/principals/users/joe"}};
+  load({account("CalDAV", "MobileCalDAVAccount", "C",
+                {{"CalDAVPrincipalConfiguration", principal}, {"CalDAVAccountConfiguration", configuration}}),
+        account("Mail", "YahooAccount", "Y", {{"Username", "joe"}})});
+  migrate();
+  ASSERT_EQ(store->count(), 1U);
+  EXPECT_EQ(value(0, "Identifier"), PropertyValue{"Y"});
+}
+
 TEST_F(MailAndCalDAV, FoldsAPartnerIntoAnInactiveUmbrella) {
   Dictionary inactive = gmail("G", "jane@example");
   inactive.set("IsActive", false);
@@ -143,11 +154,14 @@ TEST_F(MailAndCalDAV, RefusesMorePairsThanAnyDeviceHas) {
 }
 
 TEST_F(MailAndCalDAV, KeepsACalDAVAccountThatLacksWhatWouldTellWhoseItIs) {
-  const auto calendars = [](const Dictionary& principal) {
-    return account("CalDAV", "MobileCalDAVAccount", "C", {{"CalDAVPrincipalConfiguration", principal}});
+  const auto calendars = [](const Dictionary& principal, const Dictionary& configuration) {
+    return account("CalDAV", "MobileCalDAVAccount", "C",
+                   {{"CalDAVPrincipalConfiguration", principal}, {"CalDAVAccountConfiguration", configuration}});
   };
-  load({gmail("G", "jane"), calendars({{"Login_Key", "jane"}}), calendars({{"CalDAV_Server_Key", "www.google.com"}}),
-        calendars({{"Login_Key", "jane"}, {"CalDAV_Server_Key", "www.google.com"}})});
+  const Dictionary path{{"CalDAV_PrincipalPath_Key", "/calendar/dav/jane/user"}};
+  load({gmail("G", "jane"), calendars({{"Login_Key", "jane"}}, path),
+        calendars({{"CalDAV_Server_Key", "www.google.com"}}, path),
+        calendars({{"Login_Key", "jane"}, {"CalDAV_Server_Key", "www.google.com"}}, {})});
   migrate();
   EXPECT_EQ(store->count(), 4U);
 }

@@ -2,6 +2,7 @@
 #include <gtest/gtest.h>
 
 #include "migrator/accounts_data_migrator.h"
+#include "tests/support/fact_recorder.h"
 #include "tests/support/migration_device.h"
 
 using namespace tests;
@@ -20,6 +21,15 @@ class MigrationRecords : public testing::Test {
   MigrationDevice device;
   AccountsDataMigrator migrator;
 };
+
+TEST_F(MigrationRecords, TellWhereTheSettingsFileIsCopiedTo) {
+  const auto recorder = std::make_shared<FactRecorder>();
+  device.setObserver(recorder);
+  device.files->put(kSettingsFile, "whatever it holds");
+  migrator._copyAsideAccountsPlist();
+  ASSERT_EQ(recorder->facts.size(), 1U);
+  EXPECT_EQ(std::get<records::CopiedAside>(recorder->facts[0]).file, kSettingsCopy.string());
+}
 
 TEST_F(MigrationRecords, SettingsFileIsCopiedAsideByteForByte) {
   device.files->put(kSettingsFile, "whatever it holds");

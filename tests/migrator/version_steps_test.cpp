@@ -19,10 +19,13 @@ class Stages final : public platform::RunObserver {
  public:
   explicit Stages(std::shared_ptr<AccountsManager>& store) : _store{store} {}
   std::vector<std::string> steps;
+  std::vector<std::string> words;       // of each step
   std::vector<std::uint64_t> versions;  // of the store, after each step
 
-  void stageBegan(std::string_view stage, std::string_view) override {
-    if (!isSave(stage)) steps.emplace_back(stage);
+  void stageBegan(std::string_view stage, std::string_view itsWords) override {
+    if (isSave(stage)) return;
+    steps.emplace_back(stage);
+    words.emplace_back(itsWords);
   }
   void stageEnded(std::string_view stage) override {
     if (!isSave(stage)) versions.push_back(_store->dataVersion());
@@ -102,6 +105,15 @@ INSTANTIATE_TEST_SUITE_P(CurrentOrNewer, DispatchOfAVersionWithoutSteps,
                                          std::numeric_limits<std::int64_t>::min(),
                                          std::numeric_limits<std::int64_t>::max(),
                                          std::numeric_limits<std::uint64_t>::max(), "-3"));
+
+TEST_F(Dispatch, TellsPeopleBetweenWhichVersionsEachStepLies) {
+  load({account("LDAP", "LDAPAccount", "L")}, 9);
+  EXPECT_TRUE(migrator._migrateNewAccountsInfo(*store));
+  ASSERT_GE(stages->words.size(), 2U);
+  const auto steps = AccountsDataMigrator::versionSteps();
+  EXPECT_EQ(stages->words[0], "version 9 to 10: " + std::string{steps[9].words});
+  EXPECT_EQ(stages->words[1], "version 10 to 11: " + std::string{steps[10].words});
+}
 
 TEST_F(Dispatch, RunsAllStepsForAFileWithoutAVersion) {
   putSettings({{"Accounts", Array{account("LDAP", "LDAPAccount", "L")}}});
