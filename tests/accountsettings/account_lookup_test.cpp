@@ -150,6 +150,14 @@ TEST_F(LookingUpAccounts, FiltersTopLevelAccountsByTypeInOrder) {
   EXPECT_EQ(store->count(), 4U);
 }
 
+TEST_F(LookingUpAccounts, TakesAnAccountThatHasLostItsTypeForOneOfNone) {
+  const Store store = load({properties("a"), properties("b")});
+  store->allBasicAccounts()[0]->_forcedSetAccountProperty_forKey(5, "Type");
+  EXPECT_EQ(identifiersOf(store->basicAccountsWithTypes({"CalDAV"})), Lines{"b"});
+  store->replaceAccountsWithTypes_withAccounts({"CalDAV"}, {});
+  EXPECT_EQ(identifiersOf(store->allBasicAccounts()), Lines{"a"});
+}
+
 TEST_F(LookingUpAccounts, HandsOutTheLiveOrder) {
   const Store store = load({});
   const Accounts& live = store->allBasicAccounts();

@@ -208,6 +208,27 @@ TEST_F(WatchedStore, TellsAtEachSaveWhatThatOneDoesOtherwiseThanTheLast) {
   EXPECT_EQ(recorder->lines(), (Lines{"changed a: Port 1 -> 2", "changed a: Port 1 -> 3"}));
 }
 
+TEST_F(WatchedStore, TellsWhatTheFileKeptOfEachOfSeveralAccounts) {
+  const Store store = loadOutdated({properties("a", {{"Port", 1}}), properties("b", {{"Port", 1}})});
+  putFile({properties("a", {{"Port", 2}}), properties("b", {{"Port", 3}})});
+  store->saveAllAccounts();
+  EXPECT_EQ(recorder->lines(), (Lines{"changed a: Port 1 -> 2", "changed b: Port 1 -> 3"}));
+}
+
+TEST_F(WatchedStore, TellsOfAChildThatIsTakenFromItsParent) {
+  const Store store = loadOutdated({properties("p", {{"ChildAccounts", Array{properties("c")}}})});
+  store->removeChildWithIdentifier_fromAccount("c", store->allBasicAccounts()[0]);
+  store->tellChanges();
+  EXPECT_EQ(recorder->lines(), Lines{"lost c in p (removed-from-parent)"});
+}
+
+TEST_F(WatchedStore, TellsNothingOfAnAccountThatAnEqualOneIsPutInThePlaceOf) {
+  const Store store = loadOutdated({properties("a")});
+  store->replaceAccount_withAccount(store->allBasicAccounts()[0], account("a"));
+  store->tellChanges();
+  EXPECT_EQ(recorder->lines(), Lines{});
+}
+
 TEST_F(WatchedStore, TellsOfARecordThatAnotherOneWithItsIdentifierReplaces) {
   const Store store = loadOutdated({properties("a", {{"Port", 1}}), properties("a", {{"Port", 2}})});
   store->saveAllAccounts();

@@ -70,6 +70,21 @@ TEST_F(RecordChanges, TakeNoTwoEqualNumbersForARenamedKey) {
   EXPECT_EQ(between(before, stateOf({one})), Lines{"changed a: +IsActive 1, -Port"});
 }
 
+TEST_F(RecordChanges, TakeNoTwoEmptyTextsForARenamedKey) {
+  const Account one = account("a", {{"Old", ""}});
+  const StoreState before = stateOf({one});
+  one->removeAccountPropertyForKey("Old");
+  one->setAccountProperty_forKey("", "New");
+  EXPECT_EQ(between(before, stateOf({one})), Lines{"changed a: +New \"\", -Old"});
+}
+
+TEST_F(RecordChanges, TellByItsKeyOfAChildListThatBecameSomethingElse) {
+  const Account one = parent("p", {});
+  const StoreState before = stateOf({one});
+  one->setAccountProperty_forKey("text", "ChildAccounts");
+  EXPECT_EQ(between(before, stateOf({one})), Lines{"changed p: ChildAccounts () -> \"text\""});
+}
+
 TEST_F(RecordChanges, TellOfAccountsThatCameAndWent) {
   const Account stays = account("s");
   EXPECT_EQ(between(stateOf({account("a"), stays}), stateOf({stays, account("b")})),

@@ -121,6 +121,13 @@ TEST_F(FixingMailAccounts, LetsTheEarlierFragmentOfTheTableWinWhereverItStands) 
   }
 }
 
+TEST_F(FixingMailAccounts, DerivesTheClassOfAnAccountThatHasLostIt) {
+  const Account account = made(mail("MailAccount", "Mail/POP-x"));
+  account->_forcedSetAccountProperty_forKey(5, "Class");
+  EXPECT_EQ(fix(account), FixAnswer::repaired);
+  EXPECT_EQ(account->accountClass(), Text{"POPAccount"});
+}
+
 TEST_F(FixingMailAccounts, DropsAnAccountWhosePathSaysNothing) {
   const std::vector<std::optional<PropertyValue>> paths{std::nullopt, "", "mail/imap-x", "Mail/Exchange-x", 5};
   for (const auto& path : paths) {

@@ -119,6 +119,11 @@ TEST_F(ExplainedConversions, TellWhatBecameOfADeliveryAccountAndOfOneThatIsNoDic
                                 EndsWith("(DeliveryAccounts[1]" + of))));
 }
 
+TEST_F(ExplainedConversions, TellOfARefusedElementThatIsNoDictionaryWhereItStood) {
+  EXPECT_THAT(toldOf({{"MailAccounts", Array{"odd"}}}), ElementsAre("lost (refused-description: MailAccounts[0] of " +
+                                                                    accountsettings::mailAccountsPath() + ")"));
+}
+
 TEST_F(ExplainedConversions, TellOfAFileThatCannotBeRead) {
   load({});
   device.files->put(accountsettings::mailAccountsPath(), "no property list");

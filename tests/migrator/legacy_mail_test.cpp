@@ -345,6 +345,13 @@ TEST_F(LegacyMail, RecordsGetAnEmptyDictionaryForAnUnreadableFile) {
   EXPECT_EQ(*migrator._collatedMigrationData, (Dictionary{{"OldMailAccounts", Dictionary{}}}));
 }
 
+TEST_F(LegacyMail, RecordsAreNotBegunByAConversion) {
+  device.switchRecordsOn();
+  putFile({}, {incoming("M1")});
+  EXPECT_TRUE(migrator._migrateMailAccounts(*store()));
+  EXPECT_FALSE(migrator._collatedMigrationData.has_value());
+}
+
 TEST_F(LegacyMail, RecordsGetNothingWhileTheyAreOff) {
   migrator._collatedMigrationData.emplace();
   EXPECT_TRUE(migrator._migrateMailAccounts(*store()));

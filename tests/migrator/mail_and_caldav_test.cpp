@@ -42,6 +42,14 @@ TEST_F(MailAndCalDAV, LeavesOtherClassesAsTheyAre) {
   }
 }
 
+TEST_F(MailAndCalDAV, LeavesAnAccountThatHasLostItsClassAsItIs) {
+  load({gmail("G", "jane")});
+  at(0)._forcedSetAccountProperty_forKey(5, "Class");
+  migrate();
+  EXPECT_EQ(at(0).type(), Text{"Mail"});
+  EXPECT_EQ(value(0, "Enabled Dataclasses"), kAbsent);
+}
+
 TEST_F(MailAndCalDAV, TakesAnAccountForActiveThatDoesNotSayOtherwise) {
   const std::vector<std::pair<PropertyValue, bool>> cases{{true, true},  {false, false}, {1, true},      {0, false},
                                                           {"YES", true}, {"no", false},  {Array{}, true}};
