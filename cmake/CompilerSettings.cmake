@@ -51,8 +51,10 @@ if(ACCOUNTS_FUZZ)
 endif()
 
 if(ACCOUNTS_COVERAGE)
-  add_compile_options(--coverage -fprofile-update=atomic)
-  add_link_options(--coverage)
+  # Each program and library adds to one file of its own, whoever runs it.
+  add_compile_options("-fprofile-instr-generate=${CMAKE_BINARY_DIR}/profiles/%m.profraw" -fcoverage-mapping
+    -fprofile-update=atomic)
+  add_link_options(-fprofile-instr-generate)
 endif()
 
 # Programs are position-independent too, whatever the compiler's default.

@@ -1,7 +1,8 @@
 #!/bin/bash
-# Prints which lines and branches of the product the tests execute: builds the preset `coverage` and runs its tests.
+# Prints which lines and branches of the product the unit and reliability tests execute: builds the preset `coverage` and
+# runs them. A branch is one of the two ends of a condition of the source; what the compiler adds for exceptions is none.
 #   scripts/coverage.sh            every folder, file by file
-#   scripts/coverage.sh FOLDER...  these folders; what is not executed is listed, line by line
+#   scripts/coverage.sh FOLDER...  these folders; each end of a condition that is never reached is listed
 set -euo pipefail
 
 repository=$(cd -- "$(dirname -- "${BASH_SOURCE[0]}")/.." && pwd)
@@ -10,16 +11,9 @@ tree=build/coverage
 
 cmake --preset coverage --log-level=WARNING -DACCOUNTS_TESTS=ON
 cmake --build --preset coverage
-find "$tree" -name '*.gcda' -delete
-ctest --preset coverage --parallel "$(nproc)" --no-label-summary --label-exclude '^(full|install)$' < /dev/null
+rm -f -- "$tree"/profiles/*
+# The tests that try programs from the outside are named in small letters.
+ctest --preset coverage --parallel "$(nproc)" --no-label-summary --label-exclude '^(full|install)$' --tests-regex '^[A-Z]' \
+  < /dev/null
 
-folders=("$@")
-if ((${#folders[@]} == 0)); then folders=(accountsettings migrator platform host tools modules); fi
-filters=()
-for folder in "${folders[@]}"; do filters+=(--filter "$folder/"); done
-
-# What the compiler adds for exceptions is no branch of the source.
-gcovr --root . --object-directory "$tree" --gcov-ignore-parse-errors "${filters[@]}" \
-  --exclude-throw-branches --exclude-unreachable-branches --print-summary
-gcovr --root . --object-directory "$tree" --gcov-ignore-parse-errors "${filters[@]}" \
-  --exclude-throw-branches --exclude-unreachable-branches --branches
+python3 scripts/coverage_report.py "$tree" "$@"
