@@ -12,7 +12,7 @@ using platform::Status;
 
 namespace {
 
-bool hasLinks(const std::map<Path, FakeFileSystem::Node>& nodes) {
+bool hasLinks(const FakeFileSystem::Nodes& nodes) {
   return std::ranges::any_of(nodes, [](const auto& node) { return !node.second.target.empty(); });
 }
 
@@ -151,8 +151,9 @@ Status FakeFileSystem::remove(const Path& path) {
   if (!begun.isOk()) return begun;
   const Path place = placeOf(path);
   if (!nodes.contains(place)) return Status::failure(ENOENT, "remove " + path.string());
-  const std::string below = place.string() + "/";
-  std::erase_if(nodes, [&](const auto& node) { return node.first == place || node.first.string().starts_with(below); });
+  nodes.erase(place);
+  const std::string below = place.native() + "/";
+  std::erase_if(nodes, [&below](const auto& node) { return node.first.native().starts_with(below); });
   return {};
 }
 
