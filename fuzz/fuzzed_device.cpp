@@ -4,7 +4,6 @@
 #include <iterator>
 
 #include "accountsettings/accounts_manager.h"
-#include "platform/linux/property_lists/libplist_property_list_store.h"
 
 namespace fuzz {
 namespace {
@@ -94,7 +93,7 @@ Bytes secretBytes() { return {FuzzedDevice::kSecret.begin(), FuzzedDevice::kSecr
 
 }  // namespace
 
-FuzzedDevice::FuzzedDevice() : _store{platform::makeLibplistPropertyListStore(files)} {
+FuzzedDevice::FuzzedDevice() : _store{std::make_shared<ValuesInMemory>(files)} {
   for (const char* const name : {"AccountTypesProperties", "DataclassesProperties", "AccountCreators"}) {
     const Path path = Path{"/resources"} / (std::string{name} + ".plist");
     putReal(path, dictionaryAt(path));
@@ -134,6 +133,8 @@ void FuzzedDevice::begin(Input& input) {
   files->failing.clear();
   files->hasTemporaryNames = true;
   identifiers->made = 0;
+  _store->isReal = true;
+  _store->forget();
   forget();
 }
 
@@ -244,7 +245,8 @@ void FuzzedDevice::putFiles() {
   hasLegacyExchange = (has & 4U) != 0;
   hasSentinel = (has & 0x38U) == 0x38U;
   hasFaults = (has & 0xC0U) == 0xC0U;
-  systemLog->readers = (has & 0x58U) == 0x58U;  // seldom: what is logged takes as long as all else
+  systemLog->readers = (has & 0x58U) == 0x58U;
+  _store->isReal = (has & 0x58U) == 0x18U;
   const std::int64_t version = static_cast<std::int64_t>(_input->below(15)) - 1;
   const std::size_t isOdd = _input->below(8);
   Dictionary contents;
