@@ -140,6 +140,13 @@ TEST(KnownPropertyLists, AreWrittenInTheBinaryFormWhereTheyWereXml) {
   EXPECT_TRUE(contain(rewritten(tests::xmlWith("<key>k</key><string>v</string>")), "bplist00"));
 }
 
+TEST(KnownPropertyLists, MayBeAsLargeAsTensOfThousandsOfAccountsAre) {
+  PropertyListFiles lists;
+  const Bytes bytes = *lists.store->serialize({{"data", Bytes(std::size_t{40} << 20U, 7)}}).data;
+  const Dictionary first = *lists.read(bytes);
+  EXPECT_TRUE(lists.read(bytes)->isIdenticalTo(first));
+}
+
 TEST(KnownPropertyLists, AreFew) {
   PropertyListFiles lists;
   const Bytes bytes = *lists.store->serialize(kAccount).data;

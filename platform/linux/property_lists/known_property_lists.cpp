@@ -1,12 +1,14 @@
 #include "platform/linux/property_lists/known_property_lists.h"
 
 #include <algorithm>
+#include <functional>
+#include <numeric>
 
 namespace platform {
 namespace {
 
 constexpr std::size_t kMaxLists = 4;
-constexpr std::size_t kMaxListSize = std::size_t{16} << 20U;
+constexpr std::size_t kMaxBytes = std::size_t{256} << 20U;
 
 bool isWrittenAlike(const PropertyValue& left, const PropertyValue& right);
 
@@ -55,10 +57,14 @@ std::shared_ptr<const Bytes> KnownPropertyLists::bytesOf(const Dictionary& value
 }
 
 void KnownPropertyLists::keep(std::shared_ptr<const Bytes> bytes, Dictionary values, bool isFaithful) {
-  if (bytes->size() > kMaxListSize) return;
   const std::scoped_lock lock{_guard};
-  if (_lists.size() == kMaxLists) _lists.erase(_lists.begin());
   _lists.push_back({std::move(bytes), std::move(values), isFaithful});
+  while (_lists.size() > kMaxLists || size() > kMaxBytes) _lists.erase(_lists.begin());
+}
+
+std::size_t KnownPropertyLists::size() const {
+  return std::transform_reduce(_lists.begin(), _lists.end(), std::size_t{0}, std::plus{},
+                               [](const Known& each) { return each.bytes->size(); });
 }
 
 void KnownPropertyLists::makeLatest(std::vector<Known>::iterator known) {

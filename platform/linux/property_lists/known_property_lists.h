@@ -15,7 +15,7 @@ namespace platform {
 // file itself is read and written all the same. What is known is known by the whole of its bytes, not by a name, a size
 // or a time, so no change of a file goes unseen.
 //
-// Only a few lists are kept, none of them larger than 16 MiB; the one that was not needed for the longest time goes.
+// Only a few lists are kept, of no more than 256 MiB together; the one that was not needed for the longest time goes.
 // May be used from several threads.
 class KnownPropertyLists {
  public:
@@ -33,6 +33,7 @@ class KnownPropertyLists {
     bool isFaithful;
   };
   void makeLatest(std::vector<Known>::iterator known);
+  [[nodiscard]] std::size_t size() const;  // of all their bytes
 
   std::mutex _guard;
   std::vector<Known> _lists;  // the latest is the last one
