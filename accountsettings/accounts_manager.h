@@ -134,6 +134,8 @@ class ACCOUNT_EXPORT AccountsManager {
   void deleteAccountWithIdentifier(std::string_view identifier);
   // The old account must be in the order. The new one is found by identifier only in a store loaded afresh.
   void replaceAccount_withAccount(const Account& oldAccount, const Account& newAccount);
+  // Internal: the same for the account at a place of the order, which need not be looked for.
+  void replaceAccountAt(std::size_t place, const Account& newAccount);
   void replaceAccountsWithTypes_withAccounts(const Types& types, const Accounts& accounts);
   void addChild_toAccount(const Account& child, const Account& parent);
   void removeChildWithIdentifier_fromAccount(std::string_view identifier, const Account& parent);

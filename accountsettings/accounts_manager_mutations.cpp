@@ -3,6 +3,7 @@
 #include <ranges>
 #include <string>
 #include <unordered_set>
+#include <utility>
 
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/assertion_failure.h"
@@ -112,11 +113,14 @@ void AccountsManager::replaceAccount_withAccount(const Account& oldAccount, cons
     failAssertion("-[AccountsManager replaceAccount:withAccount:]", "AccountsManager",
                   "The account with identifier %@ is not in the store", {oldAccount->identifier()});
   }
+  replaceAccountAt(static_cast<std::size_t>(position - _orderedTopLevelAccounts.begin()), newAccount);
+}
+
+void AccountsManager::replaceAccountAt(std::size_t place, const Account& newAccount) {
+  const Account oldAccount = std::exchange(_orderedTopLevelAccounts[place], newAccount);
   forgetIdentifierOfAccount(*oldAccount);
   if (_tracker) _tracker->willGo(*oldAccount, records::LossCode::replaced);
-  // Listed, counted and saved, but found by its identifier only in a store that is loaded afresh.
-  *position = newAccount;
-  _loadChildrenFromAccount(*position);
+  _loadChildrenFromAccount(newAccount);
 }
 
 void AccountsManager::replaceAccountsWithTypes_withAccounts(const Types& types, const Accounts& accounts) {
@@ -187,10 +191,10 @@ void AccountsManager::removeChildWithIdentifier_fromAccount(std::string_view ide
   const std::optional<PropertyValue> property = parent->accountPropertyForKey(kAccountChildAccounts);
   if (const Array* const present = property ? property->asArray() : nullptr) {
     Array children = *present;
-    for (const PropertyValue& properties : *present) {
+    std::erase_if(children, [removed = Text{identifier}](const PropertyValue& properties) {
       const Account child = accountFromElement(properties);
-      if (child != nullptr && child->identifier() == Text{identifier}) std::erase(children, properties);
-    }
+      return child != nullptr && child->identifier() == removed;
+    });
     parent->setAccountProperty_forKey(std::move(children), kAccountChildAccounts);
   }
   _loadChildrenFromAccount(parent);

@@ -4,7 +4,9 @@
 #include <atomic>
 #include <map>
 #include <optional>
+#include <tuple>
 #include <utility>
+#include <variant>
 
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/vocabulary.h"
@@ -65,6 +67,35 @@ class Overwritten {
   const Array& _records;
   std::map<std::string_view, const BasicAccount*> _lastOf;
 };
+
+using AccountKey = std::tuple<std::string_view, std::string_view, std::string_view>;
+
+AccountKey accountOf(const records::Fact& fact) {
+  return std::visit(
+      [](const auto& each) -> AccountKey {
+        if constexpr (requires { each.account; }) {
+          return {each.account.identifier, each.account.name, each.account.type};
+        } else {
+          return {};
+        }
+      },
+      fact);
+}
+
+// The facts that are not among those that are known, which mostly are the same, one by one. Hardly any account has more
+// than one.
+std::vector<const records::Fact*> missingIn(const std::vector<records::Fact>& known,
+                                            const std::vector<records::Fact>& facts) {
+  std::vector<const records::Fact*> missing;
+  if (facts == known) return missing;
+  std::multimap<AccountKey, const records::Fact*> byAccount;
+  for (const records::Fact& fact : known) byAccount.emplace(accountOf(fact), &fact);
+  for (const records::Fact& fact : facts) {
+    const auto [begin, end] = byAccount.equal_range(accountOf(fact));
+    if (std::none_of(begin, end, [&fact](const auto& each) { return *each.second == fact; })) missing.push_back(&fact);
+  }
+  return missing;
+}
 
 }  // namespace
 
@@ -215,20 +246,11 @@ void ChangeTracker::written(const Accounts& accounts, const Array& records) {
 void ChangeTracker::savedAll(std::size_t count, std::uint64_t version, const std::string& path,
                              const platform::Status& status) {
   attempt([&] {
-    for (std::size_t place = 0; place < _atThisSave.size(); ++place) {
-      if (!wasToldAtLastSave(place)) _observer->told(_atThisSave[place]);
-    }
+    for (const records::Fact* const fact : missingIn(_atLastSave, _atThisSave)) _observer->told(*fact);
     _atLastSave = std::exchange(_atThisSave, {});
     if (status.isOk()) return _observer->told(records::Saved{path, count, version});
     _observer->told(records::SaveFailed{path, status.description(), count, version});
   });
-}
-
-// Mostly a save tells what the last one told, fact by fact.
-bool ChangeTracker::wasToldAtLastSave(std::size_t place) const {
-  const records::Fact& fact = _atThisSave[place];
-  if (place < _atLastSave.size() && _atLastSave[place] == fact) return true;
-  return std::ranges::find(_atLastSave, fact) != _atLastSave.end();
 }
 
 }  // namespace accountsettings

@@ -71,7 +71,6 @@ class ChangeTracker {
   void tellGone(const records::Lost& lost, const BasicAccount* account);
   void tellPassed(const StoreState& present);
   void tellConverted(const Difference& difference, const Origin& origin);
-  [[nodiscard]] bool wasToldAtLastSave(std::size_t place) const;
 
   std::shared_ptr<records::FactObserver> _observer;  // null once something went wrong
   StoreState _known;

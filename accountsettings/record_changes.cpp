@@ -3,7 +3,9 @@
 #include <algorithm>
 #include <deque>
 #include <map>
+#include <optional>
 #include <unordered_set>
+#include <utility>
 
 #include "accountsettings/vocabulary.h"
 
@@ -33,16 +35,33 @@ bool isToldByKey(std::string_view key, const Dictionary& before, const Dictionar
   return key != kAccountChildAccounts || !holdsRecordsOnly(before.find(key)) || !holdsRecordsOnly(after.find(key));
 }
 
-// The key that went and whose text now stands under the changed one; taken out of those that went.
-std::string takeOldKey(const PropertyValue& value, std::vector<Change>& gone) {
-  const Text* const text = value.asText();
-  if (text == nullptr || text->empty()) return {};
-  const auto found = std::ranges::find_if(gone, [&value](const Change& each) { return each.from == value; });
-  if (found == gone.end()) return {};
-  std::string key = std::move(found->key);
-  gone.erase(found);
-  return key;
-}
+// The keys of a record that went, found by the texts that stood under them.
+class GoneKeys {
+ public:
+  void add(const Dictionary::Entry& entry) {
+    const Text* const text = entry.value.asText();
+    if (text != nullptr && !text->empty()) _places.emplace(text->view(), _gone.size());
+    _gone.emplace_back(Change{entry.key.string(), {}, entry.value, {}});
+  }
+  // Takes the first key that went and under which the text stood; empty where there is none.
+  std::string takeKeyOf(const PropertyValue& value) {
+    const Text* const text = value.asText();
+    const auto found = text == nullptr ? _places.end() : _places.lower_bound(text->view());
+    if (found == _places.end() || found->first != text->view()) return {};
+    std::string key = std::exchange(_gone[found->second], std::nullopt)->key;
+    _places.erase(found);
+    return key;
+  }
+  void moveRestTo(std::vector<Change>& changes) {
+    for (std::optional<Change>& each : _gone) {
+      if (each) changes.push_back(*std::move(each));
+    }
+  }
+
+ private:
+  std::vector<std::optional<Change>> _gone;
+  std::multimap<std::string_view, std::size_t> _places;  // the earliest first
+};
 
 // --- Records ---
 
@@ -231,16 +250,16 @@ Name nameOf(const Dictionary& properties, std::string_view parent) {
 std::vector<Change> changesOf(const Dictionary& before, const Dictionary& after) {
   if (before.isIdenticalTo(after)) return {};
   std::vector<Change> changes;
-  std::vector<Change> gone;
-  for (const auto& [key, value] : before) {
-    if (!after.contains(key) && isToldByKey(key, before, after)) gone.push_back({key.string(), {}, value, {}});
+  GoneKeys gone;
+  for (const Dictionary::Entry& entry : before) {
+    if (!after.contains(entry.key) && isToldByKey(entry.key, before, after)) gone.add(entry);
   }
   for (const auto& [key, value] : after) {
     const PropertyValue* const former = before.find(key);
     if ((former != nullptr && *former == value) || !isToldByKey(key, before, after)) continue;
-    changes.push_back({key.string(), takeOldKey(value, gone), former ? std::optional{*former} : std::nullopt, value});
+    changes.push_back({key.string(), gone.takeKeyOf(value), former ? std::optional{*former} : std::nullopt, value});
   }
-  std::ranges::move(gone, std::back_inserter(changes));
+  gone.moveRestTo(changes);
   return changes;
 }
 

@@ -17,7 +17,6 @@ namespace {
 using namespace accountsettings;  // the vocabulary
 
 using Account = AccountsManager::Account;
-using Accounts = AccountsManager::Accounts;
 
 // --- Parents for hosted mail ---
 
@@ -99,8 +98,9 @@ bool AccountsDataMigrator::_migrateAccountsFrom8A293(AccountsManager& store) {
 
 // No release ever stamped 7 or 8: this step and the next leave the version at 6.
 bool AccountsDataMigrator::_migrateAccountsFrom8B117(AccountsManager& store) {
-  const Accounts snapshot = store.allBasicAccounts();
-  for (const Account& mail : snapshot) {
+  // A parent stands where its mail account stood, so the places stay what they are.
+  for (std::size_t place = 0; place < store.count(); ++place) {
+    const Account mail = store.allBasicAccounts()[place];
     if (!isHostedMail(*mail)) continue;
     const Account parent = BasicAccount::initWithProperties(parentPropertiesFor(*mail));
     if (parent == nullptr) continue;  // the device knows no cloud accounts, so there is nothing to move to
@@ -108,7 +108,7 @@ bool AccountsDataMigrator::_migrateAccountsFrom8B117(AccountsManager& store) {
     // Here, unlike in the other steps, an account must say that it is active: a new parent offers mail only if told to.
     const bool isActive = booleanForKey(*mail, kIsActiveKey).value_or(false);
     if (isActive) parent->setEnabled_forDataclass(true, kAccountDataclassMail);
-    store.replaceAccount_withAccount(mail, parent);
+    store.replaceAccountAt(place, parent);
     mail->setParentAccount(parent);
     store.addChild_toAccount(mail, parent);
   }

@@ -145,6 +145,13 @@ TEST_F(EditingAccounts, ReplacesOneAccountInItsPlaceAndFindsNeitherByIdentifier)
   EXPECT_EQ(store->accountWithIdentifier("new"), nullptr);
 }
 
+TEST_F(EditingAccounts, ReplacesTheAccountAtAPlaceAsItReplacesOneThatIsNamed) {
+  const Store store = storeOf({account("a"), withChildren("old", {properties("c")})});
+  store->replaceAccountAt(1, withChildren("new", {properties("d")}));
+  EXPECT_EQ(allOf(store), (Lines{"a", "new", "d"}));
+  EXPECT_EQ(store->accountWithIdentifier("old"), nullptr);
+}
+
 TEST_F(EditingAccounts, SavesAReplacementAndFindsItInAStoreLoadedAfresh) {
   const Store store = load({properties("old")});
   store->replaceAccount_withAccount(store->allBasicAccounts()[0], account("new"));

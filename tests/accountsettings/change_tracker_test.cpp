@@ -229,6 +229,18 @@ TEST_F(WatchedStore, TellsNothingOfAnAccountThatAnEqualOneIsPutInThePlaceOf) {
   EXPECT_EQ(recorder->lines(), Lines{});
 }
 
+TEST_F(WatchedStore, TellsNothingAgainOfAnAccountWhenOneBeforeItHasNothingToTell) {
+  const auto records = [](int portOfA, int portOfB) {
+    return Array{properties("a", {{"Port", portOfA}}), properties("b", {{"Port", portOfB}})};
+  };
+  const Store store = loadOutdated(records(1, 1));
+  for (const int portOfA : {2, 1}) {
+    putFile(records(portOfA, 2));
+    store->saveAllAccounts();
+  }
+  EXPECT_EQ(recorder->lines(), (Lines{"changed a: Port 1 -> 2", "changed b: Port 1 -> 2"}));
+}
+
 TEST_F(WatchedStore, TellsOfARecordThatAnotherOneWithItsIdentifierReplaces) {
   const Store store = loadOutdated({properties("a", {{"Port", 1}}), properties("a", {{"Port", 2}})});
   store->saveAllAccounts();

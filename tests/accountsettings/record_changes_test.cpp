@@ -62,6 +62,14 @@ TEST_F(RecordChanges, TellOfAKeyThatIsCalledOtherwiseNowInOne) {
   EXPECT_EQ(between(before, stateOf({one})), Lines{"changed u: uniqueId now Identifier \"u\""});
 }
 
+TEST_F(RecordChanges, TakeKeysOfOneTextForRenamedOnesInTheirOrder) {
+  const Account one = account("a", {{"first", "t"}, {"second", "t"}, {"third", "t"}});
+  const StoreState before = stateOf({one});
+  for (const char* const key : {"first", "second", "third"}) one->removeAccountPropertyForKey(key);
+  for (const char* const key : {"one", "two"}) one->setAccountProperty_forKey("t", key);
+  EXPECT_EQ(between(before, stateOf({one})), Lines{"changed a: first now one \"t\", second now two \"t\", -third"});
+}
+
 TEST_F(RecordChanges, TakeNoTwoEqualNumbersForARenamedKey) {
   const Account one = account("a", {{"Port", 1}});
   const StoreState before = stateOf({one});
