@@ -55,6 +55,7 @@ constexpr std::array<Kind, 13> kKinds{{
 }};
 constexpr const Kind& kGmail = kKinds[2];
 constexpr const Kind& kCalendars = kKinds[7];
+constexpr const Kind& kHosted = kKinds[11];
 constexpr Kind kCloud{0, "VorlixAccount", "KQAccount", nullptr, {"Mail", "Contacts", "Calendars", "DeviceLocator"}};
 constexpr Kind kCloudMail{0, "KeldorIMAP", "KeldorIMAPAccount", nullptr, {"Mail", "Notes"}};
 constexpr Kind kCloudCalendars{0, "CalDAV", "MobileCalDAVAccount", nullptr, {"Calendars"}};
@@ -105,14 +106,27 @@ class Generator {
     return account;
   }
 
-  Dictionary ofOneType(std::size_t number) {
-    _random = Random{_seed + number % kPopulationPeriod};
-    Dictionary account = common(kKinds.front(), number);
-    addMail(account, kKinds.front());
+  Dictionary ofOneType(std::size_t number) { return mailOf(kKinds.front(), number); }
+  Dictionary hosted(std::size_t number) { return mailOf(kHosted, number); }
+
+  Dictionary twin(std::size_t number) {
+    Dictionary account = ofOneType(number);
+    if (number % 2 == 0) {
+      _identifierOfTwin = *account.text("Identifier");
+    } else {
+      account.set("Identifier", _identifierOfTwin);
+    }
     return account;
   }
 
  private:
+  Dictionary mailOf(const Kind& kind, std::size_t number) {
+    _random = Random{_seed + number % kPopulationPeriod};
+    Dictionary account = common(kind, number);
+    addMail(account, kind);
+    return account;
+  }
+
   const Kind& anyKind() {
     std::uint64_t ticket = _random.below(100);
     for (const Kind& kind : kKinds) {
@@ -213,6 +227,7 @@ class Generator {
   Random _identity;   // what no two accounts share
   std::size_t _children;
   std::string _lastGmailUser;
+  platform::Text _identifierOfTwin;
 };
 
 }  // namespace
@@ -230,6 +245,8 @@ Array accountsOf(const Population& population) {
     switch (population.mixture) {
       case Mixture::pairs: accounts.emplace_back(generator.halfOfPair(number)); break;
       case Mixture::type: accounts.emplace_back(generator.ofOneType(number)); break;
+      case Mixture::hosted: accounts.emplace_back(generator.hosted(number)); break;
+      case Mixture::twins: accounts.emplace_back(generator.twin(number)); break;
       default: accounts.emplace_back(generator.account(number));
     }
   }

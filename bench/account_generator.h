@@ -20,9 +20,11 @@ constexpr std::size_t kPopulationPeriod = 100;
 // Beside the devices that there are, such as somebody makes up to keep a run busy.
 enum class Mixture {
   device,
-  pairs,  // each other account is the calendar account of the mail account before it, and is folded into that
-  type,   // all are of one type
-  family  // there is one account, and the others are its children
+  pairs,   // each other account is the calendar account of the mail account before it, and is folded into that
+  type,    // all are of one type
+  family,  // there is one account, and the others are its children
+  hosted,  // all are mail accounts of the hosted service, each of which gets a parent
+  twins    // each other account has the identifier of the one before it
 };
 
 struct Population {

@@ -16,6 +16,8 @@ bench::Mixture mixtureNamed(std::string_view name) {
   if (name == "pairs") return bench::Mixture::pairs;
   if (name == "type") return bench::Mixture::type;
   if (name == "family") return bench::Mixture::family;
+  if (name == "hosted") return bench::Mixture::hosted;
+  if (name == "twins") return bench::Mixture::twins;
   std::fprintf(stderr, "bench-count: no such mixture: %s\n", name.data());
   std::exit(2);
 }

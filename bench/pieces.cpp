@@ -2,15 +2,19 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <cstdlib>
 #include <memory>
+#include <string>
 
 #include "accountsettings/accounts_manager.h"
 #include "accountsettings/log_handle.h"
+#include "accountsettings/record_changes.h"
 #include "bench/memory_device.h"
 #include "bench/unchanging_files.h"
 #include "migrator/accounts_data_migrator.h"
 #include "platform/linux/property_lists/libplist_property_list_store.h"
 #include "records/description.h"
+#include "records/fact_observer.h"
 
 namespace bench {
 namespace {
@@ -168,11 +172,75 @@ void replaceAll(AccountsManager& store) {
   store.replaceAccountsWithTypes_withAccounts({accountsettings::kMailAccountType}, accounts);
 }
 
+// However many children have the identifier.
+Action removeAlike(const Population& population) {
+  const Store store = loaded(population);
+  for (const auto& account : store->allBasicAccounts()) {
+    const auto property = account->accountPropertyForKey(accountsettings::kAccountChildAccounts);
+    if (!property) continue;
+    Array children = *property->asArray();
+    for (PropertyValue& each : children) {
+      Dictionary child = *each.asDictionary();
+      child.set(accountsettings::kAccountIdentifier, "alike");
+      each = std::move(child);
+    }
+    account->setAccountProperty_forKey(std::move(children), accountsettings::kAccountChildAccounts);
+  }
+  return [store] {
+    for (const auto& account : store->allBasicAccounts())
+      store->removeChildWithIdentifier_fromAccount("alike", account);
+  };
+}
+
 void logUnread(AccountsManager& store) {
   for (const auto& account : store.allBasicAccounts()) {
     accountsettings::_ASLogSystem().log("-[Bench logUnread]", "An account: %@ %@", account->properties(),
                                         account->originalProperties());
   }
+}
+
+// --- What a run's observer is told ---
+
+class SilentObserver final : public records::FactObserver {
+ public:
+  void stageBegan(std::string_view /*stage*/, std::string_view /*words*/) override {}
+  void stageEnded(std::string_view /*stage*/) override {}
+  void told(const records::Fact& fact) override { use(fact); }
+  void lostTrack() noexcept override { std::abort(); }
+};
+
+void setObserver(std::shared_ptr<platform::RunObserver> observer) {
+  platform::Platform services = platform::current();
+  services.observer = std::move(observer);
+  platform::setCurrent(std::move(services));
+}
+
+// Two saves of changed accounts, of which the second tells of other accounts than the first.
+Action explain(const Population& population) {
+  use(loaded(population));
+  setObserver(std::make_shared<SilentObserver>());
+  Store store = AccountsManager::init();
+  setObserver(nullptr);
+  return [store = std::move(store)] {
+    saveChanged(*store);
+    store->deleteAccount(AccountsManager::Account{store->allBasicAccounts().front()});
+    store->saveAllAccounts();
+  };
+}
+
+// One account, of which every key is given another name.
+Action renameKeys(const Population& population) {
+  const auto stateWith = [](const std::string& prefix, std::size_t first, std::size_t step, std::size_t count) {
+    Dictionary properties{{accountsettings::kAccountIdentifier, "one"}};
+    for (std::size_t key = first; count > 0; key += step, --count) {
+      properties.set(prefix + std::to_string(key), "the text of " + std::to_string(key));
+    }
+    return accountsettings::StoreState{{nullptr, std::move(properties)}};
+  };
+  const std::size_t keys = population.accounts;
+  return [before = stateWith("old ", 0, 1, keys), after = stateWith("new ", keys - 1, std::size_t(-1), keys)] {
+    use(accountsettings::differencesBetween(before, after));
+  };
 }
 
 // --- Version steps ---
@@ -208,6 +276,9 @@ const std::vector<Piece>& pieces() {
       ofStore("remove all", &removeAll),
       ofStore("add children", &addChildren),
       ofStore("replace all", &replaceAll),
+      {"remove alike", &removeAlike},
+      {"explain", &explain},
+      {"rename keys", &renameKeys},
       ofStore("log unread", &logUnread),
       ofStep("7A149", &AccountsDataMigrator::_migrateAccountsFrom7A149),
       ofStep("7A150", &AccountsDataMigrator::_migrateAccountsFrom7A150),
