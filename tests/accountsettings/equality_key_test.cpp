@@ -62,9 +62,10 @@ TEST(EqualityKey, IsAnotherForEveryValueThatIsNotEqual) {
   }
 }
 
-TEST(EqualityKey, TellsWhereOneTextEndsAndTheNextBegins) {
-  const std::string mark(1, static_cast<char>(PropertyValue{""}.kind()));
-  EXPECT_NE(equalityKey(Array{"a" + mark + "b", "c"}), equalityKey(Array{"a", "b" + mark + "c"}));
+TEST(EqualityKey, TellsWhereOneDataEndsAndTheNextBegins) {
+  const auto mark = static_cast<std::uint8_t>(PropertyValue{Bytes{}}.kind());
+  EXPECT_NE(equalityKey(Array{Bytes{'a', mark, 'b'}, Bytes{'c'}}),
+            equalityKey(Array{Bytes{'a'}, Bytes{'b', mark, 'c'}}));
 }
 
 TEST(EqualityKey, IsTheSameForDictionariesWhoseOrderDiffers) {

@@ -326,6 +326,26 @@ TEST_F(SavingAccounts, ThatEndsInAnExceptionHasFailedUnlessTheFileWasWritten) {
   EXPECT_TRUE(store->lastSaveOutcome().isSaved());
 }
 
+// Reads as another one does, and has no memory to write.
+class PropertyListsWithoutMemory final : public platform::PropertyListStore {
+ public:
+  explicit PropertyListsWithoutMemory(std::shared_ptr<platform::PropertyListStore> inner) : _inner{std::move(inner)} {}
+  platform::Result<Dictionary> readDictionary(const Path& path) override { return _inner->readDictionary(path); }
+  platform::SerializedPropertyList serialize(const Dictionary& /*dictionary*/) override { throw std::bad_alloc{}; }
+
+ private:
+  std::shared_ptr<platform::PropertyListStore> _inner;
+};
+
+TEST_F(SavingAccounts, RemembersThatAnExceptionEndedItBeforeThereWereBytes) {
+  const Store store = load({});
+  device.changePlatform([&](platform::Platform& services) {
+    services.propertyLists = std::make_shared<PropertyListsWithoutMemory>(device.propertyLists);
+  });
+  EXPECT_THROW(store->saveAllAccounts(), std::bad_alloc);
+  EXPECT_EQ(store->lastSaveOutcome().stage, Stage::serializing);
+}
+
 TEST_F(SavingAccounts, RemembersThatNoDataCameWhereNobodySaidWhy) {
   const Store store = load({});
   device.propertyLists->serializes = false;

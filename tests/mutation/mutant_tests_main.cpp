@@ -35,7 +35,8 @@ bool succeeds(const char* test, rlim_t seconds) {
 
 int main(int count, char** arguments) {
   testing::InitGoogleMock(&count, arguments);
-  if (count < 3) return RUN_ALL_TESTS();
+  const bool isDyingForATest = !GTEST_FLAG_GET(internal_run_death_test).empty();
+  if (count < 3 || isDyingForATest) return RUN_ALL_TESTS();
   const rlim_t seconds = std::strtoul(arguments[1], nullptr, 10);
   for (const char* const test : std::span{arguments, static_cast<std::size_t>(count)}.subspan(2)) {
     if (succeeds(test, seconds)) continue;
