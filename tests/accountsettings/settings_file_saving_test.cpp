@@ -327,14 +327,12 @@ TEST_F(SavingAccounts, ThatEndsInAnExceptionHasFailedUnlessTheFileWasWritten) {
 }
 
 // Reads as another one does, and has no memory to write.
-class PropertyListsWithoutMemory final : public platform::PropertyListStore {
- public:
-  explicit PropertyListsWithoutMemory(std::shared_ptr<platform::PropertyListStore> inner) : _inner{std::move(inner)} {}
-  platform::Result<Dictionary> readDictionary(const Path& path) override { return _inner->readDictionary(path); }
+struct PropertyListsWithoutMemory final : platform::PropertyListStore {
+  explicit PropertyListsWithoutMemory(std::shared_ptr<platform::PropertyListStore> reading)
+      : inner{std::move(reading)} {}
+  platform::Result<Dictionary> readDictionary(const Path& path) override { return inner->readDictionary(path); }
   platform::SerializedPropertyList serialize(const Dictionary& /*dictionary*/) override { throw std::bad_alloc{}; }
-
- private:
-  std::shared_ptr<platform::PropertyListStore> _inner;
+  std::shared_ptr<platform::PropertyListStore> inner;
 };
 
 TEST_F(SavingAccounts, RemembersThatAnExceptionEndedItBeforeThereWereBytes) {
