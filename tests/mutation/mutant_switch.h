@@ -4,6 +4,7 @@
 #include <unistd.h>
 
 #include <cstdlib>
+#include <mutex>
 #include <set>
 #include <string>
 #include <string_view>
@@ -12,7 +13,7 @@ namespace mutation {
 
 // What the mutated copy of one source asks at each of its mutants. The environment names the one mutant that is active
 // in MUTANT ("accountsettings/basic_account.cpp:17"), if any, and in MUTANTS_REACHED the file to which each mutant that
-// is met is added, as a line of that form.
+// is met is added, as a line of that form. May be asked by several threads.
 class MutatedSource {
  public:
   explicit MutatedSource(std::string_view path) : _path{path} {
@@ -22,7 +23,7 @@ class MutatedSource {
   }
 
   bool isActive(int number) {
-    if (!_reachedFile.empty() && _reached.insert(number).second) tellReached(number);
+    if (!_reachedFile.empty()) noteReached(number);
     return number == _active;
   }
 
@@ -30,6 +31,10 @@ class MutatedSource {
   static std::string_view variable(const char* name) {
     const char* const value = std::getenv(name);
     return value == nullptr ? std::string_view{} : value;
+  }
+  void noteReached(int number) {
+    const std::scoped_lock lock{_guard};
+    if (_reached.insert(number).second) tellReached(number);
   }
   // A test may end its process at any moment, so nothing is held back.
   void tellReached(int number) const {
@@ -41,6 +46,7 @@ class MutatedSource {
 
   std::string _path;
   std::string _reachedFile{variable("MUTANTS_REACHED")};
+  std::mutex _guard;
   std::set<int> _reached;
   int _active = -1;
 };

@@ -34,6 +34,14 @@ LONGEST = 110
 clang.cindex.Config.set_library_file("libclang-16.so.1")
 
 
+def has_known_kind(cursor):
+    """Not what is younger than the bindings, such as a requirement, at which the compiler alone looks."""
+    try:
+        return cursor.kind is not None
+    except ValueError:
+        return False
+
+
 class Point:
     """A place of the source: what it becomes under each of its mutants, and how the copy chooses."""
 
@@ -68,7 +76,7 @@ class Finder:
 
     def visit(self, cursor, function="", parent=None):
         start, end = self.extent(cursor)
-        if cursor.kind in SKIPPED or self.is_constant(cursor):
+        if not has_known_kind(cursor) or cursor.kind in SKIPPED or self.is_constant(cursor):
             return
         if cursor.kind in FUNCTIONS or cursor.kind in CLASSES:
             scope = cursor.semantic_parent
