@@ -1,6 +1,7 @@
 """The reference that is made from the headers: without a warning, and only where everything public is described."""
 
 import os
+import shutil
 import subprocess
 import sys
 import tempfile
@@ -11,11 +12,15 @@ SOURCES = Path(os.environ["SOURCE_TREE"])
 REFERENCE = Path(os.environ["BUILD_TREE"]) / "reference"
 
 
-def run(*command):
+def run(*command, directory=None):
     return subprocess.run(
-        [str(part) for part in command], stdin=subprocess.DEVNULL, stdout=subprocess.PIPE, stderr=subprocess.STDOUT, text=True,
-        check=False,
+        [str(part) for part in command], cwd=directory, stdin=subprocess.DEVNULL, stdout=subprocess.PIPE,
+        stderr=subprocess.STDOUT, text=True, check=False,
     )
+
+
+def pages_in(directory):
+    return {page.name: page.read_bytes() for page in (directory / "html").iterdir()}
 
 
 class Reference(unittest.TestCase):
@@ -35,9 +40,12 @@ class Reference(unittest.TestCase):
         (self.scratch / "input/header.h").write_text(header, encoding="utf-8")
         settings = (REFERENCE / "Doxyfile").read_text(encoding="utf-8")
         settings += f'\nINPUT = "{self.scratch}/input"\nOUTPUT_DIRECTORY = "{self.scratch}"\nUSE_MDFILE_AS_MAINPAGE =\n'
-        (self.scratch / "Doxyfile").write_text(settings, encoding="utf-8")
-        made = run("doxygen", self.scratch / "Doxyfile")
+        made = self.make(settings, SOURCES)
         return made.returncode == 0, made.stdout
+
+    def make(self, settings, sources):
+        (self.scratch / "Doxyfile").write_text(settings, encoding="utf-8")
+        return run("doxygen", self.scratch / "Doxyfile", directory=sources / "reference")
 
     def test_is_made_without_a_warning(self):
         made = run("cmake", "--build", REFERENCE.parent, "--target", "docs")
@@ -45,6 +53,17 @@ class Reference(unittest.TestCase):
         pages = "".join(page.read_text(encoding="utf-8") for page in (REFERENCE / "html").glob("*.html"))
         told = {"waits for nobody", "account_settings_watch_dispatch", "mayDropUnreadable", "brokenInstallation"}
         self.assertEqual(told, {each for each in {*told, "<script", "struct Content"} if each in pages})
+
+    def test_is_the_same_wherever_the_sources_lie(self):
+        run("cmake", "--build", REFERENCE.parent, "--target", "docs")
+        elsewhere = self.scratch / "another place"
+        for part in ("client/include", "bindings/include", "reference"):
+            shutil.copytree(SOURCES / part, elsewhere / part)
+        settings = (REFERENCE / "Doxyfile").read_text(encoding="utf-8").replace(str(SOURCES), str(elsewhere))
+        self.make(f'{settings}\nOUTPUT_DIRECTORY = "{self.scratch}"\n', elsewhere)
+        here, there = pages_in(REFERENCE), pages_in(self.scratch)
+        self.assertEqual(sorted(here), sorted(there))
+        self.assertEqual([], [name for name in here if here[name] != there[name]])
 
     def test_fails_where_something_public_is_not_described(self):
         described = "#pragma once\n\n// Rooms.\nnamespace rooms {\n// A room.\nclass Room {\n public:\n  int size();  // of it\n%s};\n}\n"
