@@ -17,7 +17,7 @@ LICENSES = {
 }
 SHA1, SHA256 = 40, 64
 HEADERS_ONLY = {"libcli11-dev", "libutfcpp-dev", "libxxhash-dev", "nlohmann-json3-dev"}
-LIBRARIES = {"libc6", "libicu72", "libmd0", "libplist3", "libstdc++6", "libutf8proc2", "libuuid1"}
+LIBRARIES = {"libc6", "libicu72", "libmd0", "libplist3", "libstdc++6", "libutf8proc2", "zlib1g"}
 
 
 class BillOfMaterials(unittest.TestCase):
