@@ -191,10 +191,10 @@ class RealStart(unittest.TestCase):
         settings = system.path(SETTINGS)
         kept = settings.with_name("kept")
         settings.rename(kept)
-        settings.symlink_to("/etc/passwd")
+        settings.symlink_to("/etc/shadow")  # which is not the mobile user's to read
         os.lchown(settings, *self.mobile(system))
         shown, entries = self.started(system)
-        self.assertEqual(("exit-code", "5"), (shown["Result"], shown["ExecMainStatus"]), self.messages(entries))
+        self.assertEqual(("exit-code", "8"), (shown["Result"], shown["ExecMainStatus"]), self.messages(entries))
         self.assertFalse(self.is_update_done(system))
         self.assertIn(UNIT, system.path("/srv/failed").read_text())
         kept.rename(settings)
