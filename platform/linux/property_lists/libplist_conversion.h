@@ -29,7 +29,4 @@ Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt);
 // why there are none, never both.
 [[nodiscard]] SerializedPropertyList writePropertyList(const Dictionary& dictionary);
 
-// Whether a binary property list that is safe for libplist holds exactly these values in their order.
-[[nodiscard]] bool readsBackAs(const Bytes& safe, const Dictionary& values);
-
 }  // namespace platform

@@ -2,7 +2,6 @@
 
 #include <plist/plist.h>
 
-#include <algorithm>
 #include <array>
 #include <clocale>
 #include <string_view>
@@ -193,35 +192,6 @@ const char* reasonFor(Cause refusal) {
   }
 }
 
-// --- Comparison: whether a tree holds exactly these values, their kinds, keys and order. No deeper than the tree was
-// let pass. ---
-
-bool holds(plist_t node, const PropertyValue& value);
-
-bool holds(plist_t node, const Dictionary& values) {
-  if (values.size() != plist_dict_get_size(node)) return false;
-  LibplistEntries entries{node};
-  return std::all_of(values.begin(), values.end(), [&entries](const Dictionary::Entry& entry) {
-    return entries.advance() && entries.hasKey(entry.key.cString()) && holds(entries.item(), entry.value);
-  });
-}
-
-bool holds(plist_t node, const Array& array) {
-  if (array.size() != plist_array_get_size(node)) return false;
-  LibplistArrayItems items{node};
-  return std::ranges::all_of(array, [&items](const PropertyValue& element) { return holds(items.next(), element); });
-}
-
-bool holds(plist_t node, const PropertyValue& value) {
-  switch (plist_get_node_type(node)) {
-    case PLIST_STRING: return value.asText() != nullptr && *value.asText() == textOfLibplist(node);
-    case PLIST_DATA: return value.asData() != nullptr && std::ranges::equal(*value.asData(), dataOfLibplist(node));
-    case PLIST_ARRAY: return value.asArray() != nullptr && holds(node, *value.asArray());
-    case PLIST_DICT: return value.asDictionary() != nullptr && holds(node, *value.asDictionary());
-    default: return scalarOfLibplist(node) == value;
-  }
-}
-
 }  // namespace
 
 Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt) {
@@ -232,11 +202,6 @@ Result<ParsedPropertyList> parsePropertyList(Bytes bytes, std::string attempt) {
   if (isDearToWrite(values, conversion.size()))
     return Status::failure(Cause::excessive, std::move(attempt), reasonFor(Cause::excessive));
   return ParsedPropertyList{std::move(values), tree.isFaithful && !conversion.hasFoundRepeatedKeys()};
-}
-
-bool readsBackAs(const Bytes& safe, const Dictionary& values) {
-  const LibplistNode tree = treeOf(safe);
-  return plist_get_node_type(tree.get()) == PLIST_DICT && holds(tree.get(), values);
 }
 
 }  // namespace platform

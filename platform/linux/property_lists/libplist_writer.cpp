@@ -5,6 +5,7 @@
 
 #include <plist/plist.h>
 
+#include "platform/linux/property_lists/binary_plist_comparison.h"
 #include "platform/linux/property_lists/binary_plist_scan.h"
 #include "platform/linux/property_lists/libplist_node.h"
 
@@ -33,7 +34,7 @@ class Inspection {
   }
 
   [[nodiscard]] const Status& objection() const { return _objection; }
-  // That libplist takes for its tree, its table, the bytes and the tree that is read back, about.
+  // That libplist takes for its tree, its table and the bytes, about.
   [[nodiscard]] std::size_t memoryNeeded() const { return kBytesForValue * _values + 6 * _bytes; }
 
  private:
@@ -133,7 +134,7 @@ SerializedPropertyList writePropertyList(const Dictionary& dictionary) {
   // the C library sort them all.
   const bool isSafe = repairBinaryPlist(bytes).refusal == Cause::none;
   tree.reset();
-  if (!isSafe || !readsBackAs(bytes, dictionary)) {
+  if (!isSafe || !holdsExactly(bytes, dictionary)) {
     return nothing(failure(Cause::other, "What was written does not read back the same"));
   }
   return {std::make_shared<const Bytes>(std::move(bytes)), {}};
