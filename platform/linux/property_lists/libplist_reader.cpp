@@ -65,6 +65,7 @@ class Conversion {
     Text text;
     std::size_t dictionary = 0;  // the last one in which it was found, and its place there
     std::size_t place = 0;
+    Key* follower = nullptr;  // the key that came after it the last time
   };
 
   // A dictionary's items, of each key the last one at the first one's place.
@@ -76,7 +77,7 @@ class Conversion {
     _size += count;
     LibplistEntries entries{node};
     while (entries.advance()) {
-      Key& key = known(entries.key().get());
+      Key& key = keyOf(entries);
       if (key.dictionary == _dictionaries) {
         items[key.place].node = entries.item();
         _hasFoundRepeatedKeys = true;
@@ -87,6 +88,17 @@ class Conversion {
       items.push_back({key.text, entries.item()});
     }
     return items;
+  }
+
+  // Records name the same keys in the same order, so mostly it is the one that came after the key before it the last
+  // time, and need not be copied to be looked up.
+  Key& keyOf(const LibplistEntries& entries) {
+    Key* const expected = _previous->follower;
+    const bool isExpected = expected != nullptr && entries.hasKey(expected->text.cString());
+    Key& key = isExpected ? *expected : known(entries.key().get());
+    _previous->follower = &key;
+    _previous = &key;
+    return key;
   }
 
   // Bytes that are not UTF-8 change as they become a text, so two keys of the file may be one; the text tells.
@@ -122,6 +134,8 @@ class Conversion {
   }
 
   std::unordered_map<std::string_view, Key, SeededHash> _keys;  // by views of their texts
+  Key _beforeTheFirst;
+  Key* _previous = &_beforeTheFirst;
   RecentTexts _texts;
   std::size_t _dictionaries = 0;
   std::size_t _size = 0;
