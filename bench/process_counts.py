@@ -51,6 +51,12 @@ def _calls(command, environment):
     return len(calls) - look_ups, look_ups
 
 
+def _relocations(command, environment):
+    """Of the program and of what it loads on its way, without those that need no look-up."""
+    told = _run(command, {**environment, "LD_DEBUG": "statistics"}).stderr
+    return int(re.search(r"final number of relocations: (\d+)", told)[1])
+
+
 def can_trace_calls():
     return shutil.which("strace") and subprocess.run(["strace", "-o", os.devnull, "true"], check=False).returncode == 0
 
@@ -100,6 +106,9 @@ class Processes:
         # Of page faults the fewest: where the kernel puts what a program loads varies.
         faults = min(measured(_faults) for _ in range(5))
         return Counts(measured(_instructions), *measured(_calls), faults)
+
+    def relocations(self, version, command_on):
+        return self._on_device(version, command_on, _relocations)
 
     def _on_device(self, version, command_on, measure):
         root = Path(tempfile.mkdtemp(dir=self.directory))
