@@ -49,9 +49,10 @@ class Forms(ArchiveTest):
         self.assertEqual(("lost", self.expected.document), (found.verdict, found.document), found)
 
     def test_of_compression_do_not_matter(self):
-        for letter, end in (("", "tar"), ("z", "tar.gz"), ("j", "tar.bz2"), ("J", "tar.xz")):
-            archive = self.scratch / f"archive.{end}"
-            subprocess.run(["tar", f"-c{letter}f", archive, "-C", self.root, "."], check=True)
+        for compression in ("", "gz", "bz2", "xz"):
+            archive = self.scratch / f"archive.tar.{compression}".rstrip(".")
+            with tarfile.open(archive, f"w:{compression}") as written:
+                written.add(self.root, ".")
             self.assert_same(archive)
 
     def test_include_zip(self):
@@ -232,10 +233,12 @@ class Faults(ArchiveTest):
         volume.mkdir()
         here.mkdir()
         flags = ["--mount"] if os.getuid() == 0 else ["--mount", "--user", "--map-root-user"]
-        filled = ('mount -t tmpfs -o size=64k small "$0" && { head -c 64k /dev/zero > "$0/full";'
-                  ' TMPDIR="$0" exec "$@"; }')
-        ended = subprocess.run(["unshare", *flags, "sh", "-c", filled, volume, REHEARSE, "--results", self.file, archive,
-                                self.scratch / "device"], cwd=here, stdout=subprocess.DEVNULL, check=False)
+        filled = ["unshare", *flags, "sh", "-c", 'mount -t tmpfs -o size=64k small "$0" &&'
+                  ' { head -c 64k /dev/zero > "$0/full"; TMPDIR="$0" exec "$@"; }', volume]
+        if subprocess.run([*filled, "true"], check=False).returncode != 0:
+            self.skipTest("mounting a small volume is not allowed here")
+        ended = subprocess.run([*filled, REHEARSE, "--results", self.file, archive, self.scratch / "device"], cwd=here,
+                               stdout=subprocess.DEVNULL, check=False)
         self.assertEqual(3, ended.returncode)
         self.assertEqual({"archive.tar.gz": ("unrehearsed", "unpacking-failed"), "device": ("kept", "")}, self.verdicts())
         self.assertEqual([], list(here.iterdir()))
