@@ -6,11 +6,26 @@ import tempfile
 
 from selenium import webdriver
 from selenium.webdriver.chrome.service import Service
+from selenium.webdriver.common import utils
+from selenium.webdriver.support.ui import WebDriverWait
 
 from rehearse_case import REHEARSE, RehearseTest
 
 TEMPLATE = REHEARSE.parent.parent / "share/account-settings/pages/page.html"
 COLOURS = ("paper", "panel", "ink", "faint", "accent", "kept", "lost", "not-saved", "failed", "refused")
+
+
+class Driver(Service):
+    """The browser's driver by the address of this machine, since a minimal system does not know the name localhost."""
+
+    ADDRESS = "127.0.0.1"
+
+    @property
+    def service_url(self):
+        return f"http://{self.ADDRESS}:{self.port}"
+
+    def is_connectable(self):
+        return utils.is_connectable(self.port, self.ADDRESS)
 
 
 class BrowserTest(RehearseTest):
@@ -23,18 +38,21 @@ class BrowserTest(RehearseTest):
         cls.addClassCleanup(profile.cleanup)
         options = webdriver.ChromeOptions()
         for argument in ("--headless=new", "--no-sandbox", "--disable-gpu", "--disable-dev-shm-usage",
-                         "--window-size=1200,900", f"--user-data-dir={profile.name}"):
+                         "--window-size=1200,900", "--remote-debugging-pipe", f"--user-data-dir={profile.name}"):
             options.add_argument(argument)
         options.set_capability("goog:loggingPrefs", {"browser": "ALL", "performance": "ALL"})
-        cls.browser = webdriver.Chrome(service=Service("/usr/bin/chromedriver"), options=options)
+        cls.browser = webdriver.Chrome(service=Driver("/usr/bin/chromedriver"), options=options)
         cls.addClassCleanup(cls.browser.quit)
 
     def opened(self, page, scheme="light"):
         """The page in the browser, anew."""
         self.emulate(media="", features=[{"name": "prefers-color-scheme", "value": scheme},
                                          {"name": "prefers-reduced-motion", "value": "reduce"}])
+        self.browser.get("about:blank")
         self.browser.get_log("performance")
         self.browser.get(f"file://{page}")
+        shown = [f"file://{page}", "complete"]
+        WebDriverWait(self.browser, 30).until(lambda _: self.asks("[location.href, document.readyState]") == shown)
 
     def emulate(self, **media):
         self.browser.execute_cdp_cmd("Emulation.setEmulatedMedia", media)
