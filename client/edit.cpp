@@ -2,6 +2,8 @@
 
 #include <algorithm>
 #include <cerrno>
+#include <iterator>
+#include <unordered_set>
 #include <utility>
 
 #include "client/changes.h"
@@ -41,28 +43,28 @@ Records recordsOf(const AccountsManager& store) {
   return records;
 }
 
-// Null where there is no such account, or it could not be loaded as it was changed.
-Record copyIn(const AccountsManager& store, std::string_view identifier) {
-  const Target target = targetIn(store, identifier);
-  return target.record == nullptr ? nullptr : recordOf(target);
-}
+using Identifiers = std::unordered_set<std::string>;
 
-// The store takes out one record at a time, and several may have the identifier.
-void deleteEvery(AccountsManager& store, const Record& record) {
-  for (std::size_t before = store.count() + 1; store.count() < before;) {
-    before = store.count();
-    store.deleteAccount(record);
-  }
+// Takes out every top-level account that has one of the identifiers, all in one walk of the store's order.
+void deleteEvery(AccountsManager& store, const Identifiers& identifiers) {
+  if (identifiers.empty()) return;
+  AccountsManager::Accounts going;
+  std::ranges::copy_if(store.allBasicAccounts(), std::back_inserter(going), [&](const Record& record) {
+    const std::optional<Text> identifier = record->identifier();
+    return identifier && identifiers.contains(identifier->string());
+  });
+  store.deleteAccounts(going);
 }
 
 // --- Bringing a change into another store ---
 
-Outcome bringInto(AccountsManager& store, const Pair& pair) {
+// Accounts that go are only named, to be taken out together.
+Outcome bringInto(AccountsManager& store, const Pair& pair, Identifiers& going) {
   const Dictionary& named = pair.after == nullptr ? *pair.before : *pair.after;
   const Target target = targetIn(store, *named.text(kAccountIdentifier));
   const bool isThere = target.record != nullptr;
   if (pair.after == nullptr) {
-    if (isThere && !target.child) deleteEvery(store, target.record);
+    if (isThere && !target.child) going.insert(named.text(kAccountIdentifier)->string());
     return done();
   }
   if (pair.before == nullptr) {
@@ -142,6 +144,7 @@ struct Edit::Content {
   FileIdentity file = {};
   Store store = nullptr;
   Records before = {};
+  Identifiers going = {};  // of accounts that are removed, but still in the store
 
   Outcome begin() {
     if (manner == Manner::trial) return read();
@@ -174,13 +177,32 @@ struct Edit::Content {
     const Records now = recordsOf(*store);
     if (Outcome again = read(); !again.isOk()) return again;
     for (const Pair& pair : differingPairs(past, now)) {
-      if (Outcome brought = bringInto(*store, pair); !brought.isOk()) return brought;
+      if (Outcome brought = bringInto(*store, pair, going); !brought.isOk()) return brought;
     }
+    removeWhatGoes();
     return done();
+  }
+
+  void removeWhatGoes() { deleteEvery(*store, std::exchange(going, {})); }
+
+  // As if what goes were gone.
+  Target find(std::string_view identifier) {
+    const Target target = targetIn(*store, identifier);
+    const std::optional<Text> owner = target.record == nullptr ? std::nullopt : target.record->identifier();
+    if (!owner || !going.contains(owner->string())) return target;
+    removeWhatGoes();  // another account may have had the identifier
+    return targetIn(*store, identifier);
+  }
+
+  // Null where there is no such account, or it could not be loaded as it was changed.
+  Record copyOf(std::string_view identifier) {
+    const Target target = find(identifier);
+    return target.record == nullptr ? nullptr : recordOf(target);
   }
 
   Result<Saved> write() {
     const Within within{*device};
+    removeWhatGoes();
     if (FileIdentity::of(device->settingsFile()) != file) {
       if (const Outcome again = readAgain(); !again.isOk()) return again.error();
     }
@@ -233,7 +255,7 @@ struct Edit::Content {
   template <typename Function>
   Outcome alter(std::string_view identifier, const Function& altered) {
     return run([&]() -> Outcome {
-      const Target target = targetIn(*store, identifier);
+      const Target target = find(identifier);
       if (target.record == nullptr) return unknownAccount(identifier);
       Result<Dictionary> properties = altered(target);
       if (!properties.isOk()) return properties.error();
@@ -260,11 +282,11 @@ struct Edit::Content {
       store->insertAccount(record);
       return accountOf(device, BasicAccount::initWithProperties(record->properties()));
     }
-    const Target target = targetIn(*store, parent);
+    const Target target = find(parent);
     if (target.record == nullptr) return unknownAccount(parent);
     if (target.child) return Error{Code::unsuitable, "a child account cannot have children"};
     store->addChild_toAccount(record, target.record);
-    return accountOf(device, copyIn(*store, *record->identifier()));
+    return accountOf(device, copyOf(*record->identifier()));
   }
 };
 
@@ -283,6 +305,7 @@ std::vector<Account> Edit::accounts() const {
   std::vector<Account> accounts;
   if (_content == nullptr) return accounts;
   const Within within{*_content->device};
+  _content->removeWhatGoes();
   for (const Dictionary& properties : recordsOf(*_content->store)) {
     if (Record record = BasicAccount::initWithProperties(properties)) {
       accounts.push_back(accountOf(_content->device, std::move(record)));
@@ -294,7 +317,7 @@ std::vector<Account> Edit::accounts() const {
 std::optional<Account> Edit::account(std::string_view identifier) const {
   if (_content == nullptr) return std::nullopt;
   const Within within{*_content->device};
-  Record record = copyIn(*_content->store, identifier);
+  Record record = _content->copyOf(identifier);
   return record == nullptr ? std::nullopt : std::optional{accountOf(_content->device, std::move(record))};
 }
 
@@ -311,7 +334,7 @@ Result<Account> Edit::add(const NewAccount& account) {
                                              account.accountClass + "\""};
     }
     const Text identifier = *record->identifier();
-    if (targetIn(*_content->store, identifier).record != nullptr) {
+    if (_content->find(identifier).record != nullptr) {
       return Error{Code::alreadyThere, "there is an account with the identifier " + identifier.string()};
     }
     return _content->addTo(account.parentIdentifier, record);
@@ -321,12 +344,12 @@ Result<Account> Edit::add(const NewAccount& account) {
 Outcome Edit::remove(std::string_view identifier) {
   if (_content == nullptr) return finished();
   return _content->run([&]() -> Outcome {
-    const Target target = targetIn(*_content->store, identifier);
+    const Target target = _content->find(identifier);
     if (target.record == nullptr) return unknownAccount(identifier);
     if (target.child) {
       _content->store->removeChildWithIdentifier_fromAccount(identifier, target.record);
     } else {
-      deleteEvery(*_content->store, target.record);
+      _content->going.emplace(identifier);
     }
     return done();
   });

@@ -99,6 +99,17 @@ TEST_F(ChangingAccounts, RemovesEveryAccountOfTheIdentifier) {
   EXPECT_EQ(looked().size(), 1U);
 }
 
+TEST_F(ChangingAccounts, HasNothingOfAnAccountOnceItWasRemoved) {
+  auto edit = opened().edit();
+  ASSERT_TRUE(edit->remove("V1").isOk());
+  EXPECT_FALSE(edit->account("V1").has_value());
+  EXPECT_FALSE(edit->account("C1").has_value());
+  EXPECT_EQ(codeOf(edit->remove("V1")), Code::unknownAccount);
+  EXPECT_EQ(codeOf(edit->set("C1", "Port", 1)), Code::unknownAccount);
+  EXPECT_EQ(codeOf(edit->add({"CardDAV", "CardDAVAccount", {{"Identifier", "C2"}}, "V1"})), Code::unknownAccount);
+  EXPECT_EQ(edit->accounts().size(), 1U);
+}
+
 TEST_F(ChangingAccounts, AddsARecordAsItIsInItsOrder) {
   const Value::Dictionary record{{"Port", 1}, {"Class", "LDAPAccount"}, {"Identifier", "L1"}, {"Type", "LDAP"}};
   ASSERT_TRUE(opened().change([&](Edit& edit) { return edit.add({"", "", record, ""}).isOk(); }).isOk());

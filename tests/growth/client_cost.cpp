@@ -1,5 +1,6 @@
 // Looks at and changes one account of the device below ROOT, with the store alone and through the interface for
-// programs, for whoever counts what `measuredPiece` takes; prints the names of the pieces. Usage: client-cost ROOT ID
+// programs, and removes each as a trial, for whoever counts what `measuredPiece` takes; prints the names of the pieces.
+// Usage: client-cost ROOT ID
 
 #include <cstdint>
 #include <cstdio>
@@ -58,6 +59,12 @@ int main(int, char** arguments) {
          const auto saved =
              opened->change([&](accounts::Edit& edit) { return edit.set(identifier, "Port", ++port).isOk(); });
          require(saved.isOk() && saved->changes.size() == 1);
+       }},
+      {"remove each",
+       [&] {
+         auto edit = opened->trial();
+         for (const auto& account : edit->accounts()) require(edit->remove(account.identifier()).isOk());
+         require(edit->accounts().empty());
        }},
   };
   for (const auto& [name, action] : pieces) action();  // what is done once in a process is done here
