@@ -279,6 +279,8 @@ struct Edit::Content {
 
   Result<Account> addTo(const std::string& parent, const Record& record) {
     if (parent.empty()) {
+      // A new one: nothing of what the file holds under its identifier is its own.
+      record->setOriginalProperties({});
       store->insertAccount(record);
       return accountOf(device, BasicAccount::initWithProperties(record->properties()));
     }

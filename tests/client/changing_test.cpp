@@ -110,6 +110,16 @@ TEST_F(ChangingAccounts, HasNothingOfAnAccountOnceItWasRemoved) {
   EXPECT_EQ(edit->accounts().size(), 1U);
 }
 
+TEST_F(ChangingAccounts, AddsAnotherAccountInThePlaceOfOneThatWasRemoved) {
+  const auto saved = opened().change([](Edit& edit) {
+    return edit.remove("M1").isOk() && edit.set("V1", "Port", 1).isOk() &&
+           edit.add({"LDAP", "LDAPAccount", {{"Identifier", "M1"}, {"Word", "anew"}}, ""}).isOk();
+  });
+  ASSERT_TRUE(saved.isOk()) << saved.error().sentence;
+  EXPECT_EQ(looked().size(), 2U);
+  EXPECT_THAT(looked().withIdentifier("M1")->text("Word"), Optional(std::string{"anew"}));
+}
+
 TEST_F(ChangingAccounts, AddsARecordAsItIsInItsOrder) {
   const Value::Dictionary record{{"Port", 1}, {"Class", "LDAPAccount"}, {"Identifier", "L1"}, {"Type", "LDAP"}};
   ASSERT_TRUE(opened().change([&](Edit& edit) { return edit.add({"", "", record, ""}).isOk(); }).isOk());
