@@ -74,6 +74,15 @@ CLI::Option* declare(CLI::App& parser, const Option& option) {
   return parser.add_flag(names)->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
 }
 
+// Most programs know many options and are given few; to declare one takes longer than to read it.
+bool mayBeGiven(const Option& option, std::span<const char* const> arguments) {
+  const bool hasShortName = option.names.find(',') != std::string::npos;
+  return std::ranges::any_of(arguments, [&](std::string_view argument) {
+    const bool isShort = argument.size() > 1 && argument[0] == '-' && argument[1] != '-';
+    return (hasShortName && isShort) || argument.starts_with(longName(option));
+  });
+}
+
 void refuseUnknown(const CLI::App& parser, std::span<const Option> options) {
   std::vector<std::string> names;
   for (const Option& option : options) names.push_back(longName(option));
@@ -101,17 +110,19 @@ std::vector<std::string> readOptions(std::span<const Option> options, std::span<
   CLI::App parser;
   parser.set_help_flag();
   parser.allow_extras();
-  std::vector<CLI::Option*> declared;
-  for (const Option& option : options) declared.push_back(declare(parser, option));
+  std::vector<std::pair<const Option*, CLI::Option*>> declared;
+  for (const Option& option : options) {
+    if (mayBeGiven(option, arguments)) declared.emplace_back(&option, declare(parser, option));
+  }
   // Counted on as many as can be: of words beyond the expected ones the parser would take those in brackets apart.
   auto* const words = parser.add_option("words")->expected(kAnyNumber, kAnyNumber);
   words->multi_option_policy(CLI::MultiOptionPolicy::TakeAll);
   parser.parse(std::vector<std::string>{arguments.rbegin(), arguments.rend()});
   refuseUnknown(parser, options);
-  for (std::size_t index = 0; index < declared.size(); ++index) {
-    const Values& values = declared[index]->results();
+  for (const auto& [option, read] : declared) {
+    const Values& values = read->results();
     if (values.empty()) continue;
-    std::visit([&](const auto& target) { leave(options[index], target, values); }, options[index].target);
+    std::visit([&, &meant = *option](const auto& target) { leave(meant, target, values); }, option->target);
   }
   return words->results();
 }

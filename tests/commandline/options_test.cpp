@@ -110,6 +110,7 @@ TEST_F(Reading, RefusesInASentence) {
       {{"--jsn=x"}, "unknown option: --jsn (see --help)"},
       {{"--keep", "1", "-k"}, "unknown option: -k (see --help)"},
       {{"--rep"}, "unknown option: --rep (see --help)"},
+      {{"--rooted"}, "unknown option: --rooted (see --help)"},
       {{"--json=yes"}, "unknown option: --json (see --help)"},
       {{"--json=true"}, "unknown option: --json (see --help)"},
       {{"--json="}, "unknown option: --json (see --help)"},
