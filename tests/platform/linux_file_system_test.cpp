@@ -8,8 +8,10 @@
 #include <unistd.h>
 
 #include <cerrno>
+#include <chrono>
 #include <cstdlib>
 #include <fstream>
+#include <thread>
 
 #include "platform/linux/files/file_services.h"
 #include "platform/linux/linux_platform.h"
@@ -232,6 +234,15 @@ TEST_F(LinuxFiles, AreGivenByNumber) {
   ASSERT_EQ(::stat((scratch / "file").c_str(), &status), 0);
   EXPECT_EQ(status.st_uid, 501U);
   EXPECT_EQ(status.st_gid, 503U);
+}
+
+TEST_F(LinuxFiles, AreSoonGivenToNobodyWhoIsNoMore) {
+  nameTheCaller("mobile");
+  scratch.put("file", "text");
+  ASSERT_TRUE(files->setOwner(scratch / "file", "mobile", "mobile").isOk());
+  nameTheCaller("somebody");
+  std::this_thread::sleep_for(std::chrono::milliseconds{1100});
+  EXPECT_EQ(files->setOwner(scratch / "file", "mobile", "mobile").errorNumber(), ENOENT);
 }
 
 TEST_F(LinuxFiles, FindNoAccountsInAPipe) {

@@ -56,6 +56,7 @@ TEST_F(Rehearsal, ReplacesAFileInMemoryOnly) {
 TEST_F(Rehearsal, FindsNothingBelowADirectoryThatItRemoved) {
   ASSERT_TRUE(files->remove(scratch / "directory/below").isOk());
   EXPECT_EQ(files->kindOf(scratch / "directory/below/other").cause(), Cause::missing);
+  EXPECT_EQ(files->read(scratch / "directory/below/other", SIZE_MAX).status().cause(), Cause::missing);
   EXPECT_EQ(textAt("directory/file"), "as it is");
   EXPECT_EQ(scratch.contents("directory/below/other"), "as it is");
 }

@@ -89,12 +89,18 @@ Result<gid_t> AccountNames::group(const std::string& name) const {
 
 Result<AccountNames::Owner> AccountNames::ownerOf(const std::filesystem::path& path, const std::string& user,
                                                   const std::string& group) const {
+  constexpr std::chrono::seconds kBelieved{1};
+  const Clock::time_point now = Clock::now();
+  const std::scoped_lock lock{_guard};
+  const bool isKnown = _lastFinding && _lastFinding->user == user && _lastFinding->group == group;
+  if (isKnown && now - _lastFinding->time < kBelieved) return _lastFinding->owner;
   const std::string purpose = " for " + path.string();
   const Result<uid_t> userNumber = this->user(user);
   if (!userNumber.isOk()) return notFound(userNumber.status().errorNumber(), user, purpose);
   const Result<gid_t> groupNumber = this->group(group);
   if (!groupNumber.isOk()) return notFound(groupNumber.status().errorNumber(), group, purpose);
-  return Owner{userNumber.value(), groupNumber.value()};
+  _lastFinding = {user, group, {userNumber.value(), groupNumber.value()}, now};
+  return _lastFinding->owner;
 }
 
 Result<uid_t> numberOfUser(const std::filesystem::path& systemRoot, const std::string& name) {

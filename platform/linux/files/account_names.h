@@ -2,7 +2,10 @@
 
 #include <sys/types.h>
 
+#include <chrono>
 #include <filesystem>
+#include <mutex>
+#include <optional>
 #include <string>
 
 #include "platform/export.h"
@@ -25,14 +28,28 @@ class AccountNames {
   struct Owner {
     uid_t user;
     gid_t group;
+
+    bool operator==(const Owner&) const = default;
   };
-  // Both for what stands at the path, which a failure names.
+  // Both for what stands at the path, which a failure names. What was found is believed for a second, since
+  // each save asks for the same two. For any number of threads.
   [[nodiscard]] Result<Owner> ownerOf(const std::filesystem::path& path, const std::string& user,
                                       const std::string& group) const;
 
  private:
+  using Clock = std::chrono::steady_clock;
+
+  struct Finding {
+    std::string user;
+    std::string group;
+    Owner owner;
+    Clock::time_point time;
+  };
+
   std::filesystem::path _root;
   PathResolver _paths;
+  mutable std::mutex _guard;
+  mutable std::optional<Finding> _lastFinding;
 };
 
 // The number of one user, as AccountNames has it.

@@ -31,8 +31,19 @@ bool readStatus(Entry& entry) {
   return entry.descriptor.isOpen() && ::fstat(entry.descriptor.number(), &entry.status) == 0;
 }
 
-// What stands at the name in the directory. Answers false, with errno set, where that cannot be told.
+// What stands at the name in the directory, where nothing is to be entered there. Answers false, with errno set, where
+// that cannot be told.
 bool look(const Entry& directory, const std::string& name, const Overlay* overlay, Entry& entry) {
+  entry = {};
+  if (overlay != nullptr) entry.node = overlay->find(directory.status, name);
+  if (entry.node != nullptr) entry.status = entry.node->status;
+  if (entry.node != nullptr || Overlay::isMade(directory.status)) return true;
+  const int parent = directory.descriptor.number();
+  return ::fstatat(parent, name.c_str(), &entry.status, AT_SYMLINK_NOFOLLOW) == 0 || errno == ENOENT;
+}
+
+// The same, opened on the way down.
+bool open(const Entry& directory, const std::string& name, const Overlay* overlay, Entry& entry) {
   const Overlay::Node* const node = overlay == nullptr ? nullptr : overlay->find(directory.status, name);
   if (node != nullptr) {
     entry = {copyOf(directory.descriptor), node->status, node};
@@ -87,7 +98,7 @@ class PathWalk {
   std::optional<Spot> takeSpot() {
     if (!isEntryName(_leaf)) {
       const Entry& directory = _directories.back();
-      _target = {copyOf(directory.descriptor), directory.status, directory.node};
+      _target = {Descriptor{}, directory.status, directory.node};
     }
     return Spot{std::move(_directories.back()), _leaf, std::move(_target)};
   }
@@ -101,7 +112,7 @@ class PathWalk {
     if (name == ".") return true;
     if (name == "..") return goUp();
     Entry entry;
-    if (!look(_directories.back(), name, _overlay, entry)) return false;
+    if (!open(_directories.back(), name, _overlay, entry)) return false;
     if (!entry.isThere() && !isAtEnd) return failWith(ENOENT);
     if (S_ISLNK(entry.status.st_mode)) {
       if (!follow(entry)) return false;
@@ -269,7 +280,7 @@ bool PathResolver::isBase(const path& path) const {
 }
 
 Descriptor PathResolver::openPlain(const path& path) const {
-  if (isPlain(path.native())) return openWithoutLinks(AT_FDCWD, path.c_str(), O_PATH);
+  if (isPlain(path.native()) && isAsOnDevice(path.native())) return openWithoutLinks(AT_FDCWD, path.c_str(), O_PATH);
   errno = ELOOP;
   return {};
 }
@@ -320,18 +331,23 @@ Place PathResolver::openParentOfTarget(const path& path) const {
   return {walk.takeDirectory(), walk.leaf()};
 }
 
-// Directories of the path that nobody changed in the rehearsal are entered as on the device.
-bool PathResolver::isWayChanged(const path& path) const {
-  const std::string directories = above(path);
-  return _overlay != nullptr && directories != "/" &&
-         !everyName(directories, [this](std::string_view name) { return !_overlay->isKnown(name); });
+bool PathResolver::isAsOnDevice(std::string_view path) const {
+  return _overlay == nullptr || everyName(path, [this](std::string_view name) { return !_overlay->isKnown(name); });
+}
+
+Place PathResolver::openParentOfUnchanged(const path& path) const {
+  if (isPlain(path.native()) && !isBase(path) && isAsOnDevice(path.native())) {
+    return {openWithoutLinks(AT_FDCWD, above(path).c_str(), O_PATH | O_DIRECTORY), leafOf(path)};
+  }
+  errno = ELOOP;
+  return {};
 }
 
 std::optional<Spot> PathResolver::find(const path& path) const {
-  if (isPlain(path.native()) && !isBase(path) && !isWayChanged(path)) {
+  if (const std::string way = above(path); isPlain(path.native()) && !isBase(path) && isAsOnDevice(way)) {
     Spot spot;
     spot.leaf = leafOf(path);
-    spot.directory.descriptor = openWithoutLinks(AT_FDCWD, above(path).c_str(), O_PATH | O_DIRECTORY);
+    spot.directory.descriptor = openWithoutLinks(AT_FDCWD, way.c_str(), O_PATH | O_DIRECTORY);
     if (readStatus(spot.directory)) {
       return look(spot.directory, spot.leaf, _overlay, spot.entry) ? std::optional{std::move(spot)} : std::nullopt;
     }

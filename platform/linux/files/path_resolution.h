@@ -2,6 +2,7 @@
 
 #include <filesystem>
 #include <optional>
+#include <string_view>
 #include <vector>
 
 #include "platform/base_directories.h"
@@ -25,7 +26,9 @@ struct FileTrees {
 
 // What stands at a name: nothing where its mode is 0.
 struct Entry {
-  Descriptor descriptor{};  // for the *at calls; of what only a rehearsal has, the innermost device directory above
+  // Of a directory, for the *at calls; of one that only a rehearsal has, the innermost device directory above. What a
+  // path leads to need not be opened.
+  Descriptor descriptor{};
   struct stat status {};
   const Overlay::Node* node = nullptr;  // set where a rehearsal says what stands there
 
@@ -66,9 +69,13 @@ class PathResolver {
   [[nodiscard]] std::optional<Spot> find(const std::filesystem::path& path) const;
   [[nodiscard]] std::optional<Spot> findTarget(const std::filesystem::path& path) const;
 
-  // What the path leads to as an O_PATH descriptor, in one call of the kernel. Not open, with errno ELOOP, where a link
-  // or an oddity of the path's writing stands in the way; the calls above then know more.
+  // What the path leads to on the device as an O_PATH descriptor, in one call of the kernel. Not open, with errno
+  // ELOOP, where a link, an oddity of the path's writing, or a name that a rehearsal changed stands in the way; the
+  // calls above then know more.
   [[nodiscard]] Descriptor openPlain(const std::filesystem::path& path) const;
+
+  // The same of the path's place; what stands at the path itself is not looked at, but is as on the device.
+  [[nodiscard]] Place openParentOfUnchanged(const std::filesystem::path& path) const;
 
   // The regular file that the path leads to, for reading, as openOwnFile has it.
   [[nodiscard]] Descriptor openFile(const std::filesystem::path& path, struct stat& opened) const;
@@ -82,7 +89,7 @@ class PathResolver {
   [[nodiscard]] Place openParent(const std::filesystem::path& path, bool isToSync) const;
   [[nodiscard]] const Base& baseOf(const std::filesystem::path& path) const;
   [[nodiscard]] bool isBase(const std::filesystem::path& path) const;
-  [[nodiscard]] bool isWayChanged(const std::filesystem::path& path) const;
+  [[nodiscard]] bool isAsOnDevice(std::string_view path) const;  // whether a rehearsal changed none of its names
 
   std::vector<Base> _bases;
   const Overlay* _overlay;

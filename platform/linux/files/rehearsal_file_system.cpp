@@ -32,10 +32,10 @@ bool mayBeChanged(const Spot& spot) {
   const struct stat& directory = spot.directory.status;
   if (Overlay::isMade(directory)) return true;
   if (::faccessat(spot.directory.descriptor.number(), ".", R_OK | W_OK | X_OK, AT_EACCESS) != 0) return false;
-  const uid_t user = ::geteuid();
   const bool isSticky = (directory.st_mode & S_ISVTX) != 0;
-  if (!isSticky || user == 0 || !spot.entry.isThere()) return true;
-  return spot.entry.status.st_uid == user || directory.st_uid == user || failWith(EPERM);
+  if (!isSticky || !spot.entry.isThere()) return true;
+  const uid_t user = ::geteuid();
+  return user == 0 || spot.entry.status.st_uid == user || directory.st_uid == user || failWith(EPERM);
 }
 
 // Whether a file of that size may be made there, and there is room for it.
@@ -45,17 +45,25 @@ bool mayBePut(const Spot& spot, std::size_t size) {
   if (::getrlimit(RLIMIT_FSIZE, &limit) == 0 && size > limit.rlim_cur) return failWith(EFBIG);
   struct statvfs volume {};
   if (::fstatvfs(spot.directory.descriptor.number(), &volume) != 0 || volume.f_blocks == 0) return true;
-  const std::uintmax_t blocks = ::geteuid() == 0 ? volume.f_bfree : volume.f_bavail;
-  return size <= blocks * volume.f_frsize || failWith(ENOSPC);
+  if (size <= std::uintmax_t{volume.f_bavail} * volume.f_frsize) return true;
+  const bool hasRest = ::geteuid() == 0 && size <= std::uintmax_t{volume.f_bfree} * volume.f_frsize;
+  return hasRest || failWith(ENOSPC);
+}
+
+// Of a directory that the rehearsal made, where it would be made.
+bool findVolume(const Entry& directory, dev_t& volume) {
+  struct stat holder = directory.status;
+  if (Overlay::isMade(holder) && ::fstat(directory.descriptor.number(), &holder) != 0) return false;
+  volume = holder.st_dev;
+  return true;
 }
 
 bool mayBeMoved(const Spot& source, const Spot& target) {
   if (!isThere(source.entry)) return false;
-  struct stat from {};
-  struct stat to {};
-  if (::fstat(source.directory.descriptor.number(), &from) != 0) return false;
-  if (::fstat(target.directory.descriptor.number(), &to) != 0) return false;
-  if (from.st_dev != to.st_dev) return failWith(EXDEV);
+  dev_t from = 0;
+  dev_t to = 0;
+  if (!findVolume(source.directory, from) || !findVolume(target.directory, to)) return false;
+  if (from != to) return failWith(EXDEV);
   if (isDirectory(source.entry)) return failWith(ENOTSUP);
   return mayBeCovered(target.entry) && mayBeChanged(source) && mayBeChanged(target);
 }
@@ -68,19 +76,15 @@ bool isNobodyElses(const Entry& entry) {
   return ::geteuid() == 0 || entry.status.st_uid == ::geteuid() || failWith(EPERM);
 }
 
-Place placeOf(const Spot& spot) {
-  return {Descriptor{::fcntl(spot.directory.descriptor.number(), F_DUPFD_CLOEXEC, 0)}, spot.leaf};
-}
-
-// `open` is how the device's file is opened: openOwnFile or openRegularFile.
+// `open` is how the device's file is opened: openOwnFile or openRegularFile. The spot's directory goes with it.
 template <typename Open>
-bool readDeviceFile(const Spot& spot, const Open& open, std::size_t sizeLimit, Bytes& bytes) {
+bool readDeviceFile(Spot& spot, const Open& open, std::size_t sizeLimit, Bytes& bytes) {
   struct stat opened {};
-  const Descriptor file = open(placeOf(spot), opened);
+  const Descriptor file = open(Place{std::move(spot.directory.descriptor), spot.leaf}, opened);
   return file.isOpen() && readUpTo(file.number(), opened, sizeLimit, bytes);
 }
 
-bool readContents(const Spot& spot, std::size_t sizeLimit, Bytes& bytes) {
+bool readContents(Spot& spot, std::size_t sizeLimit, Bytes& bytes) {
   if (!isThere(spot.entry)) return false;
   if (isDirectory(spot.entry)) return failWith(EISDIR);
   if (!S_ISREG(spot.entry.status.st_mode)) return failWith(S_ISLNK(spot.entry.status.st_mode) ? ELOOP : EINVAL);
@@ -91,14 +95,14 @@ bool readContents(const Spot& spot, std::size_t sizeLimit, Bytes& bytes) {
 }
 
 // What a move takes along, whoever's it is: the bytes of a file, or where a link leads.
-bool takeContents(const Spot& spot, Bytes& bytes) {
+bool takeContents(Spot& spot, Bytes& bytes) {
   if (spot.entry.node != nullptr) {
     bytes = spot.entry.node->bytes;
     return true;
   }
   if (!S_ISLNK(spot.entry.status.st_mode)) return readDeviceFile(spot, openRegularFile, SIZE_MAX, bytes);
   std::array<char, PATH_MAX> text{};
-  const ssize_t size = ::readlinkat(spot.entry.descriptor.number(), "", text.data(), text.size());
+  const ssize_t size = ::readlinkat(spot.directory.descriptor.number(), spot.leaf.c_str(), text.data(), text.size());
   if (size < 0) return false;
   bytes.assign(text.begin(), text.begin() + size);
   return true;
@@ -118,6 +122,10 @@ class RehearsalFileSystem final : public RehearsedFiles {
       : _accounts{directories.systemRoot()}, _paths{treesOf(directories), &_overlay} {}
 
   Result<FileKind> kindOf(const Path& path) override {
+    struct stat status {};
+    const Descriptor thing = _paths.openPlain(path);
+    if (!thing.isOpen() && errno == ENOENT) return failureOf("look at", path);
+    if (thing.isOpen() && ::fstat(thing.number(), &status) == 0) return platform::kindOf(status.st_mode);
     std::optional<Spot> spot = _paths.findTarget(path);
     if (!spot && errno == ELOOP) spot = _paths.find(path);
     if (!spot || !isThere(spot->entry)) return failureOf("look at", path);
@@ -126,8 +134,12 @@ class RehearsalFileSystem final : public RehearsedFiles {
 
   Result<Bytes> read(const Path& path, std::size_t sizeLimit) override {
     Bytes bytes;
-    const std::optional<Spot> spot = _paths.findTarget(path);
-    if (!spot || !readContents(*spot, sizeLimit, bytes)) return failureOf("read", path);
+    struct stat opened {};
+    const Place place = _paths.openParentOfUnchanged(path);
+    const Descriptor file = place.parent.isOpen() ? openOwnFile(place, opened) : Descriptor{};
+    const bool isCertain = file.isOpen() || errno == ENOENT || errno == EMLINK;
+    if (!isCertain) return readTarget(path, sizeLimit);
+    if (!file.isOpen() || !readUpTo(file.number(), opened, sizeLimit, bytes)) return failureOf("read", path);
     return bytes;
   }
 
@@ -147,7 +159,7 @@ class RehearsalFileSystem final : public RehearsedFiles {
 
   Status copy(const Path& from, const Path& to) override {
     Bytes bytes;
-    const std::optional<Spot> source = _paths.findTarget(from);
+    std::optional<Spot> source = _paths.findTarget(from);
     if (!source || !readContents(*source, SIZE_MAX, bytes)) return failureOf("copy", from);
     const std::optional<Spot> target = _paths.find(to);
     if (!target || !isFree(target->entry) || !mayBePut(*target, bytes.size())) return failureOf("copy to", to);
@@ -174,10 +186,7 @@ class RehearsalFileSystem final : public RehearsedFiles {
     if (!numbers.isOk()) return numbers.status();
     const std::optional<Spot> spot = _paths.find(path);
     if (!spot || !isThere(spot->entry) || !isNobodyElses(spot->entry)) return failureOf("set the owner of", path);
-    // Whether a file of this process could be given away, the kernel tells of one that lies nowhere.
-    const Descriptor file{::memfd_create("owner", MFD_CLOEXEC)};
-    const bool isGiven = file.isOpen() && ::fchown(file.number(), numbers.value().user, numbers.value().group) == 0;
-    return isGiven ? Status{} : failureOf("set the owner of", path);
+    return mayGiveTo(numbers.value()) ? Status{} : failureOf("set the owner of", path);
   }
 
   Result<Path> temporaryName() override {
@@ -198,7 +207,7 @@ class RehearsalFileSystem final : public RehearsedFiles {
   }
 
   Status rename(const Path& from, const Path& to) override {
-    const std::optional<Spot> source = _paths.find(from);
+    std::optional<Spot> source = _paths.find(from);
     const std::optional<Spot> target = source ? _paths.find(to) : std::nullopt;
     Bytes bytes;
     if (target && mayBeMoved(*source, *target) && takeContents(*source, bytes)) {
@@ -212,6 +221,22 @@ class RehearsalFileSystem final : public RehearsedFiles {
   }
 
  private:
+  Result<Bytes> readTarget(const Path& path, std::size_t sizeLimit) {
+    Bytes bytes;
+    std::optional<Spot> spot = _paths.findTarget(path);
+    if (!spot || !readContents(*spot, sizeLimit, bytes)) return failureOf("read", path);
+    return bytes;
+  }
+
+  // Whether a file of this process could be given away, the kernel tells of one that lies nowhere.
+  [[nodiscard]] bool mayGiveTo(const AccountNames::Owner& owner) {
+    if (_givenTo == owner) return true;
+    const Descriptor file{::memfd_create("owner", MFD_CLOEXEC)};
+    if (!file.isOpen() || ::fchown(file.number(), owner.user, owner.group) != 0) return false;
+    _givenTo = owner;
+    return true;
+  }
+
   void putFile(const Spot& spot, Bytes bytes) {
     _overlay.put(spot.directory.status, spot.leaf, nodeOf(S_IFREG | S_IRUSR | S_IWUSR, std::move(bytes)));
   }
@@ -233,6 +258,7 @@ class RehearsalFileSystem final : public RehearsedFiles {
   Overlay _overlay;
   PathResolver _paths;
   unsigned _temporaryNames = 0;
+  std::optional<AccountNames::Owner> _givenTo;  // the last one to whom a file could be given away
 };
 
 }  // namespace
