@@ -69,7 +69,8 @@ Child childOn(const std::filesystem::path& root, const Mishap& mishap) {
                 .directory = root / "snapshots",
                 .footprint = {},
                 .release = "1",
-                .warn = [](const std::string&) {}}};
+                .warn = [](const std::string&) {},
+                .putAside = {}}};
 }
 
 // Remembers how the last save ended.
