@@ -4,6 +4,7 @@
 #include <map>
 #include <memory>
 #include <optional>
+#include <set>
 #include <utility>
 
 #include "platform/linux/files/file_services.h"
@@ -89,6 +90,26 @@ class KeepingPropertyListStore final : public platform::PropertyListStore {
   std::shared_ptr<platform::PropertyListStore> _others;
 };
 
+// What is open is not looked for again.
+class KeepingModuleLoader final : public platform::ModuleLoader {
+ public:
+  explicit KeepingModuleLoader(std::shared_ptr<ModuleLoader> inner) : _inner{std::move(inner)} {}
+
+  Status open(const std::string& path) override {
+    if (_open.contains(path)) return {};
+    Status opened = _inner->open(path);
+    if (opened.isOk()) _open.insert(path);
+    return opened;
+  }
+
+ private:
+  std::shared_ptr<ModuleLoader> _inner;
+  std::set<std::string> _open;
+};
+
+// Null where nothing is kept.
+std::shared_ptr<platform::ModuleLoader> keptModules;
+
 }  // namespace
 
 std::shared_ptr<platform::FileKeeper> makeRehearsalKeeper(std::shared_ptr<platform::FileKeeper> inner,
@@ -100,6 +121,7 @@ void rehearseOn(platform::Platform& platform) {
   platform.files = platform::makeRehearsalFileSystem(*platform.directories);
   platform.propertyLists = platform::makeLibplistPropertyListStore(platform.files);
   if (keptLists) platform.propertyLists = std::make_shared<KeepingPropertyListStore>(platform.propertyLists);
+  if (keptModules) platform.modules = keptModules;
   platform.systemLog = std::make_shared<platform::SilentSystemLog>();
   silenceNotices(platform);
 }
@@ -107,6 +129,11 @@ void rehearseOn(platform::Platform& platform) {
 void silenceNotices(platform::Platform& platform) {
   platform.preferencesChanged = std::make_shared<platform::SilentPreferencesChangedNotice>();
   platform.cloudTabs = std::make_shared<platform::SilentCloudTabsNotice>();
+}
+
+void keepModules(platform::Platform& platform) {
+  keptModules = std::make_shared<KeepingModuleLoader>(platform.modules);
+  platform.modules = keptModules;
 }
 
 void keepResources(const platform::Platform& platform) {

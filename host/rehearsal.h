@@ -13,6 +13,10 @@ void rehearseOn(platform::Platform& platform);
 // The programs that run on this machine hear nothing of what is done on this platform.
 void silenceNotices(platform::Platform& platform);
 
+// What this platform opens from now on stays open for all platforms that are made to rehearse after it, and is not
+// looked at again for them.
+void keepModules(platform::Platform& platform);
+
 // Reads the product's own property lists, which are in the platform's resources and the same for every device, once for
 // all platforms that are made to rehearse from now on. Whoever replaces one of them is not heeded then.
 void keepResources(const platform::Platform& platform);

@@ -73,16 +73,21 @@ platform::Result<ForkedRun> answered(const Request& request, const Options& opti
 }
 
 // What no device has a say in.
-void loadForAll(const Options& options) {
-  platform::setCurrent(platform::makeLinuxPlatform(options.device));
+void loadForAll(Options& options) {
+  platform::Platform platform = platform::makeLinuxPlatform(options.device);
+  options.device.resources = platform.directories->resources();
+  keepModules(platform);
+  platform::setCurrent(std::move(platform));
   const auto loaded = loadMigrator(platform::current(), options.plugin);
   if (!loaded.isOk()) throw Ending{ExitStatus::noPlugin, loaded.status().reason()};
   keepResources(platform::current());
+  platform::setCurrent({});  // given back here once, and not in each child, which has its own
 }
 
 }  // namespace
 
-ExitStatus serveRehearsals(const Options& options) {
+ExitStatus serveRehearsals(const Options& given) {
+  Options options = given;
   loadForAll(options);
   std::string line;
   for (bool isHeard = commandline::print(greeting()); isHeard && std::getline(std::cin, line);) {

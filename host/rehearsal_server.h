@@ -9,6 +9,6 @@ namespace host {
 // process, which has loaded the plug-in, with what `--root DIR --dry-run --explain=json` and the options of this call
 // make of it. docs/FLEET.md describes requests and answers. Throws commandline::Ending where the plug-in cannot be
 // loaded, for what is no request, and where no child can be made.
-[[nodiscard]] ExitStatus serveRehearsals(const Options& options);
+[[nodiscard]] ExitStatus serveRehearsals(const Options& given);
 
 }  // namespace host
