@@ -31,7 +31,7 @@ using Stopped = ForkedRun::Stopped;
 
 constexpr std::size_t kMaxErrors = std::size_t{1} << 20;
 constexpr double kSecondsToEnd = 1;  // after its last word
-constexpr int kMillisecondsBetweenErrors = 10;
+constexpr int kMillisecondsToGather = 10;
 
 struct Pipe {
   Descriptor reader;
@@ -81,20 +81,21 @@ class Child {
         _limits{limits},
         _listener{listener.value_or(-1)} {}
 
-  // Answers whether there is still somebody to tell. While there is output to come, this process is not woken by each
-  // line of errors, but takes what has gathered now and then.
+  // Answers whether there is still somebody to tell. This process is not woken by each line, but takes what has
+  // gathered now and then: first when the child ends, as most soon do, and then while there is output to come.
   [[nodiscard]] bool hearOut() {
+    const Descriptor* heard = &_end;
     while (_run.stopped == Stopped::no && (_output.isOpen() || _errors.isOpen())) {
-      const Descriptor& heard = _output.isOpen() ? _output : _errors;
-      std::array<pollfd, 2> ready{{{heard.number(), POLLIN, 0}, {_listener, 0, 0}}};
+      std::array<pollfd, 2> ready{{{heard->number(), POLLIN, 0}, {_listener, 0, 0}}};
       const int left = millisecondsLeft();
-      const int count = ::poll(ready.data(), ready.size(), std::min(left, kMillisecondsBetweenErrors));
+      const int count = ::poll(ready.data(), ready.size(), std::min(left, kMillisecondsToGather));
       if (count < 0 && errno == EINTR) continue;
       if (count < 0 || left == 0) _run.stopped = Stopped::timeout;
       if (ready[1].revents != 0) return false;
       take(_output, _run.output, SIZE_MAX);
       take(_errors, _run.errors, kMaxErrors);
       if (_limits.output && _run.output.size() > *_limits.output) _run.stopped = Stopped::tooMuchOutput;
+      heard = _output.isOpen() ? &_output : &_errors;
     }
     return true;
   }
@@ -103,8 +104,7 @@ class Child {
     if (pollfd ended{_end.number(), POLLIN, 0}; secondsToEnd > 0 && ended.fd >= 0) {
       ::poll(&ended, 1, static_cast<int>(secondsToEnd * 1000));
     }
-    ::kill(-_number, SIGKILL);
-    ::kill(_number, SIGKILL);  // it may have no session yet
+    if (::kill(-_number, SIGKILL) != 0) ::kill(_number, SIGKILL);  // it may have no session yet
     int status = 0;
     rusage usage{};
     while (::wait4(_number, &status, 0, &usage) < 0 && errno == EINTR) continue;

@@ -112,6 +112,13 @@ class Served(ServingTest):
                 RandomDevice(seed).fill(device)
                 self.assert_as_alone(server, device)
 
+    def test_more_than_a_pipe_holds_is_told_as_alone(self):
+        accounts = [{"Identifier": str(number), "Type": "CalDAV"} for number in range(300)]
+        device = self.device(Version=0, Accounts=accounts)
+        server = self.server()
+        self.assert_as_alone(server, device)
+        self.assertGreater(server.rehearse(device.root).head["output"], 1 << 16)
+
     def test_what_one_device_answers_is_no_answer_of_the_next(self):
         server, odd, plain = self.server(), self.example("first-generation"), self.example("legacy-files")
         odd.write_plist("etc/vorlix/device-info.plist", {"CPUArchitecture": "armv6", "RegionalBehaviorGoogleMail": True})
