@@ -70,9 +70,10 @@ class CountingFiles final : public platform::FileSystem {
 
 void makeDevice(const Path& root, const Population& population) {
   for (const char* const directory : {"etc", "var/mobile/Library/Mail", "var/mobile/Library/Preferences",
-                                      "var/mobile/Library/Logs/CrashReporter", "var/mobile/tmp"}) {
+                                      "var/mobile/Library/Logs/CrashReporter", "var/mobile/tmp", "tmp"}) {
     std::filesystem::create_directories(root / directory);
   }
+  std::filesystem::permissions(root / "tmp", std::filesystem::perms::all | std::filesystem::perms::sticky_bit);
   writeTable(root / "etc/passwd",
              "mobile:*:" + std::to_string(::getuid()) + ":" + std::to_string(::getgid()) + "::/var/mobile:/bin/sh");
   writeTable(root / "etc/group", "mobile:*:" + std::to_string(::getgid()) + ":");
