@@ -1,5 +1,6 @@
 """The host as it is asked to rehearse: in a process of its own, with limits on its time, memory and output."""
 
+import functools
 import hashlib
 import os
 import resource
@@ -95,13 +96,13 @@ class Host(NamedTuple):
         """Of everything that what a rehearsal says depends on: two builds of one version differ in it."""
         digest = hashlib.sha256()
         for part in self._parts():
-            digest.update(part.name.encode() + b"\0" + hashlib.sha256(part.read_bytes()).digest())
+            digest.update(part.name.encode() + b"\0" + digest_of(part).digest())
         return digest.hexdigest()
 
     def digests(self):
         """Of the program and of the plug-in, each by itself, as sha256sum prints them."""
         program, plugin, *_ = self._parts()
-        return [hashlib.sha256(part.read_bytes()).hexdigest() for part in (program, plugin)]
+        return [digest_of(part).hexdigest() for part in (program, plugin)]
 
     def _parts(self):
         """The program, the plug-in, the system's own libraries that the two load, and the resources."""
@@ -119,6 +120,12 @@ class Host(NamedTuple):
         if not found:
             raise HostUnusable(f"no plug-in is installed beside {program}; name one with --plugin")
         return found[0]
+
+
+@functools.cache
+def digest_of(file):
+    """The SHA-256 of a file's contents, read once."""
+    return hashlib.sha256(file.read_bytes())
 
 
 def own_libraries(binary):

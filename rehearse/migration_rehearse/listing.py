@@ -1,6 +1,7 @@
 """Which images are meant: those named on the command line, and those in lists, which may be longer than memory."""
 
 import os
+import re
 import shutil
 import sys
 import tempfile
@@ -11,6 +12,7 @@ from migration_rehearse.campaign import in_shard
 from migration_rehearse.engines import EngineFault
 
 STANDARD_INPUT = "-"
+IS_ABSOLUTE = re.compile(r"(/(?!\.?(/|$))[^/]+)+", re.DOTALL).fullmatch  # and written as short as can be
 
 
 class Listing:
@@ -28,7 +30,7 @@ class Listing:
         return (absolute(path) for path in self._all() if in_shard(path, self.shard))
 
     def count(self):
-        return sum(1 for _ in self)
+        return sum(in_shard(path, self.shard) for path in self._all())
 
     def _all(self):
         yield from self.named
@@ -46,7 +48,7 @@ class Listing:
 
 def absolute(path):
     """The same place from wherever a worker runs. Parents are left for links to mean what they do; no path stays none."""
-    return str(Path(path).absolute()) if path else path
+    return path if not path or IS_ABSOLUTE(path) else str(Path(path).absolute())
 
 
 def _spooled(stream):

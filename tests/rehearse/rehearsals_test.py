@@ -11,9 +11,11 @@ import signal
 import subprocess
 import time
 import unittest
+from itertools import product
 from pathlib import Path
 
 from device_case import PLUGINS
+from migration_rehearse.listing import absolute
 from rehearsal_case import every_detail
 from rehearse_case import KEPT, REHEARSE, UNFIXABLE, RehearseTest
 
@@ -60,6 +62,11 @@ class Rehearsals(RehearseTest):
 
 
 class Lists(RehearseTest):
+    def test_name_each_place_in_one_way(self):
+        for path in map("".join, product("/.a\n", repeat=5)):
+            self.assertEqual(str(Path(path).absolute()), absolute(path))
+        self.assertEqual("", absolute(""))
+
     def test_name_images_line_by_line(self):
         images = self.fleet(3)
         listed = self.scratch / "list"
