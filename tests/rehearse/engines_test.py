@@ -47,6 +47,11 @@ def failing(number):
     raise ValueError(number)
 
 
+def cores_of(_):
+    time.sleep(0.02)  # so that every worker has some
+    return os.sched_getaffinity(0)
+
+
 def place_for_files(_):
     return tempfile.mkdtemp()
 
@@ -62,6 +67,11 @@ class LocalProcesses(unittest.TestCase):
     def test_answer_every_task_once(self):
         self.assertEqual([(number, 2 * number) for number in range(500)],
                          sorted(self.engine.map(doubled, range(500))))
+
+    def test_stay_each_on_one_core_of_those_that_the_program_has(self):
+        cores = list(self.results(cores_of, range(20)).values())
+        self.assertEqual({1}, {len(of_one) for of_one in cores})
+        self.assertEqual(set(sorted(os.sched_getaffinity(0))[:2]), set.union(*cores))
 
     def test_take_tasks_no_further_ahead_than_they_need(self):
         given = []
