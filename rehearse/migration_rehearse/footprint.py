@@ -39,6 +39,9 @@ DIRECTORIES = (
     "var/mobile/tmp",
 )
 
+# Where these stand, each directory after the one that it is in.
+WAYS = sorted({path[:end] for path in (*FILES, *DIRECTORIES) for end, letter in enumerate(path) if letter == "/"})
+
 # An identifier from its thirteenth character on, which a search finds at once since it begins with what is rare; and
 # the part before that.
 IDENTIFIER_END = re.compile(r"-4[0-9A-F]{3}-[89AB][0-9A-F]{3}-[0-9A-F]{12}")
@@ -111,23 +114,34 @@ def resolved(path, target):
 def look_at(root):
     """The footprint of the device whose file tree is in the directory `root`."""
     digest, identifiers, found = hashlib.sha256(), set(), 0
-    target = target_of(root)
-
-    @functools.cache
-    def is_plain(directory):
-        """Whether no link stands on the way to it, itself included."""
-        return not directory or (is_plain(directory.rpartition("/")[0]) and target(directory) is None)
-
+    target, ways = target_of(root), _ways(root)
     for path in (*FILES, *DIRECTORIES):
-        kind, content = _what_stands_at(f"{root}/{path}") if is_plain(path.rpartition("/")[0]) else LINK
+        kind, content = ways[path.rpartition("/")[0]] or _what_stands_at(f"{root}/{path}")
         if kind == "link":
             place = resolved(path, target)
             kind, content = LINK if place is None else _what_stands_at(f"{root}/{place}")
         digest.update(f"{path}\0{kind}\0{len(content)}\0".encode())
-        digest.update(content)
-        identifiers.update(identifier for _, identifier in identifiers_in(content.decode("latin-1")))
-        found += path.startswith("var/mobile/") and kind != "missing"
+        if content:
+            digest.update(content)
+            identifiers.update(identifier for _, identifier in identifiers_in(content.decode("latin-1")))
+        found += kind != "missing" and path.startswith("var/mobile/")
     return Footprint(digest.hexdigest(), frozenset(identifiers), found > 0)
+
+
+def _ways(root):
+    """Of each directory on the way to a place: what stands at every place below it, where that can be told without looking
+    there, since nothing does or a link is on the way; else None."""
+    ways = {}
+    for directory in WAYS:
+        ways[directory] = ways.get(directory.rpartition("/")[0]) or _way(f"{root}/{directory}")
+    return ways
+
+
+def _way(directory):
+    try:
+        return LINK if stat.S_ISLNK(os.lstat(directory).st_mode) else None
+    except OSError as failure:
+        return _not_seen(failure)
 
 
 def read_file(root, path, limit=MAX_HASHED):
@@ -140,7 +154,7 @@ def _what_stands_at(place):
     try:
         status = os.lstat(place)
     except OSError as failure:
-        return ("missing" if isinstance(failure, (FileNotFoundError, NotADirectoryError)) else "unreadable"), b""
+        return _not_seen(failure)
     if stat.S_ISLNK(status.st_mode):
         return LINK
     kind = f"{status.st_mode:o} {status.st_uid} {status.st_gid} {min(status.st_nlink, 2)}"
@@ -152,20 +166,33 @@ def _what_stands_at(place):
     return (kind + " unreadable", b"") if content is None else (f"{kind} {status.st_size}", content)
 
 
+def _not_seen(failure):
+    return ("missing" if isinstance(failure, (FileNotFoundError, NotADirectoryError)) else "unreadable"), b""
+
+
 def _read(place, limit):
     """A pipe at the place is not waited for, and a link not followed."""
     try:
         descriptor = os.open(place, os.O_RDONLY | os.O_NOFOLLOW | os.O_NONBLOCK | os.O_CLOEXEC)
     except OSError:
         return None
-    with open(descriptor, "rb") as file:
+    try:
         status = os.fstat(descriptor)
         if not stat.S_ISREG(status.st_mode):
             return None
-        try:
-            return file.read(min(limit, status.st_size))  # for what is asked for, memory is taken
-        except OSError:
-            return None
+        return _first(descriptor, min(limit, status.st_size))  # for what is asked for, memory is taken
+    except OSError:
+        return None
+    finally:
+        os.close(descriptor)
+
+
+def _first(descriptor, size):
+    """So many bytes of a file, or as many as there are."""
+    content = os.read(descriptor, size)
+    while 0 < len(content) < size and (more := os.read(descriptor, size - len(content))):
+        content += more
+    return content
 
 
 def digest_of_file(path):
