@@ -3,10 +3,12 @@
 #include <array>
 #include <bit>
 #include <cstdint>
-#include <set>
 #include <string_view>
+#include <unordered_set>
 #include <utility>
 #include <vector>
+
+#include "platform/insertion_ordered_map.h"
 
 namespace platform {
 namespace {
@@ -26,6 +28,12 @@ std::uint32_t placeOf(Kind kind, std::string_view bytes) {
   std::uint32_t hash = 5381 + static_cast<std::uint32_t>(kind);
   for (const char byte : bytes) hash = hash * 33 + static_cast<std::uint32_t>(byte);
   return hash % kTableSize;
+}
+
+std::uint64_t numberIn(std::string_view bytes) {
+  std::uint64_t number = 0;
+  for (const char byte : bytes) number = number << 8U | static_cast<unsigned char>(byte);
+  return number;
 }
 
 // Hands every text, key and number to the visitor, with its kind.
@@ -72,18 +80,26 @@ class Uses {
  public:
   void see(Kind kind, std::string_view bytes) {
     ++_total;
-    ++_ofPlace[isText(kind) ? placeOfText(kind, bytes) : placeOf(kind, bytes)];
+    Place& place = _places[isText(kind) ? placeOfText(kind, bytes) : placeOf(kind, bytes)];
+    const std::uint64_t value = isText(kind) ? reinterpret_cast<std::uintptr_t>(bytes.data()) : numberIn(bytes);
+    if (place.uses++ == 0 || place.last != value) ++place.different;
+    place.last = value;
   }
   [[nodiscard]] std::uint64_t total() const { return _total; }
-  [[nodiscard]] std::uint64_t of(std::size_t place) const { return _ofPlace[place]; }
-  // As many comparisons as there could be, were all that fall into a place different.
+  [[nodiscard]] std::uint64_t of(std::size_t place) const { return _places[place].uses; }
+  // No fewer comparisons than there are: with all that are different in the place, for each use of it.
   [[nodiscard]] std::uint64_t mostComparisons() const {
     std::uint64_t sum = 0;
-    for (const std::uint64_t uses : _ofPlace) sum += uses * uses;
+    for (const Place& place : _places) sum += std::uint64_t{place.uses} * place.different;
     return sum;
   }
 
  private:
+  struct Place {
+    std::uint64_t last = 0;  // the number seen last, or where the text's characters lie
+    std::uint32_t uses = 0;
+    std::uint32_t different = 0;  // at most: what comes back after another value counts anew
+  };
   struct Known {
     const char* characters = nullptr;
     Kind kind = Kind::integer;
@@ -100,7 +116,7 @@ class Uses {
   static constexpr std::size_t kAlignment = 16;  // of what an allocator hands out
 
   std::uint64_t _total = 0;
-  std::vector<std::uint32_t> _ofPlace = std::vector<std::uint32_t>(kTableSize);
+  std::vector<Place> _places = std::vector<Place>(kTableSize);
   std::array<Known, 256> _known{};
 };
 
@@ -121,15 +137,23 @@ class Comparisons {
   }
 
  private:
-  static std::uint64_t numberIn(std::string_view bytes) {
-    std::uint64_t number = 0;
-    for (const char byte : bytes) number = number << 8U | static_cast<unsigned char>(byte);
-    return number;
-  }
+  using SomeText = std::pair<Kind, std::string_view>;
+  using SomeNumber = std::pair<Kind, std::uint64_t>;
+
+  // So that nobody can choose what collides here, too.
+  struct Hash {
+    std::size_t operator()(const SomeText& text) const {
+      return SeededHash{}(text.second) + static_cast<std::size_t>(text.first);
+    }
+    std::size_t operator()(const SomeNumber& number) const {
+      const auto bytes = std::bit_cast<std::array<char, sizeof number.second>>(number.second);
+      return (*this)(SomeText{number.first, {bytes.data(), bytes.size()}});
+    }
+  };
 
   const Uses& _uses;
-  std::set<std::pair<Kind, std::string_view>> _texts;
-  std::set<std::pair<Kind, std::uint64_t>> _numbers;
+  std::unordered_set<SomeText, Hash> _texts;
+  std::unordered_set<SomeNumber, Hash> _numbers;
   std::uint64_t _sum = 0;
 };
 
