@@ -1,10 +1,10 @@
 #include "platform/linux/property_lists/writing_cost.h"
 
+#include <algorithm>
 #include <array>
 #include <bit>
 #include <cstdint>
 #include <string_view>
-#include <unordered_set>
 #include <utility>
 #include <vector>
 
@@ -24,17 +24,32 @@ enum class Kind : std::uint32_t { integer = 1, real = 2, text = 3, date = 6, key
 
 bool isText(Kind kind) { return kind == Kind::text || kind == Kind::key; }
 
-std::uint32_t placeOf(Kind kind, std::string_view bytes) {
+std::uint32_t tablePlaceOf(Kind kind, std::string_view bytes) {
   std::uint32_t hash = 5381 + static_cast<std::uint32_t>(kind);
   for (const char byte : bytes) hash = hash * 33 + static_cast<std::uint32_t>(byte);
   return hash % kTableSize;
 }
 
-std::uint64_t numberIn(std::string_view bytes) {
-  std::uint64_t number = 0;
-  for (const char byte : bytes) number = number << 8U | static_cast<unsigned char>(byte);
-  return number;
-}
+// The value that a place of the table was asked for last: a number, or a text by where its characters lie.
+class Latest {
+ public:
+  // Takes it for the latest.
+  [[nodiscard]] bool isOther(Kind kind, std::string_view bytes) {
+    const std::uint64_t before = _value;
+    _value = isText(kind) ? reinterpret_cast<std::uintptr_t>(bytes.data()) : numberIn(bytes);
+    return !std::exchange(_isAny, true) || _value != before;
+  }
+
+ private:
+  static std::uint64_t numberIn(std::string_view bytes) {
+    std::uint64_t number = 0;
+    for (const char byte : bytes) number = number << 8U | static_cast<unsigned char>(byte);
+    return number;
+  }
+
+  std::uint64_t _value = 0;
+  bool _isAny = false;
+};
 
 // Hands every text, key and number to the visitor, with its kind.
 template <typename Visitor>
@@ -80,10 +95,13 @@ class Uses {
  public:
   void see(Kind kind, std::string_view bytes) {
     ++_total;
-    Place& place = _places[isText(kind) ? placeOfText(kind, bytes) : placeOf(kind, bytes)];
-    const std::uint64_t value = isText(kind) ? reinterpret_cast<std::uintptr_t>(bytes.data()) : numberIn(bytes);
-    if (place.uses++ == 0 || place.last != value) ++place.different;
-    place.last = value;
+    Place& place = _places[placeOf(kind, bytes)];
+    ++place.uses;
+    if (place.latest.isOther(kind, bytes)) ++place.different;
+  }
+  // Where the library looks for the value in its table.
+  [[nodiscard]] std::uint32_t placeOf(Kind kind, std::string_view bytes) {
+    return isText(kind) ? placeOfText(kind, bytes) : tablePlaceOf(kind, bytes);
   }
   [[nodiscard]] std::uint64_t total() const { return _total; }
   [[nodiscard]] std::uint64_t of(std::size_t place) const { return _places[place].uses; }
@@ -96,7 +114,7 @@ class Uses {
 
  private:
   struct Place {
-    std::uint64_t last = 0;  // the number seen last, or where the text's characters lie
+    Latest latest;
     std::uint32_t uses = 0;
     std::uint32_t different = 0;  // at most: what comes back after another value counts anew
   };
@@ -109,7 +127,7 @@ class Uses {
   // The keys and most texts of one file share their characters, so where those lie tells them.
   std::uint32_t placeOfText(Kind kind, std::string_view text) {
     Known& known = _known[reinterpret_cast<std::uintptr_t>(text.data()) / kAlignment % _known.size()];
-    if (known.characters != text.data() || known.kind != kind) known = {text.data(), kind, placeOf(kind, text)};
+    if (known.characters != text.data() || known.kind != kind) known = {text.data(), kind, tablePlaceOf(kind, text)};
     return known.place;
   }
 
@@ -120,41 +138,29 @@ class Uses {
   std::array<Known, 256> _known{};
 };
 
-// Sums up the comparisons, telling equal ones from different ones.
+// Sums up the comparisons, telling equal values from different ones: by their place, which the same bytes of two kinds
+// never share, and by a digest for which nobody can choose values.
 class Comparisons {
  public:
-  explicit Comparisons(const Uses& uses) : _uses{uses} {}
+  explicit Comparisons(Uses& uses) : _uses{uses} {}
 
   void see(Kind kind, std::string_view bytes) {
-    // What numbers are made of does not outlive the call.
-    const bool isNew =
-        isText(kind) ? _texts.emplace(kind, bytes).second : _numbers.emplace(kind, numberIn(bytes)).second;
-    if (isNew) _sum += _uses.of(placeOf(kind, bytes));
+    const std::uint32_t place = _uses.placeOf(kind, bytes);
+    if (_latest[place].isOther(kind, bytes)) _seen.push_back(SeededHash{}(bytes) / kTableSize * kTableSize + place);
   }
-  [[nodiscard]] bool areUneven() const {
-    const std::uint64_t evenly = _uses.total() * ((_texts.size() + _numbers.size()) / kTableSize + 1);
-    return _sum > kCheap + kMaxUnevenness * evenly;
+  [[nodiscard]] bool areUneven() {
+    std::ranges::sort(_seen);
+    _seen.erase(std::unique(_seen.begin(), _seen.end()), _seen.end());
+    std::uint64_t sum = 0;
+    for (const std::uint64_t value : _seen) sum += _uses.of(value % kTableSize);
+    const std::uint64_t evenly = _uses.total() * (_seen.size() / kTableSize + 1);
+    return sum > kCheap + kMaxUnevenness * evenly;
   }
 
  private:
-  using SomeText = std::pair<Kind, std::string_view>;
-  using SomeNumber = std::pair<Kind, std::uint64_t>;
-
-  // So that nobody can choose what collides here, too.
-  struct Hash {
-    std::size_t operator()(const SomeText& text) const {
-      return SeededHash{}(text.second) + static_cast<std::size_t>(text.first);
-    }
-    std::size_t operator()(const SomeNumber& number) const {
-      const auto bytes = std::bit_cast<std::array<char, sizeof number.second>>(number.second);
-      return (*this)(SomeText{number.first, {bytes.data(), bytes.size()}});
-    }
-  };
-
-  const Uses& _uses;
-  std::unordered_set<SomeText, Hash> _texts;
-  std::unordered_set<SomeNumber, Hash> _numbers;
-  std::uint64_t _sum = 0;
+  Uses& _uses;
+  std::vector<Latest> _latest = std::vector<Latest>(kTableSize);
+  std::vector<std::uint64_t> _seen;  // digests, the last digits of which are replaced by the place
 };
 
 }  // namespace
