@@ -64,11 +64,7 @@ class DeviceWithAccounts : public ::testing::Test {
 
   // As an editor does that knows nothing of us: another file is moved onto the settings.
   void replaceAccounts(const std::string& accounts, int version = accountsettings::kCurrentVersion) const {
-    const std::string kept = device.root.contents(kSettings);
-    putAccounts(accounts, version);
-    const std::string written = device.root.contents(kSettings);
-    device.root.put(kSettings, kept);
-    std::filesystem::rename(device.root.put("replacement", written), device.root / kSettings);
+    std::filesystem::rename(device.root.put("replacement", withAccounts(accounts, version)), device.root / kSettings);
   }
 
   [[nodiscard]] accounts::OpenOptions options() const {
